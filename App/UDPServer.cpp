@@ -1,0 +1,124 @@
+#include "App/UDPServer.h"
+
+#include <array>
+#include <cstdint>
+#include <exception>
+#include <iostream>
+
+#include <Poco/Error.h>
+#include <Poco/Exception.h>
+#include <Poco/Net/SocketAddress.h>
+#include <Poco/Timespan.h>
+
+#include "Common/Constants.h"
+
+namespace {
+
+constexpr std::size_t RECEIVE_BUFFER_BYTES = 10240;
+constexpr long POLL_TIMEOUT_MS = 250; // how long a stop may take; spares the loop a socket to be woken by
+
+/// What is asked of the kernel. Its default holds some hundred datagrams, which a burst fills while this
+/// thread waits for a processor.
+constexpr int SOCKET_BUFFER_BYTES = 8 * 1024 * 1024;
+
+/// For `catch (...)`: prints the exception under way.
+void PrintCaughtException() {
+    try {
+        throw;
+    } catch (const Poco::Exception& error) {
+        std::cout << "Poco exception: " << error.displayText() << std::endl;
+    } catch (const std::exception& error) {
+        std::cout << "Std exception: " << error.what() << std::endl;
+    } catch (...) {
+        std::cout << "Unknown exception,eCode:" << Poco::Error::last()
+                  << ",desc:" << Poco::Error::getMessage(Poco::Error::last()) << std::endl;
+    }
+}
+
+} // namespace
+
+/// What a datagram is received into. The byte behind the last is always zero, so that a datagram which fills
+/// the buffer ends somewhere too.
+class UDPServer::Buffer {
+public:
+    void Clear() { m_bytes.fill('\0'); }
+    char* Data() { return m_bytes.data(); }
+
+    /// The bytes up to the first zero byte.
+    std::string Text() const { return m_bytes.data(); }
+
+private:
+    std::array<char, RECEIVE_BUFFER_BYTES + 1> m_bytes{};
+};
+
+UDPServer::~UDPServer() {
+    Stop();
+}
+
+bool UDPServer::Start(const std::string& ip, int port) {
+    try {
+        const Poco::Net::SocketAddress address(ip, static_cast<std::uint16_t>(port));
+        // Both kinds of reuse, so that a service which was just restarted can bind at once.
+        m_socket.bind(address, true, true);
+        try {
+            m_socket.setReceiveBufferSize(SOCKET_BUFFER_BYTES);
+        } catch (const Poco::Exception&) { // what the kernel grants is enough to run with
+        }
+        m_thread.start(*this);
+        return true;
+    } catch (...) {
+        PrintCaughtException();
+        return false;
+    }
+}
+
+void UDPServer::run() {
+    Buffer buffer;
+    if (m_bStop)
+        return;
+    do {
+        if (!WaitForDatagram())
+            continue;
+        try {
+            ReceiveOne(buffer);
+        } catch (...) {
+            PrintCaughtException();
+        }
+    } while (!m_bStop);
+}
+
+/// Whether a datagram came within the poll timeout. A poll that fails (a closed socket) would fail again at
+/// once and for ever: it is printed when it begins, and each one waits out the timeout that it did not use.
+bool UDPServer::WaitForDatagram() {
+    try {
+        const bool readable = m_socket.poll(Poco::Timespan(POLL_TIMEOUT_MS * Poco::Timespan::MILLISECONDS),
+                                            Poco::Net::Socket::SELECT_READ);
+        m_pollFailed = false;
+        return readable;
+    } catch (...) {
+        if (!m_pollFailed)
+            PrintCaughtException();
+        m_pollFailed = true;
+        Poco::Thread::sleep(POLL_TIMEOUT_MS);
+        return false;
+    }
+}
+
+void UDPServer::ReceiveOne(Buffer& buffer) {
+    buffer.Clear();
+    Poco::Net::SocketAddress sender; // whoever sends from this machine is welcome
+    if (m_socket.receiveFrom(buffer.Data(), RECEIVE_BUFFER_BYTES, sender) < 1)
+        return;
+    Recv(buffer.Text());
+}
+
+void UDPServer::Stop() {
+    if (!m_thread.isRunning())
+        return;
+    StopSelf();
+    m_thread.join();
+}
+
+void UDPServer::StopSelf() {
+    m_bStop = true;
+}

@@ -1,0 +1,57 @@
+#pragma once
+
+#include <string>
+
+#include <Poco/Net/DatagramSocket.h>
+#include <Poco/Runnable.h>
+#include <Poco/Thread.h>
+
+/// Receives datagrams on a thread of its own and hands each one, as text, to Recv. Knows nothing of what they
+/// mean.
+///
+/// Life: constructed → started (Start returned true) → stopping → joined. There is no restart.
+/// Threads: Recv runs on the receiving thread, everything else on the owner's. A derived class stops in its
+/// own destructor: once that has run, the receiving thread has no Recv to call any more. Failure: goes to
+/// standard output, never to the log; the receiver must be able to complain without a logger.
+class UDPServer : public Poco::Runnable {
+public:
+    UDPServer() = default;
+
+    /// As Stop. An exception on the way ends the process.
+    ~UDPServer() override;
+
+    /// The receive loop; returns when a stop is asked for.
+    void run() override;
+
+    /// Binds `ip` and `port` and starts the thread. False after printing why that failed; nothing is running
+    /// then.
+    bool Start(const std::string& ip, int port);
+
+    /// Stops the loop and joins its thread, which takes one poll timeout (250 ms) at the most beside the Recv
+    /// under way. Returns at once when nothing runs. Not for the receiving thread itself: see StopSelf.
+    void Stop();
+
+    /// Asks the loop to end and does not wait; may be called by Recv.
+    void StopSelf();
+
+protected:
+    /// Called once for each datagram: its bytes up to the first zero byte, 10240 at the most. The result is
+    /// ignored, and an exception costs this datagram only.
+    virtual bool Recv(const std::string& msg) = 0;
+
+    Poco::Thread m_thread;
+    Poco::Net::DatagramSocket m_socket;
+
+private:
+    class Buffer;
+
+    bool WaitForDatagram();
+    void ReceiveOne(Buffer& buffer);
+
+    /// Plain on purpose: the stopping thread writes it once, the loop reads it once a pass, and the join
+    /// orders the rest. The worst that the race can cost is one more pass.
+    bool m_bStop = false;
+
+    /// Whether the last poll failed, so that a socket that stays broken is reported once.
+    bool m_pollFailed = false;
+};

@@ -1,0 +1,19 @@
+#pragma once
+
+#include <string>
+
+// Every source file has a copy of these of its own, built by its own static initialiser: they may be used
+// during static initialisation, where a shared copy of another file might not exist yet.
+
+static const std::string ORVEK_EMPTY_STRING = "";
+static const std::string ORVEK_SPACE_STRING = " ";
+
+/// For SystemTool::Clock::DateTime::ToString; %i stands for the milliseconds.
+static const std::string DATE_TIME_FORMAT_MS = "%Y-%m-%d %H:%M:%S:%i";
+
+/// The suite's registry key on the other platform; unused on this one.
+static const std::string WIN_REG_PATH = "HKEY_LOCAL_MACHINE\\SOFTWARE\\HubLink";
+
+/// The suite's preferences directory, and its machine-wide settings file there.
+static const std::string MAC_REG_PATH = "/Library/Preferences/hublink";
+static const std::string MAC_REG_INI = MAC_REG_PATH + "/local_machine.ini";

@@ -1,0 +1,115 @@
+#pragma once
+
+#include <stdexcept>
+#include <string>
+#include <string_view>
+
+#include <Poco/Error.h>
+#include <Poco/Exception.h>
+#include <boost/format.hpp>
+
+#include "Plugin/ILogger.h"
+#include "Plugin/ModuleLoader.h"
+
+// The logger of a source file, and the one way to write a log line. Everything here that names pSysLog is
+// static, so that each source file has its own: a shared inline function would mean another file's logger in
+// every file.
+
+/// Loads the logger plug-in; each source file that logs has its own loader. Only the one of App/main is
+/// configured; all of them write into the sink which that configures.
+static SystemTool::ModuleLoader<SystemTool::IO::ILogger>
+    g_LoggerLoader(SystemTool::IO::Directory::GetExcutableDirectory() + "libBoostLogger.dylib");
+
+/// Null when the plug-in could not be loaded; then nothing is logged and everything else goes on.
+[[maybe_unused]] static SystemTool::IO::ILogger* pSysLog = g_LoggerLoader.GetModule();
+
+namespace SyncServiceReport {
+
+enum class LogLevel : int {
+    Info = 2,    ///< What arrived, and what was done on a control message.
+    Warning = 3, ///< Exceptions that were caught, and reports that nobody takes.
+    Error = 4,   ///< Failures, the crash trace, and texts that could not be built.
+};
+
+/// A text over this size counts as one that cannot be built. A datagram is a format string by design, so one
+/// of twenty bytes may ask for a tabulation to column 2,000,000,000; it must cost a log line and not
+/// gigabytes.
+inline constexpr std::size_t MAX_LOG_TEXT_BYTES = 1024 * 1024;
+
+/// Where a record comes from. The source file is the calling one by itself, as its folder and stem. The line
+/// is fixed where people look for it by number, else the site's own.
+class LogSite {
+public:
+    constexpr LogSite(LogLevel level, const char* function, int line = __builtin_LINE(),
+                      const char* path = __builtin_FILE())
+        : level(level), function(function), line(line), file(FolderAndStem(path)) {}
+
+    const LogLevel level;
+    const char* const function;
+    const int line;
+    const std::string_view file; ///< Such as "App/ReportServer".
+
+private:
+    static constexpr std::string_view FolderAndStem(std::string_view path) {
+        const auto name = path.rfind('/');
+        const auto folder =
+            path.rfind('/', name - 1) + 1; // the start of the text when there is none: npos + 1 is 0
+        return path.substr(folder, path.rfind('.') - folder);
+    }
+};
+
+/// The text that `format` gives with `arguments`. Throws what boost::format throws for a format that does not
+/// fit, and std::length_error for a text over MAX_LOG_TEXT_BYTES, before that is built.
+template <typename... Arguments>
+std::string BuildLogText(const std::string& format, const Arguments&... arguments) {
+    boost::format text(format);
+    (text % ... % arguments);
+    // A format that lacks arguments is left to boost::format, whose own words are the better ones.
+    if (text.remaining_args() == 0 && text.size() > MAX_LOG_TEXT_BYTES)
+        throw std::length_error("the text would have " + std::to_string(text.size()) +
+                                " bytes, more than the " + std::to_string(MAX_LOG_TEXT_BYTES) +
+                                " of a log record");
+    return text.str();
+}
+
+/// Writes one log line. `format` may be a text from outside; that is required behaviour: a percent sign in
+/// it, where boost::format cannot make sense of it, gives an Error line of "[BoostLogError]" and the reason
+/// instead. People search the log for that mark to find datagrams with percent signs.
+///
+/// Never throws, whatever the logger does: a log line is not worth a report.
+template <typename... Arguments>
+static void WriteLog(const LogSite& site, const std::string& format, const Arguments&... arguments) noexcept {
+    if (pSysLog == nullptr)
+        return;
+    const auto write = [&site](LogLevel level, const std::string& text) {
+        pSysLog->WriteLog(static_cast<int>(level), "", std::string(site.file), site.function, site.line, text,
+                          0);
+    };
+    try {
+        try {
+            write(site.level, BuildLogText(format, arguments...));
+        } catch (const std::exception& error) {
+            write(LogLevel::Error, std::string("[BoostLogError]") + error.what());
+        }
+    } catch (...) { // the logger itself is failing: there is nobody left to tell
+    }
+}
+
+/// For the last handler of a public operation, `catch (...) { return LogCaughtException(site); }`: logs the
+/// exception under way in the words that people search the log for, their trailing blanks included. Always
+/// false, the result of an operation that caught one.
+[[maybe_unused]] static bool LogCaughtException(const LogSite& site) noexcept {
+    try {
+        throw;
+    } catch (const Poco::Exception& error) {
+        WriteLog(site, "Poco exception :%s ", error.displayText());
+    } catch (const std::exception& error) {
+        WriteLog(site, "Std exception :%s ", error.what());
+    } catch (...) {
+        WriteLog(site, "Unknown exception :%d-%s", Poco::Error::last(),
+                 Poco::Error::getMessage(Poco::Error::last()));
+    }
+    return false;
+}
+
+} // namespace SyncServiceReport

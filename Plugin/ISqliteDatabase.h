@@ -1,0 +1,38 @@
+#pragma once
+
+#include <string>
+#include <vector>
+
+/// The local database that the plug-in libOrvekSqlite.dylib implements. The order of the operations is the
+/// plug-in's binary interface.
+///
+/// Ownership: objects are made and destroyed by their plug-in alone ("CreateModule", "DestoryModule").
+/// Threads: one thread at a time.
+/// Failure: an operation that returns false has left its reason for GetLastErrorMsg.
+class ISqliteDatabase {
+public:
+    /// Opens the SQLite database file at `path` for all later operations.
+    virtual bool Open(const std::string& path) = 0;
+
+    /// Runs a statement that creates a table.
+    virtual bool CreateTable(const std::string& sql) = 0;
+
+    /// Runs one statement that returns no rows.
+    virtual bool ExecSql(const std::string& sql) = 0;
+
+    /// Runs all statements in the order of the list, as one batch; false if the batch failed.
+    virtual bool BatExecSql(const std::vector<std::string>& sqls) = 0;
+
+    /// Runs a query and appends one vector per row to `rows`, one text per column, in column order. A NULL
+    /// cell reads as empty text.
+    virtual bool QuerySql(const std::string& sql, std::vector<std::vector<std::string>>& rows) = 0;
+
+    /// Runs a counting statement and stores its number in `count`.
+    virtual bool GetTotalCount(const std::string& sql, int& count) = 0;
+
+    /// The text of the last failed operation's error.
+    virtual std::string GetLastErrorMsg() = 0;
+
+protected:
+    ~ISqliteDatabase() = default;
+};

@@ -1,0 +1,24 @@
+#pragma once
+
+#include <cstdint>
+#include <string>
+
+/// The operating-system calls of the project, one implementation file per system (Platform_linux.cpp,
+/// Platform_mac.cpp); everything else is portable. Safe from any thread, and safe during static
+/// initialisation: nothing here depends on another file's static objects.
+namespace SystemTool::Platform {
+
+/// The user's data directory, absolute and without a trailing separator. Empty only for a user whom the
+/// system gives no home directory at all. Nothing is created.
+std::string UserDataDir();
+
+/// Name and version of the operating system, as a person would write it.
+std::string OSVersionString();
+
+/// Absolute path of the running executable; empty when the system does not tell.
+std::string ExecutablePath();
+
+/// The id that the system's own tools show for the calling thread.
+std::uint64_t CurrentThreadId();
+
+} // namespace SystemTool::Platform

@@ -1,0 +1,104 @@
+#include "SystemTool/Platform.h"
+
+#include <array>
+#include <cstdlib>
+#include <fstream>
+
+#include <pwd.h>
+#include <sys/syscall.h>
+#include <sys/utsname.h>
+#include <unistd.h>
+
+namespace SystemTool::Platform {
+namespace {
+
+constexpr std::size_t PASSWORD_ENTRY_BYTES =
+    16384; // what glibc suggests by _SC_GETPW_R_SIZE_MAX, and then some
+
+std::string HomeOfPasswordEntry() {
+    passwd entry{};
+    passwd* found = nullptr;
+    std::array<char, PASSWORD_ENTRY_BYTES> buffer{};
+    if (::getpwuid_r(::getuid(), &entry, buffer.data(), buffer.size(), &found) != 0 || found == nullptr)
+        return {};
+    return found->pw_dir;
+}
+
+std::string WithoutTrailingSeparators(std::string path) {
+    while (path.size() > 1 && path.back() == '/')
+        path.pop_back();
+    return path;
+}
+
+/// The text of an absolute path in the environment; empty for an unset, empty or relative one, which the
+/// desktop's base directory rules tell programs to ignore.
+std::string AbsolutePathFromEnvironment(const char* name) {
+    const char* value = std::getenv(name);
+    return value != nullptr && value[0] == '/' ? value : "";
+}
+
+/// Undoes the shell quoting of a value of os-release: quotes around it, a backslash before a special
+/// character.
+std::string Unquoted(const std::string& value) {
+    std::string text;
+    for (std::size_t i = 0; i < value.size(); ++i) {
+        if (value[i] == '\\' && i + 1 < value.size())
+            text += value[++i];
+        else if (value[i] != '"' && value[i] != '\'')
+            text += value[i];
+    }
+    return text;
+}
+
+std::string PrettyNameOf(const char* osReleasePath) {
+    static constexpr std::string_view KEY = "PRETTY_NAME=";
+    std::ifstream file(osReleasePath);
+    for (std::string line; std::getline(file, line);)
+        if (line.compare(0, KEY.size(), KEY) == 0)
+            return Unquoted(line.substr(KEY.size()));
+    return {};
+}
+
+} // namespace
+
+std::string UserDataDir() {
+    if (auto data = AbsolutePathFromEnvironment("XDG_DATA_HOME"); !data.empty())
+        return WithoutTrailingSeparators(std::move(data));
+    auto home = AbsolutePathFromEnvironment("HOME");
+    if (home.empty())
+        home = HomeOfPasswordEntry();
+    if (home.empty())
+        return {};
+    home = WithoutTrailingSeparators(std::move(home));
+    return (home == "/" ? "" : home) + "/.local/share";
+}
+
+std::string OSVersionString() {
+    auto name = PrettyNameOf("/etc/os-release");
+    if (name.empty())
+        name = PrettyNameOf("/usr/lib/os-release");
+    utsname kernel{};
+    if (::uname(&kernel) != 0)
+        return name.empty() ? "Linux" : name;
+    return (name.empty() ? kernel.sysname : name) + " " + kernel.release;
+}
+
+std::string ExecutablePath() {
+    std::string path(256, '\0');
+    for (;;) {
+        const auto length = ::readlink("/proc/self/exe", path.data(), path.size());
+        if (length < 0)
+            return {};
+        if (static_cast<std::size_t>(length) < path.size()) {
+            path.resize(static_cast<std::size_t>(length));
+            return path;
+        }
+        path.resize(path.size() * 2); // a full buffer may be a cut path
+    }
+}
+
+std::uint64_t CurrentThreadId() {
+    return static_cast<std::uint64_t>(::syscall(SYS_gettid));
+}
+
+} // namespace SystemTool::Platform

@@ -1,0 +1,51 @@
+#include "SystemTool/Platform.h"
+
+#include <array>
+#include <climits>
+#include <cstdlib>
+
+#include <mach-o/dyld.h>
+#include <pthread.h>
+#include <pwd.h>
+#include <sys/sysctl.h>
+#include <unistd.h>
+
+// Written for the product's home system; the project's own tests run on Linux only.
+namespace SystemTool::Platform {
+
+std::string UserDataDir() {
+    std::string home;
+    if (const char* value = std::getenv("HOME"); value != nullptr && value[0] == '/')
+        home = value;
+    else if (const passwd* entry = ::getpwuid(::getuid()); entry != nullptr)
+        home = entry->pw_dir;
+    while (!home.empty() && home.back() == '/')
+        home.pop_back();
+    return home.empty() ? "" : home + "/Library/Application Support";
+}
+
+std::string OSVersionString() {
+    std::array<char, 64> version{};
+    std::size_t size = version.size();
+    if (::sysctlbyname("kern.osproductversion", version.data(), &size, nullptr, 0) != 0)
+        return "macOS";
+    return std::string("macOS ") + version.data();
+}
+
+std::string ExecutablePath() {
+    std::uint32_t size = 0;
+    ::_NSGetExecutablePath(nullptr, &size); // fails, and tells the size
+    std::string path(size, '\0');
+    if (::_NSGetExecutablePath(path.data(), &size) != 0)
+        return {};
+    std::array<char, PATH_MAX> resolved{};
+    return ::realpath(path.c_str(), resolved.data()) != nullptr ? resolved.data() : path.c_str();
+}
+
+std::uint64_t CurrentThreadId() {
+    std::uint64_t id = 0;
+    ::pthread_threadid_np(nullptr, &id);
+    return id;
+}
+
+} // namespace SystemTool::Platform

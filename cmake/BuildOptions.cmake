@@ -1,0 +1,31 @@
+# What every target of ours is built with. Targets ask for it by linking ssr_options; nothing is set globally
+# but the language level and visibility, which a static library and its users must agree on.
+set(CMAKE_CXX_STANDARD 20)
+set(CMAKE_CXX_STANDARD_REQUIRED ON)
+set(CMAKE_CXX_EXTENSIONS OFF)
+set(CMAKE_POSITION_INDEPENDENT_CODE ON)
+set(CMAKE_CXX_VISIBILITY_PRESET hidden)
+set(CMAKE_VISIBILITY_INLINES_HIDDEN ON)
+set(CMAKE_EXPORT_COMPILE_COMMANDS ON)
+
+if(NOT CMAKE_BUILD_TYPE)
+    set(CMAKE_BUILD_TYPE RelWithDebInfo)
+endif()
+
+find_program(SSR_CCACHE ccache)
+if(SSR_CCACHE AND NOT CMAKE_CXX_COMPILER_LAUNCHER)
+    # The sloppiness is what ccache asks for before it caches anything that uses a precompiled header.
+    set(CMAKE_CXX_COMPILER_LAUNCHER ${CMAKE_COMMAND} -E env
+        CCACHE_SLOPPINESS=pch_defines,time_macros,include_file_mtime,include_file_ctime ${SSR_CCACHE})
+endif()
+
+add_library(ssr_options INTERFACE)
+target_include_directories(ssr_options INTERFACE ${PROJECT_SOURCE_DIR})
+target_compile_options(ssr_options INTERFACE -Wall -Wextra -Wpedantic -Wshadow -Wnon-virtual-dtor
+    -Woverloaded-virtual -Wconversion -Werror)
+
+if(SSR_SANITIZE)
+    target_compile_options(ssr_options INTERFACE -fsanitize=${SSR_SANITIZE} -fno-sanitize-recover=all
+        -fno-omit-frame-pointer)
+    target_link_options(ssr_options INTERFACE -fsanitize=${SSR_SANITIZE})
+endif()

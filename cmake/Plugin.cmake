@@ -1,0 +1,20 @@
+# ssr_add_plugin(<target> <library name> <source>...)
+#
+# A plug-in is a shared library that is opened at run time by its exact file name, lib<name>.dylib on every
+# platform. It exports CreateModule and DestoryModule and nothing else, so that two plug-ins that link the same
+# static library never share state by accident and closing one really unloads it.
+function(ssr_add_plugin target name)
+    add_library(${target} MODULE ${ARGN})
+    target_link_libraries(${target} PRIVATE ssr_options)
+    set_target_properties(${target} PROPERTIES
+        OUTPUT_NAME ${name} PREFIX lib SUFFIX .dylib LIBRARY_OUTPUT_DIRECTORY ${SSR_BIN_DIR})
+    if(NOT APPLE)
+        set(exports ${PROJECT_SOURCE_DIR}/cmake/plugin.exports)
+        target_link_options(${target} PRIVATE -Wl,--version-script=${exports} -Wl,--no-undefined)
+        set_property(TARGET ${target} APPEND PROPERTY LINK_DEPENDS ${exports})
+        if(SSR_SANITIZE)
+            # The sanitizer's runtime is the program's; the linker cannot see it from here.
+            target_link_options(${target} PRIVATE -Wl,-z,undefs)
+        endif()
+    endif()
+endfunction()

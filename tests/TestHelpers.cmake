@@ -1,0 +1,27 @@
+include(GoogleTest)
+
+# ssr_add_test(<name> [SOURCES <file>...] [LINK <target>...] [FAKES <target>...])
+#
+# A test program in a folder of its own. A program loads its plug-ins from its own folder, so the FAKES, plug-ins under
+# the real ones' file names, are put there; a plug-in that is not named is missing for that program.
+function(ssr_add_test name)
+    cmake_parse_arguments(arg "" "" "SOURCES;LINK;FAKES" ${ARGN})
+    set(folder ${PROJECT_BINARY_DIR}/tests/${name})
+    add_executable(${name} ${arg_SOURCES})
+    target_link_libraries(${name} PRIVATE ssr_options ${arg_LINK} GTest::gmock_main GTest::gtest)
+    set_target_properties(${name} PROPERTIES RUNTIME_OUTPUT_DIRECTORY ${folder})
+    foreach(fake IN LISTS arg_FAKES)
+        add_dependencies(${name} ${fake})
+        add_custom_command(TARGET ${name} PRE_LINK
+            COMMAND ${CMAKE_COMMAND} -E copy_if_different $<TARGET_FILE:${fake}> ${folder}/$<TARGET_FILE_NAME:${fake}>)
+        set_property(TARGET ${name} APPEND PROPERTY LINK_DEPENDS $<TARGET_FILE:${fake}>)
+    endforeach()
+    gtest_discover_tests(${name} TEST_PREFIX ${name}. WORKING_DIRECTORY ${folder} DISCOVERY_TIMEOUT 60
+        PROPERTIES TIMEOUT 120 ENVIRONMENT "${SSR_TEST_ENVIRONMENT}")
+endfunction()
+
+# What the sanitizers are told; harmless without them.
+list(APPEND SSR_TEST_ENVIRONMENT
+    "ASAN_OPTIONS=detect_stack_use_after_return=1:allocator_may_return_null=1"
+    "UBSAN_OPTIONS=print_stacktrace=1"
+    "TSAN_OPTIONS=suppressions=${CMAKE_CURRENT_SOURCE_DIR}/tsan.supp:second_deadlock_stack=1")
