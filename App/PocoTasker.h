@@ -34,9 +34,9 @@ public:
             const Poco::AutoPtr<Poco::Notification> item(m_queue.waitDequeueNotification());
             if (!item)
                 continue; // woken without an item
-            if (dynamic_cast<StopNotification*>(item.get()) != nullptr)
+            if (dynamic_cast<const StopNotification*>(item.get()) != nullptr)
                 return;
-            if (const auto* work = dynamic_cast<WorkNotification<T>*>(item.get()))
+            if (const auto* work = dynamic_cast<const WorkNotification<T>*>(item.get()))
                 Consume(work->m_data);
         }
     }

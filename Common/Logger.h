@@ -38,22 +38,19 @@ inline constexpr std::size_t MAX_LOG_TEXT_BYTES = 1024 * 1024;
 
 /// Where a record comes from. The source file is the calling one by itself, as its folder and stem. The line
 /// is fixed where people look for it by number, else the site's own.
-class LogSite {
-public:
-    constexpr LogSite(LogLevel level, const char* function, int line = __builtin_LINE(),
-                      const char* path = __builtin_FILE())
-        : level(level), function(function), line(line), file(FolderAndStem(path)) {}
+struct LogSite {
+    constexpr LogSite(LogLevel levelOfRecord, const char* functionName, int fixedLine = __builtin_LINE(),
+                      std::string_view path = __builtin_FILE())
+        : level(levelOfRecord), function(functionName), line(fixedLine), file(FolderAndStem(path)) {}
 
-    const LogLevel level;
-    const char* const function;
-    const int line;
-    const std::string_view file; ///< Such as "App/ReportServer".
+    LogLevel level;
+    const char* function;
+    int line;
+    std::string_view file; ///< Such as "App/ReportServer".
 
-private:
     static constexpr std::string_view FolderAndStem(std::string_view path) {
         const auto name = path.rfind('/');
-        const auto folder =
-            path.rfind('/', name - 1) + 1; // the start of the text when there is none: npos + 1 is 0
+        const auto folder = path.rfind('/', name - 1) + 1; // without one, npos + 1 is the start of the text
         return path.substr(folder, path.rfind('.') - folder);
     }
 };
@@ -63,7 +60,7 @@ private:
 template <typename... Arguments>
 std::string BuildLogText(const std::string& format, const Arguments&... arguments) {
     boost::format text(format);
-    (text % ... % arguments);
+    (static_cast<void>(text % arguments), ...);
     // A format that lacks arguments is left to boost::format, whose own words are the better ones.
     if (text.remaining_args() == 0 && text.size() > MAX_LOG_TEXT_BYTES)
         throw std::length_error("the text would have " + std::to_string(text.size()) +

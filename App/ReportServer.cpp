@@ -1,0 +1,122 @@
+#include "App/ReportServer.h"
+
+#include <algorithm>
+
+#include "Common/Common.h"
+#include "Frame/FrameWorker.h"
+#include "Metrik/MetrikMgr.h"
+#include "SystemTool/IO/JsonDocument.h"
+
+namespace SyncServiceReport {
+namespace {
+
+using SystemTool::IO::JsonDocument;
+
+constexpr int UDP_PORT = 9997;
+constexpr std::size_t DIGITS_OF_SECONDS = 10; // of a time since the epoch; one in milliseconds has thirteen
+
+std::string TimeText(const JsonDocument& createTime) {
+    std::string text =
+        createTime.IsLongLong() ? std::to_string(createTime.ToLongLong()) : createTime.ToString();
+    if (text.size() == DIGITS_OF_SECONDS)
+        text += "000"; // by length alone, deliberately: senders give seconds as a number or as a text
+    return text;
+}
+
+} // namespace
+
+ReportServer::ReportServer() = default;
+
+ReportServer::~ReportServer() {
+    Stop();
+}
+
+bool ReportServer::Start() {
+    try {
+        InitBaseInfo();
+        m_pMetrikMgr = new MetrikMgr(this);
+        m_pMetrikMgr->Init();
+        m_pFrameWorker = new FrameWorker(this);
+        m_pFrameWorker->Init();
+        UDPServer::Start(UDP_SERVER_IP, UDP_PORT);
+        // Both bases have a thread and a loop; this is the queue's pair. What is received before waits in the
+        // queue.
+        WorkQueue::m_thread.start(static_cast<WorkQueue&>(*this));
+        return true;
+    } catch (...) {
+        return LogCaughtException({LogLevel::Warning, "Start", 35});
+    }
+}
+
+void ReportServer::Stop() {
+    UDPServer::Stop();
+    StopThread();
+}
+
+bool ReportServer::Recv(const std::string& msg) {
+    // The received text is the format string, deliberately. One that boost::format cannot make sense of is
+    // found in the log by its "[BoostLogError]" mark; it is processed like any other.
+    WriteLog({LogLevel::Info, "Recv", 42}, msg);
+    Produce(msg);
+    return true;
+}
+
+bool ReportServer::Consume(const std::string& msg) {
+    try {
+        // A search of the raw text and no parse, deliberately: it is what tells the two kinds of message
+        // apart.
+        if (msg.find("eventID") == std::string::npos) {
+            m_pMetrikMgr->Update(msg);
+            return true;
+        }
+        ST_OptLog log;
+        if (!JsonToStruct(msg, log))
+            return false;
+        if (log.eventID.substr(0, 1) == "A")
+            m_pMetrikMgr->Send(log);
+        else
+            m_pFrameWorker->Send(log);
+        return true;
+    } catch (...) {
+        return LogCaughtException({LogLevel::Warning, "Consume", 76});
+    }
+}
+
+void ReportServer::InitBaseInfo() {
+    m_baseInfo.userDataDir = SystemTool::CommonTool::GetUserDataDir();
+    m_baseInfo.osVersion = SystemTool::CommonTool::GetOSVersionString();
+}
+
+void ReportServer::SetBaseInfo(const ST_BaseInfo& info) {
+    if (!info.openID.empty())
+        m_baseInfo.openID = info.openID;
+    if (!info.suiteVersion.empty())
+        m_baseInfo.suiteVersion = info.suiteVersion;
+    WriteLog({LogLevel::Info, "SetBaseInfo", 111}, "SetBaseInfo %s-%s", m_baseInfo.openID,
+             m_baseInfo.suiteVersion);
+}
+
+bool ReportServer::JsonToStruct(const std::string& json, ST_OptLog& out) {
+    try {
+        out = ST_OptLog();
+        std::string error;
+        JsonDocument report;
+        report.FromJson(json, error);
+        if (!error.empty()) {
+            WriteLog({LogLevel::Error, "JsonToStruct", 123},
+                     error); // the parser's text is the format, deliberately
+            return false;
+        }
+        out.eventID = report.GetKeyValue("eventID").ToString();
+        const JsonDocument value = report.GetKeyValue("value");
+        out.value = value.IsObject() ? value.ToJson() : value.ToString();
+        out.createTime = TimeText(report.GetKeyValue("createTime"));
+        out.pType = std::count(out.eventID.begin(), out.eventID.end(), '|') == 1 ? 0 : 1;
+        out.isDayReport = report.GetKeyValue("isDayReport").ToInt() == 1;
+        return true;
+    } catch (...) {
+        return LogCaughtException({LogLevel::Warning, "JsonToStruct", 164});
+    }
+}
+
+} // namespace SyncServiceReport

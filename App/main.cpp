@@ -1,0 +1,48 @@
+#include <iostream>
+
+#include <Poco/Event.h>
+#include <Poco/SharedPtr.h>
+
+#include "App/MiniDump.h"
+#include "App/ReportServer.h"
+#include "Common/Common.h"
+#include "SystemTool/BSException.h"
+
+using namespace SyncServiceReport;
+
+namespace {
+
+constexpr std::int64_t LOG_FILE_BYTES = 10485760;   // 10 MiB, then the file is rotated
+constexpr std::int64_t LOG_TOTAL_BYTES = 104857600; // 100 MiB, then the oldest rotated file goes
+constexpr int FLUSH_EACH_RECORD = 1;
+constexpr int COPY_TO_CONSOLE = 0;
+
+/// Opens the log for the whole process. One that cannot be opened costs the log and nothing else.
+void ConfigureLog() {
+    if (pSysLog == nullptr)
+        return;
+    try {
+        pSysLog->InitLog(APP_LOG_DIR_PATH, "Report.log", "QUILLON", "APP", LOG_FILE_BYTES, LOG_TOTAL_BYTES,
+                         FLUSH_EACH_RECORD, COPY_TO_CONSOLE);
+    } catch (const SystemTool::BSException& error) {
+        std::cout << "Error:" << error.ErrorMsg() << std::endl;
+    }
+}
+
+} // namespace
+
+int main() {
+    // The log comes before the instance check, so that a refused second instance leaves its line in the
+    // shared log.
+    ConfigureLog();
+    MiniDump::EnableAutoStack(APP_LOG_DIR_PATH, "Report");
+    if (MiniDump::IsAlreadyRun()) {
+        WriteLog({LogLevel::Info, "main", 14}, "Process is already running");
+        return 1;
+    }
+    Poco::Event stopEvent(Poco::Event::EVENT_AUTORESET);
+    Poco::SharedPtr<ReportServer> server(new ReportServer);
+    server->Start();  // a start that failed has been logged; what does run is worth keeping
+    stopEvent.wait(); // for ever: the service ends by a signal
+    return 0;
+}

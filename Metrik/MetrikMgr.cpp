@@ -1,0 +1,104 @@
+#include "Metrik/MetrikMgr.h"
+
+#include "App/ReportServer.h"
+#include "Common/Common.h"
+#include "Metrik/MetrikWorker.h"
+#include "SystemTool/IO/JsonDocument.h"
+
+namespace SyncServiceReport {
+namespace {
+
+using SystemTool::IO::JsonDocument;
+
+ST_InitMsg InitMsgFrom(const JsonDocument& exdata) {
+    const auto text = [&exdata](const char* key) { return exdata.GetKeyValue(key).ToString(); };
+    return {.moduleID = text("moduleID"),
+            .moduleVersion = text("moduleVersion"),
+            .moduleName = text("moduleName"),
+            .logPath = text("logPath"),
+            .dbPath = text("dbPath"),
+            .openID = text("openID"),
+            .hublinkVersion = text("hublinkVersion")};
+}
+
+} // namespace
+
+MetrikMgr::MetrikMgr(ReportServer* server) : m_pServer(server) {}
+
+bool MetrikMgr::Init() {
+    ST_InitMsg msg;
+    msg.moduleID = DEFAULT_MODULE_ID; // the worker knows the other settings of the default module itself
+    AddWorker(msg);
+    return true;
+}
+
+void MetrikMgr::AddWorker(const ST_InitMsg& msg) {
+    if (m_mapWorkers.contains(msg.moduleID))
+        return;
+    Poco::SharedPtr<MetrikWorker> worker(new MetrikWorker(m_pServer));
+    // The result is not looked at, deliberately: a worker whose SDK did not start is registered all the same,
+    // so that a module which announces itself again and again does not load the SDK again and again.
+    if (msg.moduleID == DEFAULT_MODULE_ID)
+        worker->InitDefalut();
+    else
+        worker->Init(msg);
+    m_mapWorkers[msg.moduleID] = worker;
+    WriteLog({LogLevel::Info, "AddWorker", 41}, "Add metrik module :%s", msg.moduleID);
+}
+
+bool MetrikMgr::Update(const std::string& json) {
+    try {
+        std::string error;
+        JsonDocument parser;
+        const JsonDocument message = parser.FromJson(json, error);
+        if (!error.empty()) {
+            // The log's readers search for this spelling.
+            WriteLog({LogLevel::Error, "Update", 53}, "json formate error :%s", error);
+            return false;
+        }
+        const std::string msgType = message.GetKeyValue("msgType").ToString();
+        const JsonDocument exdata = message.GetKeyValue("exdata");
+        std::string openID;
+        std::string version;
+        if (msgType == ORVEK_REPORT_MODULEINIT) {
+            const ST_InitMsg msg = InitMsgFrom(exdata);
+            AddWorker(msg);
+            openID = msg.openID;
+            version = msg.hublinkVersion;
+        } else if (msgType == ORVEK_REPORT_UPDATEOPENID) {
+            openID = exdata.GetKeyValue("openID").ToString();
+            version = exdata.GetKeyValue("hublinkVersion").ToString();
+        }
+        if (!openID.empty()) { // a version alone is not passed on, deliberately: it belongs to a user
+            ST_BaseInfo info;
+            info.openID = openID;
+            info.suiteVersion = version;
+            m_pServer->SetBaseInfo(info);
+        }
+        return true;
+    } catch (...) {
+        return LogCaughtException({LogLevel::Warning, "Update", 93});
+    }
+}
+
+bool MetrikMgr::Send(const ST_OptLog& log) {
+    try {
+        const auto bar = log.eventID.find('|');
+        if (bar == std::string::npos) {
+            WriteLog({LogLevel::Warning, "Send", 107}, "eventID error :%s", log.eventID);
+            return false;
+        }
+        const std::string module = log.eventID.substr(0, bar);
+        const auto found = m_mapWorkers.find(module);
+        if (found == m_mapWorkers.end()) {
+            WriteLog({LogLevel::Warning, "Send", 115}, "module not init :%s", module);
+            return false;
+        }
+        Poco::SharedPtr<IWorker> worker = found->second;
+        return worker->Send(log);
+    } catch (...) {
+        return LogCaughtException({LogLevel::Warning, "Send", 122});
+    }
+}
+
+} // namespace SyncServiceReport

@@ -1,0 +1,94 @@
+#include "Metrik/MetrikWorker.h"
+
+#include <Poco/Format.h>
+
+#include "App/ReportServer.h"
+#include "Common/Common.h"
+#include "SystemTool/IO/JsonDocument.h"
+
+namespace SyncServiceReport {
+
+using SystemTool::IO::JsonDocument;
+
+void FailCallBackFun(std::string a, std::string b) {
+    WriteLog({LogLevel::Error, "FailCallBackFun", 21}, "%s-%s", a, b);
+}
+
+void SuccCallBackFun(std::string, std::string) {}
+
+MetrikWorker::MetrikWorker(ReportServer* server) : m_pServer(server) {}
+
+MetrikWorker::~MetrikWorker() = default;
+
+bool MetrikWorker::InitDefalut() {
+    try {
+        if (!LoadSdk("InitDefalut", 32, 38))
+            return false;
+        const std::string& userDataDir = m_pServer->GetBaseInfo().userDataDir;
+        m_pSdk->InitSdk(DEFAULT_MODULE_ID, DEFAULT_MODULE_VERSION, DEFAULT_MODULE_NAME,
+                        Poco::format("%s/hublink/log", userDataDir),
+                        Poco::format("%s/hublink/database", userDataDir), FailCallBackFun, SuccCallBackFun);
+        return true;
+    } catch (...) {
+        return LogCaughtException({LogLevel::Warning, "InitDefalut", 56});
+    }
+}
+
+bool MetrikWorker::Init(const ST_InitMsg& msg) {
+    if (!LoadSdk("Init", 67, 73))
+        return false;
+    m_pSdk->InitSdk(msg.moduleID, msg.moduleVersion, msg.moduleName, msg.logPath, msg.dbPath, FailCallBackFun,
+                    SuccCallBackFun);
+    return true;
+}
+
+/// Loads a plug-in of this worker's own and takes its object; logs in the name of `function` what is missing.
+bool MetrikWorker::LoadSdk(const char* function, int loaderLine, int interfaceLine) {
+    const std::string library = ORVEK_EXCUTABLE_PATH + "libMetrikSdk.dylib";
+    m_pSdkLoader = new SdkLoader(library);
+    if (m_pSdkLoader.isNull()) {
+        WriteLog({LogLevel::Error, function, loaderLine}, "Failed to load metrik sdk loader:%s", library);
+        return false;
+    }
+    m_pSdk = m_pSdkLoader->GetModule();
+    if (m_pSdk == nullptr) {
+        WriteLog({LogLevel::Error, function, interfaceLine}, "Failed to load metrik sdk interface:%s",
+                 m_pSdkLoader->GetLastError());
+        return false;
+    }
+    return true;
+}
+
+bool MetrikWorker::Send(const ST_OptLog& log) {
+    if (m_pSdk == nullptr)
+        return false;
+    try {
+        const ST_BaseInfo& info = m_pServer->GetBaseInfo();
+        JsonDocument extend;
+        extend.SetKeyValue("hublinkVersion", info.suiteVersion);
+        extend.SetKeyValue("createTime", log.createTime);
+
+        JsonDocument eventData;
+        if (!log.value.empty()) {
+            std::string error;
+            JsonDocument value;
+            eventData = value.FromJson(log.value, error);
+            if (!error.empty()) {
+                WriteLog({LogLevel::Error, "Send", 107},
+                         error); // the parser's text is the format, deliberately
+                return false;
+            }
+        }
+        eventData.SetKeyValue("openid", info.openID);
+        eventData.SetKeyValue("sys_version", info.osVersion);
+
+        JsonDocument root;
+        root.SetKeyValue("extend", extend);
+        root.SetKeyValue("eventData", eventData);
+        return m_pSdk->ReportEvent(log.eventID, root.ToJson());
+    } catch (...) {
+        return LogCaughtException({LogLevel::Warning, "Send", 121});
+    }
+}
+
+} // namespace SyncServiceReport
