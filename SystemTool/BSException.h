@@ -3,8 +3,8 @@
 #include <exception>
 #include <string>
 
-#include <boost/exception/error_info.hpp>
 #include <boost/exception/exception.hpp>
+#include <boost/exception/info.hpp>
 
 namespace SystemTool {
 

@@ -1,6 +1,6 @@
 #include "SystemTool/IO/JsonDocument.h"
 
-#include <limits>
+#include <cstring>
 #include <stdexcept>
 #include <vector>
 
@@ -20,12 +20,24 @@ constexpr unsigned PARSE_FLAGS = rapidjson::kParseIterativeFlag | rapidjson::kPa
 
 using Value = rapidjson::Value;
 
-/// Hands a parser's events on to a document and ends the parse when they go too deep.
-class DepthGuard {
+/// Whether decoded text holds half a surrogate pair: what an escape such as \udc00 on its own decodes to,
+/// which is no UTF-8 and which the parser lets pass.
+bool HasLoneSurrogate(const char* text, rapidjson::SizeType length) {
+    constexpr char LEAD = '\xed';
+    const char* const end = text + length;
+    while ((text = static_cast<const char*>(std::memchr(text, LEAD, static_cast<std::size_t>(end - text)))) !=
+           nullptr)
+        if (static_cast<unsigned char>(*++text) >= 0xa0) // in a valid text, a lead byte is never the last
+            return true;
+    return false;
+}
+
+/// Hands a parser's events on to a document, and ends the parse for what the parser itself would let pass.
+class Guard {
 public:
     using Ch = char;
 
-    explicit DepthGuard(rapidjson::Document& document) : m_document(document) {}
+    explicit Guard(rapidjson::Document& document) : m_document(document) {}
 
     bool Null() { return m_document.Null(); }
     bool Bool(bool value) { return m_document.Bool(value); }
@@ -38,19 +50,34 @@ public:
         return m_document.RawNumber(text, length, copy);
     }
     bool String(const Ch* text, rapidjson::SizeType length, bool copy) {
-        return m_document.String(text, length, copy);
+        return IsText(text, length) && m_document.String(text, length, copy);
     }
     bool Key(const Ch* text, rapidjson::SizeType length, bool copy) {
-        return m_document.Key(text, length, copy);
+        return IsText(text, length) && m_document.Key(text, length, copy);
     }
-    bool StartObject() { return ++m_depth <= JsonDocument::MAX_DEPTH && m_document.StartObject(); }
+    bool StartObject() { return Enter() && m_document.StartObject(); }
     bool EndObject(rapidjson::SizeType members) { return --m_depth, m_document.EndObject(members); }
-    bool StartArray() { return ++m_depth <= JsonDocument::MAX_DEPTH && m_document.StartArray(); }
+    bool StartArray() { return Enter() && m_document.StartArray(); }
     bool EndArray(rapidjson::SizeType elements) { return --m_depth, m_document.EndArray(elements); }
 
+    /// Why the parse was ended.
+    const char* Refusal() const { return m_refusal; }
+
 private:
+    bool Enter() { return ++m_depth <= JsonDocument::MAX_DEPTH || Refuse("Nested deeper than 128 levels."); }
+    bool IsText(const Ch* text, rapidjson::SizeType length) {
+        return !HasLoneSurrogate(text, length) || Refuse("Half a surrogate pair in string.");
+    }
+    bool Refuse(const char* refusal) {
+        m_refusal = refusal;
+        return false;
+    }
+
+    static_assert(JsonDocument::MAX_DEPTH == 128, "the refusal's text names the limit");
+
     rapidjson::Document& m_document;
     int m_depth = 0;
+    const char* m_refusal = "";
 };
 
 /// One parse, in the shape that rapidjson::Document::Populate wants: it calls this with itself as the
@@ -62,9 +89,10 @@ public:
     bool operator()(rapidjson::Document& document) {
         rapidjson::MemoryStream bytes(m_text.data(), m_text.size());
         rapidjson::EncodedInputStream<rapidjson::UTF8<>, rapidjson::MemoryStream> stream(bytes);
-        DepthGuard guard(document);
+        Guard guard(document);
         rapidjson::Reader reader;
         m_result = reader.Parse<PARSE_FLAGS>(stream, guard);
+        m_refusal = guard.Refusal();
         // The parser takes a zero byte for the end of the text; the text says where it really ends.
         if (!m_result.IsError() && stream.Tell() != m_text.size())
             m_result.Set(rapidjson::kParseErrorDocumentRootNotSingular, stream.Tell());
@@ -84,6 +112,7 @@ public:
 private:
     const std::string& m_text;
     rapidjson::ParseResult m_result;
+    const char* m_refusal = "";
 };
 
 /// Tells `handler` the whole of `root`, in order, as a parser would. The open arrays and objects are kept on

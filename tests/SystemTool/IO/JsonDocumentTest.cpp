@@ -1,11 +1,234 @@
 #include "SystemTool/IO/JsonDocument.h"
 
+#include <limits>
+
 #include <gtest/gtest.h>
 
 using SystemTool::IO::JsonDocument;
 
-TEST(JsonDocument, ReadsAMember) {
+namespace {
+
+JsonDocument Parsed(const std::string& text) {
     std::string error;
-    EXPECT_EQ(JsonDocument().FromJson(R"({"a":1.5})", error).GetKeyValue("a").ToString(), "1.5");
+    JsonDocument document;
+    document.FromJson(text, error);
+    EXPECT_EQ(error, "") << text;
+    return document;
+}
+
+std::string ErrorOf(const std::string& text) {
+    std::string error = "left from before";
+    JsonDocument document = Parsed("1");
+    document.FromJson(text, error);
+    EXPECT_EQ(document.ToJson(), "null") << "a text that is no JSON leaves the document null";
+    return error;
+}
+
+std::string Nested(int depth, char open, char close) {
+    return std::string(static_cast<std::size_t>(depth), open) +
+           std::string(static_cast<std::size_t>(depth), close);
+}
+
+} // namespace
+
+TEST(JsonDocument, FillsTheDocumentAndReturnsIt) {
+    std::string error = "left from before";
+    JsonDocument document;
+    const JsonDocument returned = document.FromJson(R"({"a":"b"})", error);
     EXPECT_EQ(error, "");
+    EXPECT_EQ(document.ToJson(), R"({"a":"b"})");
+    EXPECT_EQ(returned.ToJson(), R"({"a":"b"})");
+}
+
+TEST(JsonDocument, AbsentMembersAreEmptyTextAndZeroAndFalse) {
+    for (const auto& absent :
+         {Parsed(R"({"a":1})").GetKeyValue("b"), Parsed(R"({"b":null})").GetKeyValue("b"),
+          Parsed("[1]").GetKeyValue("b"), Parsed("7").GetKeyValue("b"), JsonDocument(),
+          JsonDocument().GetKeyValue("a").GetKeyValue("b")}) {
+        EXPECT_EQ(absent.ToString(), "");
+        EXPECT_EQ(absent.ToInt(), 0);
+        EXPECT_EQ(absent.ToLongLong(), 0);
+        EXPECT_FALSE(absent.IsLongLong());
+        EXPECT_FALSE(absent.IsObject());
+        EXPECT_EQ(absent.ToJson(), "null");
+    }
+}
+
+TEST(JsonDocument, AStringsTextIsDecoded) {
+    EXPECT_EQ(Parsed(R"("a\"b\\\/\n\u00e9\ud83d\ude00")").ToString(), "a\"b\\/\n\u00e9\U0001f600");
+    EXPECT_EQ(Parsed(R"("a\u0000b")").ToString(), std::string("a\0b", 3));
+}
+
+TEST(JsonDocument, ANumbersTextIsThatOfJson) {
+    for (const std::string text : {"0", "-7", "1.5", "0.1", "-0.25", "1700000000123", "9223372036854775807",
+                                   "-9223372036854775808", "18446744073709551615"})
+        EXPECT_EQ(Parsed(text).ToString(), text);
+}
+
+TEST(JsonDocument, BooleansAndContainersHaveTheirJsonAsText) {
+    EXPECT_EQ(Parsed("true").ToString(), "true");
+    EXPECT_EQ(Parsed("false").ToString(), "false");
+    EXPECT_EQ(Parsed(R"( { "b" : [ 1 , {} , [] ] , "a" : null } )").ToString(),
+              R"({"b":[1,{},[]],"a":null})");
+    EXPECT_EQ(Parsed(R"([ "x" ])").ToString(), R"(["x"])");
+}
+
+TEST(JsonDocument, ToIntIsZeroForWhatIsNoIntegerInRange) {
+    EXPECT_EQ(Parsed("2147483647").ToInt(), std::numeric_limits<int>::max());
+    EXPECT_EQ(Parsed("-2147483648").ToInt(), std::numeric_limits<int>::min());
+    for (const std::string text :
+         {"2147483648", "-2147483649", "1.0", "1.5", R"("1")", "true", "[1]", R"({"a":1})"})
+        EXPECT_EQ(Parsed(text).ToInt(), 0) << text;
+}
+
+TEST(JsonDocument, OnlySigned64BitIntegersAreLongLong) {
+    EXPECT_TRUE(Parsed("9223372036854775807").IsLongLong());
+    EXPECT_EQ(Parsed("9223372036854775807").ToLongLong(), std::numeric_limits<std::int64_t>::max());
+    EXPECT_EQ(Parsed("-9223372036854775808").ToLongLong(), std::numeric_limits<std::int64_t>::min());
+    for (const std::string text : {"9223372036854775808", "1.0", "1e3", R"("1")", "true"}) {
+        EXPECT_FALSE(Parsed(text).IsLongLong()) << text;
+        EXPECT_EQ(Parsed(text).ToLongLong(), 0) << text;
+    }
+}
+
+TEST(JsonDocument, AnErrorSaysWhatIsWrongAndAtWhichByte) {
+    EXPECT_EQ(ErrorOf(""), "The document is empty. At byte 0.");
+    EXPECT_EQ(ErrorOf("hello"), "Invalid value. At byte 0.");
+    EXPECT_EQ(ErrorOf(R"({"a":1)"), "Missing a comma or '}' after an object member. At byte 6.");
+    EXPECT_EQ(ErrorOf(R"({"a":"b)"), "Missing a closing quotation mark in string. At byte 7.");
+}
+
+TEST(JsonDocument, TextBehindTheValueIsAnError) {
+    EXPECT_NE(ErrorOf(R"({"a":1} x)").find("At byte 8."), std::string::npos);
+    EXPECT_NE(ErrorOf(std::string("{}\0", 3)).find("At byte 2."), std::string::npos);
+    EXPECT_NE(ErrorOf(std::string("{}\0{}", 5)).find("At byte 2."), std::string::npos);
+    EXPECT_EQ(Parsed("{} \r\n\t").ToJson(), "{}");
+}
+
+TEST(JsonDocument, InvalidUtf8IsAnError) {
+    for (const std::string bytes : {"\xff", "\xc3", "\xc0\xaf", "\xed\xa0\x80", "\xf5\x80\x80\x80", "a\x80"})
+        EXPECT_NE(ErrorOf("\"" + bytes + "\""), "") << ::testing::PrintToString(bytes);
+}
+
+TEST(JsonDocument, HalfASurrogatePairIsAnError) {
+    for (const std::string text :
+         {R"("\ud800")", R"("\ud800x")", R"("\udc00")", R"({"\udfff":1})", R"("a\udc00b")"})
+        EXPECT_NE(ErrorOf(text), "") << text;
+    EXPECT_EQ(Parsed(R"("\ud7ff\ue000")").ToString(), "\ud7ff\ue000")
+        << "the code points next to them are whole";
+}
+
+TEST(JsonDocument, AControlCharacterInAStringIsAnError) {
+    EXPECT_NE(ErrorOf("\"a\nb\""), "");
+    EXPECT_NE(ErrorOf(std::string("\"a\0b\"", 5)), "");
+}
+
+TEST(JsonDocument, AByteOrderMarkIsSkipped) {
+    EXPECT_EQ(Parsed("\xef\xbb\xbf{}").ToJson(), "{}");
+}
+
+TEST(JsonDocument, NestingOf128LevelsIsReadAndOfOneMoreIsAnError) {
+    EXPECT_EQ(Parsed(Nested(128, '[', ']')).ToJson(), Nested(128, '[', ']'));
+    EXPECT_EQ(ErrorOf(Nested(129, '[', ']')).find("Nested deeper than 128 levels. At byte "), 0U);
+}
+
+TEST(JsonDocument, DepthIsNoSumOfSiblings) {
+    std::string text = "[";
+    for (int i = 0; i < 1000; ++i)
+        text += "[],{},";
+    EXPECT_EQ(Parsed(text + "0]").ToJson(), text + "0]");
+}
+
+TEST(JsonDocument, MillionsOfOpeningBracketsCostNoStack) {
+    EXPECT_NE(ErrorOf(std::string(4'000'000, '[')), "");
+    std::string objects;
+    for (int i = 0; i < 1'000'000; ++i)
+        objects += R"({"a":)";
+    EXPECT_NE(ErrorOf(objects), "");
+}
+
+TEST(JsonDocument, ANumberBeyondTheRangeOfADoubleIsAnError) {
+    EXPECT_NE(ErrorOf("1e400"), "");
+    EXPECT_NE(ErrorOf(std::string(5000, '9')), "");
+    EXPECT_EQ(Parsed("0." + std::string(5000, '3')).ToString(), "0.3333333333333333");
+}
+
+TEST(JsonDocument, OfMembersWithTheSameKeyTheFirstIsRead) {
+    EXPECT_EQ(Parsed(R"({"a":1,"a":2})").GetKeyValue("a").ToInt(), 1);
+}
+
+TEST(JsonDocument, KeysAreComparedWhole) {
+    const auto document = Parsed(R"({"":1,"a\u0000b":2,"a":3})");
+    EXPECT_EQ(document.GetKeyValue("").ToInt(), 1);
+    EXPECT_EQ(document.GetKeyValue(std::string("a\0b", 3)).ToInt(), 2);
+    EXPECT_EQ(document.GetKeyValue("a").ToInt(), 3);
+}
+
+TEST(JsonDocument, AMemberOutlivesTheDocumentItCameFrom) {
+    JsonDocument member;
+    {
+        const auto document = Parsed(R"({"a":{"b":"a text that is too long for the string object itself"}})");
+        member = document.GetKeyValue("a");
+    }
+    EXPECT_EQ(member.GetKeyValue("b").ToString(), "a text that is too long for the string object itself");
+}
+
+TEST(JsonDocument, SettingAMemberOfANewDocumentMakesAnObject) {
+    JsonDocument document;
+    document.SetKeyValue("b", std::string("1"));
+    document.SetKeyValue("a", Parsed("[1,2]"));
+    document.SetKeyValue("c", JsonDocument());
+    EXPECT_EQ(document.ToJson(), R"({"b":"1","a":[1,2],"c":null})");
+    EXPECT_TRUE(document.IsObject());
+}
+
+TEST(JsonDocument, SettingReplacesAllMembersOfThatNameInTheFirstOnesPlace) {
+    JsonDocument document = Parsed(R"({"x":0,"a":1,"b":2,"a":3,"a":4,"c":5})");
+    document.SetKeyValue("a", std::string("new"));
+    EXPECT_EQ(document.ToJson(), R"({"x":0,"a":"new","b":2,"c":5})");
+}
+
+TEST(JsonDocument, SettingInACopyLeavesTheOriginalAlone) {
+    JsonDocument original = Parsed(R"({"a":{"b":1}})");
+    JsonDocument copy = original;
+    JsonDocument member = original.GetKeyValue("a");
+    copy.SetKeyValue("x", std::string("y"));
+    member.SetKeyValue("b", std::string("z"));
+    EXPECT_EQ(original.ToJson(), R"({"a":{"b":1}})");
+    EXPECT_EQ(copy.ToJson(), R"({"a":{"b":1},"x":"y"})");
+    EXPECT_EQ(member.ToJson(), R"({"b":"z"})");
+}
+
+TEST(JsonDocument, CanBeSetAsAMemberOfItself) {
+    JsonDocument document = Parsed(R"({"a":1})");
+    document.SetKeyValue("self", document);
+    EXPECT_EQ(document.ToJson(), R"({"a":1,"self":{"a":1}})");
+}
+
+TEST(JsonDocument, SettingAMemberOfWhatIsNoObjectThrows) {
+    for (const std::string text : {"5", R"("text")", "[1]", "true"}) {
+        JsonDocument document = Parsed(text);
+        EXPECT_THROW(document.SetKeyValue("a", std::string("b")), std::logic_error) << text;
+        EXPECT_EQ(document.ToJson(), text);
+    }
+    JsonDocument null = Parsed("null");
+    null.SetKeyValue("a", std::string("b"));
+    EXPECT_EQ(null.ToJson(), R"({"a":"b"})");
+}
+
+TEST(JsonDocument, PrintsWhatItParsedAndParsesWhatItPrints) {
+    const std::string text =
+        R"({"eventID":"A100|10001","value":{"k":[1,2.5,"\u0001\"\\",true,null]},"createTime":1})";
+    EXPECT_EQ(Parsed(text).ToJson(), text);
+    EXPECT_EQ(Parsed(Parsed(text).ToJson()).ToJson(), text);
+}
+
+TEST(JsonDocument, BuildingDeepDocumentsCostsNoStack) {
+    JsonDocument document = Parsed("[]");
+    for (int i = 0; i < 2000; ++i) {
+        JsonDocument outer;
+        outer.SetKeyValue("a", document);
+        document = outer;
+    }
+    EXPECT_EQ(document.ToJson().size(), 2000 * std::string(R"({"a":})").size() + 2);
 }

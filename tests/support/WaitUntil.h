@@ -1,0 +1,16 @@
+#pragma once
+
+#include <chrono>
+#include <thread>
+
+/// Whether `condition` became true before the deadline. The one place where tests sleep: between two looks.
+template <typename Condition>
+bool WaitUntil(Condition condition, std::chrono::milliseconds deadline = std::chrono::seconds(10)) {
+    const auto end = std::chrono::steady_clock::now() + deadline;
+    while (!condition()) {
+        if (std::chrono::steady_clock::now() > end)
+            return false;
+        std::this_thread::sleep_for(std::chrono::milliseconds(1));
+    }
+    return true;
+}
