@@ -1,0 +1,61 @@
+#pragma once
+
+#include <functional>
+#include <mutex>
+#include <ostream>
+#include <string>
+#include <vector>
+
+#include "tests/fakes/FakePlugin.h"
+
+/// One call of WriteLog.
+struct LogRecord {
+    int level;
+    std::string file;
+    std::string function;
+    int line;
+    std::string message;
+    std::string tag{};
+    int reserved = 0;
+
+    bool operator==(const LogRecord&) const = default;
+
+    friend std::ostream& operator<<(std::ostream& out, const LogRecord& r) {
+        return out << r.level << " [" << r.file << ':' << r.line << ' ' << r.function << "] tag=" << r.tag
+                   << ' ' << r.message << " reserved=" << r.reserved;
+    }
+};
+
+/// What the fake logger recorded, over all of its instances, and what it is told to do.
+struct FakeLoggerState {
+    void Write(LogRecord record) {
+        ThrowIf(throws);
+        const std::lock_guard lock(mutex);
+        records.push_back(std::move(record));
+    }
+    std::vector<LogRecord> Records() {
+        const std::lock_guard lock(mutex);
+        return records;
+    }
+    /// The records of one function, for a test that has no eye for what else was logged.
+    std::vector<LogRecord> RecordsOf(const std::string& function) {
+        auto all = Records();
+        std::erase_if(all, [&function](const LogRecord& record) { return record.function != function; });
+        return all;
+    }
+    void Clear() {
+        const std::lock_guard lock(mutex);
+        records.clear();
+    }
+
+    int created = 0; ///< Instances that "CreateModule" made.
+    Throws throws = Throws::Nothing;
+
+private:
+    std::mutex mutex; ///< Guards the records.
+    std::vector<LogRecord> records;
+};
+
+inline FakeLoggerState& FakeLogger() {
+    return FakeState<FakeLoggerState>("libBoostLogger.dylib");
+}

@@ -1,0 +1,35 @@
+#include "tests/fakes/FakeModule.h"
+
+namespace {
+
+FakeModuleState g_state;
+
+class Module final : public IFakeModule {
+public:
+    int Answer() override { return 42; }
+};
+
+} // namespace
+
+FAKE_EXPORT FakeModuleState* FakeState() {
+    return &g_state;
+}
+
+#ifndef WITHOUT_CREATE
+FAKE_EXPORT IFakeModule* CreateModule() {
+    ++g_state.created;
+#ifdef CREATES_NULL
+    return nullptr;
+#else
+    return new Module;
+#endif
+}
+#endif
+
+#ifndef WITHOUT_DESTORY
+FAKE_EXPORT void DestoryModule(IFakeModule* module) {
+    ++g_state.destroyed;
+    g_state.lastDestroyed = module;
+    delete static_cast<Module*>(module);
+}
+#endif

@@ -1,0 +1,42 @@
+#pragma once
+
+#include <deque>
+#include <string>
+#include <vector>
+
+#include "tests/fakes/FakePlugin.h"
+
+/// What the fake database was asked, and what it answers.
+struct FakeSqliteState {
+    struct Call {
+        std::string operation;
+        std::string argument; ///< The path or statement; a batch's statements joined by blanks.
+
+        bool operator==(const Call&) const = default;
+    };
+
+    /// The next answer, the default one when the script is used up.
+    bool Answer() {
+        ThrowIf(throws);
+        if (answers.empty())
+            return answer;
+        const bool next = answers.front();
+        answers.pop_front();
+        return next;
+    }
+
+    std::vector<Call> calls;
+    std::deque<bool> answers;
+    bool answer = true;
+    Throws throws = Throws::Nothing;
+    std::string errorText = "scripted error";
+    std::vector<std::vector<std::string>> rows; ///< What a query appends.
+    int count = 0; ///< What a counting statement stores; nothing is stored for a negative.
+    int created = 0;
+    int destroyed = 0;
+    bool createsNothing = false;
+};
+
+inline FakeSqliteState& FakeSqlite() {
+    return FakeState<FakeSqliteState>("libOrvekSqlite.dylib");
+}
