@@ -1,10 +1,12 @@
 #pragma once
 
-#include <functional>
+#include <iostream>
 #include <mutex>
 #include <ostream>
 #include <string>
 #include <vector>
+
+#include <unistd.h>
 
 #include "tests/fakes/FakePlugin.h"
 
@@ -30,6 +32,10 @@ struct LogRecord {
 struct FakeLoggerState {
     void Write(LogRecord record) {
         ThrowIf(throws);
+        if (echoes)
+            std::cerr << record << std::endl;
+        while (hangs)
+            ::pause();
         const std::lock_guard lock(mutex);
         records.push_back(std::move(record));
     }
@@ -50,6 +56,9 @@ struct FakeLoggerState {
 
     int created = 0; ///< Instances that "CreateModule" made.
     Throws throws = Throws::Nothing;
+    bool echoes =
+        false; ///< Copies each record to standard error, for tests that see no more of a child than that.
+    bool hangs = false; ///< Never returns from a write.
 
 private:
     std::mutex mutex; ///< Guards the records.

@@ -17,7 +17,8 @@ struct FakeSqliteState {
 
     /// The next answer, the default one when the script is used up.
     bool Answer() {
-        ThrowIf(throws);
+        if (throwsIn.empty() || throwsIn == calls.back().operation)
+            ThrowIf(throws);
         if (answers.empty())
             return answer;
         const bool next = answers.front();
@@ -29,6 +30,7 @@ struct FakeSqliteState {
     std::deque<bool> answers;
     bool answer = true;
     Throws throws = Throws::Nothing;
+    std::string throwsIn; ///< The one operation that throws; empty for all.
     std::string errorText = "scripted error";
     std::vector<std::vector<std::string>> rows; ///< What a query appends.
     int count = 0; ///< What a counting statement stores; nothing is stored for a negative.

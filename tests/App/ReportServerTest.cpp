@@ -1,0 +1,422 @@
+#include "App/ReportServer.h"
+
+#include <iostream>
+#include <sstream>
+
+#include <Poco/Net/DatagramSocket.h>
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "Frame/DBHelper.h"
+#include "Frame/FrameWorker.h"
+#include "Metrik/MetrikMgr.h"
+#include "SystemTool/CommonTool.h"
+#include "tests/fakes/FakeLogger.h"
+#include "tests/fakes/FakeSdk.h"
+#include "tests/fakes/FakeSqlite.h"
+#include "tests/support/WaitUntil.h"
+
+using namespace SyncServiceReport;
+using ::testing::ElementsAre;
+using ::testing::HasSubstr;
+using ::testing::IsEmpty;
+
+namespace {
+
+constexpr auto TOO_FEW_ARGUMENTS =
+    "[BoostLogError]boost::too_few_args: format-string referred to more arguments than were passed";
+
+LogRecord Record(int level, const std::string& function, int line, const std::string& message) {
+    return {level, "App/ReportServer", function, line, message};
+}
+
+class ReportServerTest : public ::testing::Test {
+protected:
+    ~ReportServerTest() override {
+        m_server.Stop();
+        DBHelper::instance().Init(nullptr);
+    }
+
+    void Start() {
+        ASSERT_TRUE(m_server.Start());
+        FakeLogger().Clear();
+    }
+
+    static void SendDatagram(const std::string& text) {
+        Poco::Net::DatagramSocket sender(Poco::Net::SocketAddress("127.0.0.1", 0));
+        sender.sendTo(text.data(), static_cast<int>(text.size()),
+                      Poco::Net::SocketAddress("127.0.0.1", 9997));
+    }
+
+    /// A message whose effect tells that everything sent before it has been handled.
+    static constexpr auto THE_END = R"({"msgType":"updateOpenID","exdata":{"openID":"the end"}})";
+
+    void AwaitTheEnd() {
+        EXPECT_TRUE(WaitUntil([] { return FakeLogger().RecordsOf("SetBaseInfo").size() == 1; }));
+        m_server.Stop();
+    }
+
+    std::size_t EventCount() const { return m_sdk.calls.size() - 1; } // beside the initialisation
+    std::size_t RowCount() const { return m_db.calls.size() - 2; }    // beside opening and reading BaseInfo
+
+    FakeSqliteState& m_db = FakeSqlite();
+    FakeSdkState& m_sdk = FakeSdk();
+    ReportServer m_server;
+};
+
+/// JsonToStruct alone, on a server that was never started.
+class JsonToStructTest : public ::testing::Test {
+protected:
+    ST_OptLog Converted(const std::string& json) {
+        ST_OptLog log;
+        EXPECT_TRUE(m_server.JsonToStruct(json, log)) << json;
+        return log;
+    }
+    std::string CreateTimeOf(const std::string& json) {
+        return Converted(R"({"createTime":)" + json + "}").createTime;
+    }
+    std::string ValueOf(const std::string& json) { return Converted(R"({"value":)" + json + "}").value; }
+    int TypeOf(const std::string& eventID) { return Converted(R"({"eventID":")" + eventID + "\"}").pType; }
+    bool IsDayReport(const std::string& json) {
+        return Converted(R"({"isDayReport":)" + json + "}").isDayReport;
+    }
+
+    ReportServer m_server;
+};
+
+} // namespace
+
+// --- start and stop
+
+TEST_F(ReportServerTest, StartBringsUpTheDestinationsInOrder) {
+    EXPECT_TRUE(m_server.Start());
+    EXPECT_EQ(m_server.GetBaseInfo().userDataDir, SystemTool::CommonTool::GetUserDataDir());
+    EXPECT_EQ(m_server.GetBaseInfo().osVersion, SystemTool::CommonTool::GetOSVersionString());
+    EXPECT_THAT(m_sdk.calls.front().arguments[3], HasSubstr(SystemTool::CommonTool::GetUserDataDir()));
+    std::vector<std::string> messages;
+    for (const auto& record : FakeLogger().Records())
+        messages.push_back(record.message);
+    EXPECT_THAT(messages, ElementsAre("Add metrik module :A759", "FrameWorker load success"));
+}
+
+TEST_F(ReportServerTest, StartReceivesOnTheReportPortAndConsumes) {
+    Start();
+    SendDatagram(R"({"eventID":"B1","value":"v"})");
+    SendDatagram(R"({"eventID":"A759|1"})");
+    SendDatagram(THE_END);
+    AwaitTheEnd();
+    EXPECT_EQ(RowCount(), 1U);
+    EXPECT_EQ(EventCount(), 1U);
+}
+
+TEST_F(ReportServerTest, StartIsTrueWhenNothingWorks) {
+    m_db.createsNothing = true;
+    m_sdk.createsNothing = true;
+    Poco::Net::DatagramSocket taken;
+    taken.bind(Poco::Net::SocketAddress("127.0.0.1", 9997), false, false);
+    std::ostringstream output;
+    auto* const original = std::cout.rdbuf(output.rdbuf());
+    EXPECT_TRUE(m_server.Start());
+    std::cout.rdbuf(original);
+    EXPECT_EQ(output.str(), "Poco exception: Net Exception: Address already in use: 127.0.0.1:9997\n");
+}
+
+TEST_F(ReportServerTest, AnExceptionInStartIsLoggedAndUndoesNothing) {
+    Start();
+    std::ostringstream output; // the socket's complaint about a second bind
+    auto* const original = std::cout.rdbuf(output.rdbuf());
+    EXPECT_FALSE(m_server.Start()) << "a thread that runs cannot be started";
+    std::cout.rdbuf(original);
+    const auto records = FakeLogger().RecordsOf("Start");
+    ASSERT_EQ(records.size(), 1U);
+    EXPECT_EQ(records[0], Record(3, "Start", 35, records[0].message));
+    EXPECT_THAT(records[0].message, ::testing::MatchesRegex("Poco exception :.*thread already running.* "));
+}
+
+TEST_F(ReportServerTest, StopBeforeStartReturns) {
+    m_server.Stop();
+    EXPECT_THAT(FakeLogger().Records(), IsEmpty());
+}
+
+TEST_F(ReportServerTest, DestructionReleasesTheDestinations) {
+    {
+        ReportServer server;
+        ASSERT_TRUE(server.Start());
+    }
+    EXPECT_EQ(m_sdk.destroyed, 1);
+    EXPECT_EQ(m_db.destroyed, 1);
+}
+
+TEST_F(ReportServerTest, WhatIsReceivedIsHandledInOrder) {
+    Start();
+    for (int i = 0; i < 500; ++i)
+        SendDatagram(R"({"eventID":"B)" + std::to_string(i) + "\"}");
+    SendDatagram(THE_END);
+    AwaitTheEnd();
+    ASSERT_EQ(RowCount(), 500U);
+    for (int i = 0; i < 500; ++i)
+        EXPECT_THAT(m_db.calls[static_cast<std::size_t>(i) + 2].argument,
+                    HasSubstr("'B" + std::to_string(i) + "'"));
+}
+
+// --- receiving
+
+TEST_F(ReportServerTest, RecvLogsTheTextAndIsTrue) {
+    EXPECT_TRUE(m_server.Recv(R"({"eventID":"B1"})"));
+    EXPECT_THAT(FakeLogger().Records(), ElementsAre(Record(2, "Recv", 42, R"({"eventID":"B1"})")));
+}
+
+TEST_F(ReportServerTest, RecvTakesTheTextForAFormat) {
+    EXPECT_TRUE(m_server.Recv("%s"));
+    EXPECT_TRUE(m_server.Recv("100%% sure"));
+    EXPECT_THAT(FakeLogger().Records(),
+                ElementsAre(Record(4, "Recv", 42, TOO_FEW_ARGUMENTS), Record(2, "Recv", 42, "100% sure")));
+}
+
+TEST_F(ReportServerTest, ATextThatCannotBeLoggedIsProcessedAllTheSame) {
+    Start();
+    SendDatagram(R"({"eventID":"B1","value":"50%s"})");
+    SendDatagram("%s");
+    SendDatagram(THE_END);
+    AwaitTheEnd();
+    EXPECT_EQ(RowCount(), 1U);
+    EXPECT_THAT(m_db.calls.back().argument, HasSubstr("'50%s'"));
+    EXPECT_EQ(FakeLogger().RecordsOf("Recv")[0], Record(4, "Recv", 42, TOO_FEW_ARGUMENTS));
+    EXPECT_EQ(FakeLogger().RecordsOf("Update")[0].message, "json formate error :Invalid value. At byte 0.");
+}
+
+// --- dispatch
+
+TEST_F(ReportServerTest, AReportOfAModuleGoesToAnalyticsOnly) {
+    Start();
+    EXPECT_TRUE(m_server.Consume(R"({"eventID":"A759|10001","value":{"a":1},"createTime":1700000000})"));
+    EXPECT_EQ(EventCount(), 1U);
+    EXPECT_EQ(RowCount(), 0U);
+    EXPECT_EQ(m_sdk.calls.back().arguments.front(), "A759|10001");
+    EXPECT_THAT(m_sdk.calls.back().arguments.back(), HasSubstr(R"("createTime":"1700000000000")"));
+}
+
+TEST_F(ReportServerTest, AnyOtherReportGoesToTheStoreOnly) {
+    Start();
+    for (const std::string eventID : {"B1", "a759|1", "", "|A", " A", "1"})
+        EXPECT_TRUE(m_server.Consume(R"({"eventID":")" + eventID + "\"}")) << eventID;
+    EXPECT_EQ(EventCount(), 0U);
+    EXPECT_EQ(RowCount(), 6U);
+}
+
+TEST_F(ReportServerTest, TheFirstLetterIsThatOfTheDecodedId) {
+    Start();
+    EXPECT_TRUE(m_server.Consume(R"({"eventID":"\u0041759|1"})"));
+    EXPECT_EQ(EventCount(), 1U);
+}
+
+TEST_F(ReportServerTest, TheKeyIsSearchedInTheRawText) {
+    Start();
+    EXPECT_TRUE(m_server.Consume(R"({"event\u0049D":"B1"})")) << "an escaped spelling of the key is none";
+    EXPECT_EQ(RowCount(), 0U);
+    EXPECT_TRUE(m_server.Consume(R"({"other":"mentions eventID"})"));
+    EXPECT_EQ(RowCount(), 1U) << "a report with an empty id";
+    EXPECT_THAT(m_db.calls.back().argument, HasSubstr("values('', '','',1,"));
+}
+
+TEST_F(ReportServerTest, AControlMessageThatMentionsTheKeyIsNoControlMessage) {
+    Start();
+    EXPECT_TRUE(m_server.Consume(R"({"msgType":"updateOpenID","exdata":{"openID":"eventID"}})"));
+    EXPECT_EQ(m_server.GetBaseInfo().openID, "visitor");
+    EXPECT_EQ(RowCount(), 1U);
+}
+
+TEST_F(ReportServerTest, AControlMessageGoesToTheManagerAndIsTrueWhateverItSays) {
+    Start();
+    EXPECT_TRUE(m_server.Consume(R"({"msgType":"updateOpenID","exdata":{"openID":"u1"}})"));
+    EXPECT_EQ(m_server.GetBaseInfo().openID, "u1");
+    EXPECT_TRUE(m_server.Consume("no JSON"));
+    EXPECT_TRUE(m_server.Consume(""));
+    EXPECT_EQ(FakeLogger().RecordsOf("Update").size(), 2U);
+}
+
+TEST_F(ReportServerTest, AReportThatCannotBeParsedIsFalseAndTheNextOneIsTaken) {
+    Start();
+    EXPECT_FALSE(m_server.Consume(R"({"eventID":)"));
+    EXPECT_THAT(FakeLogger().Records(),
+                ElementsAre(Record(4, "JsonToStruct", 123, "Invalid value. At byte 11.")));
+    EXPECT_TRUE(m_server.Consume(R"({"eventID":"B1"})"));
+    EXPECT_EQ(RowCount(), 1U);
+}
+
+TEST_F(ReportServerTest, ADestinationsFailureIsNoFailureOfConsume) {
+    Start();
+    m_db.answer = false;
+    m_sdk.reportAnswer = false;
+    EXPECT_TRUE(m_server.Consume(R"({"eventID":"B1"})"));
+    EXPECT_TRUE(m_server.Consume(R"({"eventID":"A759|1"})"));
+}
+
+TEST_F(ReportServerTest, AMissingDestinationIsLogged) {
+    EXPECT_FALSE(m_server.Consume(R"({"eventID":"B1"})"));
+    EXPECT_FALSE(m_server.Consume(R"({"eventID":"A1"})"));
+    EXPECT_FALSE(m_server.Consume("control"));
+    EXPECT_THAT(FakeLogger().Records(),
+                ElementsAre(Record(3, "Consume", 76, "Poco exception :Null pointer "),
+                            Record(3, "Consume", 76, "Poco exception :Null pointer "),
+                            Record(3, "Consume", 76, "Poco exception :Null pointer ")));
+}
+
+// --- base information
+
+TEST_F(ReportServerTest, SetBaseInfoTakesUserAndVersionOverAndLogsThem) {
+    ST_BaseInfo info;
+    info.openID = "u1";
+    info.suiteVersion = "5.1.0.2";
+    m_server.SetBaseInfo(info);
+    EXPECT_EQ(m_server.GetBaseInfo().openID, "u1");
+    EXPECT_EQ(m_server.GetBaseInfo().suiteVersion, "5.1.0.2");
+    EXPECT_THAT(FakeLogger().Records(), ElementsAre(Record(2, "SetBaseInfo", 111, "SetBaseInfo u1-5.1.0.2")));
+}
+
+TEST_F(ReportServerTest, SetBaseInfoWithBothEmptyChangesNothingAndLogs) {
+    ST_BaseInfo info;
+    info.openID.clear();
+    info.suiteVersion.clear();
+    m_server.SetBaseInfo(info);
+    EXPECT_THAT(FakeLogger().Records(),
+                ElementsAre(Record(2, "SetBaseInfo", 111, "SetBaseInfo visitor-3.0.0.0")));
+}
+
+TEST_F(ReportServerTest, SetBaseInfoWithAnEmptyVersionKeepsTheVersion) {
+    ST_BaseInfo info;
+    info.suiteVersion = "9";
+    m_server.SetBaseInfo(info);
+    info.openID = "u1";
+    info.suiteVersion.clear();
+    m_server.SetBaseInfo(info);
+    EXPECT_EQ(FakeLogger().Records().back().message, "SetBaseInfo u1-9");
+}
+
+TEST_F(ReportServerTest, AFreshRecordPassesItsOtherDefaultOn) {
+    ST_BaseInfo info;
+    info.suiteVersion = "9";
+    m_server.SetBaseInfo(info);
+    ST_BaseInfo fresh;
+    fresh.openID = "u1";
+    m_server.SetBaseInfo(fresh);
+    EXPECT_EQ(m_server.GetBaseInfo().suiteVersion, "3.0.0.0");
+}
+
+TEST_F(ReportServerTest, SetBaseInfoNeverChangesTheMachinesFacts) {
+    m_server.InitBaseInfo();
+    ST_BaseInfo info;
+    info.userDataDir = "/elsewhere";
+    info.osVersion = "other";
+    m_server.SetBaseInfo(info);
+    EXPECT_EQ(m_server.GetBaseInfo().userDataDir, SystemTool::CommonTool::GetUserDataDir());
+    EXPECT_EQ(m_server.GetBaseInfo().osVersion, SystemTool::CommonTool::GetOSVersionString());
+}
+
+TEST_F(ReportServerTest, InitBaseInfoLeavesUserAndVersionAlone) {
+    ST_BaseInfo info;
+    info.openID = "u1";
+    info.suiteVersion = "9";
+    m_server.SetBaseInfo(info);
+    m_server.InitBaseInfo();
+    EXPECT_EQ(m_server.GetBaseInfo().openID, "u1");
+    EXPECT_EQ(m_server.GetBaseInfo().suiteVersion, "9");
+}
+
+TEST_F(ReportServerTest, AnOpenIdWithAPercentSignIsLoggedUnchanged) {
+    ST_BaseInfo info;
+    info.openID = "100%s";
+    m_server.SetBaseInfo(info);
+    EXPECT_EQ(FakeLogger().Records().back(), Record(2, "SetBaseInfo", 111, "SetBaseInfo 100%s-3.0.0.0"));
+}
+
+// --- report to record
+
+TEST_F(JsonToStructTest, ConvertsAReport) {
+    const ST_OptLog log = Converted(
+        R"({"eventID":"A100|10001","value":{"k": "v"},"createTime":1700000000,"isDayReport":0,"other":"ignored"})");
+    EXPECT_EQ(log.nReserved, 0);
+    EXPECT_EQ(log.eventID, "A100|10001");
+    EXPECT_EQ(log.value, R"({"k":"v"})");
+    EXPECT_EQ(log.createTime, "1700000000000");
+    EXPECT_EQ(log.pType, 0);
+    EXPECT_FALSE(log.isDayReport);
+    EXPECT_THAT(FakeLogger().Records(), IsEmpty());
+}
+
+TEST_F(JsonToStructTest, WhatIsNoJsonLeavesTheDefaults) {
+    ST_OptLog log;
+    log.nReserved = 5;
+    log.eventID = log.value = log.createTime = "left over";
+    log.pType = 0;
+    log.isDayReport = true;
+    EXPECT_FALSE(m_server.JsonToStruct("eventID", log));
+    EXPECT_EQ(log.nReserved, 0);
+    EXPECT_EQ(log.eventID + log.value + log.createTime, "");
+    EXPECT_EQ(log.pType, 1);
+    EXPECT_FALSE(log.isDayReport);
+    EXPECT_THAT(FakeLogger().Records(),
+                ElementsAre(Record(4, "JsonToStruct", 123, "Invalid value. At byte 0.")));
+}
+
+TEST_F(JsonToStructTest, TenCharactersOfTimeAreSeconds) {
+    EXPECT_EQ(CreateTimeOf("1700000000"), "1700000000000");
+    EXPECT_EQ(CreateTimeOf(R"("1700000000")"), "1700000000000");
+    EXPECT_EQ(CreateTimeOf(R"("abcdefghij")"), "abcdefghij000");
+    EXPECT_EQ(CreateTimeOf("-170000000"), "-170000000000") << "a minus sign counts";
+    EXPECT_EQ(CreateTimeOf(R"("\u00e9\u00e9\u00e9\u00e9\u00e9")"), "\u00e9\u00e9\u00e9\u00e9\u00e9"
+                                                                   "000")
+        << "bytes are counted";
+    EXPECT_EQ(CreateTimeOf("12345678.5"), "12345678.5000") << "no integer: its text";
+}
+
+TEST_F(JsonToStructTest, OtherLengthsOfTimeStay) {
+    for (const std::string json : {"1700000000123", "170000000", "17000000000", "0", "-1700000000", "1.5"})
+        EXPECT_EQ(CreateTimeOf(json), json);
+    EXPECT_EQ(CreateTimeOf(R"("abc")"), "abc");
+    EXPECT_EQ(CreateTimeOf(R"("")"), "");
+    EXPECT_EQ(CreateTimeOf("null"), "");
+    EXPECT_EQ(CreateTimeOf("true"), "true");
+    EXPECT_EQ(Converted("{}").createTime, "");
+}
+
+TEST_F(JsonToStructTest, ExactlyOneBarIsTypeZero) {
+    EXPECT_EQ(TypeOf("A100|10001"), 0);
+    EXPECT_EQ(TypeOf("|"), 0);
+    EXPECT_EQ(TypeOf("A100|"), 0);
+    EXPECT_EQ(TypeOf("A100"), 1);
+    EXPECT_EQ(TypeOf(""), 1);
+    EXPECT_EQ(TypeOf("A100|1|2"), 1);
+    EXPECT_EQ(TypeOf("||"), 1);
+    EXPECT_EQ(TypeOf(R"(A\u007c1)"), 0) << "bars are counted in the decoded id";
+    EXPECT_EQ(Converted("{}").pType, 1);
+}
+
+TEST_F(JsonToStructTest, AnObjectsValueIsItsCompactJsonAndAnyOthersItsText) {
+    EXPECT_EQ(ValueOf(R"({ "a" : [ 1 , 2.5 ] , "b" : { } })"), R"({"a":[1,2.5],"b":{}})");
+    EXPECT_EQ(ValueOf(R"("it's \"text\"")"), R"(it's "text")");
+    EXPECT_EQ(ValueOf("1.5"), "1.5");
+    EXPECT_EQ(ValueOf("9007199254740993"), "9007199254740993");
+    EXPECT_EQ(ValueOf("true"), "true");
+    EXPECT_EQ(ValueOf("null"), "");
+    EXPECT_EQ(ValueOf("[1, 2]"), "[1,2]");
+    EXPECT_EQ(Converted("{}").value, "");
+}
+
+TEST_F(JsonToStructTest, OnlyTheIntegerOneIsADayReport) {
+    EXPECT_TRUE(IsDayReport("1"));
+    for (const std::string json : {"0", "2", "-1", "1.0", R"("1")", "true", "null", "4294967297"})
+        EXPECT_FALSE(IsDayReport(json)) << json;
+    EXPECT_FALSE(Converted("{}").isDayReport);
+}
+
+TEST_F(JsonToStructTest, ARootThatIsNoObjectGivesAnEmptyRecord) {
+    for (const std::string json : {"[]", "5", R"("eventID")", "null"})
+        EXPECT_EQ(Converted(json).eventID, "") << json;
+}
+
+TEST_F(JsonToStructTest, AnIdIsTextWhateverItsType) {
+    EXPECT_EQ(Converted(R"({"eventID":100})").eventID, "100");
+    EXPECT_EQ(Converted(R"({"eventID":["A|"]})").eventID, R"(["A|"])");
+    EXPECT_EQ(Converted(R"({"eventID":["A|"]})").pType, 0);
+}

@@ -1,0 +1,241 @@
+#include "App/UDPServer.h"
+
+#include <atomic>
+#include <iostream>
+#include <mutex>
+#include <streambuf>
+#include <type_traits>
+#include <vector>
+
+#include <Poco/Net/SocketAddress.h>
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "tests/fakes/FakePlugin.h"
+#include "tests/support/WaitUntil.h"
+
+using Poco::Net::SocketAddress;
+using ::testing::ElementsAre;
+
+namespace {
+
+const std::string LOOPBACK = "127.0.0.1";
+constexpr int PORT = 9997;
+
+/// Standard output while this object lives; may be written and read by different threads.
+class CapturedOutput : private std::streambuf {
+public:
+    CapturedOutput() : m_original(std::cout.rdbuf(this)) {}
+    ~CapturedOutput() override { std::cout.rdbuf(m_original); }
+    CapturedOutput(const CapturedOutput&) = delete;
+    CapturedOutput& operator=(const CapturedOutput&) = delete;
+
+    std::string Text() const {
+        const std::lock_guard lock(m_mutex);
+        return m_text;
+    }
+
+private:
+    std::streamsize xsputn(const char* text, std::streamsize length) override {
+        const std::lock_guard lock(m_mutex);
+        m_text.append(text, static_cast<std::size_t>(length));
+        return length;
+    }
+    int overflow(int character) override {
+        const char byte = static_cast<char>(character);
+        xsputn(&byte, 1);
+        return character;
+    }
+
+    mutable std::mutex m_mutex; ///< Guards the text.
+    std::string m_text;
+    std::streambuf* m_original;
+};
+
+class Receiver final : public UDPServer {
+public:
+    ~Receiver() override { Stop(); }
+
+    bool Recv(const std::string& msg) override {
+        {
+            const std::lock_guard lock(m_mutex);
+            m_received.push_back(msg);
+        }
+        if (msg == "throw Poco")
+            ThrowIf(Throws::Poco);
+        if (msg == "throw std")
+            ThrowIf(Throws::Std);
+        if (msg == "throw other") {
+            errno = ENOENT;
+            ThrowIf(Throws::Other);
+        }
+        if (msg == "stop self")
+            StopSelf();
+        if (msg == "close the socket")
+            m_socket.close();
+        return false; // of no consequence
+    }
+
+    std::vector<std::string> Received() {
+        const std::lock_guard lock(m_mutex);
+        return m_received;
+    }
+
+    bool IsRunning() const { return m_thread.isRunning(); }
+    int ReceiveBufferBytes() { return m_socket.getReceiveBufferSize(); }
+
+private:
+    std::mutex m_mutex; ///< Guards the texts.
+    std::vector<std::string> m_received;
+};
+
+class UDPServerTest : public ::testing::Test {
+protected:
+    void Send(const std::string& datagram) {
+        m_sender.sendTo(datagram.data(), static_cast<int>(datagram.size()), SocketAddress(LOOPBACK, PORT));
+    }
+
+    /// What arrived when `count` texts had.
+    std::vector<std::string> Await(std::size_t count) {
+        EXPECT_TRUE(WaitUntil([&] { return m_receiver.Received().size() >= count; }));
+        return m_receiver.Received();
+    }
+
+    CapturedOutput m_output;
+    Receiver m_receiver;
+    Poco::Net::DatagramSocket m_sender{SocketAddress(LOOPBACK, 0)};
+};
+
+} // namespace
+
+static_assert(std::is_abstract_v<UDPServer>);
+
+TEST_F(UDPServerTest, HandsEachDatagramOnAsText) {
+    ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
+    Send("one");
+    Send("two");
+    EXPECT_THAT(Await(2), ElementsAre("one", "two"));
+    m_receiver.Stop();
+    EXPECT_EQ(m_output.Text(), "");
+}
+
+TEST_F(UDPServerTest, IgnoresADatagramOfNoBytes) {
+    ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
+    Send("");
+    Send("after");
+    EXPECT_THAT(Await(1), ElementsAre("after"));
+}
+
+TEST_F(UDPServerTest, CutsADatagramAtItsFirstZeroByte) {
+    ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
+    Send(std::string("before\0after\0", 13));
+    EXPECT_THAT(Await(1), ElementsAre("before"));
+}
+
+TEST_F(UDPServerTest, HandsADatagramThatStartsWithAZeroByteOnAsEmptyText) {
+    ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
+    Send(std::string("\0text", 5));
+    EXPECT_THAT(Await(1), ElementsAre(""));
+}
+
+TEST_F(UDPServerTest, LeavesNothingOfALongDatagramInAShortOneAfterIt) {
+    ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
+    Send(std::string(10240, 'x'));
+    Send("short");
+    EXPECT_EQ(Await(2)[1], "short");
+}
+
+TEST_F(UDPServerTest, TakesADatagramOf10240BytesWhole) {
+    ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
+    const std::string whole = std::string(10239, 'x') + "y";
+    Send(whole);
+    EXPECT_EQ(Await(1)[0], whole);
+}
+
+TEST_F(UDPServerTest, CutsLongerDatagramsTo10240Bytes) {
+    ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
+    Send(std::string(10241, 'x'));
+    Send(std::string(65507, 'y'));
+    const auto received = Await(2);
+    EXPECT_EQ(received[0], std::string(10240, 'x'));
+    EXPECT_EQ(received[1], std::string(10240, 'y'));
+}
+
+TEST_F(UDPServerTest, PrintsAnExceptionOutOfRecvAndGoesOn) {
+    ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
+    Send("throw Poco");
+    Send("throw std");
+    Send("throw other");
+    Send("after");
+    Await(4);
+    m_receiver.Stop();
+    EXPECT_EQ(m_output.Text(), "Poco exception: I/O error: scripted\n"
+                               "Std exception: scripted\n"
+                               "Unknown exception,eCode:2,desc:No such file or directory\n");
+}
+
+TEST_F(UDPServerTest, ATakenPortIsPrintedAndStartsNothing) {
+    Poco::Net::DatagramSocket other;
+    other.bind(SocketAddress(LOOPBACK, PORT), false, false);
+    EXPECT_FALSE(m_receiver.Start(LOOPBACK, PORT));
+    EXPECT_FALSE(m_receiver.IsRunning());
+    EXPECT_EQ(m_output.Text(), "Poco exception: Net Exception: Address already in use: 127.0.0.1:9997\n");
+    m_receiver.Stop(); // returns at once: the thread was never started
+}
+
+TEST_F(UDPServerTest, AnAddressThatIsNoneIsPrintedAndStartsNothing) {
+    EXPECT_FALSE(m_receiver.Start("not an address", PORT));
+    EXPECT_FALSE(m_receiver.IsRunning());
+    EXPECT_THAT(m_output.Text(), ::testing::StartsWith("Poco exception: "));
+}
+
+TEST_F(UDPServerTest, BindsAPortThatAnotherReceiverHolds) {
+    Receiver other;
+    ASSERT_TRUE(other.Start(LOOPBACK, PORT));
+    EXPECT_TRUE(m_receiver.Start(LOOPBACK, PORT)) << "a restarted service must not wait for its predecessor";
+}
+
+TEST_F(UDPServerTest, StopBeforeStartReturns) {
+    m_receiver.Stop();
+    EXPECT_FALSE(m_receiver.IsRunning());
+}
+
+TEST_F(UDPServerTest, StopsWithin300MillisecondsWhileIdle) {
+    ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
+    Send("the loop runs");
+    Await(1);
+    const auto begin = std::chrono::steady_clock::now();
+    m_receiver.Stop();
+    EXPECT_LT(std::chrono::steady_clock::now() - begin, std::chrono::milliseconds(300));
+    EXPECT_FALSE(m_receiver.IsRunning());
+    m_receiver.Stop(); // again: nothing runs
+}
+
+TEST_F(UDPServerTest, StopSelfEndsTheLoopFromWithin) {
+    ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
+    Send("stop self");
+    EXPECT_TRUE(WaitUntil([&] { return !m_receiver.IsRunning(); }));
+    EXPECT_THAT(m_receiver.Received(), ElementsAre("stop self"));
+}
+
+TEST_F(UDPServerTest, AStopBeforeTheLoopBeganLetsItReturnAtOnce) {
+    m_receiver.StopSelf();
+    m_receiver.run(); // on this thread; would never return
+    EXPECT_THAT(m_receiver.Received(), ElementsAre());
+}
+
+TEST_F(UDPServerTest, PrintsAPollThatKeepsFailingOnceAndCanStillBeStopped) {
+    ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
+    Send("close the socket");
+    EXPECT_TRUE(WaitUntil([&] { return m_output.Text().ends_with('\n'); }));
+    m_receiver.Stop();
+    EXPECT_EQ(m_output.Text(), "Poco exception: Invalid socket\n");
+    EXPECT_FALSE(m_receiver.IsRunning());
+}
+
+TEST_F(UDPServerTest, HasTheLargestReceiveBufferThatTheKernelGrants) {
+    ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
+    Poco::Net::DatagramSocket asked(SocketAddress(LOOPBACK, 0));
+    asked.setReceiveBufferSize(8 * 1024 * 1024);
+    EXPECT_EQ(m_receiver.ReceiveBufferBytes(), asked.getReceiveBufferSize());
+}

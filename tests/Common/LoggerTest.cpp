@@ -1,0 +1,171 @@
+#include "Common/Common.h"
+
+#include <chrono>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "tests/fakes/FakeLogger.h"
+
+using namespace SyncServiceReport;
+using ::testing::ElementsAre;
+using ::testing::StartsWith;
+
+namespace {
+
+constexpr LogSite SITE{LogLevel::Info, "Function", 7};
+
+/// The one record that logging `format` at SITE gives.
+template <typename... Arguments>
+LogRecord Logged(const std::string& format, const Arguments&... arguments) {
+    FakeLogger().Clear();
+    WriteLog(SITE, format, arguments...);
+    const auto records = FakeLogger().Records();
+    EXPECT_EQ(records.size(), 1U) << format;
+    return records.empty() ? LogRecord{} : records.front();
+}
+
+LogRecord Plain(const std::string& message) {
+    return {2, "Common/LoggerTest", "Function", 7, message};
+}
+
+LogRecord BoostLogError(const std::string& why) {
+    return {4, "Common/LoggerTest", "Function", 7, "[BoostLogError]" + why};
+}
+
+bool IsBoostLogError(const LogRecord& record) {
+    return record == BoostLogError(record.message.substr(std::min<std::size_t>(record.message.size(), 15)));
+}
+
+} // namespace
+
+TEST(WriteLog, WritesLevelFileFunctionLineAndTextWithAnEmptyTagAndZero) {
+    EXPECT_EQ(Logged("Start"), Plain("Start"));
+}
+
+TEST(WriteLog, PutsArgumentsIntoTheText) {
+    EXPECT_EQ(Logged("Unknown exception :%d-%s", 5, "why"), Plain("Unknown exception :5-why"));
+}
+
+TEST(WriteLog, LeavesPercentSignsOfAnArgumentAlone) {
+    EXPECT_EQ(Logged("Std exception :%s ", "100 %s %d %"), Plain("Std exception :100 %s %d % "));
+}
+
+TEST(WriteLog, UsesTheSitesOwnLineWhereNoneIsFixed) {
+    const int lineBefore = __LINE__;
+    WriteLog({LogLevel::Error, "Function"}, "text");
+    EXPECT_THAT(FakeLogger().Records(),
+                ElementsAre(LogRecord{4, "Common/LoggerTest", "Function", lineBefore + 1, "text"}));
+}
+
+TEST(WriteLog, FormatsDirectivesThatNeedNoArgument) {
+    EXPECT_EQ(Logged("100%% of %%s"), Plain("100% of %s"));
+    EXPECT_EQ(Logged("a%|9t|b"), Plain("a        b"));
+    EXPECT_EQ(Logged("a%9tb"), Plain("a        b"));
+    EXPECT_EQ(Logged("a%|5T-|b"), Plain("a----b"));
+}
+
+TEST(WriteLog, ReportsATextThatCannotBeBuilt) {
+    const std::string tooFewArguments =
+        "boost::too_few_args: format-string referred to more arguments than were passed";
+    EXPECT_EQ(Logged("%s"), BoostLogError(tooFewArguments));
+    EXPECT_EQ(Logged("50 %d"), BoostLogError(tooFewArguments));
+    EXPECT_EQ(Logged("%1%"), BoostLogError(tooFewArguments));
+    EXPECT_EQ(Logged("100 %"), BoostLogError("boost::bad_format_string: format-string is ill-formed"));
+    EXPECT_EQ(
+        Logged("no directive", 1),
+        BoostLogError("boost::too_many_args: format-string referred to fewer arguments than were passed"));
+}
+
+TEST(WriteLog, CountsATextOfMoreThanOneMebibyteAsOneThatCannotBeBuilt) {
+    EXPECT_EQ(Logged("a%|1048576t|").message.size(), 1048576U);
+    EXPECT_EQ(Logged("a%|1048577t|"),
+              BoostLogError("the text would have 1048577 bytes, more than the 1048576 of a log record"));
+}
+
+TEST(WriteLog, BuildsNoGigabytesFromATabulationInAnySpelling) {
+    const auto begin = std::chrono::steady_clock::now();
+    for (const std::string format :
+         {"a%|2000000000t|", "a%2000000000t", "a%1$2000000000tx", "a%-2000000000t", "a%'2000000000t",
+          "%|2000000000T*|", "%|2000000000t|%|1999999999t|", "%|9223372036854775807t|x",
+          "%|9223372036854775807t|a%|0t|", "%|99999999999999999999t|", "%2000000000s", "%.2000000000s",
+          "%2000000000%"})
+        EXPECT_TRUE(IsBoostLogError(Logged(format)))
+            << format << " gave " << Logged(format).message.size() << " bytes";
+    EXPECT_LT(std::chrono::steady_clock::now() - begin, std::chrono::seconds(5)) << "nothing was built";
+}
+
+TEST(WriteLog, BoundsATextOfManyTabulations) {
+    std::string format;
+    for (int column = 1; column <= 200; ++column)
+        format += "%|" + std::to_string(column * 1000) + "t|x";
+    EXPECT_EQ(Logged(format).message.size(), 200'000U + 1);
+}
+
+TEST(WriteLog, ReportsALoggerThatThrowsToTheLogger) {
+    // The first write throws; the report of that is a write too and throws again: all that is left is
+    // silence.
+    for (const Throws what : {Throws::Poco, Throws::Std, Throws::Other}) {
+        FakeLogger().throws = what;
+        WriteLog(SITE, "text");
+    }
+    FakeLogger().throws = Throws::Nothing;
+    EXPECT_THAT(FakeLogger().Records(), ElementsAre());
+}
+
+TEST(LogCaughtException, NamesEachKindOfExceptionInItsOwnWords) {
+    const auto logged = [](auto exception) {
+        FakeLogger().Clear();
+        try {
+            throw exception;
+        } catch (...) {
+            EXPECT_FALSE(LogCaughtException({LogLevel::Warning, "Consume", 76}));
+        }
+        return FakeLogger().Records();
+    };
+    const auto warning = [](const std::string& text) {
+        return LogRecord{3, "Common/LoggerTest", "Consume", 76, text};
+    };
+    EXPECT_THAT(logged(Poco::IOException("disk 100%s")),
+                ElementsAre(warning("Poco exception :I/O error: disk 100%s ")));
+    EXPECT_THAT(logged(std::runtime_error("bad %d")), ElementsAre(warning("Std exception :bad %d ")));
+    errno = ENOENT;
+    EXPECT_THAT(logged(42), ElementsAre(warning("Unknown exception :2-No such file or directory")));
+}
+
+TEST(PerFileLogger, IsAnInstanceOfItsOwnInEachSourceFile) {
+    EXPECT_NE(pSysLog, nullptr);
+    EXPECT_EQ(pSysLog, g_LoggerLoader.GetModule());
+    EXPECT_EQ(g_LoggerLoader.GetModuleName(), "libBoostLogger.dylib");
+    EXPECT_GT(FakeLogger().created, 5) << "the core's source files have theirs too";
+}
+
+TEST(Constants, HaveTheirValues) {
+    EXPECT_EQ(ORVEK_EMPTY_STRING, "");
+    EXPECT_EQ(ORVEK_SPACE_STRING, " ");
+    EXPECT_EQ(DATE_TIME_FORMAT_MS, "%Y-%m-%d %H:%M:%S:%i");
+    EXPECT_EQ(WIN_REG_PATH, R"(HKEY_LOCAL_MACHINE\SOFTWARE\HubLink)");
+    EXPECT_EQ(MAC_REG_PATH, "/Library/Preferences/hublink");
+    EXPECT_EQ(MAC_REG_INI, "/Library/Preferences/hublink/local_machine.ini");
+    EXPECT_EQ(APP_LOG_DIR_PATH, SystemTool::CommonTool::GetUserDataDir() + "/hublink/log/metrik");
+    EXPECT_EQ(ORVEK_EXCUTABLE_PATH, SystemTool::IO::Directory::GetExcutableDirectory());
+    EXPECT_EQ(UDP_SERVER_IP, "127.0.0.1");
+    EXPECT_EQ(DEFAULT_MODULE_ID, "A759");
+    EXPECT_EQ(DEFAULT_MODULE_VERSION, "1");
+    EXPECT_EQ(DEFAULT_MODULE_NAME, "default");
+    EXPECT_EQ(ORVEK_REPORT_MODULEINIT, "init");
+    EXPECT_EQ(ORVEK_REPORT_UPDATEOPENID, "updateOpenID");
+}
+
+TEST(Records, HaveTheirDefaults) {
+    const ST_OptLog log;
+    EXPECT_EQ(log.nReserved, 0);
+    EXPECT_EQ(log.pType, 1);
+    EXPECT_FALSE(log.isDayReport);
+    EXPECT_EQ(log.eventID + log.value + log.createTime, "");
+    const ST_BaseInfo info;
+    EXPECT_EQ(info.userDataDir, "");
+    EXPECT_EQ(info.openID, "visitor");
+    EXPECT_EQ(info.suiteVersion, "3.0.0.0");
+    EXPECT_EQ(info.osVersion, "");
+}

@@ -1,0 +1,187 @@
+#include "Frame/DBHelper.h"
+
+#include <chrono>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "Plugin/ModuleLoader.h"
+#include "tests/fakes/FakeLogger.h"
+#include "tests/fakes/FakeSqlite.h"
+
+using SyncServiceReport::DBHelper;
+using ::testing::AllOf;
+using ::testing::ElementsAre;
+using ::testing::Field;
+using ::testing::IsEmpty;
+
+namespace {
+
+using Rows = std::vector<std::vector<std::string>>;
+using Call = FakeSqliteState::Call;
+
+class DBHelperTest : public ::testing::Test {
+protected:
+    DBHelperTest() { m_helper.Init(m_loader.GetModule()); }
+    ~DBHelperTest() override { m_helper.Init(nullptr); }
+
+    /// A record of DBHelper, whatever its line.
+    static auto Error(const std::string& function, const std::string& message) {
+        return AllOf(Field(&LogRecord::level, 4), Field(&LogRecord::file, "Frame/DBHelper"),
+                     Field(&LogRecord::function, function), Field(&LogRecord::message, message),
+                     Field(&LogRecord::tag, ""), Field(&LogRecord::reserved, 0));
+    }
+
+    SystemTool::ModuleLoader<ISqliteDatabase> m_loader{SystemTool::IO::Directory::GetExcutableDirectory() +
+                                                       "libOrvekSqlite.dylib"};
+    DBHelper& m_helper = DBHelper::instance();
+    FakeSqliteState& m_db = FakeSqlite();
+};
+
+class DBHelperWithoutPlugin : public ::testing::Test {
+protected:
+    DBHelper& m_helper = DBHelper::instance();
+};
+
+} // namespace
+
+TEST(DBHelper, IsOneInstance) {
+    EXPECT_EQ(&DBHelper::instance(), &DBHelper::instance());
+}
+
+TEST_F(DBHelperWithoutPlugin, OperationsFailSilently) {
+    EXPECT_FALSE(m_helper.CreateTable("create table t (a)"));
+    EXPECT_FALSE(m_helper.ExecSql("select 1"));
+    EXPECT_FALSE(m_helper.BatExecSql({"select 1"}));
+    EXPECT_THAT(FakeLogger().Records(), IsEmpty());
+}
+
+TEST_F(DBHelperWithoutPlugin, AQueryFailsSilentlyAndEmptiesTheRows) {
+    Rows rows = {{"left", "over"}};
+    EXPECT_FALSE(m_helper.QuerySql("select 1", rows));
+    EXPECT_THAT(rows, IsEmpty());
+    EXPECT_THAT(FakeLogger().Records(), IsEmpty());
+}
+
+TEST_F(DBHelperTest, InitIsTrueAndTakesAnotherObjectLater) {
+    EXPECT_TRUE(m_helper.Init(nullptr));
+    EXPECT_FALSE(m_helper.ExecSql("select 1"));
+    EXPECT_TRUE(m_helper.Init(m_loader.GetModule()));
+    EXPECT_TRUE(m_helper.ExecSql("select 1"));
+}
+
+TEST_F(DBHelperTest, PassesStatementsOnUnchanged) {
+    const std::string sql = " select 'it''s' , \"%s\";; -- \n";
+    Rows rows;
+    int count = 0;
+    EXPECT_TRUE(m_helper.CreateTable(sql));
+    EXPECT_TRUE(m_helper.ExecSql(sql));
+    EXPECT_FALSE(m_helper.QuerySql(sql, rows));
+    EXPECT_TRUE(m_helper.BatExecSql({sql, sql}));
+    EXPECT_TRUE(m_helper.GetTotalCount(sql, count));
+    EXPECT_THAT(m_db.calls, ElementsAre(Call{"CreateTable", sql}, Call{"ExecSql", sql}, Call{"QuerySql", sql},
+                                        Call{"BatExecSql", sql + " " + sql}, Call{"count was", "0"},
+                                        Call{"GetTotalCount", sql}));
+    EXPECT_THAT(FakeLogger().Records(), IsEmpty());
+}
+
+TEST_F(DBHelperTest, AFailureIsLoggedAsErrorTextHyphenStatement) {
+    m_db.answer = false;
+    m_db.errorText = "no such table";
+    Rows rows;
+    int count = 0;
+    EXPECT_FALSE(m_helper.CreateTable("select 1"));
+    EXPECT_FALSE(m_helper.ExecSql("select 1"));
+    EXPECT_FALSE(m_helper.QuerySql("select 1", rows));
+    EXPECT_FALSE(m_helper.GetTotalCount("select 1", count));
+    EXPECT_THAT(FakeLogger().Records(), ElementsAre(Error("CreateTable", "no such table-select 1"),
+                                                    Error("ExecSql", "no such table-select 1"),
+                                                    Error("QuerySql", "no such table-select 1"),
+                                                    Error("GetTotalCount", "no such table-select 1")));
+}
+
+TEST_F(DBHelperTest, PercentSignsOfErrorAndStatementAreLoggedAsTheyAre) {
+    m_db.answer = false;
+    m_db.errorText = "near \"%d\"";
+    EXPECT_FALSE(m_helper.ExecSql("select '%s'"));
+    EXPECT_THAT(FakeLogger().Records(), ElementsAre(Error("ExecSql", "near \"%d\"-select '%s'")));
+}
+
+TEST_F(DBHelperTest, AQueryIsTrueWhenARowCameBack) {
+    m_db.rows = {{"OpenID", "u1"}, {"HubLinkVersion", "5.1.0.2"}};
+    Rows rows = {{"left", "over"}};
+    EXPECT_TRUE(m_helper.QuerySql("select key ,value from BaseInfo ;", rows));
+    EXPECT_EQ(rows, m_db.rows);
+}
+
+TEST_F(DBHelperTest, AQueryWithoutARowIsFalseAndLogsNothing) {
+    Rows rows = {{"left", "over"}};
+    EXPECT_FALSE(m_helper.QuerySql("select 1 where 0", rows));
+    EXPECT_THAT(rows, IsEmpty());
+    EXPECT_THAT(FakeLogger().Records(), IsEmpty());
+}
+
+TEST_F(DBHelperTest, ABatchThatFailsOnceIsTriedAgainAfterAPause) {
+    m_db.answers = {false, true};
+    const auto begin = std::chrono::steady_clock::now();
+    EXPECT_TRUE(m_helper.BatExecSql({"a", "b"}));
+    EXPECT_GE(std::chrono::steady_clock::now() - begin, std::chrono::milliseconds(1000));
+    EXPECT_THAT(m_db.calls, ElementsAre(Call{"BatExecSql", "a b"}, Call{"BatExecSql", "a b"}));
+    EXPECT_THAT(FakeLogger().Records(), ElementsAre(Error("BatExecSql", "scripted error")));
+}
+
+TEST_F(DBHelperTest, ABatchThatKeepsFailingIsTriedThreeTimesWithThreePauses) {
+    m_db.answer = false;
+    const auto begin = std::chrono::steady_clock::now();
+    EXPECT_FALSE(m_helper.BatExecSql({"a"}));
+    EXPECT_GE(std::chrono::steady_clock::now() - begin, std::chrono::milliseconds(3000))
+        << "the last failure pauses too";
+    EXPECT_EQ(m_db.calls.size(), 3U);
+    EXPECT_THAT(FakeLogger().Records(),
+                ElementsAre(Error("BatExecSql", "scripted error"), Error("BatExecSql", "scripted error"),
+                            Error("BatExecSql", "scripted error")));
+}
+
+TEST_F(DBHelperTest, ABatchErrorWithADirectiveIsABoostLogErrorAndIsRetried) {
+    m_db.answers = {false, true};
+    m_db.errorText = "near %d";
+    EXPECT_TRUE(m_helper.BatExecSql({"a"}));
+    EXPECT_THAT(
+        FakeLogger().Records(),
+        ElementsAre(Error("BatExecSql", "[BoostLogError]boost::too_few_args: format-string referred to more "
+                                        "arguments than were passed")));
+}
+
+TEST_F(DBHelperTest, ACountIsResetBeforeThePluginIsAsked) {
+    m_db.count = -1;
+    m_db.answer = false;
+    int count = 99;
+    EXPECT_FALSE(m_helper.GetTotalCount("select count(*) from OperLog", count));
+    EXPECT_EQ(count, 0);
+    EXPECT_EQ(m_db.calls.front(), (Call{"count was", "0"}));
+}
+
+TEST_F(DBHelperTest, AFailedCountKeepsWhatThePluginStored) {
+    m_db.count = 5;
+    m_db.answer = false;
+    int count = 99;
+    EXPECT_FALSE(m_helper.GetTotalCount("select count(*) from OperLog", count));
+    EXPECT_EQ(count, 5);
+}
+
+TEST_F(DBHelperTest, ThePluginsExceptionsGoToTheCaller) {
+    m_db.throws = Throws::Std;
+    Rows rows;
+    int count = 0;
+    EXPECT_THROW(m_helper.ExecSql("a"), std::runtime_error);
+    EXPECT_THROW(m_helper.CreateTable("a"), std::runtime_error);
+    EXPECT_THROW(m_helper.QuerySql("a", rows), std::runtime_error);
+    EXPECT_THROW(m_helper.BatExecSql({"a"}), std::runtime_error);
+    EXPECT_THROW(m_helper.GetTotalCount("a", count), std::runtime_error);
+    EXPECT_THAT(FakeLogger().Records(), IsEmpty());
+}
+
+TEST(DBHelperDeathTest, ACountWithoutAPluginIsACrashAndNotAZero) {
+    int count = 0;
+    EXPECT_DEATH(DBHelper::instance().GetTotalCount("select 1", count), "");
+}

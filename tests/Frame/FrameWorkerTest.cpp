@@ -1,0 +1,230 @@
+#include "Frame/FrameWorker.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "App/ReportServer.h"
+#include "Frame/DBHelper.h"
+#include "SystemTool/CommonTool.h"
+#include "tests/fakes/FakeLogger.h"
+#include "tests/fakes/FakeSqlite.h"
+
+using namespace SyncServiceReport;
+using ::testing::AllOf;
+using ::testing::ElementsAre;
+using ::testing::Field;
+using ::testing::HasSubstr;
+using ::testing::IsEmpty;
+
+namespace {
+
+using Call = FakeSqliteState::Call;
+
+class FrameWorkerTest : public ::testing::Test {
+protected:
+    FrameWorkerTest() { m_server.InitBaseInfo(); }
+    ~FrameWorkerTest() override { DBHelper::instance().Init(nullptr); }
+
+    static auto Record(int level, const std::string& function, const std::string& message) {
+        return AllOf(Field(&LogRecord::level, level), Field(&LogRecord::file, "Frame/FrameWorker"),
+                     Field(&LogRecord::function, function), Field(&LogRecord::message, message));
+    }
+
+    /// Initialises with the rows that BaseInfo has.
+    void InitWith(std::vector<std::vector<std::string>> rows) {
+        m_db.rows = std::move(rows);
+        EXPECT_TRUE(m_worker.Init());
+    }
+
+    std::string LastStatement() const { return m_db.calls.back().argument; }
+
+    FakeSqliteState& m_db = FakeSqlite();
+    ReportServer m_server;
+    FrameWorker m_worker{&m_server};
+};
+
+ST_OptLog Log(const std::string& eventID, const std::string& value, const std::string& createTime,
+              int pType) {
+    ST_OptLog log;
+    log.eventID = eventID;
+    log.value = value;
+    log.createTime = createTime;
+    log.pType = pType;
+    return log;
+}
+
+} // namespace
+
+TEST_F(FrameWorkerTest, InitOpensTheUsersDatabaseAndReadsTheBaseInformation) {
+    EXPECT_TRUE(m_worker.Init());
+    EXPECT_THAT(m_db.calls, ElementsAre(Call{"Open", SystemTool::CommonTool::GetUserDataDir() +
+                                                         "/hublink/database/Report.db"},
+                                        Call{"QuerySql", "select key ,value from BaseInfo ;"}));
+    EXPECT_THAT(FakeLogger().Records(), ElementsAre(Record(2, "Init", "FrameWorker load success")));
+}
+
+TEST_F(FrameWorkerTest, ADatabaseThatDoesNotOpenIsNoFailureOfInit) {
+    m_db.answers = {false};
+    EXPECT_TRUE(m_worker.Init());
+    EXPECT_THAT(FakeLogger().RecordsOf("Init"), ElementsAre(Record(2, "Init", "FrameWorker load success")));
+}
+
+TEST_F(FrameWorkerTest, APluginThatMakesNoObjectIsLogged) {
+    m_db.createsNothing = true;
+    EXPECT_FALSE(m_worker.Init());
+    EXPECT_THAT(
+        FakeLogger().Records(),
+        ElementsAre(Record(4, "Init",
+                           "Failed to load sqlite plugin:" +
+                               SystemTool::IO::Directory::GetExcutableDirectory() + "libOrvekSqlite.dylib")));
+    FakeLogger().Clear();
+    EXPECT_FALSE(m_worker.Send(Log("B1", "v", "1", 1)));
+    EXPECT_THAT(FakeLogger().Records(), IsEmpty());
+}
+
+TEST_F(FrameWorkerTest, InitLogsEachKindOfException) {
+    m_db.throws = Throws::Poco;
+    EXPECT_FALSE(m_worker.Init());
+    m_db.throws = Throws::Std;
+    EXPECT_FALSE(m_worker.Init());
+    m_db.throws = Throws::Other;
+    EXPECT_FALSE(m_worker.Init());
+    EXPECT_THAT(FakeLogger().Records(),
+                ElementsAre(Record(3, "Init", "Poco exception :I/O error: scripted "),
+                            Record(3, "Init", "Std exception :scripted "),
+                            AllOf(Field(&LogRecord::level, 3),
+                                  Field(&LogRecord::message, ::testing::StartsWith("Unknown exception :")))));
+}
+
+TEST_F(FrameWorkerTest, SendsBeforeInitFailSilently) {
+    EXPECT_FALSE(m_worker.Send(Log("B1", "v", "1", 1)));
+    EXPECT_THAT(m_db.calls, IsEmpty());
+    EXPECT_THAT(FakeLogger().Records(), IsEmpty());
+}
+
+TEST_F(FrameWorkerTest, StoredUserAndVersionBecomeTheServersAndStandInLaterRows) {
+    InitWith({{"OpenID", "u1"}, {"HubLinkVersion", "5.1.0.2"}, {"Other", "ignored"}});
+    EXPECT_EQ(m_server.GetBaseInfo().openID, "u1");
+    EXPECT_EQ(m_server.GetBaseInfo().suiteVersion, "5.1.0.2");
+    EXPECT_TRUE(m_worker.Send(Log("B100|1", R"({"a":1})", "1700000000000", 0)));
+    EXPECT_EQ(LastStatement(), "insert into OperLog (eventID,value,createTime,pType,extData3,extData4) "
+                               R"(values('B100|1', '{"a":1}','1700000000000',0,'5.1.0.2','u1'))");
+}
+
+TEST_F(FrameWorkerTest, AMissingVersionPassesItsDefaultOn) {
+    ST_BaseInfo known;
+    known.suiteVersion = "9.9.9.9";
+    m_server.SetBaseInfo(known);
+    InitWith({{"OpenID", "u1"}});
+    EXPECT_EQ(m_server.GetBaseInfo().openID, "u1");
+    EXPECT_EQ(m_server.GetBaseInfo().suiteVersion, "3.0.0.0");
+}
+
+TEST_F(FrameWorkerTest, AMissingUserPassesItsDefaultOn) {
+    ST_BaseInfo known;
+    known.openID = "u9";
+    m_server.SetBaseInfo(known);
+    InitWith({{"HubLinkVersion", "5.1.0.2"}});
+    EXPECT_EQ(m_server.GetBaseInfo().openID, "visitor");
+}
+
+TEST_F(FrameWorkerTest, OfRowsWithTheSameKeyTheLaterCounts) {
+    InitWith({{"OpenID", "u1"}, {"OpenID", "u2"}});
+    EXPECT_EQ(m_server.GetBaseInfo().openID, "u2");
+}
+
+TEST_F(FrameWorkerTest, KeysAreCaseSensitive) {
+    InitWith({{"openid", "u1"}, {"HUBLINKVERSION", "5"}});
+    EXPECT_EQ(m_server.GetBaseInfo().openID, "visitor");
+    EXPECT_EQ(m_server.GetBaseInfo().suiteVersion, "3.0.0.0");
+}
+
+TEST_F(FrameWorkerTest, AnEmptyStoredTextLeavesTheServersAlone) {
+    ST_BaseInfo known;
+    known.openID = "u9";
+    m_server.SetBaseInfo(known);
+    InitWith({{"OpenID", ""}});
+    EXPECT_EQ(m_server.GetBaseInfo().openID, "u9");
+}
+
+TEST_F(FrameWorkerTest, WithoutARowTheServerIsNotCalled) {
+    InitWith({});
+    EXPECT_THAT(FakeLogger().RecordsOf("SetBaseInfo"), IsEmpty());
+}
+
+TEST_F(FrameWorkerTest, AFailedQueryDoesNotCallTheServer) {
+    m_db.rows = {{"OpenID", "u1"}};
+    m_db.answers = {true, false};
+    EXPECT_TRUE(m_worker.Init());
+    EXPECT_THAT(FakeLogger().RecordsOf("SetBaseInfo"), IsEmpty());
+    EXPECT_EQ(FakeLogger().RecordsOf("QuerySql").size(), 1U);
+}
+
+TEST_F(FrameWorkerTest, ALaterUserStandsInLaterRows) {
+    InitWith({});
+    EXPECT_TRUE(m_worker.Send(Log("B", "", "", 1)));
+    EXPECT_THAT(LastStatement(), HasSubstr("values('B', '','',1,'3.0.0.0','visitor')"));
+    ST_BaseInfo info;
+    info.openID = "u7";
+    info.suiteVersion = "7";
+    m_server.SetBaseInfo(info);
+    EXPECT_TRUE(m_worker.Send(Log("B", "", "", 1)));
+    EXPECT_THAT(LastStatement(), HasSubstr("values('B', '','',1,'7','u7')"));
+}
+
+TEST_F(FrameWorkerTest, TextsGoIntoTheStatementAsTheyAre) {
+    InitWith({});
+    EXPECT_TRUE(m_worker.Send(Log("100%s'", "it's %d", "\\", 1)));
+    EXPECT_THAT(LastStatement(), HasSubstr("values('100%s'', 'it's %d','\\',1,"));
+}
+
+TEST_F(FrameWorkerTest, AZeroByteStaysInTheStatement) {
+    InitWith({});
+    EXPECT_TRUE(m_worker.Send(Log("B", std::string("a\0b", 3), "", 1)));
+    EXPECT_THAT(LastStatement(), HasSubstr(std::string("'a\0b'", 5)));
+}
+
+TEST_F(FrameWorkerTest, ARejectedStatementIsLoggedOnceAndNotRetried) {
+    InitWith({});
+    m_db.answers = {false};
+    EXPECT_FALSE(m_worker.Send(Log("B", "it's", "", 1)));
+    EXPECT_EQ(FakeLogger().RecordsOf("ExecSql").size(), 1U);
+    EXPECT_EQ(FakeLogger().RecordsOf("ExecSql").front().message, "scripted error-" + LastStatement());
+    EXPECT_TRUE(m_worker.Send(Log("B", "its", "", 1))) << "the next record is stored normally";
+}
+
+TEST_F(FrameWorkerTest, SendLogsEachKindOfException) {
+    InitWith({});
+    FakeLogger().Clear();
+    for (const Throws what : {Throws::Poco, Throws::Std, Throws::Other}) {
+        m_db.throws = what;
+        EXPECT_FALSE(m_worker.Send(Log("B", "", "", 1)));
+    }
+    EXPECT_THAT(FakeLogger().Records(),
+                ElementsAre(Record(3, "Send", "Poco exception :I/O error: scripted "),
+                            Record(3, "Send", "Std exception :scripted "),
+                            AllOf(Field(&LogRecord::level, 3),
+                                  Field(&LogRecord::message, ::testing::StartsWith("Unknown exception :")))));
+}
+
+TEST_F(FrameWorkerTest, AnInitThatFailsAfterOpeningLeavesTheDatabaseInUse) {
+    m_db.throwsIn = "QuerySql";
+    m_db.throws = Throws::Std;
+    EXPECT_FALSE(m_worker.Init());
+    EXPECT_TRUE(m_worker.Send(Log("B", "", "", 1)));
+}
+
+TEST_F(FrameWorkerTest, ReadingTheBaseInformationHasNoGuardOfItsOwn) {
+    InitWith({});
+    m_db.throws = Throws::Std;
+    EXPECT_THROW(m_worker.SetUserBaseInfo(), std::runtime_error);
+}
+
+TEST_F(FrameWorkerTest, DestructionGivesTheDatabaseBack) {
+    {
+        FrameWorker worker(&m_server);
+        EXPECT_TRUE(worker.Init());
+    }
+    EXPECT_EQ(m_db.created, 1);
+    EXPECT_EQ(m_db.destroyed, 1);
+}
