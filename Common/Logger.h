@@ -1,13 +1,12 @@
 #pragma once
 
-#include <stdexcept>
 #include <string>
 #include <string_view>
 
 #include <Poco/Error.h>
 #include <Poco/Exception.h>
-#include <boost/format.hpp>
 
+#include "Common/LogText.h"
 #include "Plugin/ILogger.h"
 #include "Plugin/ModuleLoader.h"
 
@@ -31,11 +30,6 @@ enum class LogLevel : int {
     Error = 4,   ///< Failures, the crash trace, and texts that could not be built.
 };
 
-/// A text over this size counts as one that cannot be built. A datagram is a format string by design, so one
-/// of twenty bytes may ask for a tabulation to column 2,000,000,000; it must cost a log line and not
-/// gigabytes.
-inline constexpr std::size_t MAX_LOG_TEXT_BYTES = 1024 * 1024;
-
 /// Where a record comes from. The source file is the calling one by itself, as its folder and stem. The line
 /// is fixed where people look for it by number, else the site's own.
 struct LogSite {
@@ -54,20 +48,6 @@ struct LogSite {
         return path.substr(folder, path.rfind('.') - folder);
     }
 };
-
-/// The text that `format` gives with `arguments`. Throws what boost::format throws for a format that does not
-/// fit, and std::length_error for a text over MAX_LOG_TEXT_BYTES, before that is built.
-template <typename... Arguments>
-std::string BuildLogText(const std::string& format, const Arguments&... arguments) {
-    boost::format text(format);
-    (static_cast<void>(text % arguments), ...);
-    // A format that lacks arguments is left to boost::format, whose own words are the better ones.
-    if (text.remaining_args() == 0 && text.size() > MAX_LOG_TEXT_BYTES)
-        throw std::length_error("the text would have " + std::to_string(text.size()) +
-                                " bytes, more than the " + std::to_string(MAX_LOG_TEXT_BYTES) +
-                                " of a log record");
-    return text.str();
-}
 
 /// Writes one log line. `format` may be a text from outside; that is required behaviour: a percent sign in
 /// it, where boost::format cannot make sense of it, gives an Error line of "[BoostLogError]" and the reason

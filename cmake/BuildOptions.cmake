@@ -28,4 +28,7 @@ if(SSR_SANITIZE)
     target_compile_options(ssr_options INTERFACE -fsanitize=${SSR_SANITIZE} -fno-sanitize-recover=all
         -fno-omit-frame-pointer)
     target_link_options(ssr_options INTERFACE -fsanitize=${SSR_SANITIZE})
+    add_library(ssr_sanitizer_options OBJECT ${CMAKE_CURRENT_LIST_DIR}/SanitizerOptions.cpp)
+    target_sources(ssr_options INTERFACE
+        $<$<STREQUAL:$<TARGET_PROPERTY:TYPE>,EXECUTABLE>:$<TARGET_OBJECTS:ssr_sanitizer_options>>)
 endif()

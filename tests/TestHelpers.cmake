@@ -22,11 +22,5 @@ function(ssr_add_test name)
         set_property(TARGET ${name} PROPERTY CROSSCOMPILING_EMULATOR ${PROJECT_SOURCE_DIR}/tests/in-sandbox)
     endif()
     gtest_discover_tests(${name} TEST_PREFIX ${name}. WORKING_DIRECTORY ${folder} DISCOVERY_TIMEOUT 60
-        PROPERTIES TIMEOUT 120 ENVIRONMENT "${SSR_TEST_ENVIRONMENT}")
+        PROPERTIES TIMEOUT 120)
 endfunction()
-
-# What the sanitizers are told; harmless without them.
-list(APPEND SSR_TEST_ENVIRONMENT
-    "ASAN_OPTIONS=detect_stack_use_after_return=1:allocator_may_return_null=1"
-    "UBSAN_OPTIONS=print_stacktrace=1"
-    "TSAN_OPTIONS=suppressions=${CMAKE_CURRENT_SOURCE_DIR}/tsan.supp:second_deadlock_stack=1")

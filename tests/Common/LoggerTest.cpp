@@ -95,6 +95,13 @@ TEST(WriteLog, BuildsNoGigabytesFromATabulationInAnySpelling) {
     EXPECT_LT(std::chrono::steady_clock::now() - begin, std::chrono::seconds(5)) << "nothing was built";
 }
 
+TEST(WriteLog, LeavesLongNumbersThatBelongToNoDirectiveAlone) {
+    for (const std::string text :
+         {"1234567890123", "%% 1234567890123", "a%|3t|1234567890123", "%%%%9999999999"})
+        EXPECT_EQ(Logged(text).level, 2) << text;
+    EXPECT_EQ(Logged("a%|0000000000005t|b"), Plain("a    b")) << "leading zeros make no large number";
+}
+
 TEST(WriteLog, BoundsATextOfManyTabulations) {
     std::string format;
     for (int column = 1; column <= 200; ++column)
