@@ -1,0 +1,104 @@
+// The plug-in libBoostLogger.dylib: the ILogger that its two exports hand out, and the process's one sink.
+
+#include <atomic>
+#include <filesystem>
+#include <memory>
+#include <mutex>
+#include <string>
+
+#include <boost/exception/info.hpp>
+
+#include "Modules/BoostLogger/LogSink.h"
+#include "Plugin/ILogger.h"
+#include "SystemTool/BSException.h"
+
+namespace BoostLogger {
+
+namespace {
+
+using SystemTool::BSErrorText;
+using SystemTool::BSException;
+
+/// Null until configured; then the sink for the rest of the process.
+std::atomic<LogSink*> g_sink = nullptr;
+
+std::mutex g_configuring;                ///< Guards g_settings, and lets one InitLog run at a time.
+const LogSettings* g_settings = nullptr; ///< Those of g_sink.
+
+[[noreturn]] void Refuse(const LogSettings& settings, const std::string& reason,
+                         const std::string& systemText) {
+    throw BSException(settings.application + " " + settings.module + " has no log: " + reason)
+        << BSErrorText(systemText);
+}
+
+void CheckSettings(const LogSettings& settings) {
+    if (settings.directory.empty())
+        Refuse(settings, "the log directory's name is empty.", "");
+    if (settings.fileName.empty() || settings.fileName.find('/') != std::string::npos ||
+        settings.fileName == "." || settings.fileName == ".." ||
+        settings.LivePath().find('\0') != std::string::npos)
+        Refuse(settings, "\"" + settings.fileName + "\" is no name of a file.", "");
+    if (settings.maxFileBytes <= 0 || settings.maxTotalBytes < settings.maxFileBytes)
+        Refuse(settings, "one file must be allowed a byte at least, and all files together as much as one.",
+               "");
+}
+
+/// The sink is leaked on purpose, see LogSink.
+void StartSink(const LogSettings& settings) {
+    auto sink = std::make_unique<LogSink>(settings);
+    if (const FileFailure failure = sink->Start())
+        Refuse(
+            settings,
+            failure.Text() + ", " + settings.LivePath() +
+                ". Make sure that this user may write there and that the disk is not full, then start again.",
+            failure.Text());
+    g_settings = new LogSettings(settings);
+    g_sink.store(sink.release(), std::memory_order_release);
+}
+
+/// The same settings again are no error: whoever asks for the log that there is has it.
+void Configure(const LogSettings& settings) {
+    CheckSettings(settings);
+    const std::lock_guard lock(g_configuring);
+    if (g_settings == nullptr)
+        return StartSink(settings);
+    if (!(*g_settings == settings))
+        Refuse(settings, "this process logs to " + g_settings->LivePath() + " already, with other settings.",
+               "");
+}
+
+class Logger final : public SystemTool::IO::ILogger {
+public:
+    void InitLog(const std::string& logDir, const std::string& fileName, const std::string& appName,
+                 const std::string& moduleName, std::int64_t maxFileBytes, std::int64_t maxTotalBytes,
+                 int flushEach, int console) override {
+        std::error_code none;
+        const std::string directory =
+            logDir.empty() ? logDir : std::filesystem::absolute(logDir, none).string();
+        Configure({directory, fileName, appName, moduleName, maxFileBytes, maxTotalBytes, flushEach != 0,
+                   console != 0});
+    }
+
+    void WriteLog(int level, const std::string& tag, const std::string& file, const std::string& function,
+                  int line, const std::string& message, int /*reserved*/) override {
+        if (LogSink* sink = g_sink.load(std::memory_order_acquire))
+            sink->Write({level, tag, file, function, line, message});
+    }
+};
+
+/// The object that every loader gets. It has no state, so that one serves all; and it is never destroyed,
+/// because the loaders are destroyed by exit() while other threads still call it.
+Logger& TheLogger() {
+    static Logger* const logger = new Logger;
+    return *logger;
+}
+
+} // namespace
+
+} // namespace BoostLogger
+
+extern "C" __attribute__((visibility("default"))) SystemTool::IO::ILogger* CreateModule() {
+    return &BoostLogger::TheLogger();
+}
+
+extern "C" __attribute__((visibility("default"))) void DestoryModule(SystemTool::IO::ILogger*) {}

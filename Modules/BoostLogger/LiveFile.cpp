@@ -1,0 +1,124 @@
+#include "Modules/BoostLogger/LiveFile.h"
+
+#include <cerrno>
+#include <chrono>
+#include <thread>
+
+#include <fcntl.h>
+#include <sys/file.h>
+#include <sys/stat.h>
+#include <sys/uio.h>
+#include <unistd.h>
+
+namespace BoostLogger {
+
+namespace {
+
+constexpr mode_t DIRECTORY_MODE = 0700;
+constexpr mode_t FILE_MODE = 0600;
+
+/// The other process holds the lock for one rename and a few unlinks; where it takes longer it is stopped or
+/// its disk hangs, and then the caller must not hang with it.
+constexpr int LOCK_ATTEMPTS = 20;
+constexpr std::chrono::milliseconds LOCK_PAUSE{1};
+
+} // namespace
+
+FileFailure MakeDirectory(const std::string& path) {
+    for (std::size_t end = path.find('/', 1);; end = path.find('/', end + 1)) {
+        const std::string part = path.substr(0, end);
+        if (mkdir(part.c_str(), DIRECTORY_MODE) == 0)
+            chmod(part.c_str(), DIRECTORY_MODE); // for a umask that takes the owner's own rights away
+        else if (struct stat status{}; stat(part.c_str(), &status) != 0)
+            return {errno, "make the directory"};
+        else if (!S_ISDIR(status.st_mode))
+            return {ENOTDIR, "make the directory"};
+        if (end == std::string::npos)
+            return {};
+    }
+}
+
+FileFailure LiveFile::Open(const std::string& path) {
+    Close();
+    // O_NOFOLLOW: a link planted under the log's name must not have another file of the user's appended to.
+    // O_NONBLOCK: the open of a pipe must fail and not wait for its reader; regular files ignore it.
+    // Readable, for the look at the last byte.
+    m_descriptor =
+        open(path.c_str(), O_RDWR | O_APPEND | O_CREAT | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK | O_NOCTTY,
+             FILE_MODE);
+    if (!IsOpen())
+        return {errno, "open the file"};
+    const FileFailure failure = Examine();
+    if (failure)
+        Close();
+    return failure;
+}
+
+FileFailure LiveFile::Examine() {
+    struct stat status {};
+    if (fstat(m_descriptor, &status) != 0)
+        return {errno, "examine the file"};
+    if (!S_ISREG(status.st_mode))
+        return {EINVAL, "use what is no regular file"};
+    if ((status.st_mode & 07777) != FILE_MODE)
+        static_cast<void>(
+            fchmod(m_descriptor, FILE_MODE)); // fails on another user's file, which may be written to
+    m_sizeBytes = status.st_size;
+    char last = '\n';
+    m_endsInHalfLine = m_sizeBytes > 0 && pread(m_descriptor, &last, 1, m_sizeBytes - 1) == 1 && last != '\n';
+    return {};
+}
+
+bool LiveFile::IsGoneFrom(const std::string& path) const {
+    struct stat there {};
+    struct stat ours {};
+    if (lstat(path.c_str(), &there) != 0)
+        return errno == ENOENT || errno == ENOTDIR;
+    return fstat(m_descriptor, &ours) == 0 && (ours.st_ino != there.st_ino || ours.st_dev != there.st_dev);
+}
+
+FileFailure LiveFile::Append(std::string_view line) {
+    char newline = '\n';
+    // writev takes its texts through pointers to non-const and does not change them.
+    iovec parts[] = {{&newline, 1}, {const_cast<char*>(line.data()), line.size()}};
+    const bool mends = m_endsInHalfLine;
+    const std::size_t size = line.size() + (mends ? 1 : 0);
+    ssize_t written = 0;
+    do {
+        written = mends ? writev(m_descriptor, parts, 2) : write(m_descriptor, line.data(), line.size());
+    } while (written < 0 && errno == EINTR);
+    if (written < 0)
+        return {errno, "write to the file"};
+    // Not a sum of our own: the offset after an append is the file's end, with what other processes appended.
+    m_sizeBytes = lseek(m_descriptor, 0, SEEK_CUR);
+    if (static_cast<std::size_t>(written) == size) {
+        m_endsInHalfLine = false;
+        return {};
+    }
+    // Cutting the half line off again could cut off what another process appended after it.
+    m_endsInHalfLine = written > (mends ? 1 : 0) || (written == 0 && mends);
+    return {ENOSPC, "write a whole line to the file"};
+}
+
+FileFailure LiveFile::Lock() {
+    for (int attempt = 0; attempt < LOCK_ATTEMPTS; ++attempt) {
+        if (flock(m_descriptor, LOCK_EX | LOCK_NB) == 0)
+            return {};
+        if (errno != EWOULDBLOCK && errno != EINTR)
+            break;
+        std::this_thread::sleep_for(LOCK_PAUSE);
+    }
+    return {errno, "lock the file for its rotation"};
+}
+
+void LiveFile::Unlock() {
+    flock(m_descriptor, LOCK_UN);
+}
+
+void LiveFile::Close() {
+    if (IsOpen())
+        close(m_descriptor);
+    m_descriptor = -1;
+}
+
+} // namespace BoostLogger

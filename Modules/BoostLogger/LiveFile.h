@@ -1,0 +1,57 @@
+#pragma once
+
+#include <cstdint>
+#include <string>
+#include <string_view>
+
+#include "Modules/BoostLogger/FileFailure.h"
+
+namespace BoostLogger {
+
+/// Makes the directory and its missing parents, each with mode 0700 whatever the umask. What exists keeps its
+/// mode: it may hold other things than this log.
+FileFailure MakeDirectory(const std::string& path);
+
+/// The descriptor of the file that records go to, opened for appending; several processes may have the same
+/// file open. Threads: one at a time.
+class LiveFile {
+public:
+    LiveFile() = default;
+    ~LiveFile() { Close(); }
+    LiveFile(const LiveFile&) = delete;
+    LiveFile& operator=(const LiveFile&) = delete;
+
+    /// Opens, or makes, the file with mode 0600 whatever the umask; one with a wider mode is narrowed, since
+    /// the records hold what users do. Symbolic links and anything but a regular file are refused. What was
+    /// open before is closed, its lock given up, whether this succeeds or not.
+    FileFailure Open(const std::string& path);
+
+    bool IsOpen() const { return m_descriptor >= 0; }
+
+    /// Whether `path` is known to be another file by now, or none: it was rotated by another process or
+    /// deleted.
+    bool IsGoneFrom(const std::string& path) const;
+
+    /// The size of the file after this object's last operation, with what other processes appended until
+    /// then.
+    std::int64_t SizeBytes() const { return m_sizeBytes; }
+
+    /// Appends the line, which ends in a newline, with one system call: it is in the file, as a whole and not
+    /// torn by other writers, when this returns. Where only a part of it could be written, the next line
+    /// starts with a newline, so that the two are not glued together.
+    FileFailure Append(std::string_view line);
+
+    /// The exclusive lock that is held while the file is rotated, until Unlock or Close. Waits 20 ms at most.
+    FileFailure Lock();
+    void Unlock();
+    void Close();
+
+private:
+    FileFailure Examine();
+
+    int m_descriptor = -1;
+    std::int64_t m_sizeBytes = 0;
+    bool m_endsInHalfLine = false;
+};
+
+} // namespace BoostLogger

@@ -1,0 +1,134 @@
+#include "Modules/BoostLogger/LogWriter.h"
+
+#include <string>
+
+#include "Modules/BoostLogger/RecordLine.h"
+
+namespace BoostLogger {
+
+namespace {
+
+/// A full disk fails each of 300,000 attempts a second as well as it fails four.
+constexpr std::chrono::milliseconds RETRY_INTERVAL{250};
+
+/// Between two looks at the path, lines may go into a file that was deleted or that another process has
+/// rotated away. A look before each line would cost a third of the line.
+constexpr std::chrono::milliseconds LOOK_INTERVAL{100};
+
+constexpr int WARNING = 3;
+
+/// Set while this thread holds the writer's lock. The crash handler logs on the thread that crashed: should
+/// that ever be in here, its records must be lost and not wait for ever.
+thread_local bool t_isInside = false;
+
+struct Inside {
+    Inside() { t_isInside = true; }
+    ~Inside() { t_isInside = false; }
+};
+
+} // namespace
+
+LogWriter::LogWriter(const LogSettings& settings)
+    : m_settings(settings), m_path(settings.LivePath()), m_rotated(settings.directory, settings.fileName) {}
+
+FileFailure LogWriter::Start() {
+    const std::lock_guard lock(m_mutex);
+    if (const FileFailure failure = Reopen())
+        return failure;
+    if (!m_live.Lock()) {
+        Prune();
+        m_live.Unlock();
+    }
+    return {};
+}
+
+void LogWriter::Append(std::string_view line, TimePoint now) noexcept {
+    if (t_isInside)
+        return CountLost();
+    const std::lock_guard lock(m_mutex);
+    const Inside inside;
+    try {
+        AppendLocked(line, now);
+    } catch (...) { // no memory for the list of rotated files
+        CountLost();
+    }
+}
+
+void LogWriter::AppendLocked(std::string_view line, TimePoint now) {
+    if (m_losing && now < m_nextAttempt)
+        return CountLost();
+    const FileFailure failure = Deliver(line, now);
+    m_losing = static_cast<bool>(failure);
+    if (!m_losing)
+        return;
+    CountLost();
+    m_failure = failure;
+    m_nextAttempt = now + RETRY_INTERVAL;
+}
+
+FileFailure LogWriter::Deliver(std::string_view line, TimePoint now) {
+    if (const FileFailure failure = FollowPath(now))
+        return failure;
+    if (m_lost.load(std::memory_order_relaxed) > 0)
+        if (const FileFailure failure = ReportLoss())
+            return failure;
+    return Put(line);
+}
+
+FileFailure LogWriter::FollowPath(TimePoint now) {
+    if (m_live.IsOpen() && now < m_nextLook)
+        return {};
+    m_nextLook = now + LOOK_INTERVAL;
+    return m_live.IsOpen() && !m_live.IsGoneFrom(m_path) ? FileFailure{} : Reopen();
+}
+
+FileFailure LogWriter::Reopen() {
+    m_live.Close();
+    if (const FileFailure failure = MakeDirectory(m_settings.directory))
+        return failure;
+    return m_live.Open(m_path);
+}
+
+FileFailure LogWriter::ReportLoss() {
+    const std::uint64_t lost = m_lost.load(std::memory_order_relaxed);
+    const std::string reason = m_failure ? m_failure.Text() : "out of memory";
+    const std::string message = std::to_string(lost) + " records could not be written: " + reason;
+    LineBuffer line;
+    ComposeLine(line, {WARNING, "", "Modules/BoostLogger", "ReportLoss", __LINE__, message},
+                std::chrono::system_clock::now());
+    if (const FileFailure failure = Put(TextOf(line)))
+        return failure;
+    m_lost.fetch_sub(lost, std::memory_order_relaxed);
+    m_failure = {};
+    return {};
+}
+
+FileFailure LogWriter::Put(std::string_view line) {
+    const auto size = static_cast<std::int64_t>(line.size());
+    if (m_live.SizeBytes() > 0 && m_live.SizeBytes() + size > m_settings.maxFileBytes)
+        if (const FileFailure failure = Rotate())
+            return failure;
+    return m_live.Append(line);
+}
+
+/// The lock is the live file's own: whoever waited for it finds that the path is another file by then, which
+/// means that the rotation is done already. Opening the new file gives the lock up.
+FileFailure LogWriter::Rotate() {
+    if (const FileFailure failure = m_live.Lock())
+        return failure;
+    if (!m_live.IsGoneFrom(m_path)) {
+        if (const FileFailure failure = m_rotated.TakeIn(m_path)) {
+            m_live.Unlock();
+            return failure;
+        }
+        Prune();
+    }
+    return Reopen();
+}
+
+void LogWriter::Prune() {
+    // The live file may grow to its full size until the next rotation, so that much is not to be had.
+    m_rotated.Prune(m_settings.maxTotalBytes - m_settings.maxFileBytes);
+}
+
+} // namespace BoostLogger

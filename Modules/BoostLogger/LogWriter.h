@@ -1,0 +1,62 @@
+#pragma once
+
+#include <atomic>
+#include <chrono>
+#include <cstdint>
+#include <mutex>
+#include <string_view>
+
+#include "Modules/BoostLogger/LiveFile.h"
+#include "Modules/BoostLogger/LogSettings.h"
+#include "Modules/BoostLogger/RotatedFiles.h"
+
+namespace BoostLogger {
+
+/// Puts lines into the log's files: rotation, the cap on all files, and the life of the log when the disk
+/// fails:
+///
+///   writing → (a step fails) → losing: lines are counted and dropped, one attempt a quarter of a second
+///           → (an attempt succeeds) → a record tells how many were lost and why → writing
+///
+/// Threads: Append and CountLost from any. Append blocks for no longer than the file system does, and 20 ms
+/// where another process rotates at the same moment.
+class LogWriter {
+public:
+    using TimePoint = std::chrono::steady_clock::time_point;
+
+    explicit LogWriter(const LogSettings& settings);
+
+    /// Makes the directory, opens the live file and deletes what an older, larger cap has left.
+    FileFailure Start();
+
+    /// Appends one line, its newline included. When this returns the line is in the file and survives the end
+    /// of this process, or it is counted as lost.
+    void Append(std::string_view line, TimePoint now) noexcept;
+
+    /// Counts a record that was lost before it became a line.
+    void CountLost() noexcept { m_lost.fetch_add(1, std::memory_order_relaxed); }
+
+private:
+    void AppendLocked(std::string_view line, TimePoint now);
+    FileFailure Deliver(std::string_view line, TimePoint now);
+    FileFailure FollowPath(TimePoint now);
+    FileFailure Reopen();
+    FileFailure ReportLoss();
+    FileFailure Put(std::string_view line);
+    FileFailure Rotate();
+    void Prune();
+
+    const LogSettings m_settings;
+    const std::string m_path;
+    std::atomic<std::uint64_t> m_lost = 0;
+
+    std::mutex m_mutex; ///< Guards everything below, and the order of lines in the file.
+    LiveFile m_live;
+    RotatedFiles m_rotated;
+    TimePoint m_nextLook;    ///< When to see next whether the path still is our file.
+    TimePoint m_nextAttempt; ///< After a failure; before that everything is dropped.
+    FileFailure m_failure;   ///< The last one; kept after it for the record that reports the loss.
+    bool m_losing = false;
+};
+
+} // namespace BoostLogger

@@ -1,0 +1,19 @@
+#pragma once
+
+#include <chrono>
+#include <cstddef>
+
+#include "Modules/BoostLogger/LineBuffer.h"
+#include "Modules/BoostLogger/LogRecord.h"
+
+namespace BoostLogger {
+
+/// A longer message is cut. The largest datagram has 10 KiB; whatever is beyond this belongs into no log.
+inline constexpr std::size_t MAX_MESSAGE_BYTES = 64 * 1024;
+
+/// Appends the whole line of `record`, its newline included:
+///   2026-11-20 10:15:30.123 INFO  [pid:tid] [App/ReportServer:42 Recv] message
+/// The time is local. A tag that is not empty follows the function as " #tag".
+void ComposeLine(LineBuffer& line, const LogRecord& record, std::chrono::system_clock::time_point now);
+
+} // namespace BoostLogger
