@@ -1,6 +1,5 @@
 #include "Modules/BoostLogger/EscapedText.h"
 
-#include <algorithm>
 #include <cstdint>
 
 namespace BoostLogger {
@@ -118,10 +117,9 @@ std::string_view CutAtCharacter(std::string_view text, std::size_t maxBytes) {
     if (text.size() <= maxBytes)
         return text;
     constexpr std::size_t LONGEST = 4;
-    const std::size_t lowest = maxBytes - std::min(maxBytes, LONGEST - 1);
-    for (std::size_t end = maxBytes; end >= lowest && end > 0; --end)
-        if (!IsContinuation(static_cast<Byte>(text[end])))
-            return text.substr(0, end);
+    for (std::size_t back = 0; back < LONGEST && back <= maxBytes; ++back)
+        if (!IsContinuation(static_cast<Byte>(text[maxBytes - back])))
+            return text.substr(0, maxBytes - back);
     return text.substr(0, maxBytes); // no UTF-8 at all there, so that no place is better than another
 }
 

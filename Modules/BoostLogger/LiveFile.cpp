@@ -64,9 +64,20 @@ FileFailure LiveFile::Examine() {
         static_cast<void>(
             fchmod(m_descriptor, FILE_MODE)); // fails on another user's file, which may be written to
     m_sizeBytes = status.st_size;
-    char last = '\n';
-    m_endsInHalfLine = m_sizeBytes > 0 && pread(m_descriptor, &last, 1, m_sizeBytes - 1) == 1 && last != '\n';
+    m_endsInHalfLine = EndsInHalfLine();
     return {};
+}
+
+/// A crash or a full disk leaves half a line, and so does another process's write that is under way: the size
+/// of a file grows page by page. The kernel changes the mode under the lock that a write holds, so after that
+/// the write is done; a size that is still the same belongs to a half line that stays one.
+bool LiveFile::EndsInHalfLine() const {
+    char last = '\n';
+    if (m_sizeBytes == 0 || pread(m_descriptor, &last, 1, m_sizeBytes - 1) != 1 || last == '\n')
+        return false;
+    static_cast<void>(fchmod(m_descriptor, FILE_MODE));
+    struct stat status {};
+    return fstat(m_descriptor, &status) == 0 && status.st_size == m_sizeBytes;
 }
 
 bool LiveFile::IsGoneFrom(const std::string& path) const {

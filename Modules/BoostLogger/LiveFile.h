@@ -48,6 +48,7 @@ public:
 
 private:
     FileFailure Examine();
+    bool EndsInHalfLine() const;
 
     int m_descriptor = -1;
     std::int64_t m_sizeBytes = 0;

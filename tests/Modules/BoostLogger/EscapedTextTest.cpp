@@ -1,0 +1,119 @@
+#include "Modules/BoostLogger/EscapedText.h"
+
+#include <random>
+
+#include <gtest/gtest.h>
+
+using BoostLogger::CutAtCharacter;
+
+namespace {
+
+std::string Escaped(std::string_view text) {
+    BoostLogger::LineBuffer line;
+    BoostLogger::AppendEscaped(line, text);
+    return std::string(BoostLogger::TextOf(line));
+}
+
+std::string Unescaped(const std::string& text) {
+    std::string bytes;
+    for (std::size_t i = 0; i < text.size(); ++i) {
+        if (text[i] != '\\') {
+            bytes += text[i];
+            continue;
+        }
+        switch (text[++i]) {
+        case 'n':
+            bytes += '\n';
+            break;
+        case 'r':
+            bytes += '\r';
+            break;
+        case 't':
+            bytes += '\t';
+            break;
+        case 'x':
+            bytes += static_cast<char>(std::stoi(text.substr(i + 1, 2), nullptr, 16));
+            i += 2;
+            break;
+        default:
+            bytes += text[i];
+        }
+    }
+    return bytes;
+}
+
+} // namespace
+
+TEST(EscapedText, LeavesReadableTextAlone) {
+    const std::string text = "{\"a\": \"Gr\u00fc\u00dfe \u62a5\u544a \U0001F600 \u0628 %s \u00a0~\"}";
+    EXPECT_EQ(Escaped(text), text);
+    EXPECT_EQ(Escaped(""), "");
+}
+
+TEST(EscapedText, KeepsATextOnItsLine) {
+    EXPECT_EQ(Escaped("one\ntwo\r\n\tthree"), "one\\ntwo\\r\\n\\tthree");
+    EXPECT_EQ(Escaped("\u2028 \u2029"), "\\xe2\\x80\\xa8 \\xe2\\x80\\xa9");
+}
+
+TEST(EscapedText, KeepsATextFromDrivingATerminal) {
+    EXPECT_EQ(Escaped("\x1b[2J \a \x7f"), "\\x1b[2J \\x07 \\x7f");
+    EXPECT_EQ(Escaped("\xc2\x9b[2J \xc2\x80"), "\\xc2\\x9b[2J \\xc2\\x80");
+    EXPECT_EQ(Escaped("\u202e \u2066"), "\\xe2\\x80\\xae \\xe2\\x81\\xa6");
+}
+
+TEST(EscapedText, EscapesAZeroByte) {
+    EXPECT_EQ(Escaped(std::string_view("a\0b", 3)), "a\\x00b");
+}
+
+TEST(EscapedText, DoublesABackslashSoThatAnEscapeCannotBeFaked) {
+    EXPECT_EQ(Escaped("a\\nb"), "a\\\\nb");
+}
+
+TEST(EscapedText, EscapesBytesThatAreNoUtf8) {
+    EXPECT_EQ(Escaped("\x80"), "\\x80");                            // a continuation alone
+    EXPECT_EQ(Escaped("\xc3"), "\\xc3");                            // cut off
+    EXPECT_EQ(Escaped("\xe6\x8a."), "\\xe6\\x8a.");                 // cut off within the text
+    EXPECT_EQ(Escaped("\xc0\x8a"), "\\xc0\\x8a");                   // a newline in a longer form
+    EXPECT_EQ(Escaped("\xe0\x80\x8a"), "\\xe0\\x80\\x8a");          // and in a longer one
+    EXPECT_EQ(Escaped("\xed\xa0\x80"), "\\xed\\xa0\\x80");          // a surrogate
+    EXPECT_EQ(Escaped("\xf4\x90\x80\x80"), "\\xf4\\x90\\x80\\x80"); // beyond Unicode
+    EXPECT_EQ(Escaped("\xf0\x8f\xbf\xbf\xff"), "\\xf0\\x8f\\xbf\\xbf\\xff");
+}
+
+TEST(EscapedText, FindsTheOddByteAtAnyPlace) {
+    for (std::size_t place = 0; place < 100; ++place) {
+        std::string text(100, 'a');
+        text[place] = '\n';
+        EXPECT_EQ(Escaped(text), std::string(place, 'a') + "\\n" + std::string(99 - place, 'a'));
+    }
+}
+
+TEST(EscapedText, CanBeTurnedBackIntoTheSameBytesAndEscapingItAgainChangesOnlyBackslashes) {
+    std::mt19937 random(20261120);
+    for (int round = 0; round < 3000; ++round) {
+        std::string bytes(random() % 120, '\0');
+        // Of all bytes, but often such as begin or go on with a character.
+        for (char& byte : bytes)
+            byte = static_cast<char>(random() % 3 == 0 ? random() % 256 : 0x80 + random() % 128);
+        const std::string escaped = Escaped(bytes);
+        EXPECT_EQ(Unescaped(escaped), bytes);
+        std::string again = Escaped(escaped); // whatever is no valid, harmless UTF-8 would be escaped now
+        for (auto at = again.find("\\\\"); at != std::string::npos; at = again.find("\\\\", at + 1))
+            again.erase(at, 1);
+        EXPECT_EQ(again, escaped);
+    }
+}
+
+TEST(CutAtCharacter, NeverCutsWithinACharacter) {
+    EXPECT_EQ(CutAtCharacter("abc", 3), "abc");
+    EXPECT_EQ(CutAtCharacter("abcd", 3), "abc");
+    EXPECT_EQ(CutAtCharacter("ab\u62a5", 4), "ab");
+    EXPECT_EQ(CutAtCharacter("ab\u62a5", 3), "ab");
+    EXPECT_EQ(CutAtCharacter("ab\u62a5", 2), "ab");
+    EXPECT_EQ(CutAtCharacter("a\U0001F600", 4), "a");
+    EXPECT_EQ(CutAtCharacter("\U0001F600", 2), "");
+}
+
+TEST(CutAtCharacter, CutsWhatIsNoUtf8AnywhereAtTheLimit) {
+    EXPECT_EQ(CutAtCharacter("\x80\x80\x80\x80\x80\x80\x80\x80", 6).size(), 6U);
+}

@@ -1,0 +1,113 @@
+#include "Modules/BoostLogger/LiveFile.h"
+
+#include <cerrno>
+
+#include <gtest/gtest.h>
+#include <sys/stat.h>
+
+#include "tests/Modules/BoostLogger/Child.h"
+#include "tests/Modules/BoostLogger/LogFiles.h"
+#include "tests/support/TemporaryDirectory.h"
+
+using BoostLogger::LiveFile;
+using BoostLogger::MakeDirectory;
+
+namespace {
+
+class LiveFileTest : public testing::Test {
+protected:
+    TemporaryDirectory m_directory;
+    const std::string m_path = m_directory.Path() + "/Report.log";
+    LiveFile m_file;
+};
+
+} // namespace
+
+TEST_F(LiveFileTest, AppendsToWhatIsThere) {
+    WriteFile(m_path, "old\n");
+    ASSERT_FALSE(m_file.Open(m_path));
+    EXPECT_EQ(m_file.SizeBytes(), 4);
+    ASSERT_FALSE(m_file.Append("new\n"));
+    EXPECT_EQ(m_file.SizeBytes(), 8);
+    EXPECT_EQ(ReadFile(m_path), "old\nnew\n");
+}
+
+TEST_F(LiveFileTest, SeesHowMuchAnotherWriterAppended) {
+    LiveFile other;
+    ASSERT_FALSE(m_file.Open(m_path));
+    ASSERT_FALSE(other.Open(m_path));
+    ASSERT_FALSE(other.Append("0123456789\n"));
+    ASSERT_FALSE(m_file.Append("x\n"));
+    EXPECT_EQ(m_file.SizeBytes(), 13);
+}
+
+TEST_F(LiveFileTest, StartsANewLineAfterAHalfLineThatItFinds) {
+    WriteFile(m_path, "half of a li");
+    ASSERT_FALSE(m_file.Open(m_path));
+    ASSERT_FALSE(m_file.Append("whole\n"));
+    ASSERT_FALSE(m_file.Append("next\n"));
+    EXPECT_EQ(ReadFile(m_path), "half of a li\nwhole\nnext\n");
+}
+
+TEST_F(LiveFileTest, NarrowsTheModeOfAWiderFile) {
+    WriteFile(m_path, "");
+    ASSERT_EQ(chmod(m_path.c_str(), 0666), 0);
+    ASSERT_FALSE(m_file.Open(m_path));
+    EXPECT_EQ(ModeOf(m_path), 0600U);
+}
+
+TEST_F(LiveFileTest, HasItsModesWhateverTheUmask) {
+    for (const mode_t mask : {0000, 0777}) {
+        const std::string directory = m_directory.Path() + "/" + std::to_string(mask);
+        Child child([&] {
+            umask(mask);
+            return !MakeDirectory(directory + "/a/b") && !m_file.Open(directory + "/a/b/Report.log");
+        });
+        EXPECT_EQ(child.Wait(), 0);
+        EXPECT_EQ(ModeOf(directory), 0700U);
+        EXPECT_EQ(ModeOf(directory + "/a"), 0700U);
+        EXPECT_EQ(ModeOf(directory + "/a/b"), 0700U);
+        EXPECT_EQ(ModeOf(directory + "/a/b/Report.log"), 0600U);
+    }
+}
+
+TEST_F(LiveFileTest, LeavesTheModeOfADirectoryThatIsThere) {
+    const std::string directory = m_directory.Path() + "/wide";
+    ASSERT_EQ(mkdir(directory.c_str(), 0700), 0);
+    ASSERT_EQ(chmod(directory.c_str(), 0755), 0);
+    EXPECT_FALSE(MakeDirectory(directory));
+    EXPECT_EQ(ModeOf(directory), 0755U);
+}
+
+TEST_F(LiveFileTest, IsNoLinkAndNoPipeAndNoDirectory) {
+    ASSERT_EQ(symlink("elsewhere", m_path.c_str()), 0);
+    EXPECT_EQ(m_file.Open(m_path).error, ELOOP);
+    EXPECT_FALSE(std::filesystem::exists(m_directory.Path() + "/elsewhere"));
+
+    const std::string pipe = m_directory.Path() + "/pipe";
+    ASSERT_EQ(mkfifo(pipe.c_str(), 0600), 0);
+    EXPECT_EQ(m_file.Open(pipe).Text(), "cannot use what is no regular file: Invalid argument");
+
+    EXPECT_EQ(m_file.Open(m_directory.Path()).error, EISDIR);
+    EXPECT_FALSE(m_file.IsOpen());
+}
+
+TEST_F(LiveFileTest, KnowsWhenThePathIsAnotherFile) {
+    ASSERT_FALSE(m_file.Open(m_path));
+    EXPECT_FALSE(m_file.IsGoneFrom(m_path));
+    std::filesystem::rename(m_path, m_path + ".away");
+    EXPECT_TRUE(m_file.IsGoneFrom(m_path));
+    WriteFile(m_path, "");
+    EXPECT_TRUE(m_file.IsGoneFrom(m_path));
+    EXPECT_FALSE(m_file.IsGoneFrom(m_path + ".away"));
+}
+
+TEST_F(LiveFileTest, IsLockedAgainstAnotherUntilItIsClosed) {
+    LiveFile other;
+    ASSERT_FALSE(m_file.Open(m_path));
+    ASSERT_FALSE(other.Open(m_path));
+    ASSERT_FALSE(m_file.Lock());
+    EXPECT_EQ(other.Lock().error, EWOULDBLOCK);
+    m_file.Close();
+    EXPECT_FALSE(other.Lock());
+}

@@ -1,0 +1,266 @@
+#include "Modules/BoostLogger/LogWriter.h"
+
+#include <csignal>
+
+#include <gtest/gtest.h>
+#include <sys/resource.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include "tests/Modules/BoostLogger/Child.h"
+#include "tests/Modules/BoostLogger/LogFiles.h"
+#include "tests/support/TemporaryDirectory.h"
+
+using BoostLogger::LogSettings;
+using BoostLogger::LogWriter;
+using namespace std::chrono_literals;
+
+namespace {
+
+/// What the time says is up to the test; see LogWriter::Append.
+class LogWriterTest : public testing::Test {
+protected:
+    LogSettings Settings(std::int64_t maxFileBytes = 1000, std::int64_t maxTotalBytes = 10000) const {
+        return {m_directory, "Report.log", "TEST", "APP", maxFileBytes, maxTotalBytes, true, false};
+    }
+
+    std::uintmax_t TotalBytes() const {
+        std::uintmax_t total = 0;
+        for (const auto& path : LogFilesOf(m_directory))
+            total += std::filesystem::file_size(path);
+        return total;
+    }
+
+    TemporaryDirectory m_temporary;
+    const std::string m_directory = m_temporary.Path() + "/log";
+    const std::string m_path = m_directory + "/Report.log";
+    const LogWriter::TimePoint m_start = std::chrono::steady_clock::now();
+};
+
+/// A line of `size` bytes, its newline included.
+std::string Line(std::size_t size, char letter = 'x') {
+    return std::string(size - 1, letter) + "\n";
+}
+
+/// Keeps files of this process from growing beyond `bytes`, as a full disk does.
+void LimitFileSize(rlim_t bytes) {
+    rlimit limit{};
+    getrlimit(RLIMIT_FSIZE, &limit);
+    limit.rlim_cur = bytes;
+    setrlimit(RLIMIT_FSIZE, &limit);
+}
+
+/// Rights do not bind root: a scenario about rights runs as another user then, to whom `directory` is given.
+bool BecomeOrdinaryUser(const std::string& directory) {
+    constexpr uid_t NOBODY = 65534;
+    if (geteuid() != 0)
+        return true;
+    return chown(directory.c_str(), NOBODY, NOBODY) == 0 && setgid(NOBODY) == 0 && setuid(NOBODY) == 0;
+}
+
+} // namespace
+
+TEST_F(LogWriterTest, RotatesBeforeAFileWouldBecomeTooLarge) {
+    LogWriter writer(Settings());
+    ASSERT_FALSE(writer.Start());
+    for (int i = 0; i < 25; ++i)
+        writer.Append(Line(100), m_start);
+    EXPECT_EQ(std::filesystem::file_size(m_directory + "/Report_1.log"), 1000U);
+    EXPECT_EQ(std::filesystem::file_size(m_directory + "/Report_2.log"), 1000U);
+    EXPECT_EQ(std::filesystem::file_size(m_path), 500U);
+}
+
+TEST_F(LogWriterTest, GivesALineThatIsTooLargeForAnyFileAFileOfItsOwn) {
+    LogWriter writer(Settings());
+    ASSERT_FALSE(writer.Start());
+    for (const std::size_t size : {10, 5000, 20})
+        writer.Append(Line(size), m_start);
+    EXPECT_EQ(std::filesystem::file_size(m_directory + "/Report_1.log"), 10U);
+    EXPECT_EQ(std::filesystem::file_size(m_directory + "/Report_2.log"), 5000U);
+    EXPECT_EQ(std::filesystem::file_size(m_path), 20U);
+}
+
+TEST_F(LogWriterTest, KeepsAllFilesTogetherWithinTheCapAtAnyTime) {
+    LogWriter writer(Settings(1000, 3500));
+    ASSERT_FALSE(writer.Start());
+    for (int i = 0; i < 200; ++i) {
+        writer.Append(Line(130), m_start);
+        ASSERT_LE(TotalBytes(), 3500U);
+    }
+    EXPECT_EQ(LogFilesOf(m_directory).size(), 3U);
+    EXPECT_GE(TotalBytes(), 2 * 910U);
+}
+
+TEST_F(LogWriterTest, KeepsNoRotatedFileWhereTheCapLeavesRoomForTheLiveOneOnly) {
+    LogWriter writer(Settings(1000, 1000));
+    ASSERT_FALSE(writer.Start());
+    for (int i = 0; i < 50; ++i)
+        writer.Append(Line(100), m_start);
+    EXPECT_EQ(LogFilesOf(m_directory).size(), 1U);
+}
+
+TEST_F(LogWriterTest, AppliesASmallerCapWhenItStarts) {
+    std::filesystem::create_directory(m_directory);
+    for (int number = 1; number <= 5; ++number)
+        WriteFile(m_directory + "/Report_" + std::to_string(number) + ".log", Line(1000));
+    LogWriter writer(Settings(1000, 3000));
+    ASSERT_FALSE(writer.Start());
+    EXPECT_FALSE(std::filesystem::exists(m_directory + "/Report_3.log"));
+    EXPECT_TRUE(std::filesystem::exists(m_directory + "/Report_4.log"));
+}
+
+TEST_F(LogWriterTest, GoesOnWithTheLiveFileAndTheNumbersOfAnEarlierRun) {
+    for (int run = 0; run < 3; ++run) {
+        LogWriter writer(Settings());
+        ASSERT_FALSE(writer.Start());
+        for (int i = 0; i < 7; ++i)
+            writer.Append(Line(100), m_start);
+    }
+    EXPECT_EQ(LogFilesOf(m_directory).size(), 3U);
+    EXPECT_TRUE(std::filesystem::exists(m_directory + "/Report_2.log"));
+    EXPECT_EQ(std::filesystem::file_size(m_path), 100U);
+}
+
+TEST_F(LogWriterTest, DoesNotRotateAFileThatAnotherProcessHasRotatedAlready) {
+    LogWriter one(Settings());
+    LogWriter other(Settings());
+    ASSERT_FALSE(one.Start());
+    ASSERT_FALSE(other.Start());
+    for (int i = 0; i < 10; ++i)
+        one.Append(Line(100, 'a'), m_start);
+    other.Append(Line(50, 'b'), m_start); // into the full file: its size is news for this one
+    other.Append(Line(50, 'b'), m_start); // rotates
+    one.Append(Line(50, 'a'), m_start);   // follows
+    EXPECT_EQ(LogFilesOf(m_directory).size(), 2U);
+    EXPECT_EQ(ReadFile(m_path), Line(50, 'b') + Line(50, 'a'));
+}
+
+TEST_F(LogWriterTest, FollowsAPathThatBecameAnotherFileWithinATenthOfASecond) {
+    LogWriter writer(Settings());
+    ASSERT_FALSE(writer.Start());
+    writer.Append("one\n", m_start);
+    std::filesystem::rename(m_path, m_path + ".away");
+    writer.Append("two\n", m_start + 99ms);
+    EXPECT_EQ(ReadFile(m_path + ".away"), "one\ntwo\n");
+    writer.Append("three\n", m_start + 100ms);
+    EXPECT_EQ(ReadFile(m_path), "three\n");
+}
+
+TEST_F(LogWriterTest, MakesADeletedDirectoryAgain) {
+    LogWriter writer(Settings());
+    ASSERT_FALSE(writer.Start());
+    writer.Append("one\n", m_start);
+    std::filesystem::remove_all(m_directory);
+    writer.Append("two\n", m_start + 1s);
+    EXPECT_EQ(ReadFile(m_path), "two\n");
+    EXPECT_EQ(ModeOf(m_directory), 0700U);
+    EXPECT_EQ(ModeOf(m_path), 0600U);
+}
+
+TEST_F(LogWriterTest, CountsWhatItCannotWriteAndTellsWhenItRecovers) {
+    LogWriter writer(Settings());
+    ASSERT_FALSE(writer.Start());
+    writer.Append("one\n", m_start);
+    std::filesystem::remove_all(m_directory);
+    WriteFile(m_directory, "in the way");
+    writer.Append("two\n", m_start + 1s);
+    writer.Append("three\n", m_start + 1001ms);
+    std::filesystem::remove(m_directory);
+    writer.Append("four\n", m_start + 1249ms); // between two attempts
+    EXPECT_FALSE(std::filesystem::exists(m_directory));
+    writer.Append("five\n", m_start + 1250ms);
+    writer.Append("six\n", m_start + 1251ms);
+
+    const auto lines = ReadLines(m_path);
+    ASSERT_EQ(lines.size(), 3U);
+    EXPECT_NE(lines[0].find(" WARN  ["), std::string::npos);
+    EXPECT_TRUE(lines[0].ends_with(
+        "ReportLoss] 3 records could not be written: cannot make the directory: Not a directory"))
+        << lines[0];
+    EXPECT_EQ(lines[1], "five");
+    EXPECT_EQ(lines[2], "six");
+}
+
+TEST_F(LogWriterTest, CountsARecordThatNeverBecameALine) {
+    LogWriter writer(Settings());
+    ASSERT_FALSE(writer.Start());
+    writer.CountLost();
+    writer.Append("one\n", m_start);
+    const auto lines = ReadLines(m_path);
+    ASSERT_EQ(lines.size(), 2U);
+    EXPECT_TRUE(lines[0].ends_with("1 records could not be written: out of memory")) << lines[0];
+}
+
+TEST_F(LogWriterTest, DoesNotGlueALineToTheHalfOfOneThatAFullDiskCutOff) {
+    Child child([&] {
+        std::signal(SIGXFSZ, SIG_IGN);
+        LogWriter writer(Settings());
+        if (writer.Start())
+            return false;
+        writer.Append(Line(100, 'a'), m_start);
+        LimitFileSize(150);
+        writer.Append(Line(100, 'b'), m_start + 1s); // fifty bytes of it
+        writer.Append(Line(100, 'c'), m_start + 2s); // nothing
+        LimitFileSize(RLIM_INFINITY);
+        writer.Append(Line(100, 'd'), m_start + 3s);
+        return true;
+    });
+    ASSERT_EQ(child.Wait(), 0);
+    const auto lines = ReadLines(m_path);
+    ASSERT_EQ(lines.size(), 4U);
+    EXPECT_EQ(lines[0], std::string(99, 'a'));
+    EXPECT_EQ(lines[1], std::string(50, 'b'));
+    EXPECT_TRUE(
+        lines[2].ends_with("2 records could not be written: cannot write to the file: File too large"))
+        << lines[2];
+    EXPECT_EQ(lines[3], std::string(99, 'd'));
+}
+
+TEST_F(LogWriterTest, DropsRecordsRatherThanOutgrowItsFileWhereItMayNotRotate) {
+    Child child([&] {
+        if (!BecomeOrdinaryUser(m_temporary.Path()))
+            return false;
+        LogWriter writer(Settings());
+        if (writer.Start())
+            return false;
+        chmod(m_directory.c_str(), 0500);
+        for (int i = 0; i < 30; ++i)
+            writer.Append(Line(100), m_start);
+        const bool held = std::filesystem::file_size(m_path) == 1000;
+        chmod(m_directory.c_str(), 0700);
+        writer.Append("healed\n", m_start + 1s);
+        return held;
+    });
+    ASSERT_EQ(child.Wait(), 0);
+    const auto lines = ReadLines(m_path);
+    ASSERT_EQ(lines.size(), 2U);
+    EXPECT_TRUE(
+        lines[0].ends_with("20 records could not be written: cannot rotate the file: Permission denied"))
+        << lines[0];
+    EXPECT_EQ(lines[1], "healed");
+    EXPECT_EQ(std::filesystem::file_size(m_directory + "/Report_1.log"), 1000U);
+}
+
+TEST_F(LogWriterTest, DoesNotHangWhileAnotherProcessHoldsTheRotationLock) {
+    LogWriter writer(Settings());
+    ASSERT_FALSE(writer.Start());
+    for (int i = 0; i < 10; ++i)
+        writer.Append(Line(100), m_start);
+    BoostLogger::LiveFile stopped;
+    ASSERT_FALSE(stopped.Open(m_path));
+    ASSERT_FALSE(stopped.Lock());
+    for (int i = 0; i < 10000; ++i)
+        writer.Append(Line(100), m_start); // one attempt, 9999 drops
+    EXPECT_LT(std::chrono::steady_clock::now() - m_start, 5s);
+    EXPECT_EQ(std::filesystem::file_size(m_path), 1000U);
+    stopped.Close();
+    writer.Append("healed\n", m_start + 1s);
+    ASSERT_EQ(ReadLines(m_path).size(), 2U);
+    EXPECT_NE(ReadLines(m_path)[0].find("10000 records could not be written: cannot lock the file"),
+              std::string::npos);
+}
+
+TEST_F(LogWriterTest, SaysWhyItCannotStart) {
+    WriteFile(m_directory, "in the way");
+    EXPECT_EQ(LogWriter(Settings()).Start().Text(), "cannot make the directory: Not a directory");
+}

@@ -1,0 +1,231 @@
+// Threads, processes and their ends.
+
+#include <chrono>
+#include <csignal>
+#include <cstdlib>
+#include <map>
+#include <thread>
+#include <vector>
+
+#include <gtest/gtest.h>
+#include <sys/stat.h>
+
+#include "tests/Modules/BoostLogger/Child.h"
+#include "tests/Modules/BoostLogger/LogFiles.h"
+#include "tests/Modules/BoostLogger/Plugin.h"
+#include "tests/support/TemporaryDirectory.h"
+#include "tests/support/WaitUntil.h"
+
+using namespace std::chrono_literals;
+
+namespace {
+
+#if defined(__SANITIZE_THREAD__) || defined(__SANITIZE_ADDRESS__)
+constexpr int MANY = 5'000; // the sanitizers make a record ten times as slow
+#else
+constexpr int MANY = 100'000;
+#endif
+
+#if defined(__SANITIZE_THREAD__)
+constexpr int EXITS = 3; // this sanitizer sleeps for a second in each exit
+#else
+constexpr int EXITS = 20;
+#endif
+
+class BoostLoggerProcesses : public testing::Test {
+protected:
+    /// Logs "<name> <number>" for the numbers from 0 on.
+    static void LogNumbers(SystemTool::IO::ILogger* logger, const std::string& name, int count) {
+        for (int i = 0; i < count; ++i)
+            Log(logger, name + " " + std::to_string(i));
+    }
+
+    /// Expects of each name in the log exactly the numbers from 0 to `count`, in order.
+    void ExpectNumbers(const std::vector<std::string>& names, int count) {
+        std::map<std::string, int> next;
+        for (const auto& line : ReadLog(m_temporary.Path())) {
+            const std::string message = MessageOf(line);
+            const std::string name = message.substr(0, message.find(' '));
+            ASSERT_EQ(message, name + " " + std::to_string(next[name])) << line;
+            ++next[name];
+        }
+        ASSERT_EQ(next.size(), names.size());
+        for (const auto& name : names)
+            EXPECT_EQ(next[name], count) << name;
+    }
+
+    TemporaryDirectory m_temporary;
+    const std::string m_path = m_temporary.Path() + "/Report.log";
+};
+
+/// What the service does when it crashes: threads log on while exit() runs.
+void LogForEver(SystemTool::IO::ILogger* logger, const char* name) {
+    std::thread([logger, name] {
+        for (long i = 0;; ++i)
+            Log(logger, std::string(name) + " " + std::to_string(i));
+    }).detach();
+}
+
+/// Logs when the statics are destroyed: made before the loader, hence destroyed after it.
+struct LateStatic {
+    ~LateStatic() {
+        if (logger != nullptr)
+            Log(logger, "after the loader's end");
+    }
+    SystemTool::IO::ILogger* logger = nullptr;
+};
+
+SystemTool::IO::ILogger* StaticLogger(const std::string& directory) {
+    static LateStatic late;
+    static LoggerLoader loader(BOOST_LOGGER_PATH);
+    Init(loader, {directory});
+    late.logger = loader.GetModule();
+    return late.logger;
+}
+
+} // namespace
+
+TEST_F(BoostLoggerProcesses, EightThreadsGetEveryRecordOutWholeAndInOrder) {
+    std::vector<std::string> names;
+    for (int thread = 0; thread < 8; ++thread)
+        names.push_back("t" + std::to_string(thread));
+    Child child([&] {
+        LoggerLoader loader(BOOST_LOGGER_PATH);
+        Init(loader, {m_temporary.Path(), 10 * 1024 * 1024, 1024 * 1024 * 1024});
+        std::vector<std::thread> threads;
+        for (const auto& name : names)
+            threads.emplace_back([&] { LogNumbers(loader.GetModule(), name, MANY); });
+        for (auto& thread : threads)
+            thread.join();
+        return true;
+    });
+    ASSERT_EQ(child.Wait(), 0);
+    ExpectNumbers(names, MANY);
+}
+
+TEST_F(BoostLoggerProcesses, TwoProcessesOnOneLogLoseAndTearNothingWhileBothRotate) {
+    constexpr int COUNT = MANY / 5;
+    const auto scenario = [&](const char* name) {
+        return [this, name] {
+            LoggerLoader loader(BOOST_LOGGER_PATH);
+            Init(loader, {m_temporary.Path(), 50'000, 1024 * 1024 * 1024});
+            LogNumbers(loader.GetModule(), name, COUNT);
+            return true;
+        };
+    };
+    Child one(scenario("one"));
+    Child other(scenario("other"));
+    ASSERT_EQ(one.Wait(), 0);
+    ASSERT_EQ(other.Wait(), 0);
+    ExpectNumbers({"one", "other"}, COUNT);
+    EXPECT_GT(LogFilesOf(m_temporary.Path()).size(), 3U);
+    for (const auto& path : LogFilesOf(m_temporary.Path()))
+        EXPECT_LE(std::filesystem::file_size(path), 50'000U + 2 * 100) << path; // a record of each
+}
+
+TEST_F(BoostLoggerProcesses, ASecondInstanceThatIsRefusedLeavesTheLogOfTheFirstAlone) {
+    constexpr int COUNT = MANY / 5;
+    Child first([&] {
+        LoggerLoader loader(BOOST_LOGGER_PATH);
+        Init(loader, {m_temporary.Path()});
+        LogNumbers(loader.GetModule(), "first", COUNT);
+        return true;
+    });
+    ASSERT_TRUE(WaitUntil([&] { return !ReadFile(m_path).empty(); }));
+    struct stat before {};
+    ASSERT_EQ(stat(m_path.c_str(), &before), 0);
+    Child second([&] {
+        LoggerLoader loader(BOOST_LOGGER_PATH);
+        Init(loader, {m_temporary.Path()});
+        Log(loader, "second 0");
+        return true;
+    });
+    EXPECT_EQ(second.Wait(), 0);
+    EXPECT_EQ(first.Wait(), 0);
+
+    struct stat after {};
+    ASSERT_EQ(stat(m_path.c_str(), &after), 0);
+    EXPECT_EQ(after.st_ino, before.st_ino);
+    int fromFirst = 0;
+    int fromSecond = 0;
+    for (const auto& line : ReadLines(m_path)) {
+        if (MessageOf(line) == "second 0")
+            ++fromSecond;
+        else
+            ASSERT_EQ(MessageOf(line), "first " + std::to_string(fromFirst++));
+    }
+    EXPECT_EQ(fromFirst, COUNT);
+    EXPECT_EQ(fromSecond, 1);
+}
+
+TEST_F(BoostLoggerProcesses, ARecordIsInTheFileWhenWriteLogReturnsEvenIfTheProcessIsKilledThen) {
+    Child child([&] {
+        LoggerLoader loader(BOOST_LOGGER_PATH);
+        Init(loader, {m_temporary.Path()});
+        LogNumbers(loader.GetModule(), "last", 3);
+        raise(SIGKILL);
+        return true;
+    });
+    EXPECT_EQ(child.Wait(), 128 + SIGKILL);
+    ExpectNumbers({"last"}, 3);
+}
+
+TEST_F(BoostLoggerProcesses, ExitEndsWhileOtherThreadsAreLogging) {
+    for (int round = 0; round < EXITS; ++round) {
+        const TemporaryDirectory directory;
+        Child child([&]() -> bool {
+            auto* const logger = StaticLogger(directory.Path());
+            LogForEver(logger, "a");
+            LogForEver(logger, "b");
+            Log(logger, "about to exit");
+            std::exit(0);
+        });
+        EXPECT_TRUE(WaitUntil([&] { return child.HasEnded(); }, 5s)) << "round " << round;
+        EXPECT_EQ(child.Status(), 0) << "round " << round;
+        std::string all;
+        for (const auto& line : ReadLog(directory.Path()))
+            all += MessageOf(line) + "\n";
+        EXPECT_NE(all.find("after the loader's end\n"), std::string::npos);
+    }
+}
+
+TEST_F(BoostLoggerProcesses, UnloadingTheLastLoaderDoesNotHarmAThreadThatIsLogging) {
+    Child child([&] {
+        auto loader = std::make_unique<LoggerLoader>(BOOST_LOGGER_PATH);
+        Init(*loader, {m_temporary.Path()});
+        auto* const logger = loader->GetModule();
+        std::thread thread([logger] { LogNumbers(logger, "t", 20'000); });
+        loader.reset();
+        thread.join();
+        return true;
+    });
+    ASSERT_EQ(child.Wait(), 0);
+    ExpectNumbers({"t"}, 20'000);
+}
+
+#if !defined(__SANITIZE_THREAD__) // which reports, rightly, that a logger is nothing for a signal handler
+namespace {
+
+SystemTool::IO::ILogger* g_crashLogger = nullptr;
+
+void LogAndExit(int signal) {
+    Log(g_crashLogger, "Signal[" + std::to_string(signal) + "]", 4);
+    std::exit(0);
+}
+
+} // namespace
+
+TEST_F(BoostLoggerProcesses, ACrashHandlerCanLogAndExitWhileOtherThreadsAreLogging) {
+    Child child([&]() -> bool {
+        g_crashLogger = StaticLogger(m_temporary.Path());
+        std::signal(SIGSEGV, LogAndExit);
+        LogForEver(g_crashLogger, "a");
+        LogForEver(g_crashLogger, "b");
+        raise(SIGSEGV);
+        return false;
+    });
+    EXPECT_TRUE(WaitUntil([&] { return child.HasEnded(); }, 5s));
+    EXPECT_EQ(child.Status(), 0);
+    EXPECT_NE(ReadFile(m_path).find("] Signal[11]\n"), std::string::npos);
+}
+#endif
