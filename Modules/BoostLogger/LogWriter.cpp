@@ -15,6 +15,9 @@ constexpr std::chrono::milliseconds RETRY_INTERVAL{250};
 /// rotated away. A look before each line would cost a third of the line.
 constexpr std::chrono::milliseconds LOOK_INTERVAL{100};
 
+/// Why records are lost when no step on the files has failed.
+const char* const NO_LINE = "out of memory, or logged by a signal handler inside the logger";
+
 constexpr int WARNING = 3;
 
 /// Set while this thread holds the writer's lock. The crash handler logs on the thread that crashed: should
@@ -91,7 +94,7 @@ FileFailure LogWriter::Reopen() {
 
 FileFailure LogWriter::ReportLoss() {
     const std::uint64_t lost = m_lost.load(std::memory_order_relaxed);
-    const std::string reason = m_failure ? m_failure.Text() : "out of memory";
+    const std::string reason = m_failure ? m_failure.Text() : NO_LINE;
     const std::string message = std::to_string(lost) + " records could not be written: " + reason;
     LineBuffer line;
     ComposeLine(line, {WARNING, "", "Modules/BoostLogger", "ReportLoss", __LINE__, message},
