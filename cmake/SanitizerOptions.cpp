@@ -1,22 +1,23 @@
 // What the sanitizers are told in every program of ours, so that no environment variable has to be
-// remembered.
+// remembered. Their runtimes are shared libraries and look the functions up, so they must be visible.
+#define OPTIONS extern "C" __attribute__((visibility("default")))
 
-extern "C" const char* __asan_default_options() {
+OPTIONS const char* __asan_default_options() {
     // A refused allocation is a null pointer, and so std::bad_alloc, as without the sanitizer.
     return "detect_stack_use_after_return=1:allocator_may_return_null=1";
 }
 
-extern "C" const char* __ubsan_default_options() {
+OPTIONS const char* __ubsan_default_options() {
     return "print_stacktrace=1";
 }
 
-extern "C" const char* __tsan_default_options() {
+OPTIONS const char* __tsan_default_options() {
     // The one signal handler, the crash handler, does what no handler may, on purpose: the process is lost
     // anyway, and the trace is worth trying.
     return "report_signal_unsafe=0:second_deadlock_stack=1:allocator_may_return_null=1";
 }
 
-extern "C" const char* __tsan_default_suppressions() {
+OPTIONS const char* __tsan_default_suppressions() {
     // The receiver's stop flag is a plain bool on purpose: one thread sets it once, the loop reads it once a
     // pass, and the join that follows orders the rest. The only write is in this function, so nothing else is
     // hidden.

@@ -1,12 +1,13 @@
 include(GoogleTest)
 
-# ssr_add_test(<name> [SANDBOX] [SOURCES <file>...] [LINK <target>...] [FAKES <target>...])
+# ssr_add_test(<name> [SANDBOX] [SOURCES <file>...] [LINK <target>...] [FAKES <target>...]
+#     [LABELS <label>...])
 #
 # A test program in a folder of its own. A program loads its plug-ins from its own folder, so the FAKES, plug-ins under
 # the real ones' file names, are put there; a plug-in that is not named is missing for that program. With SANDBOX, each
 # test runs with port 9997 and the pid file's directory to itself (see in-sandbox).
 function(ssr_add_test name)
-    cmake_parse_arguments(arg "SANDBOX" "" "SOURCES;LINK;FAKES" ${ARGN})
+    cmake_parse_arguments(arg "SANDBOX" "" "SOURCES;LINK;FAKES;LABELS" ${ARGN})
     set(folder ${PROJECT_BINARY_DIR}/tests/${name})
     add_executable(${name} ${arg_SOURCES})
     target_link_libraries(${name} PRIVATE ssr_options ${arg_LINK} GTest::gmock_main GTest::gtest)
@@ -22,5 +23,5 @@ function(ssr_add_test name)
         set_property(TARGET ${name} PROPERTY CROSSCOMPILING_EMULATOR ${PROJECT_SOURCE_DIR}/tests/in-sandbox)
     endif()
     gtest_discover_tests(${name} TEST_PREFIX ${name}. WORKING_DIRECTORY ${folder} DISCOVERY_TIMEOUT 60
-        PROPERTIES TIMEOUT 120)
+        PROPERTIES TIMEOUT 120 LABELS "${arg_LABELS}")
 endfunction()

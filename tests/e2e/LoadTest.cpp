@@ -1,0 +1,101 @@
+#include <chrono>
+#include <cstdlib>
+#include <thread>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "tests/e2e/support/Service.h"
+#include "tests/support/WaitUntil.h"
+
+// A long run of reports at a fixed rate: every one of them ends somewhere, in order, and the ledger adds up.
+
+namespace {
+
+using namespace std::chrono_literals;
+
+/// How many reports; SSR_LOAD_REPORTS in the environment asks for another number.
+int ReportCount() {
+    const char* asked = std::getenv("SSR_LOAD_REPORTS");
+    return asked != nullptr ? std::atoi(asked) : 100'000;
+}
+
+constexpr int RATE = 20'000;         // reports a second
+constexpr int EVERY_NTH_EVENT = 10;  // goes to analytics
+constexpr int EVERY_NTH_BROKEN = 97; // is no JSON
+
+bool IsBroken(int i) {
+    return i % EVERY_NTH_BROKEN == 0;
+}
+bool IsEvent(int i) {
+    return !IsBroken(i) && i % EVERY_NTH_EVENT == 0;
+}
+
+std::string Report(int i) {
+    const std::string number = std::to_string(i);
+    if (IsBroken(i))
+        return R"({"eventID":)" + number + "|";
+    return R"({"eventID":")" + std::string(IsEvent(i) ? "A759|" : "B1|") + number +
+           R"(","value":{"button":"save","page":"editor","count":3,"text":"as people write it"},"createTime":1700000000})";
+}
+
+void SendAtRate(int count) {
+    const auto begin = std::chrono::steady_clock::now();
+    for (int i = 0; i < count; ++i) {
+        const auto due = begin + std::chrono::microseconds(1'000'000LL * i / RATE);
+        if (std::chrono::steady_clock::now() < due)
+            std::this_thread::sleep_until(due); // the pace, not a wait for anything
+        Service::Send(Report(i));
+    }
+}
+
+} // namespace
+
+TEST(Load, EveryReportEndsSomewhereInOrder) {
+    Service service;
+    service.Install();
+    service.Start();
+    const int sent = ReportCount();
+    SendAtRate(sent);
+    service.AwaitQuiet();
+
+    const auto rows = service.RowCount();
+    const auto events = service.Count(service.OutboxFile(), "select count(*) from event");
+    std::int64_t refused = 0;
+    std::int64_t received = 0;
+    for (const auto& name :
+         std::filesystem::directory_iterator(service.DataDirectory() + "/hublink/log/metrik")) {
+        std::ifstream log(name.path());
+        for (std::string line; std::getline(log, line);) {
+            refused += line.find("[App/ReportServer:123 JsonToStruct]") != std::string::npos ? 1 : 0;
+            received += line.find("[App/ReportServer:42 Recv]") != std::string::npos ? 1 : 0;
+        }
+    }
+    const auto dropped = Service::DroppedByKernel();
+    RecordProperty("dropped", std::to_string(dropped));
+    EXPECT_EQ(sent, rows + events + refused + dropped);
+    EXPECT_EQ(dropped, 0) << "at this rate the receiver keeps up";
+    EXPECT_EQ(received, sent + 1 - dropped) << "with the marker, each one is in the log";
+
+    int events_expected = 0;
+    int refused_expected = 0;
+    for (int i = 0; i < sent; ++i) {
+        events_expected += IsEvent(i) ? 1 : 0;
+        refused_expected += IsBroken(i) ? 1 : 0;
+    }
+    EXPECT_EQ(events, events_expected);
+    EXPECT_EQ(refused, refused_expected);
+
+    const std::string outOfOrder =
+        "select count(*) from (select cast(substr(%s, instr(%s, '|') + 1) as integer) as n, "
+        "lag(cast(substr(%s, instr(%s, '|') + 1) as integer)) over (order by id) as before "
+        "from %s) where n <= before";
+    const auto query = [&](const std::string& column, const std::string& table) {
+        std::string sql = outOfOrder;
+        for (std::size_t at; (at = sql.find("%s")) != std::string::npos;)
+            sql.replace(at, 2, sql.find("%s", at + 2) == std::string::npos ? table : column);
+        return sql;
+    };
+    EXPECT_EQ(service.Count(service.DatabaseFile(), query("eventID", "OperLog")), 0);
+    EXPECT_EQ(service.Count(service.OutboxFile(), query("event_id", "event")), 0);
+}

@@ -1,0 +1,231 @@
+#include "tests/e2e/support/Service.h"
+
+#include <cerrno>
+#include <csignal>
+#include <filesystem>
+#include <fstream>
+#include <regex>
+#include <sstream>
+#include <stdexcept>
+
+#include <Poco/Net/DatagramSocket.h>
+#include <Poco/Net/SocketAddress.h>
+#include <SQLiteCpp/SQLiteCpp.h>
+#include <fcntl.h>
+#include <sys/syscall.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include "tests/support/WaitUntil.h"
+
+namespace {
+
+const std::string PROGRAM = "SyncServiceReport";
+const std::vector<std::string> PLUGINS = {"libBoostLogger.dylib", "libOrvekSqlite.dylib",
+                                          "libMetrikSdk.dylib"};
+
+std::string ContentOf(const std::string& path) {
+    std::ifstream file(path, std::ios::binary);
+    return {std::istreambuf_iterator<char>(file), {}};
+}
+
+std::vector<char*> Pointers(std::vector<std::string>& texts) {
+    std::vector<char*> pointers;
+    for (auto& text : texts)
+        pointers.push_back(text.data());
+    pointers.push_back(nullptr);
+    return pointers;
+}
+
+/// The exit code, or minus the signal.
+int CodeOf(int status) {
+    return WIFEXITED(status) ? WEXITSTATUS(status) : -WTERMSIG(status);
+}
+
+/// The fields of the report port's line in the kernel's table of UDP sockets; empty when nothing is bound.
+std::vector<std::string> KernelsLineOfThePort() {
+    std::ifstream table("/proc/net/udp");
+    for (std::string line; std::getline(table, line);)
+        if (line.find(": 0100007F:270D ") != std::string::npos) { // 127.0.0.1:9997
+            std::istringstream fields(line);
+            return {std::istream_iterator<std::string>(fields), {}};
+        }
+    return {};
+}
+
+} // namespace
+
+Service::Service() {
+    // The program looks for its plug-ins beside itself, so a copy of it may have others than the original.
+    std::filesystem::copy_file(std::filesystem::path(SSR_BIN_DIR) / PROGRAM,
+                               m_program.Path() + "/" + PROGRAM);
+    for (const auto& plugin : PLUGINS)
+        std::filesystem::create_symlink(std::filesystem::path(SSR_BIN_DIR) / plugin,
+                                        m_program.Path() + "/" + plugin);
+    m_environment = {"XDG_DATA_HOME=" + DataDirectory(), "HOME=" + DataDirectory(), "PATH=/usr/bin:/bin"};
+}
+
+Service::~Service() {
+    Kill();
+}
+
+void Service::Remove(const std::string& plugin) {
+    if (!std::filesystem::remove(m_program.Path() + "/" + plugin))
+        throw std::runtime_error("no plug-in " + plugin);
+}
+
+pid_t Service::Spawn(const std::string& program, const std::vector<std::string>& arguments) const {
+    std::vector<std::string> words = {program};
+    words.insert(words.end(), arguments.begin(), arguments.end());
+    auto environment = m_environment;
+    const auto argv = Pointers(words);
+    const auto envp = Pointers(environment);
+    const int output = ::open((m_program.Path() + "/output").c_str(), O_WRONLY | O_CREAT | O_APPEND, 0600);
+    const pid_t process = ::fork();
+    if (process == 0) {
+        ::dup2(output, STDOUT_FILENO);
+        ::dup2(output, STDERR_FILENO);
+        ::execve(program.c_str(), argv.data(), envp.data());
+        ::_exit(127);
+    }
+    ::close(output);
+    return process;
+}
+
+int Service::Reportctl(const std::vector<std::string>& arguments) const {
+    int status = 0;
+    ::waitpid(Spawn(std::string(SSR_BIN_DIR) + "/reportctl", arguments), &status, 0);
+    return CodeOf(status);
+}
+
+void Service::Install() const {
+    if (const int code = Reportctl({"setup"}); code != 0)
+        throw std::runtime_error("set-up ended with " + std::to_string(code) + ": " + Output());
+}
+
+void Service::Launch() {
+    m_process = Spawn(m_program.Path() + "/" + PROGRAM, {});
+}
+
+void Service::Start() {
+    Launch();
+    if (!WaitUntil([this] { return Bound() || !IsRunning(); }))
+        throw std::runtime_error("the service neither bound its port nor ended");
+}
+
+int Service::RunAnother() const {
+    int status = 0;
+    ::waitpid(Spawn(m_program.Path() + "/" + PROGRAM, {}), &status, 0);
+    return CodeOf(status);
+}
+
+bool Service::IsRunning() {
+    siginfo_t state{};
+    return m_process > 0 &&
+           ::waitid(P_PID, static_cast<id_t>(m_process), &state, WEXITED | WNOHANG | WNOWAIT) == 0 &&
+           state.si_pid == 0;
+}
+
+void Service::Signal(int signal) const {
+    ::kill(m_process, signal);
+}
+
+void Service::Signal(int signal, pid_t thread) const {
+    ::syscall(SYS_tgkill, m_process, thread, signal);
+}
+
+std::optional<int> Service::AwaitEnd(std::chrono::milliseconds deadline) {
+    if (!WaitUntil([this] { return !IsRunning(); }, deadline))
+        return std::nullopt;
+    int status = 0;
+    ::waitpid(m_process, &status, 0);
+    m_process = -1;
+    return CodeOf(status);
+}
+
+void Service::Kill() {
+    if (m_process <= 0)
+        return;
+    Signal(SIGKILL);
+    ::waitpid(m_process, nullptr, 0);
+    m_process = -1;
+}
+
+void Service::Send(const std::string& text) {
+    static Poco::Net::DatagramSocket socket(Poco::Net::SocketAddress("127.0.0.1", 0));
+    socket.sendTo(text.data(), static_cast<int>(text.size()), Poco::Net::SocketAddress("127.0.0.1", 9997));
+}
+
+void Service::AwaitQuiet() {
+    const std::string marker = "marker" + std::to_string(++m_markers);
+    Send(R"({"eventID":")" + marker + "\"}");
+    const auto stored = [&] {
+        return Count(DatabaseFile(), "select count(*) from OperLog where eventID='" + marker + "'") == 1;
+    };
+    if (!WaitUntil(stored, std::chrono::seconds(60)))
+        throw std::runtime_error("a report was not stored in time; the log: " + Log().substr(0, 4000));
+    SQLite::Database database(DatabaseFile(), SQLite::OPEN_READWRITE, 10'000);
+    database.exec("delete from OperLog where eventID='" + marker + "'");
+}
+
+std::string Service::Output() const {
+    return ContentOf(m_program.Path() + "/output");
+}
+
+std::string Service::Log() const {
+    return ContentOf(LogFile());
+}
+
+std::vector<Service::Line> Service::LogLines() const {
+    static const std::regex FORM(
+        R"(\d{4}-\d\d-\d\d \d\d:\d\d:\d\d\.\d{3} (\w+) +\[(\d+):(\d+)\] \[([^\]]+)\] (.*))");
+    std::vector<Line> lines;
+    std::istringstream log(Log());
+    for (std::string text; std::getline(log, text);) {
+        // A message of many kilobytes would overflow the stack of std::regex, so only the head is matched.
+        constexpr std::size_t HEAD = 200;
+        std::smatch parts;
+        const std::string head = text.substr(0, HEAD);
+        if (!std::regex_match(head, parts, FORM))
+            throw std::runtime_error("a line of the log has not the log's form: " + head);
+        lines.push_back({parts[1], std::stoi(parts[2]), std::stoi(parts[3]), parts[4],
+                         parts[5].str() + (text.size() > HEAD ? text.substr(HEAD) : "")});
+    }
+    return lines;
+}
+
+std::vector<Service::Line> Service::LogLines(const std::string& site) const {
+    auto lines = LogLines();
+    std::erase_if(lines, [&site](const Line& line) { return line.site != site; });
+    return lines;
+}
+
+std::vector<std::string> Service::Query(const std::string& file, const std::string& sql) const {
+    std::vector<std::string> rows;
+    try {
+        const SQLite::Database database(file, SQLite::OPEN_READWRITE, 10'000);
+        SQLite::Statement query(database, sql);
+        while (query.executeStep()) {
+            std::string row;
+            for (int column = 0; column < query.getColumnCount(); ++column)
+                row += (column > 0 ? "|" : "") + query.getColumn(column).getString();
+            rows.push_back(row);
+        }
+    } catch (const SQLite::Exception&) { // not there yet
+    }
+    return rows;
+}
+
+std::int64_t Service::Count(const std::string& file, const std::string& sql) const {
+    const auto rows = Query(file, sql);
+    return rows.empty() ? -1 : std::stoll(rows.front());
+}
+
+bool Service::Bound() {
+    return !KernelsLineOfThePort().empty();
+}
+
+std::int64_t Service::DroppedByKernel() {
+    const auto fields = KernelsLineOfThePort();
+    return fields.empty() ? -1 : std::stoll(fields.back());
+}
