@@ -1,0 +1,54 @@
+#pragma once
+
+#include <chrono>
+#include <cstdint>
+
+namespace OrvekSqlite {
+
+/// What one statement may cost. The plug-in is handed texts that any local program had a hand in, so a bound
+/// stands on everything that SQLite can be made to spend.
+struct Limits {
+    /// One value, and one row. A report's datagram carries 10 KB, so that the longest text of it fits a
+    /// hundred times.
+    int valueBytes = 1'048'576;
+
+    /// One statement's text: six values of a report, and room for what another caller may write.
+    int sqlBytes = 1'048'576;
+
+    /// How deep an expression may nest. The store's own statements nest one deep; parsing needs stack for
+    /// each.
+    int expressionDepth = 100;
+
+    /// Instructions of a compiled statement, a bound on its memory. An insert of the store compiles to 30.
+    int instructions = 100'000;
+
+    /// Length of a LIKE pattern; matching one can take exponential time in the number of its wildcards.
+    int likePatternBytes = 100;
+
+    /// Triggers within triggers. Ours has none; a table that somebody else extended may have a few.
+    int triggerDepth = 10;
+
+    /// Steps of the virtual machine for an INSERT, which takes about 30; with a thousand triggers' worth of
+    /// slack that is still some 10 milliseconds.
+    std::int64_t insertSteps = 1'000'000;
+
+    /// Steps for any other statement. A whole pass over 5 million rows takes some 50 million; endless ones
+    /// end after some seconds.
+    std::int64_t statementSteps = 200'000'000;
+};
+
+/// How the database is opened.
+struct Settings {
+    /// How long a statement waits for another process's write lock before it fails. A backup or a person's
+    /// open transaction of 10 seconds must cost no row, and half as much again is the slack. Longer would
+    /// only make the queue before us grow: reports that keep coming are kept in memory meanwhile.
+    std::chrono::milliseconds busyTimeout = std::chrono::seconds(15);
+
+    /// The write-ahead log is cut back to this after a checkpoint. A reader that stayed for long may have let
+    /// it grow; the disk space is the user's.
+    std::int64_t journalBytes = 16'777'216;
+
+    Limits limits;
+};
+
+} // namespace OrvekSqlite

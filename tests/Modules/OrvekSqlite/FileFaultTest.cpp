@@ -1,0 +1,255 @@
+#include <chrono>
+#include <fstream>
+
+#include <sys/stat.h>
+
+#include "tests/Modules/OrvekSqlite/ChildProcess.h"
+#include "tests/Modules/OrvekSqlite/SqliteFixture.h"
+#include "tests/support/WaitUntil.h"
+
+// What happens to the file while the service runs, and before.
+namespace {
+
+namespace fs = std::filesystem;
+
+class DatabaseFile : public SqliteFixture {
+protected:
+    void SetUp() override {
+        SqliteFixture::SetUp();
+        m_umask = ::umask(0); // as in the service
+    }
+
+    void TearDown() override { ::umask(m_umask); }
+
+    bool Exec(const std::string& sql) { return Plugin()->ExecSql(sql); }
+    std::string Error() { return Plugin()->GetLastErrorMsg(); }
+
+    void OpenStore() {
+        MakeStore(Store());
+        ASSERT_TRUE(Plugin()->Open(Store())) << Error();
+    }
+
+    static std::string ContentOf(const std::string& path) {
+        std::ifstream file(path, std::ios::binary);
+        return {std::istreambuf_iterator<char>(file), {}};
+    }
+
+    static void Overwrite(const std::string& path, const std::string& content) {
+        std::ofstream(path, std::ios::binary | std::ios::trunc) << content;
+    }
+
+    /// A good database, moved to the store's path in one step.
+    void ReplaceStore() {
+        const auto fresh = Directory() + "/fresh";
+        MakeStore(fresh);
+        fs::rename(fresh, Store());
+    }
+
+    void ExpectEveryFilePrivate() const {
+        for (const auto& file : fs::directory_iterator(Directory()))
+            EXPECT_EQ(fs::status(file).permissions(), fs::perms{0600}) << file.path();
+    }
+
+    /// Root may write everything, so a test about rights gives its own up, and the files with them.
+    bool BecomeAnOrdinaryUser() const {
+        constexpr uid_t NOBODY = 65534;
+        if (::geteuid() != 0)
+            return true;
+        return ::chown(Directory().c_str(), NOBODY, NOBODY) == 0 &&
+               ::chown(Store().c_str(), NOBODY, NOBODY) == 0 && ::setgid(NOBODY) == 0 &&
+               ::setuid(NOBODY) == 0;
+    }
+
+private:
+    mode_t m_umask = 0;
+};
+
+TEST_F(DatabaseFile, IsNotCreatedWhenItIsMissing) {
+    EXPECT_FALSE(Plugin()->Open(Store()));
+    EXPECT_EQ(Error(), "unable to open database file");
+    EXPECT_FALSE(Exec(Insert("x")));
+    EXPECT_TRUE(fs::is_empty(Directory()));
+}
+
+TEST_F(DatabaseFile, IsUsedOnceItAppears) {
+    EXPECT_FALSE(Plugin()->Open(Store()));
+    EXPECT_FALSE(Exec(Insert("lost")));
+    MakeStore(Store());
+    EXPECT_TRUE(Exec(Insert("kept"))) << Error();
+    EXPECT_EQ(Ask(Store(), "select group_concat(eventID) from OperLog"), "kept");
+}
+
+TEST_F(DatabaseFile, TakesRowsOnceItsTablesAreMade) {
+    Overwrite(Store(), "");
+    EXPECT_TRUE(Plugin()->Open(Store())) << Error();
+    EXPECT_FALSE(Exec(Insert("lost")));
+    EXPECT_EQ(Error(), "no such table: OperLog");
+    SQLite::Database(Store(), SQLite::OPEN_READWRITE).exec(SCHEMA);
+    EXPECT_TRUE(Exec(Insert("kept"))) << Error();
+    EXPECT_EQ(Rows(Store()), "1");
+}
+
+TEST_F(DatabaseFile, IsKeptInWriteAheadMode) {
+    SQLite::Database(Store(), SQLite::OPEN_READWRITE | SQLite::OPEN_CREATE).exec(SCHEMA);
+    ASSERT_EQ(Ask(Store(), "pragma journal_mode"), "delete");
+    ASSERT_TRUE(Plugin()->Open(Store())) << Error();
+    EXPECT_EQ(Ask(Store(), "pragma journal_mode"), "wal");
+}
+
+TEST_F(DatabaseFile, IsReadableByItsOwnerAloneWhenSetUpMadeIt) {
+    OpenStore();
+    ASSERT_TRUE(Exec(Insert("x"))) << Error();
+    ASSERT_TRUE(fs::exists(Store() + "-wal") && fs::exists(Store() + "-shm"));
+    ExpectEveryFilePrivate();
+}
+
+TEST_F(DatabaseFile, IsMadePrivateWhenSomebodyElseMadeItReadable) {
+    MakeStore(Store());
+    fs::permissions(Store(), fs::perms{0666});
+    SQLite::Database other(Store(), SQLite::OPEN_READWRITE);
+    other.exec("insert into BaseInfo values ('k', 'v')");
+    ASSERT_EQ(fs::status(Store() + "-wal").permissions(), fs::perms{0666});
+
+    ASSERT_TRUE(Plugin()->Open(Store())) << Error();
+    ASSERT_TRUE(Exec(Insert("x"))) << Error();
+    ExpectEveryFilePrivate();
+}
+
+TEST_F(DatabaseFile, IsFoundThroughASymbolicLink) {
+    fs::create_directory(Directory() + "/elsewhere");
+    const auto target = Directory() + "/elsewhere/Real.db";
+    MakeStore(target);
+    fs::create_symlink(target, Store());
+    ASSERT_TRUE(Plugin()->Open(Store())) << Error();
+    ASSERT_TRUE(Exec(Insert("x"))) << Error();
+    EXPECT_EQ(Rows(target), "1");
+}
+
+TEST_F(DatabaseFile, GetsTheRowsAfterItReplacedAnother) {
+    OpenStore();
+    ASSERT_TRUE(Exec(Insert("old"))) << Error();
+    ReplaceStore();
+    EXPECT_TRUE(Exec(Insert("new"))) << Error();
+    EXPECT_EQ(Ask(Store(), "select group_concat(eventID) from OperLog"), "new");
+    EXPECT_EQ(Ask(Store(), "pragma integrity_check"), "ok");
+}
+
+TEST_F(DatabaseFile, GetsTheBatchAndAnswersTheQueryAfterItReplacedAnother) {
+    OpenStore();
+    ASSERT_TRUE(Exec(Insert("old"))) << Error();
+    ReplaceStore();
+    std::vector<std::vector<std::string>> rows;
+    EXPECT_TRUE(Plugin()->QuerySql("select eventID from OperLog", rows)) << Error();
+    EXPECT_TRUE(rows.empty());
+    ReplaceStore();
+    EXPECT_TRUE(Plugin()->BatExecSql({Insert("a"), Insert("b")})) << Error();
+    EXPECT_EQ(Rows(Store()), "2");
+}
+
+TEST_F(DatabaseFile, ReplacesOneThatRefusedTheStatement) {
+    OpenStore();
+    SQLite::Database(Store(), SQLite::OPEN_READWRITE).exec("drop table OperLog");
+    EXPECT_FALSE(Exec(Insert("lost")));
+    ReplaceStore();
+    EXPECT_TRUE(Exec(Insert("kept"))) << Error();
+}
+
+TEST_F(DatabaseFile, IsMissedAfterItsDeletionAndUsedWhenItIsBack) {
+    OpenStore();
+    ASSERT_TRUE(Exec(Insert("old"))) << Error();
+    fs::remove(Store());
+    EXPECT_FALSE(Exec(Insert("lost")));
+    EXPECT_EQ(Error(), "unable to open database file");
+    ReplaceStore();
+    EXPECT_TRUE(Exec(Insert("kept"))) << Error();
+    EXPECT_EQ(Ask(Store(), "select group_concat(eventID) from OperLog"), "kept");
+    EXPECT_EQ(Ask(Store(), "pragma integrity_check"), "ok");
+}
+
+TEST_F(DatabaseFile, KeepsItsRowsWhenItIsMovedAway) {
+    OpenStore();
+    ASSERT_TRUE(Exec(Insert("old"))) << Error();
+    const auto moved = Directory() + "/Moved.db";
+    fs::rename(Store(), moved);
+    EXPECT_FALSE(Exec(Insert("lost")));
+    EXPECT_NE(Ask(moved, "select count(*) from OperLog where eventID = 'old'"), "0");
+    EXPECT_EQ(Ask(moved, "pragma integrity_check"), "ok");
+}
+
+TEST_F(DatabaseFile, IsNotTouchedWhenItIsNoDatabase) {
+    const std::string content(9000, 'x');
+    Overwrite(Store(), content);
+    EXPECT_FALSE(Plugin()->Open(Store()));
+    EXPECT_EQ(Error(), "file is not a database");
+    EXPECT_FALSE(Exec(Insert("lost")));
+    EXPECT_EQ(ContentOf(Store()), content);
+
+    ReplaceStore();
+    EXPECT_TRUE(Exec(Insert("kept"))) << Error();
+    EXPECT_EQ(Rows(Store()), "1");
+}
+
+TEST_F(DatabaseFile, IsNoticedToBeDamagedWhileItIsOpen) {
+    OpenStore();
+    ASSERT_TRUE(Exec(Insert("old"))) << Error();
+    Overwrite(Store(), std::string(9000, 'x'));
+    EXPECT_FALSE(Exec(Insert("lost")));
+    EXPECT_EQ(Error(), "file is not a database");
+    ReplaceStore();
+    EXPECT_TRUE(Exec(Insert("kept"))) << Error();
+    EXPECT_EQ(Ask(Store(), "select group_concat(eventID) from OperLog"), "kept");
+    EXPECT_EQ(Ask(Store(), "pragma integrity_check"), "ok");
+}
+
+TEST_F(DatabaseFile, TakesRowsOnceItMayBeWritten) {
+    MakeStore(Store());
+    fs::permissions(Store(), fs::perms{0400});
+    ChildProcess user([&](const auto&) {
+        if (!BecomeAnOrdinaryUser())
+            return 1;
+        (void)Plugin()->Open(Store());
+        if (Exec(Insert("lost")) || Error() != "attempt to write a readonly database")
+            return 2;
+        fs::permissions(Store(), fs::perms{0600});
+        return Exec(Insert("kept")) ? 0 : 3;
+    });
+    EXPECT_EQ(WEXITSTATUS(user.Wait()), 0);
+    EXPECT_EQ(Rows(Store()), "1");
+}
+
+TEST_F(DatabaseFile, GetsTheRowAfterAnotherProcessHeldTheLockForThreeSeconds) {
+    MakeStore(Store());
+    ChildProcess holder([&](const auto& tell) {
+        SQLite::Database database(Store(), SQLite::OPEN_READWRITE);
+        database.exec("begin immediate");
+        tell();
+        ::sleep(3);
+        database.exec("commit");
+        return 0;
+    });
+    ASSERT_TRUE(holder.WaitUntilItTold());
+    const auto start = std::chrono::steady_clock::now();
+    ASSERT_TRUE(Plugin()->Open(Store())) << Error();
+    EXPECT_TRUE(Exec(Insert("x"))) << Error();
+    EXPECT_GT(std::chrono::steady_clock::now() - start, std::chrono::milliseconds(2500));
+    EXPECT_EQ(Rows(Store()), "1");
+}
+
+TEST_F(DatabaseFile, HoldsTheRowOfAProcessThatWasKilledRightAfterItsStatement) {
+    MakeStore(Store());
+    for (int killed = 1; killed <= 5; ++killed) {
+        ChildProcess writer([&](const auto&) {
+            Loader loader(PluginPath());
+            if (!loader.GetModule()->Open(Store()) || !loader.GetModule()->ExecSql(Insert("x")))
+                return 1;
+            ::raise(SIGKILL);
+            return 2;
+        });
+        const int status = writer.Wait();
+        ASSERT_TRUE(WIFSIGNALED(status) && WTERMSIG(status) == SIGKILL);
+        EXPECT_EQ(Rows(Store()), std::to_string(killed));
+        EXPECT_EQ(Ask(Store(), "pragma integrity_check"), "ok");
+    }
+}
+
+} // namespace
