@@ -1,0 +1,27 @@
+#pragma once
+
+#include <string>
+
+namespace CLI {
+class App;
+}
+
+namespace reportctl {
+
+struct SetupOptions {
+    bool dryRun = false;
+    std::string openID;         ///< empty: not to be set
+    std::string suiteVersion;   ///< empty: not to be set
+    std::string preferencesDir; ///< where the service keeps its pid file
+};
+
+/// Adds the command `setup` to the command line. When it was given, parsing runs it and puts the program's
+/// exit code into `exitCode`, which must outlive `app`'s parsing.
+void AddSetup(CLI::App& app, int& exitCode);
+
+/// Makes what the service needs and finds missing: its directories, the store with its tables, and what is
+/// told about the user. What is there already stays as it is. One failure does not keep the rest from being
+/// made. Returns the exit code: 0, or 1 when something could not be done.
+int RunSetup(const SetupOptions& options);
+
+} // namespace reportctl

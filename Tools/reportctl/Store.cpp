@@ -1,0 +1,195 @@
+#include "Tools/reportctl/Store.h"
+
+#include <cerrno>
+#include <cstdlib>
+#include <filesystem>
+#include <system_error>
+
+#include <SQLiteCpp/Database.h>
+#include <SQLiteCpp/Exception.h>
+#include <SQLiteCpp/Statement.h>
+#include <SQLiteCpp/Transaction.h>
+#include <fmt/format.h>
+#include <sqlite3.h>
+#include <unistd.h>
+
+#include "Tools/reportctl/Schema.h"
+
+namespace reportctl {
+namespace {
+
+namespace fs = std::filesystem;
+
+constexpr auto PRIVATE_FILE = fs::perms::owner_read | fs::perms::owner_write;
+
+/// A running service holds the write lock for moments; a person can wait for five seconds, not for ever.
+constexpr int BUSY_TIMEOUT_MS = 5000;
+
+constexpr auto SIDE_FILES = {"-wal", "-shm", "-journal"};
+
+SQLite::Database OpenStore(const std::string& path) {
+    return SQLite::Database(path, SQLite::OPEN_READWRITE, BUSY_TIMEOUT_MS);
+}
+
+/// A new, private, empty file beside the one that it is for. Gone, with SQLite's files beside it, at the end.
+class DraftFile {
+public:
+    explicit DraftFile(const std::string& path) : m_path(path + ".new-XXXXXX") {
+        const int file = ::mkstemp(m_path.data());
+        if (file < 0)
+            throw std::runtime_error(std::generic_category().message(errno));
+        ::close(file);
+    }
+
+    ~DraftFile() {
+        std::error_code ignored;
+        fs::remove(m_path, ignored);
+        for (const auto* suffix : SIDE_FILES)
+            fs::remove(m_path + suffix, ignored);
+    }
+
+    DraftFile(const DraftFile&) = delete;
+    DraftFile& operator=(const DraftFile&) = delete;
+
+    const std::string& Path() const { return m_path; }
+
+private:
+    std::string m_path;
+};
+
+/// Side files without their database: what a deleted one left behind, or what a service that still has the
+/// deleted one open goes on writing. SQLite would read the new database through them and damage it.
+void RemoveOrphanedSideFiles(Worklog& log, const std::string& path) {
+    for (const auto* suffix : SIDE_FILES)
+        if (const auto file = path + suffix; fs::exists(file))
+            log.Do(REMOVE, file + ", which belonged to a store that is gone", [&] { fs::remove(file); });
+}
+
+void CreateStore(const std::string& path) {
+    const DraftFile draft(path);
+    {
+        auto database = OpenStore(draft.Path());
+        database.exec("pragma journal_mode = wal");
+        RunInTransaction(database, StatementsToCurrentSchema(database));
+    }
+    fs::create_hard_link(draft.Path(), path); // fails rather than replacing one that has appeared
+}
+
+bool EnsureNewStore(Worklog& log, const std::string& path) {
+    RemoveOrphanedSideFiles(log, path);
+    return log.Do(
+        MAKE, fmt::format("store {} (mode 0600, schema version {})", path, SCHEMA_VERSION),
+        [&] { CreateStore(path); }, "Run this again once that is remedied.");
+}
+
+bool EnsureSchema(Worklog& log, SQLite::Database& database, const std::string& path) {
+    const int version = SchemaVersionOf(database);
+    if (version > SCHEMA_VERSION) {
+        log.Fail(fmt::format("{} has schema version {}, this program knows {}: it was left as it is. Use the "
+                             "reportctl of the newer installation.",
+                             path, version, SCHEMA_VERSION));
+        return false;
+    }
+    const auto statements = StatementsToCurrentSchema(database);
+    const auto thing = fmt::format("store {} (schema version {})", path, SCHEMA_VERSION);
+    if (statements.empty()) {
+        log.Keep(thing);
+        return true;
+    }
+    return log.Do(
+        MIGRATE, fmt::format("{} from version {}, keeping its rows", thing, version),
+        [&] { RunInTransaction(database, statements); }, "The store was left as it is.");
+}
+
+bool IsPrivate(const std::string& file) {
+    return !fs::exists(file) || fs::status(file).permissions() == PRIVATE_FILE;
+}
+
+void EnsurePrivateFiles(Worklog& log, const std::string& path) {
+    for (const auto* suffix : {"", "-wal", "-shm", "-journal"})
+        if (const auto file = path + suffix; !IsPrivate(file))
+            log.Do(
+                CHANGE, fmt::format("mode of {} to 0600", file), [&] { fs::permissions(file, PRIVATE_FILE); },
+                "The file's owner must do that.");
+}
+
+void EnsureWriteAheadLog(Worklog& log, SQLite::Database& database, const std::string& path) {
+    if (database.execAndGet("pragma journal_mode").getString() != "wal")
+        log.Do(
+            CHANGE, fmt::format("journal of {} to a write-ahead log", path),
+            [&] { database.exec("pragma journal_mode = wal"); }, "Stop who uses it and run this again.");
+}
+
+/// The modes are looked at while the store is closed: opening it makes side files of the mode that is about
+/// to be changed.
+bool EnsureExistingStore(Worklog& log, const std::string& path) {
+    if (auto database = OpenStore(path); !EnsureSchema(log, database, path))
+        return false;
+    EnsurePrivateFiles(log, path);
+    auto database = OpenStore(path);
+    EnsureWriteAheadLog(log, database, path);
+    return true;
+}
+
+bool HasBaseInfo(SQLite::Database& database, const std::string& key, const std::string& value) {
+    if (!database.tableExists("BaseInfo"))
+        return false; // a dry run would make it
+    SQLite::Statement query(database, "select count(*), total(value is ?) from BaseInfo where key = ?");
+    query.bind(1, value);
+    query.bind(2, key);
+    query.executeStep();
+    return query.getColumn(0).getInt() > 0 && query.getColumn(0).getInt() == query.getColumn(1).getInt();
+}
+
+/// All rows of the key, where others left several: the service would take the last.
+void WriteBaseInfo(SQLite::Database& database, const std::string& key, const std::string& value) {
+    SQLite::Transaction transaction(database, SQLite::TransactionBehavior::IMMEDIATE);
+    SQLite::Statement update(database, "update BaseInfo set value = ? where key = ?");
+    update.bind(1, value);
+    update.bind(2, key);
+    if (update.exec() == 0) {
+        SQLite::Statement insert(database, "insert into BaseInfo (key, value) values (?, ?)");
+        insert.bind(1, key);
+        insert.bind(2, value);
+        insert.exec();
+    }
+    transaction.commit();
+}
+
+} // namespace
+
+bool EnsureStore(Worklog& log, const std::string& path) {
+    try {
+        if (!fs::exists(path))
+            return EnsureNewStore(log, path);
+        return EnsureExistingStore(log, path);
+    } catch (const SQLite::Exception& error) {
+        const bool isDatabase =
+            error.getErrorCode() != SQLITE_NOTADB && error.getErrorCode() != SQLITE_CORRUPT;
+        log.Fail(fmt::format("{}: {}. It was left as it is.{}", path, error.what(),
+                             isDatabase ? "" : " Move it away and run this again to get a new store."));
+    } catch (const std::exception& error) {
+        log.Fail(fmt::format("{}: {}. It was left as it is.", path, error.what()));
+    }
+    return false;
+}
+
+void EnsureBaseInfo(Worklog& log, const std::string& path, const std::string& key, const std::string& value) {
+    const auto thing = fmt::format("{} to \"{}\" in the table BaseInfo", key, value);
+    try {
+        if (log.IsDryRun() && !fs::exists(path)) {
+            log.Do(SET, thing, [] {});
+            return;
+        }
+        auto database = OpenStore(path);
+        if (HasBaseInfo(database, key, value))
+            log.Keep(fmt::format("{} \"{}\" in the table BaseInfo", key, value));
+        else
+            log.Do(
+                SET, thing, [&] { WriteBaseInfo(database, key, value); }, "Run this again.");
+    } catch (const std::exception& error) {
+        log.Fail(fmt::format("{}: {}.", path, error.what()));
+    }
+}
+
+} // namespace reportctl

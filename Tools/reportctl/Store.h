@@ -1,0 +1,22 @@
+#pragma once
+
+#include <string>
+
+#include "Tools/reportctl/Worklog.h"
+
+namespace reportctl {
+
+/// Makes sure of the database at `path`: mode 0600, write-ahead log, the tables of the current schema.
+///
+/// A new one is built under another name and gets its own in one step: nobody ever sees half a store, and one
+/// that appears meanwhile is not overwritten. An older schema is migrated, with its rows, in one transaction.
+/// A file that is no database, and a schema that is newer than this program, are left as they are.
+///
+/// False when there is no store to go on with; the log has the reason. True in a dry run that would make it.
+bool EnsureStore(Worklog& log, const std::string& path);
+
+/// Makes sure that the table BaseInfo of the database at `path` holds `value` under `key`, and no other value
+/// under it.
+void EnsureBaseInfo(Worklog& log, const std::string& path, const std::string& key, const std::string& value);
+
+} // namespace reportctl

@@ -1,0 +1,91 @@
+#pragma once
+
+#include <cstdio>
+#include <filesystem>
+#include <fstream>
+#include <map>
+#include <string>
+
+#include <SQLiteCpp/Database.h>
+#include <SQLiteCpp/Statement.h>
+#include <gtest/gtest.h>
+#include <sys/wait.h>
+
+#include "tests/support/TemporaryDirectory.h"
+
+/// Runs reportctl with a home and a preferences directory of the test's own.
+class ReportctlFixture : public testing::Test {
+protected:
+    struct Outcome {
+        int exitCode = -1;
+        std::string output; ///< standard output and standard error
+
+        bool Says(const std::string& text) const { return output.find(text) != std::string::npos; }
+    };
+
+    /// Runs `reportctl setup` with these arguments; `shell` is what the shell does before, such as
+    /// "umask 0 &&".
+    Outcome RunSetup(const std::string& arguments = {}, const std::string& shell = {}) const {
+        return Reportctl("setup --preferences-dir '" + Preferences() + "' " + arguments, shell);
+    }
+
+    Outcome Reportctl(const std::string& arguments, const std::string& shell = {}) const {
+        const auto command = shell + " XDG_DATA_HOME='" + Data() + "' '" REPORTCTL "' " + arguments + " 2>&1";
+        Outcome outcome;
+        FILE* pipe = ::popen(command.c_str(), "r");
+        if (pipe == nullptr)
+            return outcome;
+        for (int c = std::fgetc(pipe); c != EOF; c = std::fgetc(pipe))
+            outcome.output += static_cast<char>(c);
+        const int status = ::pclose(pipe);
+        outcome.exitCode = WIFEXITED(status) ? WEXITSTATUS(status) : -1;
+        return outcome;
+    }
+
+    std::string Data() const { return m_directory.Path() + "/data"; }
+    std::string Preferences() const { return m_directory.Path() + "/preferences/hublink"; }
+    std::string Database() const { return Data() + "/hublink/database"; }
+    std::string Store() const { return Database() + "/Report.db"; }
+
+    static unsigned ModeOf(const std::string& path) {
+        return static_cast<unsigned>(std::filesystem::symlink_status(path).permissions());
+    }
+
+    static std::string ContentOf(const std::string& path) {
+        std::ifstream file(path, std::ios::binary);
+        return {std::istreambuf_iterator<char>(file), {}};
+    }
+
+    /// Everything below the test's directory: each path with its mode, each file with its content.
+    std::map<std::string, std::string> Everything() const {
+        std::map<std::string, std::string> all;
+        for (const auto& entry : std::filesystem::recursive_directory_iterator(m_directory.Path()))
+            all[entry.path()] = std::to_string(ModeOf(entry.path())) +
+                                (entry.is_regular_file() ? ContentOf(entry.path()) : "");
+        return all;
+    }
+
+    /// A database that somebody made by hand, where set-up looks for one.
+    void MakeStore(const std::string& sql) const {
+        std::filesystem::create_directories(Database());
+        SQLite::Database(Store(), SQLite::OPEN_READWRITE | SQLite::OPEN_CREATE).exec(sql);
+    }
+
+    /// The first cell that the query returns.
+    std::string Ask(const std::string& query) const {
+        SQLite::Database database(Store(), SQLite::OPEN_READWRITE);
+        SQLite::Statement statement(database, query);
+        return statement.executeStep() ? statement.getColumn(0).getString() : "(no row)";
+    }
+
+    std::string ColumnsOf(const std::string& table) const {
+        return Ask("select group_concat(name || ' ' || type || pk) from pragma_table_info('" + table + "')");
+    }
+
+    static constexpr auto OPER_LOG_COLUMNS =
+        "id INTEGER1,eventID TEXT0,value TEXT0,createTime TEXT0,pType INTEGER0,extData1 TEXT0,"
+        "extData2 TEXT0,extData3 TEXT0,extData4 TEXT0";
+
+private:
+    TemporaryDirectory m_directory;
+};

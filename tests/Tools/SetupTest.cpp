@@ -1,0 +1,210 @@
+#include "tests/Tools/ReportctlFixture.h"
+
+namespace {
+
+namespace fs = std::filesystem;
+
+class Setup : public ReportctlFixture {
+protected:
+    void ExpectEverythingMade() const {
+        EXPECT_EQ(ModeOf(Preferences()), 01777u);
+        for (const auto* directory : {"", "/database", "/log", "/log/metrik"})
+            EXPECT_EQ(ModeOf(Data() + "/hublink" + directory), 0700u) << directory;
+        EXPECT_EQ(ModeOf(Store()), 0600u);
+        EXPECT_EQ(ColumnsOf("OperLog"), OPER_LOG_COLUMNS);
+        EXPECT_EQ(ColumnsOf("BaseInfo"), "key TEXT0,value TEXT0");
+        EXPECT_EQ(Ask("pragma user_version"), "1");
+        EXPECT_EQ(Ask("pragma journal_mode"), "wal");
+        EXPECT_EQ(Ask("pragma integrity_check"), "ok");
+    }
+
+    std::string Files() const {
+        std::string names;
+        for (const auto& entry : fs::directory_iterator(Database()))
+            names += entry.path().filename().string() + " ";
+        return names;
+    }
+};
+
+TEST_F(Setup, MakesEverythingThatIsMissing) {
+    const auto outcome = RunSetup();
+    EXPECT_EQ(outcome.exitCode, 0) << outcome.output;
+    EXPECT_TRUE(outcome.Says("made directory " + Preferences() + " (mode 1777)\n")) << outcome.output;
+    EXPECT_TRUE(outcome.Says("made store " + Store() + " (mode 0600, schema version 1)\n"));
+    ExpectEverythingMade();
+    EXPECT_EQ(Files(), "Report.db ");
+}
+
+TEST_F(Setup, GivesTheSameModesWhateverTheUmask) {
+    for (const auto* umask : {"umask 0 &&", "umask 0777 &&"}) {
+        EXPECT_EQ(RunSetup("", umask).exitCode, 0);
+        ExpectEverythingMade();
+        EXPECT_EQ(ModeOf(Data()), 0700u);
+        EXPECT_EQ(ModeOf(fs::path(Preferences()).parent_path()), 0755u);
+        fs::remove_all(Data());
+        fs::remove_all(fs::path(Preferences()).parent_path());
+    }
+}
+
+TEST_F(Setup, ChangesNothingTheSecondTimeAndSaysSo) {
+    ASSERT_EQ(RunSetup("--open-id u1").exitCode, 0);
+    const auto before = Everything();
+    const auto outcome = RunSetup("--open-id u1");
+    EXPECT_EQ(outcome.exitCode, 0);
+    EXPECT_TRUE(outcome.Says("already there: store " + Store())) << outcome.output;
+    EXPECT_TRUE(outcome.Says("nothing to do")) << outcome.output;
+    EXPECT_FALSE(outcome.Says("made")) << outcome.output;
+    EXPECT_TRUE(Everything() == before);
+}
+
+TEST_F(Setup, SaysWhatItWouldMakeAndMakesNothing) {
+    const auto before = Everything();
+    const auto outcome = RunSetup("--dry-run --open-id u1");
+    EXPECT_EQ(outcome.exitCode, 0) << outcome.output;
+    EXPECT_TRUE(outcome.Says("would make directory " + Preferences())) << outcome.output;
+    EXPECT_TRUE(outcome.Says("would make store " + Store()));
+    EXPECT_TRUE(outcome.Says("would set OpenID to \"u1\""));
+    EXPECT_TRUE(Everything() == before);
+}
+
+TEST_F(Setup, StoresTheOpenIdAndTheVersion) {
+    EXPECT_EQ(RunSetup("--open-id u1 --suite-version 5.1.0.2").exitCode, 0);
+    EXPECT_EQ(Ask("select group_concat(key || '=' || value) from BaseInfo"),
+              "OpenID=u1,HubLinkVersion=5.1.0.2");
+}
+
+TEST_F(Setup, ReplacesTheOpenIdAndKeepsTheRest) {
+    EXPECT_EQ(RunSetup("--open-id u1 --suite-version 5.1.0.2").exitCode, 0);
+    EXPECT_EQ(RunSetup("--open-id u2").exitCode, 0);
+    EXPECT_EQ(Ask("select group_concat(key || '=' || value) from BaseInfo"),
+              "OpenID=u2,HubLinkVersion=5.1.0.2");
+}
+
+TEST_F(Setup, ReplacesEveryRowOfAKeyThatOthersStoredTwice) {
+    ASSERT_EQ(RunSetup("--open-id u1").exitCode, 0);
+    SQLite::Database(Store(), SQLite::OPEN_READWRITE)
+        .exec("insert into BaseInfo values ('OpenID', 'u2'), ('openid', 'other')");
+    EXPECT_EQ(RunSetup("--open-id u1").exitCode, 0);
+    EXPECT_EQ(Ask("select group_concat(key || '=' || value) from BaseInfo"),
+              "OpenID=u1,OpenID=u1,openid=other");
+}
+
+TEST_F(Setup, StoresATextThatLooksLikeSqlAsItIsAndWarnsOfTheQuote) {
+    const auto outcome = RunSetup("--open-id \"x'); drop table OperLog; --\"");
+    EXPECT_EQ(outcome.exitCode, 0) << outcome.output;
+    EXPECT_TRUE(outcome.Says("warning: ")) << outcome.output;
+    EXPECT_EQ(Ask("select value from BaseInfo"), "x'); drop table OperLog; --");
+    EXPECT_EQ(ColumnsOf("OperLog"), OPER_LOG_COLUMNS);
+}
+
+TEST_F(Setup, RefusesAnEmptyOpenId) {
+    const auto outcome = RunSetup("--open-id ''");
+    EXPECT_GE(outcome.exitCode, 100);
+    EXPECT_TRUE(outcome.Says("an empty text would have no effect")) << outcome.output;
+    EXPECT_FALSE(fs::exists(Data()));
+}
+
+TEST_F(Setup, TellsHowToGetTheRightToThePreferencesDirectoryAndDoesTheRest) {
+    // Nobody, not even root, can make a directory there.
+    const auto outcome = Reportctl("setup --preferences-dir /sys/reportctl-test/hublink");
+    EXPECT_EQ(outcome.exitCode, 1);
+    EXPECT_TRUE(outcome.Says("Run: sudo install -d -m 1777 /sys/reportctl-test/hublink\n")) << outcome.output;
+    EXPECT_EQ(ModeOf(Store()), 0600u);
+}
+
+TEST_F(Setup, QuotesThePathInTheCommandThatItTells) {
+    const auto outcome = Reportctl("setup --preferences-dir \"/sys/it's here\"");
+    EXPECT_TRUE(outcome.Says("sudo install -d -m 1777 '/sys/it'\\''s here'\n")) << outcome.output;
+}
+
+TEST_F(Setup, CorrectsTheModeOfThePreferencesDirectory) {
+    fs::create_directories(Preferences());
+    fs::permissions(Preferences(), fs::perms{0777});
+    const auto outcome = RunSetup();
+    EXPECT_EQ(outcome.exitCode, 0);
+    EXPECT_TRUE(outcome.Says("changed directory " + Preferences() + " (mode 1777)")) << outcome.output;
+    EXPECT_EQ(ModeOf(Preferences()), 01777u);
+}
+
+TEST_F(Setup, DoesNotOpenToAllWhatALinkPointsTo) {
+    const auto target = fs::path(Preferences()).parent_path() / "target";
+    fs::create_directories(target);
+    fs::permissions(target, fs::perms{0700});
+    fs::create_symlink(target, Preferences());
+    const auto outcome = RunSetup();
+    EXPECT_EQ(outcome.exitCode, 1);
+    EXPECT_TRUE(outcome.Says(Preferences() + " is not a directory")) << outcome.output;
+    EXPECT_EQ(ModeOf(target), 0700u);
+    EXPECT_TRUE(fs::exists(Store()));
+}
+
+TEST_F(Setup, MakesTheUsersOwnDirectoriesPrivate) {
+    fs::create_directories(Database());
+    fs::permissions(Database(), fs::perms{0755});
+    const auto outcome = RunSetup();
+    EXPECT_EQ(outcome.exitCode, 0);
+    EXPECT_TRUE(outcome.Says("changed directory " + Database() + " (mode 0700)")) << outcome.output;
+    EXPECT_EQ(ModeOf(Database()), 0700u);
+}
+
+TEST_F(Setup, LetsTheUserKeepTheDataBehindALink) {
+    const auto elsewhere = Data() + "/elsewhere";
+    fs::create_directories(elsewhere);
+    fs::create_symlink(elsewhere, Data() + "/hublink");
+    EXPECT_EQ(RunSetup().exitCode, 0);
+    EXPECT_EQ(ModeOf(elsewhere), 0700u);
+    EXPECT_TRUE(fs::exists(elsewhere + "/database/Report.db"));
+}
+
+TEST_F(Setup, FailsOverAFileInTheWayOfADirectory) {
+    fs::create_directories(Data());
+    std::ofstream(Data() + "/hublink") << "in the way";
+    const auto outcome = RunSetup();
+    EXPECT_EQ(outcome.exitCode, 1);
+    EXPECT_TRUE(outcome.Says(Data() + "/hublink is not a directory. Move it away")) << outcome.output;
+    EXPECT_EQ(ContentOf(Data() + "/hublink"), "in the way");
+}
+
+TEST_F(Setup, RemovesWhatADeletedStoreLeftBehind) {
+    fs::create_directories(Database());
+    for (const auto* suffix : {"-wal", "-shm", "-journal"})
+        std::ofstream(Store() + suffix) << "left behind";
+    const auto outcome = RunSetup();
+    EXPECT_EQ(outcome.exitCode, 0) << outcome.output;
+    EXPECT_TRUE(outcome.Says("removed " + Store() + "-wal")) << outcome.output;
+    ExpectEverythingMade();
+}
+
+TEST_F(Setup, MakesTheStorePrivateThatOthersCouldRead) {
+    ASSERT_EQ(RunSetup().exitCode, 0);
+    fs::permissions(Store(), fs::perms{0644});
+    EXPECT_TRUE(RunSetup("--dry-run").Says("would change mode of " + Store() + " to 0600\ndry run"));
+    EXPECT_EQ(ModeOf(Store()), 0644u);
+    EXPECT_TRUE(RunSetup().Says("changed mode of " + Store() + " to 0600\n"));
+    EXPECT_EQ(ModeOf(Store()), 0600u);
+}
+
+TEST_F(Setup, WorksWhileTheStoreIsInUse) {
+    ASSERT_EQ(RunSetup().exitCode, 0);
+    SQLite::Database service(Store(), SQLite::OPEN_READWRITE);
+    service.exec("insert into OperLog (eventID) values ('x')");
+    EXPECT_EQ(RunSetup("--open-id u1").exitCode, 0);
+    service.exec("insert into OperLog (eventID) values ('y')");
+    EXPECT_EQ(Ask("select (select count(*) from OperLog) || value from BaseInfo"), "2u1");
+}
+
+TEST_F(Setup, ExplainsItsExitCodes) {
+    for (const auto* arguments : {"--help", "setup --help"}) {
+        const auto outcome = Reportctl(arguments);
+        EXPECT_EQ(outcome.exitCode, 0);
+        EXPECT_TRUE(outcome.Says("Exit codes: 0 done")) << outcome.output;
+    }
+}
+
+TEST_F(Setup, DoesNothingForACommandLineThatItDoesNotUnderstand) {
+    for (const auto* arguments : {"", "nonsense", "setup --nonsense"})
+        EXPECT_GE(Reportctl(arguments).exitCode, 100) << arguments;
+    EXPECT_FALSE(fs::exists(Data()));
+}
+
+} // namespace
