@@ -69,20 +69,23 @@ Connection::Connection(const std::string& path, const Settings& settings)
 
 /// SQLite checkpoints on closing, unless the file has lost its name. Then the write-ahead log keeps its own
 /// name and its rows, and whatever database is put at the path next would be read through it and be damaged.
-/// Emptying the log into the file that it belongs to keeps both databases whole.
+/// Emptying the log into the file that it belongs to keeps both databases whole. A file that kept its name
+/// and was damaged gets its rows, too, for the same reason.
 Connection::~Connection() {
-    int moved = 0;
-    sqlite3_file_control(m_database.getHandle(), "main", SQLITE_FCNTL_HAS_MOVED, &moved);
-    if (moved == 0)
+    if (!HasLostItsName())
         return;
     sqlite3_busy_timeout(m_database.getHandle(), 0); // a reader that stays is no reason to wait here
     sqlite3_wal_checkpoint_v2(m_database.getHandle(), "main", SQLITE_CHECKPOINT_TRUNCATE, nullptr, nullptr);
 }
 
 bool Connection::IsInPlace() {
+    return !HasLostItsName() && HasDatabaseHeader();
+}
+
+bool Connection::HasLostItsName() {
     int moved = 0;
     sqlite3_file_control(m_database.getHandle(), "main", SQLITE_FCNTL_HAS_MOVED, &moved);
-    return moved == 0 && HasDatabaseHeader();
+    return moved != 0;
 }
 
 /// Read through SQLite's own handle of the file: opening the file a second time and closing it would drop

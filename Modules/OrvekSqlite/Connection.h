@@ -1,6 +1,5 @@
 #pragma once
 
-#include <memory>
 #include <string>
 
 #include <SQLiteCpp/Database.h>
@@ -42,6 +41,7 @@ public:
     bool IsInPlace();
 
 private:
+    bool HasLostItsName();
     bool HasDatabaseHeader();
 
     StatementGuard m_guard; ///< outlives the connection that calls it

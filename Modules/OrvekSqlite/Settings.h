@@ -32,9 +32,9 @@ struct Limits {
     /// slack that is still some 10 milliseconds.
     std::int64_t insertSteps = 1'000'000;
 
-    /// Steps for any other statement. A whole pass over 5 million rows takes some 50 million; endless ones
-    /// end after some seconds.
-    std::int64_t statementSteps = 200'000'000;
+    /// Steps for any other statement. A whole pass over 5 million rows takes some 50 million; an
+    /// endless one ends after a second or two.
+    std::int64_t statementSteps = 100'000'000;
 };
 
 /// How the database is opened.

@@ -2,6 +2,7 @@
 
 #include <cerrno>
 #include <filesystem>
+#include <stdexcept>
 #include <system_error>
 
 #include <fcntl.h>

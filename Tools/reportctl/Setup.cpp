@@ -4,10 +4,10 @@
 #include <memory>
 
 #include <CLI/CLI.hpp>
-#include <fmt/format.h>
 
 #include "Common/Constants.h"
 #include "SystemTool/CommonTool.h"
+#include "Tools/reportctl/BaseInfo.h"
 #include "Tools/reportctl/Directories.h"
 #include "Tools/reportctl/Store.h"
 #include "Tools/reportctl/Worklog.h"
@@ -15,24 +15,11 @@
 namespace reportctl {
 namespace {
 
-/// The keys that the service looks for, to the letter.
-constexpr auto OPEN_ID_KEY = "OpenID";
-constexpr auto SUITE_VERSION_KEY = "HubLinkVersion";
-
-/// The service puts both texts into its statements without escaping them, and the database then refuses every
-/// report. What the suite uses as an id is its own affair, so this is no error here.
-void WarnOfQuotes(Worklog& log, const std::string& text) {
-    if (text.find('\'') != std::string::npos)
-        log.Warn(fmt::format("\"{}\" holds a single quote: the service will not be able to store any report "
-                             "while it is set",
-                             text));
-}
-
-void SetUpBaseInfo(Worklog& log, const std::string& store, const char* key, const std::string& value) {
-    if (value.empty())
-        return;
-    WarnOfQuotes(log, value);
-    EnsureBaseInfo(log, store, key, value);
+void SetUpBaseInfo(Worklog& log, const std::string& store, const SetupOptions& options) {
+    if (!options.openID.empty())
+        EnsureBaseInfo(log, store, OPEN_ID_KEY, options.openID);
+    if (!options.suiteVersion.empty())
+        EnsureBaseInfo(log, store, SUITE_VERSION_KEY, options.suiteVersion);
 }
 
 void SetUpUserData(Worklog& log, const SetupOptions& options) {
@@ -45,10 +32,8 @@ void SetUpUserData(Worklog& log, const SetupOptions& options) {
     for (const auto* directory : {"", "/database", "/log", "/log/metrik"})
         EnsurePrivateDirectory(log, root + directory);
     const auto store = root + "/database/Report.db";
-    if (!EnsureStore(log, store))
-        return;
-    SetUpBaseInfo(log, store, OPEN_ID_KEY, options.openID);
-    SetUpBaseInfo(log, store, SUITE_VERSION_KEY, options.suiteVersion);
+    if (EnsureStore(log, store))
+        SetUpBaseInfo(log, store, options);
 }
 
 } // namespace

@@ -3,12 +3,10 @@
 #include <cerrno>
 #include <cstdlib>
 #include <filesystem>
+#include <stdexcept>
 #include <system_error>
 
-#include <SQLiteCpp/Database.h>
 #include <SQLiteCpp/Exception.h>
-#include <SQLiteCpp/Statement.h>
-#include <SQLiteCpp/Transaction.h>
 #include <fmt/format.h>
 #include <sqlite3.h>
 #include <unistd.h>
@@ -26,10 +24,6 @@ constexpr auto PRIVATE_FILE = fs::perms::owner_read | fs::perms::owner_write;
 constexpr int BUSY_TIMEOUT_MS = 5000;
 
 constexpr auto SIDE_FILES = {"-wal", "-shm", "-journal"};
-
-SQLite::Database OpenStore(const std::string& path) {
-    return SQLite::Database(path, SQLite::OPEN_READWRITE, BUSY_TIMEOUT_MS);
-}
 
 /// A new, private, empty file beside the one that it is for. Gone, with SQLite's files beside it, at the end.
 class DraftFile {
@@ -131,32 +125,11 @@ bool EnsureExistingStore(Worklog& log, const std::string& path) {
     return true;
 }
 
-bool HasBaseInfo(SQLite::Database& database, const std::string& key, const std::string& value) {
-    if (!database.tableExists("BaseInfo"))
-        return false; // a dry run would make it
-    SQLite::Statement query(database, "select count(*), total(value is ?) from BaseInfo where key = ?");
-    query.bind(1, value);
-    query.bind(2, key);
-    query.executeStep();
-    return query.getColumn(0).getInt() > 0 && query.getColumn(0).getInt() == query.getColumn(1).getInt();
-}
-
-/// All rows of the key, where others left several: the service would take the last.
-void WriteBaseInfo(SQLite::Database& database, const std::string& key, const std::string& value) {
-    SQLite::Transaction transaction(database, SQLite::TransactionBehavior::IMMEDIATE);
-    SQLite::Statement update(database, "update BaseInfo set value = ? where key = ?");
-    update.bind(1, value);
-    update.bind(2, key);
-    if (update.exec() == 0) {
-        SQLite::Statement insert(database, "insert into BaseInfo (key, value) values (?, ?)");
-        insert.bind(1, key);
-        insert.bind(2, value);
-        insert.exec();
-    }
-    transaction.commit();
-}
-
 } // namespace
+
+SQLite::Database OpenStore(const std::string& path) {
+    return SQLite::Database(path, SQLite::OPEN_READWRITE, BUSY_TIMEOUT_MS);
+}
 
 bool EnsureStore(Worklog& log, const std::string& path) {
     try {
@@ -172,24 +145,6 @@ bool EnsureStore(Worklog& log, const std::string& path) {
         log.Fail(fmt::format("{}: {}. It was left as it is.", path, error.what()));
     }
     return false;
-}
-
-void EnsureBaseInfo(Worklog& log, const std::string& path, const std::string& key, const std::string& value) {
-    const auto thing = fmt::format("{} to \"{}\" in the table BaseInfo", key, value);
-    try {
-        if (log.IsDryRun() && !fs::exists(path)) {
-            log.Do(SET, thing, [] {});
-            return;
-        }
-        auto database = OpenStore(path);
-        if (HasBaseInfo(database, key, value))
-            log.Keep(fmt::format("{} \"{}\" in the table BaseInfo", key, value));
-        else
-            log.Do(
-                SET, thing, [&] { WriteBaseInfo(database, key, value); }, "Run this again.");
-    } catch (const std::exception& error) {
-        log.Fail(fmt::format("{}: {}.", path, error.what()));
-    }
 }
 
 } // namespace reportctl

@@ -2,6 +2,8 @@
 
 #include <string>
 
+#include <SQLiteCpp/Database.h>
+
 #include "Tools/reportctl/Worklog.h"
 
 namespace reportctl {
@@ -15,8 +17,7 @@ namespace reportctl {
 /// False when there is no store to go on with; the log has the reason. True in a dry run that would make it.
 bool EnsureStore(Worklog& log, const std::string& path);
 
-/// Makes sure that the table BaseInfo of the database at `path` holds `value` under `key`, and no other value
-/// under it.
-void EnsureBaseInfo(Worklog& log, const std::string& path, const std::string& key, const std::string& value);
+/// Opens the store that is there, never makes one. Throws SQLite::Exception.
+SQLite::Database OpenStore(const std::string& path);
 
 } // namespace reportctl

@@ -166,6 +166,17 @@ TEST_F(DatabaseFile, IsMissedAfterItsDeletionAndUsedWhenItIsBack) {
     EXPECT_EQ(Ask(Store(), "pragma integrity_check"), "ok");
 }
 
+TEST_F(DatabaseFile, IsUsedAfterItWasDeletedWithItsSideFilesAndMadeAnew) {
+    OpenStore();
+    ASSERT_TRUE(Exec(Insert("old"))) << Error();
+    for (const auto* suffix : {"", "-wal", "-shm"})
+        fs::remove(Store() + suffix);
+    ReplaceStore();
+    EXPECT_TRUE(Exec(Insert("kept"))) << Error();
+    EXPECT_EQ(Ask(Store(), "select group_concat(eventID) from OperLog"), "kept");
+    EXPECT_EQ(Ask(Store(), "pragma integrity_check"), "ok");
+}
+
 TEST_F(DatabaseFile, KeepsItsRowsWhenItIsMovedAway) {
     OpenStore();
     ASSERT_TRUE(Exec(Insert("old"))) << Error();
