@@ -5,7 +5,6 @@
 
 #include "tests/Modules/OrvekSqlite/ChildProcess.h"
 #include "tests/Modules/OrvekSqlite/SqliteFixture.h"
-#include "tests/support/WaitUntil.h"
 
 // What happens to the file while the service runs, and before.
 namespace {

@@ -1,4 +1,4 @@
-#include <chrono>
+#include <ctime>
 #include <map>
 
 #include <sqlite3.h>
@@ -13,10 +13,11 @@ namespace {
 constexpr std::size_t VALUES = 6;
 constexpr std::size_t TYPE = 3; ///< the one value without quotes
 
+// Time of the processor: nothing here waits, and a busy machine is no fault of the statement.
 #if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
-constexpr auto TIME_LIMIT = std::chrono::milliseconds(1000);
+constexpr double TIME_LIMIT_MS = 1000;
 #else
-constexpr auto TIME_LIMIT = std::chrono::milliseconds(100);
+constexpr double TIME_LIMIT_MS = 100;
 #endif
 
 /// The statement with `text` as its value number `position`.
@@ -81,9 +82,9 @@ private:
     void Try(const std::string& sql, Outcome outcome) {
         SCOPED_TRACE(sql.substr(0, 300));
         const auto before = std::stoi(Rows(Store()));
-        const auto start = std::chrono::steady_clock::now();
+        const auto start = std::clock();
         const bool done = Plugin()->ExecSql(sql);
-        EXPECT_LT(std::chrono::steady_clock::now() - start, TIME_LIMIT);
+        EXPECT_LT(static_cast<double>(std::clock() - start) * 1000 / CLOCKS_PER_SEC, TIME_LIMIT_MS);
         EXPECT_EQ(std::stoi(Rows(Store())), before + (done ? 1 : 0));
         EXPECT_TRUE(done || !Plugin()->GetLastErrorMsg().empty());
         if (outcome == Outcome::Refused) {
