@@ -1,5 +1,7 @@
 #include <chrono>
 #include <cstdlib>
+#include <filesystem>
+#include <fstream>
 #include <thread>
 
 #include <gmock/gmock.h>
