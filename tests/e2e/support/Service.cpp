@@ -5,12 +5,12 @@
 #include <filesystem>
 #include <fstream>
 #include <iterator>
-#include <regex>
 #include <sstream>
 #include <stdexcept>
 
 #include <Poco/Net/DatagramSocket.h>
 #include <Poco/Net/SocketAddress.h>
+#include <Poco/RegularExpression.h>
 #include <SQLiteCpp/SQLiteCpp.h>
 #include <fcntl.h>
 #include <sys/syscall.h>
@@ -178,19 +178,15 @@ std::string Service::Log() const {
 }
 
 std::vector<Service::Line> Service::LogLines() const {
-    static const std::regex FORM(
-        R"(\d{4}-\d\d-\d\d \d\d:\d\d:\d\d\.\d{3} (\w+) +\[(\d+):(\d+)\] \[([^\]]+)\] (.*))");
+    static const Poco::RegularExpression FORM(
+        R"(^\d{4}-\d\d-\d\d \d\d:\d\d:\d\d\.\d{3} (\w+) +\[(\d+):(\d+)\] \[([^\]]+)\] (.*)$)");
     std::vector<Line> lines;
     std::istringstream log(Log());
     for (std::string text; std::getline(log, text);) {
-        // A message of many kilobytes would overflow the stack of std::regex, so only the head is matched.
-        constexpr std::size_t HEAD = 200;
-        std::smatch parts;
-        const std::string head = text.substr(0, HEAD);
-        if (!std::regex_match(head, parts, FORM))
-            throw std::runtime_error("a line of the log has not the log's form: " + head);
-        lines.push_back({parts[1], std::stoi(parts[2]), std::stoi(parts[3]), parts[4],
-                         parts[5].str() + (text.size() > HEAD ? text.substr(HEAD) : "")});
+        std::vector<std::string> parts;
+        if (FORM.split(text, parts) != 6)
+            throw std::runtime_error("a line of the log has not the log's form: " + text);
+        lines.push_back({parts[1], std::stoi(parts[2]), std::stoi(parts[3]), parts[4], parts[5]});
     }
     return lines;
 }

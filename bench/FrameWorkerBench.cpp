@@ -1,0 +1,88 @@
+#include <cstdlib>
+#include <filesystem>
+#include <fstream>
+
+#include <Poco/Format.h>
+#include <SQLiteCpp/SQLiteCpp.h>
+#include <benchmark/benchmark.h>
+
+#include "App/ReportServer.h"
+#include "Frame/FrameWorker.h"
+#include "tests/support/TemporaryDirectory.h"
+
+// One report through FrameWorker::Send into a real file, against a bare loop of the same statement's text.
+namespace {
+
+constexpr auto TABLES =
+    "create table OperLog (id integer primary key, eventID text, value text, createTime text, "
+    "pType integer, extData1 text, extData2 text, extData3 text, extData4 text);"
+    "create table BaseInfo (key text, value text);";
+
+SyncServiceReport::ST_OptLog Record() {
+    SyncServiceReport::ST_OptLog log;
+    log.eventID = "B100|10001";
+    log.value =
+        R"({"button":"save","page":"editor","count":3,"ratio":1.5,"text":"a text as people write it"})";
+    log.createTime = "1700000000123";
+    log.pType = 0;
+    return log;
+}
+
+/// A user data directory with an empty store in it.
+class Store {
+public:
+    Store() {
+        std::filesystem::create_directories(m_directory.Path() + "/hublink/database");
+        SQLite::Database database(Path(), SQLite::OPEN_READWRITE | SQLite::OPEN_CREATE);
+        database.exec("pragma journal_mode=wal");
+        database.exec(TABLES);
+        ::setenv("XDG_DATA_HOME", m_directory.Path().c_str(), 1);
+    }
+    std::string Path() const { return m_directory.Path() + "/hublink/database/Report.db"; }
+
+private:
+    TemporaryDirectory m_directory;
+};
+
+/// With a commit after as many rows as the argument says.
+void BareStatements(benchmark::State& state) {
+    const Store store;
+    SQLite::Database database(store.Path(), SQLite::OPEN_READWRITE);
+    database.exec("pragma synchronous=normal");
+    const auto log = Record();
+    std::int64_t rows = 0;
+    for (auto _ : state) {
+        const std::string sql =
+            Poco::format("insert into OperLog (eventID,value,createTime,pType,extData3,extData4) "
+                         "values('%s', '%s','%s',%d,'%s','%s')",
+                         log.eventID, log.value, log.createTime, log.pType, std::string("3.0.0.0"),
+                         std::string("visitor"));
+        if (state.range(0) > 1 && rows % state.range(0) == 0)
+            database.exec("begin");
+        database.exec(sql);
+        if (state.range(0) > 1 && ++rows % state.range(0) == 0)
+            database.exec("commit");
+    }
+    if (state.range(0) > 1 && rows % state.range(0) != 0)
+        database.exec("commit");
+    state.SetItemsProcessed(state.iterations());
+}
+
+void Send(benchmark::State& state) {
+    const Store store;
+    SyncServiceReport::ReportServer server;
+    server.InitBaseInfo();
+    SyncServiceReport::FrameWorker worker(&server);
+    if (!worker.Init())
+        return state.SkipWithError("the SQLite plug-in is not beside this program");
+    const auto log = Record();
+    for (auto _ : state)
+        if (!worker.Send(log))
+            return state.SkipWithError("a report was not stored");
+    state.SetItemsProcessed(state.iterations());
+}
+
+} // namespace
+
+BENCHMARK(BareStatements)->ArgName("rows_per_commit")->Arg(1)->Arg(1000);
+BENCHMARK(Send);
