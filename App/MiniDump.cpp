@@ -25,10 +25,10 @@ namespace {
 
 constexpr mode_t PID_FILE_MODE = 0666; // of every user's instance: the lock is the machine's
 
-/// After this long in the handler, SIGALRM's default action ends the process. The fault may have come while
-/// this very thread held a lock that the trace needs, the allocator's for one; a service that hangs there
-/// would keep the instance lock and the port from its successor for ever.
-constexpr unsigned CRASH_DEADLINE_SECONDS = 1;
+/// After this long in the handler, SIGALRM's default action ends the process. The fault may have come while this very
+/// thread held a lock that the trace needs, the allocator's for one; a service that hangs there would keep the instance
+/// lock and the port from its successor for ever. Long enough for a trace on a slow disk.
+constexpr unsigned CRASH_DEADLINE_SECONDS = 5;
 
 constexpr std::size_t FRAME_ENTRIES = 64;
 constexpr int FRAME_BYTES = FRAME_ENTRIES * sizeof(void*); // 512
@@ -40,6 +40,15 @@ struct BackTrace {
     void* frames[FRAME_ENTRIES];
     void* overrun[FRAME_BYTES - FRAME_ENTRIES];
 };
+
+/// Locks the file; true, with the reason in errno, when another process holds the lock. One that fails for another
+/// reason (a file system without locks) stops nobody, deliberately.
+bool IsLockedElsewhere(int file) {
+    struct flock lock {};
+    lock.l_type = F_WRLCK;
+    lock.l_whence = SEEK_SET; // with start and length 0: the whole file, also beyond its end
+    return ::fcntl(file, F_SETLK, &lock) < 0 && (errno == EACCES || errno == EAGAIN);
+}
 
 /// Writes this process's id in decimal; the result of write(2).
 ssize_t WriteProcessId(int file) {
@@ -80,20 +89,16 @@ bool MiniDump::IsAlreadyRun() {
         WriteLog({LogLevel::Info, "IsAlreadyRun", 304}, "Open file failed, error : %s", std::strerror(errno));
         std::exit(1);
     }
-    struct flock lock {};
-    lock.l_type = F_WRLCK;
-    lock.l_whence = SEEK_SET; // with start and length 0: the whole file, also beyond its end
-    // A lock that fails for another reason than a holder (a file system without locks) stops nobody,
-    // deliberately.
-    if (::fcntl(file, F_SETLK, &lock) < 0 && (errno == EACCES || errno == EAGAIN)) {
-        WriteLog({LogLevel::Info, "IsAlreadyRun", 318}, "%s already locked, error: %s", path,
-                 std::strerror(errno));
+    if (IsLockedElsewhere(file)) {
+        const char* const reason = std::strerror(errno);
+        WriteLog({LogLevel::Info, "IsAlreadyRun", 318}, "%s already locked, error: %s", path, reason);
         ::close(file);
         return true;
     }
     if (WriteProcessId(file) < 0) {
+        const char* const reason = std::strerror(errno);
         WriteLog({LogLevel::Info, "IsAlreadyRun", 330}, "Write file failed, file: %s, error: %s", path,
-                 std::strerror(errno));
+                 reason);
         ::close(file);
         std::exit(1);
     }

@@ -20,11 +20,13 @@ public:
     /// would drop it. Called once, before any thread is started.
     static bool IsAlreadyRun();
 
-    /// The handler: logs the signal and the frames, and ends the process with exit(0). None of what it does
-    /// is safe in a signal handler; a process that is lost anyway has nothing to lose by trying.
+    /// The handler: logs the signal and the frames, and ends the process with exit(0). None of what it does is safe in a
+    /// signal handler; a process that is lost anyway has nothing to lose by trying. When it hangs, SIGALRM ends the
+    /// process after a few seconds.
     static void OnStackCallBack(int signal);
 
 private:
-    static std::string m_strLogPath;
+    static std::string
+        m_strLogPath; ///< Kept for who looks at the process with a debugger; the trace goes to the logger.
     static std::string m_strLogName; ///< Also the base name of the pid file.
 };

@@ -41,7 +41,7 @@ public:
         }
     }
 
-    /// Queues a copy of `data`; from any thread, and without waiting. Throws only std::bad_alloc.
+    /// Queues a copy of `data`; from any thread, and without waiting. Throws std::bad_alloc, and what copying throws.
     void Produce(const T& data) { m_queue.enqueueNotification(new WorkNotification<T>(data)); }
 
     /// Drops what is waiting, lets the consumer finish the value it works on, and joins it. Returns at once

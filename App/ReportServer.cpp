@@ -13,12 +13,12 @@ namespace {
 using SystemTool::IO::JsonDocument;
 
 constexpr int UDP_PORT = 9997;
-constexpr std::size_t DIGITS_OF_SECONDS = 10; // of a time since the epoch; one in milliseconds has thirteen
+constexpr std::size_t LENGTH_OF_SECONDS = 10; // in bytes, a minus sign included
 
 std::string TimeText(const JsonDocument& createTime) {
     std::string text =
         createTime.IsLongLong() ? std::to_string(createTime.ToLongLong()) : createTime.ToString();
-    if (text.size() == DIGITS_OF_SECONDS)
+    if (text.size() == LENGTH_OF_SECONDS)
         text += "000"; // by length alone, deliberately: senders give seconds as a number or as a text
     return text;
 }

@@ -13,14 +13,17 @@ namespace SyncServiceReport {
 class FrameWorker;
 class MetrikMgr;
 
-/// The service: receives reports, queues them, and routes each one to the analytics side or to the local
-/// store.
+/// The service: receives reports, queues them, and routes each one to the analytics side or to the local store.
 ///
-/// Life: constructed → started → stopped (receiver first, then the queue, whose backlog is dropped) →
-/// destroyed. Ownership: owns both destinations; they point back to it. Threads: construction, Start and Stop
-/// on the owner's thread; Recv on the receiving thread; Consume, and through it everything that reads or
-/// changes the base information after the start, on the consuming thread. The queue between the two is all
-/// that they share. Failure: no exception leaves Start or Consume; one is logged and makes the result false.
+/// Life: constructed → started → stopped (receiver first, then the queue, whose backlog is dropped) → destroyed.
+///
+/// Ownership: owns both destinations; they point back to it.
+///
+/// Threads: construction, Start and Stop on the owner's thread; Recv on the receiving thread; Consume, and through it
+/// everything that reads or changes the base information after the start, on the consuming thread. The queue between
+/// the two is all that they share.
+///
+/// Failure: no exception leaves Start or Consume; one is logged and makes the result false.
 class ReportServer : public PocoTasker<std::string>, public UDPServer {
 public:
     /// Starts nothing and opens nothing.
@@ -42,7 +45,7 @@ public:
     /// Logs and queues a datagram's text; always true.
     bool Recv(const std::string& msg) override;
 
-    /// Routes one text: with "eventID" anywhere in it, it is a report; else a control message. False when it
+    /// Routes one text: with "eventID" anywhere in it, it is a report; else a control message. False when a report
     /// could not be parsed or an exception was caught.
     bool Consume(const std::string& msg) override;
 

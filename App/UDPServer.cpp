@@ -10,7 +10,7 @@
 #include <Poco/Net/SocketAddress.h>
 #include <Poco/Timespan.h>
 
-#include "Common/Constants.h"
+#include "Common/Constants.h" // and no more of Common: the rest brings the logger
 
 namespace {
 
@@ -30,8 +30,9 @@ void PrintCaughtException() {
     } catch (const std::exception& error) {
         std::cout << "Std exception: " << error.what() << std::endl;
     } catch (...) {
-        std::cout << "Unknown exception,eCode:" << Poco::Error::last()
-                  << ",desc:" << Poco::Error::getMessage(Poco::Error::last()) << std::endl;
+        const int code = Poco::Error::last();
+        std::cout << "Unknown exception,eCode:" << code << ",desc:" << Poco::Error::getMessage(code)
+                  << std::endl;
     }
 }
 
@@ -46,6 +47,8 @@ public:
 
     /// The bytes up to the first zero byte.
     std::string Text() const { return m_bytes.data(); }
+
+    Poco::Net::SocketAddress m_sender; ///< Not looked at: whoever sends from this machine is welcome.
 
 private:
     std::array<char, RECEIVE_BUFFER_BYTES + 1> m_bytes{};
@@ -106,8 +109,7 @@ bool UDPServer::WaitForDatagram() {
 
 void UDPServer::ReceiveOne(Buffer& buffer) {
     buffer.Clear();
-    Poco::Net::SocketAddress sender; // whoever sends from this machine is welcome
-    if (m_socket.receiveFrom(buffer.Data(), RECEIVE_BUFFER_BYTES, sender) < 1)
+    if (m_socket.receiveFrom(buffer.Data(), RECEIVE_BUFFER_BYTES, buffer.m_sender) < 1)
         return;
     Recv(buffer.Text());
 }

@@ -6,13 +6,14 @@
 #include <Poco/Runnable.h>
 #include <Poco/Thread.h>
 
-/// Receives datagrams on a thread of its own and hands each one, as text, to Recv. Knows nothing of what they
-/// mean.
+/// Receives datagrams on a thread of its own and hands each one, as text, to Recv. Knows nothing of what they mean.
 ///
 /// Life: constructed → started (Start returned true) → stopping → joined. There is no restart.
-/// Threads: Recv runs on the receiving thread, everything else on the owner's. A derived class stops in its
-/// own destructor: once that has run, the receiving thread has no Recv to call any more. Failure: goes to
-/// standard output, never to the log; the receiver must be able to complain without a logger.
+///
+/// Threads: Recv runs on the receiving thread, everything else on the owner's. A derived class stops in its own
+/// destructor: once that has run, the receiving thread has no Recv to call any more.
+///
+/// Failure: goes to standard output, never to the log; the receiver must be able to complain without a logger.
 class UDPServer : public Poco::Runnable {
 public:
     UDPServer() = default;

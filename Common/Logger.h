@@ -53,7 +53,8 @@ struct LogSite {
 /// it, where boost::format cannot make sense of it, gives an Error line of "[BoostLogError]" and the reason
 /// instead. People search the log for that mark to find datagrams with percent signs.
 ///
-/// Never throws, whatever the logger does: a log line is not worth a report.
+/// Never throws, whatever the logger does, also where the report of a failed write fails itself: a log line is not worth
+/// a report.
 template <typename... Arguments>
 static void WriteLog(const LogSite& site, const std::string& format, const Arguments&... arguments) noexcept {
     if (pSysLog == nullptr)
@@ -83,8 +84,8 @@ static void WriteLog(const LogSite& site, const std::string& format, const Argum
     } catch (const std::exception& error) {
         WriteLog(site, "Std exception :%s ", error.what());
     } catch (...) {
-        WriteLog(site, "Unknown exception :%d-%s", Poco::Error::last(),
-                 Poco::Error::getMessage(Poco::Error::last()));
+        const int code = Poco::Error::last();
+        WriteLog(site, "Unknown exception :%d-%s", code, Poco::Error::getMessage(code));
     }
     return false;
 }

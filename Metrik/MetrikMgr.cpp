@@ -36,6 +36,7 @@ void MetrikMgr::AddWorker(const ST_InitMsg& msg) {
     if (m_mapWorkers.contains(msg.moduleID))
         return;
     Poco::SharedPtr<MetrikWorker> worker(new MetrikWorker(m_pServer));
+    m_pNewest = worker;
     // The result is not looked at, deliberately: a worker whose SDK did not start is registered all the same,
     // so that a module which announces itself again and again does not load the SDK again and again.
     if (msg.moduleID == DEFAULT_MODULE_ID)

@@ -14,9 +14,11 @@ class ReportServer;
 /// Keeps one analytics worker for each module that announced itself, and routes reports and control messages.
 ///
 /// Ownership: owns the workers; keeps the server without owning it.
-/// Threads: no lock. Init on the starting thread before any report; Update and Send on the consuming thread
-/// only. Failure: no exception leaves Update or Send. One leaves AddWorker, and Init, when a worker cannot be
-/// made; the map then is as it was.
+///
+/// Threads: no lock. Init on the starting thread before any report; Update and Send on the consuming thread only.
+///
+/// Failure: no exception leaves Update or Send. One leaves AddWorker, and Init, when a worker cannot be made; the map
+/// then is as it was.
 class MetrikMgr {
 public:
     explicit MetrikMgr(ReportServer* server);
@@ -40,9 +42,15 @@ public:
     /// the worker's answer. A report of a module that is not registered is lost.
     bool Send(const ST_OptLog& log);
 
-private:
+protected:
     std::map<std::string, Poco::SharedPtr<IWorker>> m_mapWorkers; ///< By module id.
+
+private:
     ReportServer* m_pServer;
+
+    /// The worker that was made last. One that failed is kept until the next: the exception that its SDK threw may be
+    /// of a class of the plug-in, whose code must be there until the exception has been logged.
+    Poco::SharedPtr<IWorker> m_pNewest;
 };
 
 } // namespace SyncServiceReport

@@ -22,12 +22,14 @@ MetrikWorker::~MetrikWorker() = default;
 
 bool MetrikWorker::InitDefalut() {
     try {
-        if (!LoadSdk("InitDefalut", 32, 38))
+        IMetrikSdk* const sdk = LoadSdk("InitDefalut", 32, 38);
+        if (sdk == nullptr)
             return false;
         const std::string& userDataDir = m_pServer->GetBaseInfo().userDataDir;
-        m_pSdk->InitSdk(DEFAULT_MODULE_ID, DEFAULT_MODULE_VERSION, DEFAULT_MODULE_NAME,
-                        Poco::format("%s/hublink/log", userDataDir),
-                        Poco::format("%s/hublink/database", userDataDir), FailCallBackFun, SuccCallBackFun);
+        sdk->InitSdk(DEFAULT_MODULE_ID, DEFAULT_MODULE_VERSION, DEFAULT_MODULE_NAME,
+                     Poco::format("%s/hublink/log", userDataDir),
+                     Poco::format("%s/hublink/database", userDataDir), FailCallBackFun, SuccCallBackFun);
+        m_pSdk = sdk;
         return true;
     } catch (...) {
         return LogCaughtException({LogLevel::Warning, "InitDefalut", 56});
@@ -35,28 +37,28 @@ bool MetrikWorker::InitDefalut() {
 }
 
 bool MetrikWorker::Init(const ST_InitMsg& msg) {
-    if (!LoadSdk("Init", 67, 73))
+    IMetrikSdk* const sdk = LoadSdk("Init", 67, 73);
+    if (sdk == nullptr)
         return false;
-    m_pSdk->InitSdk(msg.moduleID, msg.moduleVersion, msg.moduleName, msg.logPath, msg.dbPath, FailCallBackFun,
-                    SuccCallBackFun);
+    sdk->InitSdk(msg.moduleID, msg.moduleVersion, msg.moduleName, msg.logPath, msg.dbPath, FailCallBackFun,
+                 SuccCallBackFun);
+    m_pSdk = sdk;
     return true;
 }
 
-/// Loads a plug-in of this worker's own and takes its object; logs in the name of `function` what is missing.
-bool MetrikWorker::LoadSdk(const char* function, int loaderLine, int interfaceLine) {
+/// Loads a plug-in of this worker's own; its object, or null after logging in the name of `function` what is missing.
+IMetrikSdk* MetrikWorker::LoadSdk(const char* function, int loaderLine, int interfaceLine) {
+    m_pSdk = nullptr; // it goes with the loader that held it
     const std::string library = ORVEK_EXCUTABLE_PATH + "libMetrikSdk.dylib";
     m_pSdkLoader = new SdkLoader(library);
     if (m_pSdkLoader.isNull()) {
         WriteLog({LogLevel::Error, function, loaderLine}, "Failed to load metrik sdk loader:%s", library);
-        return false;
+        return nullptr;
     }
-    m_pSdk = m_pSdkLoader->GetModule();
-    if (m_pSdk == nullptr) {
+    if (m_pSdkLoader->GetModule() == nullptr)
         WriteLog({LogLevel::Error, function, interfaceLine}, "Failed to load metrik sdk interface:%s",
                  m_pSdkLoader->GetLastError());
-        return false;
-    }
-    return true;
+    return m_pSdkLoader->GetModule();
 }
 
 bool MetrikWorker::Send(const ST_OptLog& log) {

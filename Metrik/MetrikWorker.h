@@ -20,11 +20,15 @@ void SuccCallBackFun(std::string a, std::string b);
 
 /// Connects one module to the analytics SDK: each worker has an SDK object of its own.
 ///
-/// Life: created → initialised by one successful InitDefalut or Init. A worker whose initialisation failed
-/// answers every Send with false and is not tried again. Ownership: keeps the server without owning it; owns
-/// the plug-in through its loader, which takes the SDK object back when the worker goes. Threads: one at a
-/// time, the consuming thread once the service runs. Failure: no exception leaves InitDefalut or Send; one
-/// leaves Init, for the manager to log.
+/// Life: created → initialised by one successful InitDefalut or Init. A worker whose initialisation failed answers
+/// every Send with false and is not tried again.
+///
+/// Ownership: keeps the server without owning it; owns the plug-in through its loader, which takes the SDK object back
+/// when the worker goes.
+///
+/// Threads: one at a time, the consuming thread once the service runs.
+///
+/// Failure: no exception leaves InitDefalut or Send; one leaves Init, for the manager to log.
 class MetrikWorker : public IWorker {
 public:
     explicit MetrikWorker(ReportServer* server);
@@ -47,11 +51,11 @@ public:
 private:
     using SdkLoader = SystemTool::ModuleLoader<IMetrikSdk>;
 
-    bool LoadSdk(const char* function, int loaderLine, int interfaceLine);
+    IMetrikSdk* LoadSdk(const char* function, int loaderLine, int interfaceLine);
 
     ReportServer* m_pServer;
     Poco::SharedPtr<SdkLoader> m_pSdkLoader;
-    IMetrikSdk* m_pSdk = nullptr;
+    IMetrikSdk* m_pSdk = nullptr; ///< Null until the SDK has been started.
 };
 
 } // namespace SyncServiceReport

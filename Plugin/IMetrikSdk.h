@@ -25,7 +25,7 @@ public:
     virtual bool InitSdk(std::string moduleId, std::string moduleVersion, std::string moduleName,
                          std::string logDir, std::string dbDir, Callback onFailure, Callback onSuccess) = 0;
 
-    /// Delivers one event. True once the SDK has taken it over.
+    /// Delivers one event. After true, the event survives the end of the process, however it ends.
     virtual bool ReportEvent(std::string eventId, std::string eventJson) = 0;
 
 protected:

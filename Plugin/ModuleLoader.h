@@ -76,7 +76,7 @@ public:
         if (!m_pDllLoader->IsHasFunc("CreateModule"))
             return Fail("No CreateModule func export,please check your dll export regular:" +
                         m_strModulePath);
-        m_pModule = m_pDllLoader->template get<T*()>("CreateModule")();
+        m_pModule = Create();
         return true;
     }
 
@@ -103,6 +103,17 @@ public:
     const std::string& GetModuleName() const { return m_strModuleName; }
 
 private:
+    /// A plug-in that throws stays open for the rest of the process: its exception may be of a class of its own, whose
+    /// code must be there for as long as somebody holds the exception.
+    T* Create() {
+        try {
+            return m_pDllLoader->template get<T*()>("CreateModule")();
+        } catch (...) {
+            m_pDllLoader.release(); // not closed, and not ours any more
+            throw;
+        }
+    }
+
     bool Fail(std::string text) {
         m_strLastError = std::move(text);
         return false;

@@ -3,12 +3,12 @@
 #include <cstdint>
 #include <string>
 
-/// The operating-system calls of the project, one implementation file per system (Platform_linux.cpp,
+/// The operating-system calls that differ between the systems, one implementation file per system (Platform_linux.cpp,
 /// Platform_mac.cpp); everything else is portable. Safe from any thread, and safe during static
 /// initialisation: nothing here depends on another file's static objects.
 namespace SystemTool::Platform {
 
-/// The user's data directory, absolute and without a trailing separator. Empty only for a user whom the
+/// The user's data directory, absolute and without a trailing separator (unless it is the root itself). Empty only for a user whom the
 /// system gives no home directory at all. Nothing is created.
 std::string UserDataDir();
 

@@ -38,7 +38,21 @@ void Item(benchmark::State& state) {
     state.SetItemsProcessed(state.iterations() * state.range(0));
 }
 
+/// With a consumer of its own that waits for each, as in the service.
+void ItemToAnotherThread(benchmark::State& state) {
+    const std::string report = ReportOf180Bytes();
+    Tasker tasker;
+    Poco::Thread consumer;
+    consumer.start(tasker);
+    for (auto _ : state)
+        tasker.Produce(report);
+    tasker.End();
+    consumer.join();
+    state.SetItemsProcessed(state.iterations());
+}
+
 } // namespace
 
+BENCHMARK(ItemToAnotherThread)->UseRealTime();
 BENCHMARK(CopyOfTheText);
 BENCHMARK(Item)->Arg(100)->Arg(10'000)->Arg(1'000'000)->Unit(benchmark::kMicrosecond);

@@ -2,10 +2,10 @@
 
 #include <cstring>
 #include <stdexcept>
+#include <string_view>
 #include <vector>
 
 #include <rapidjson/document.h>
-#include <rapidjson/encodedstream.h>
 #include <rapidjson/error/en.h>
 #include <rapidjson/memorystream.h>
 #include <rapidjson/reader.h>
@@ -80,37 +80,37 @@ private:
     const char* m_refusal = "";
 };
 
-/// One parse, in the shape that rapidjson::Document::Populate wants: it calls this with itself as the
-/// handler.
+/// One parse, in the shape that rapidjson::Document::Populate wants: it calls this with itself as the handler.
 class Parse {
 public:
-    explicit Parse(const std::string& text) : m_text(text) {}
+    explicit Parse(const std::string& text)
+        : m_text(text), m_start(text.starts_with(BYTE_ORDER_MARK) ? BYTE_ORDER_MARK.size() : 0) {}
 
     bool operator()(rapidjson::Document& document) {
-        rapidjson::MemoryStream bytes(m_text.data(), m_text.size());
-        rapidjson::EncodedInputStream<rapidjson::UTF8<>, rapidjson::MemoryStream> stream(bytes);
+        rapidjson::MemoryStream bytes(m_text.data() + m_start, m_text.size() - m_start);
         Guard guard(document);
         rapidjson::Reader reader;
-        m_result = reader.Parse<PARSE_FLAGS>(stream, guard);
+        m_result = reader.Parse<PARSE_FLAGS>(bytes, guard);
         m_refusal = guard.Refusal();
         // The parser takes a zero byte for the end of the text; the text says where it really ends.
-        if (!m_result.IsError() && stream.Tell() != m_text.size())
-            m_result.Set(rapidjson::kParseErrorDocumentRootNotSingular, stream.Tell());
+        if (!m_result.IsError() && bytes.Tell() != m_text.size() - m_start)
+            m_result.Set(rapidjson::kParseErrorDocumentRootNotSingular, bytes.Tell());
         return !m_result.IsError();
     }
 
     std::string Error() const {
         if (!m_result.IsError())
             return {};
-        const std::string what =
-            m_result.Code() == rapidjson::kParseErrorTermination
-                ? "Nested deeper than " + std::to_string(JsonDocument::MAX_DEPTH) + " levels."
-                : rapidjson::GetParseError_En(m_result.Code());
-        return what + " At byte " + std::to_string(m_result.Offset()) + ".";
+        const bool refused = m_result.Code() == rapidjson::kParseErrorTermination;
+        const std::string what = refused ? m_refusal : rapidjson::GetParseError_En(m_result.Code());
+        return what + " At byte " + std::to_string(m_start + m_result.Offset()) + ".";
     }
 
 private:
+    static constexpr std::string_view BYTE_ORDER_MARK = "\xef\xbb\xbf";
+
     const std::string& m_text;
+    const std::size_t m_start; ///< Behind a byte order mark.
     rapidjson::ParseResult m_result;
     const char* m_refusal = "";
 };
@@ -181,8 +181,26 @@ struct Copy {
     }
 };
 
+/// `text` with each byte that is no part of valid UTF-8 replaced by U+FFFD.
+std::string ValidUtf8(const std::string& text) {
+    rapidjson::MemoryStream bytes(text.data(), text.size());
+    rapidjson::StringBuffer valid;
+    while (bytes.Tell() < text.size()) {
+        const char* const begin = bytes.src_;
+        const auto length = valid.GetSize();
+        if (!rapidjson::UTF8<>::Validate(bytes, valid)) {
+            valid.Pop(valid.GetSize() - length);
+            for (const char byte : std::string_view("\xef\xbf\xbd"))
+                valid.Put(byte);
+            bytes.src_ = begin + 1;
+        }
+    }
+    return {valid.GetString(), valid.GetSize()};
+}
+
 Value TextValue(const std::string& text, rapidjson::Document::AllocatorType& allocator) {
-    return Value(text.data(), static_cast<rapidjson::SizeType>(text.size()), allocator);
+    const std::string valid = ValidUtf8(text);
+    return Value(valid.data(), static_cast<rapidjson::SizeType>(valid.size()), allocator);
 }
 
 Value::ConstMemberIterator Find(const Value& object, const std::string& key) {

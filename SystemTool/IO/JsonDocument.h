@@ -18,10 +18,9 @@ namespace SystemTool::IO {
 /// the value, however large; only SetKeyValue copies, and only what it is about to change while somebody else
 /// holds it. Nothing here recurses on the call stack with the depth of the input.
 ///
-/// Threads: different JsonDocuments may be used by different threads at once, also when they share a tree;
-/// one JsonDocument by one thread at a time.
+/// Threads: one thread at a time for a document and all that were copied or taken from it, since they share a tree.
 ///
-/// Failure: only SetKeyValue throws (and what memory allocation throws).
+/// Failure: only SetKeyValue throws.
 class JsonDocument {
 public:
     /// Arrays and objects within each other; a text that goes deeper is refused.
@@ -29,6 +28,10 @@ public:
 
     /// The null value.
     JsonDocument() = default;
+
+    /// A copy costs a pointer; there is no cheaper move, which would leave a value without its tree behind.
+    JsonDocument(const JsonDocument&) = default;
+    JsonDocument& operator=(const JsonDocument&) = default;
 
     /// Parses `text`, fills this document with the result and returns it, since some callers use it one way
     /// and some the other. `error` is emptied; for a text that is no JSON it receives what is wrong and at
@@ -42,7 +45,8 @@ public:
 
     /// Sets the member `key`. All members of that name are replaced by one, in the first one's place; a new
     /// one goes to the end. A null document becomes an object first; any other that is no object throws
-    /// std::logic_error, because its content would be lost silently.
+    /// std::logic_error, because its content would be lost silently. In a text, bytes that are no UTF-8 are replaced
+    /// by U+FFFD, so that what is printed parses again.
     void SetKeyValue(const std::string& key, const std::string& value);
     void SetKeyValue(const std::string& key, const JsonDocument& value);
 

@@ -23,13 +23,14 @@ public:
     bool IsRunning() const { return m_thread.isRunning(); }
     void Enqueue(Poco::Notification* notification) { m_queue.enqueueNotification(notification); }
     void WakeUp() { m_queue.wakeUpAll(); }
+    int Waiting() const { return m_queue.size(); }
 
     bool Consume(const std::string& data) override {
+        EXPECT_FALSE(m_inside.exchange(true)) << "one at a time";
         if (data == "block") {
             m_entered.set();
             m_release.wait();
         }
-        m_inside = true;
         const std::lock_guard lock(m_mutex);
         m_consumed.push_back(data);
         m_inside = false;
@@ -163,6 +164,7 @@ TEST(PocoTasker, AStopWaitsForTheItemUnderWayAndDropsTheBacklog) {
         tasker.StopThread();
         stopped.set();
     });
+    EXPECT_TRUE(WaitUntil([&] { return tasker.Waiting() == 1; })) << "the backlog is gone, the stop waits";
     EXPECT_FALSE(stopped.tryWait(50)) << "the item under way has not been released yet";
     tasker.m_release.set();
     EXPECT_TRUE(stopped.tryWait(10'000));

@@ -1,8 +1,8 @@
 #include "App/ReportServer.h"
 
-#include <iostream>
-#include <sstream>
+#include <filesystem>
 
+#include <Poco/Event.h>
 #include <Poco/Net/DatagramSocket.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -14,6 +14,8 @@
 #include "tests/fakes/FakeLogger.h"
 #include "tests/fakes/FakeSdk.h"
 #include "tests/fakes/FakeSqlite.h"
+#include "tests/support/CapturedOutput.h"
+#include "tests/support/ScriptedJson.h"
 #include "tests/support/WaitUntil.h"
 
 using namespace SyncServiceReport;
@@ -63,6 +65,25 @@ protected:
     FakeSdkState& m_sdk = FakeSdk();
     ReportServer m_server;
 };
+
+/// A server whose consumer stays with its first text until it is released.
+class BlockedServer final : public ReportServer {
+public:
+    ~BlockedServer() override { m_release.set(), Stop(); }
+
+    bool Consume(const std::string&) override {
+        m_entered.set();
+        m_release.wait();
+        return true;
+    }
+
+    Poco::Event m_entered;
+    Poco::Event m_release{Poco::Event::EVENT_MANUALRESET};
+};
+
+std::ptrdiff_t ThreadCount() {
+    return std::distance(std::filesystem::directory_iterator("/proc/self/task"), {});
+}
 
 /// JsonToStruct alone, on a server that was never started.
 class JsonToStructTest : public ::testing::Test {
@@ -114,23 +135,69 @@ TEST_F(ReportServerTest, StartIsTrueWhenNothingWorks) {
     m_sdk.createsNothing = true;
     Poco::Net::DatagramSocket taken;
     taken.bind(Poco::Net::SocketAddress("127.0.0.1", 9997), false, false);
-    std::ostringstream output;
-    auto* const original = std::cout.rdbuf(output.rdbuf());
+    CapturedOutput output;
     EXPECT_TRUE(m_server.Start());
-    std::cout.rdbuf(original);
-    EXPECT_EQ(output.str(), "Poco exception: Net Exception: Address already in use: 127.0.0.1:9997\n");
+    EXPECT_EQ(output.Text(), "Poco exception: Net Exception: Address already in use: 127.0.0.1:9997\n");
 }
 
-TEST_F(ReportServerTest, AnExceptionInStartIsLoggedAndUndoesNothing) {
+TEST_F(ReportServerTest, AnExceptionInStartIsLogged) {
     Start();
-    std::ostringstream output; // the socket's complaint about a second bind
-    auto* const original = std::cout.rdbuf(output.rdbuf());
+    CapturedOutput output; // the socket's complaint about a second bind
     EXPECT_FALSE(m_server.Start()) << "a thread that runs cannot be started";
-    std::cout.rdbuf(original);
     const auto records = FakeLogger().RecordsOf("Start");
     ASSERT_EQ(records.size(), 1U);
     EXPECT_EQ(records[0], Record(3, "Start", 35, records[0].message));
     EXPECT_THAT(records[0].message, ::testing::MatchesRegex("Poco exception :.*thread already running.* "));
+}
+
+TEST_F(ReportServerTest, AfterAnExceptionInStartReportsAreStillStored) {
+    Start();
+    CapturedOutput output;
+    EXPECT_FALSE(m_server.Start());
+    FakeLogger().Clear();
+    SendDatagram(R"({"eventID":"after"})");
+    SendDatagram(THE_END);
+    AwaitTheEnd();
+    EXPECT_THAT(m_db.calls.back().argument, HasSubstr("'after'"));
+}
+
+TEST_F(ReportServerTest, DestructionStopsBothThreadsFirst) {
+    const auto before = ThreadCount();
+    {
+        ReportServer server;
+        ASSERT_TRUE(server.Start());
+        for (int i = 0; i < 100; ++i)
+            server.Recv(R"({"eventID":"B1"})");
+        EXPECT_EQ(ThreadCount(), before + 2);
+    }
+    EXPECT_EQ(ThreadCount(), before);
+}
+
+TEST_F(ReportServerTest, StopEndsTheInputBeforeTheQueue) {
+    BlockedServer server;
+    const auto before = ThreadCount();
+    ASSERT_TRUE(server.Start());
+    server.Recv("any");
+    server.m_entered.wait(); // the consumer is at work, and stays so
+    Poco::Thread stopper;
+    stopper.startFunc([&server] { server.Stop(); });
+    // Consumer and stopper are left when the receiver is gone.
+    EXPECT_TRUE(WaitUntil([&] { return ThreadCount() == before + 2; }, std::chrono::seconds(5)));
+    server.m_release.set();
+    stopper.join();
+    EXPECT_EQ(ThreadCount(), before);
+}
+
+TEST_F(ReportServerTest, TheStoreIsReleasedBeforeAnalytics) {
+    int sequence = 0;
+    m_db.sequence = &sequence;
+    m_sdk.sequence = &sequence;
+    {
+        ReportServer server;
+        ASSERT_TRUE(server.Start());
+    }
+    EXPECT_EQ(m_db.destroyedAt, 1);
+    EXPECT_EQ(m_sdk.destroyedAt, 2);
 }
 
 TEST_F(ReportServerTest, StopBeforeStartReturns) {
@@ -164,6 +231,19 @@ TEST_F(ReportServerTest, WhatIsReceivedIsHandledInOrder) {
 TEST_F(ReportServerTest, RecvLogsTheTextAndIsTrue) {
     EXPECT_TRUE(m_server.Recv(R"({"eventID":"B1"})"));
     EXPECT_THAT(FakeLogger().Records(), ElementsAre(Record(2, "Recv", 42, R"({"eventID":"B1"})")));
+}
+
+TEST_F(ReportServerTest, RecvLogsBeforeItQueues) {
+    class Server : public ReportServer {
+    public:
+        using PocoTasker<std::string>::m_queue;
+    } server;
+    int waiting = -1;
+    FakeLogger().onWrite = [&](const LogRecord&) { waiting = server.m_queue.size(); };
+    server.Recv("text");
+    FakeLogger().onWrite = nullptr;
+    EXPECT_EQ(waiting, 0);
+    EXPECT_EQ(server.m_queue.size(), 1);
 }
 
 TEST_F(ReportServerTest, RecvTakesTheTextForAFormat) {
@@ -357,6 +437,29 @@ TEST_F(JsonToStructTest, WhatIsNoJsonLeavesTheDefaults) {
     EXPECT_FALSE(log.isDayReport);
     EXPECT_THAT(FakeLogger().Records(),
                 ElementsAre(Record(4, "JsonToStruct", 123, "Invalid value. At byte 0.")));
+}
+
+TEST_F(JsonToStructTest, AParsersTextIsAFormat) {
+    g_scriptedJson.error = "near %d";
+    ST_OptLog log;
+    EXPECT_FALSE(m_server.JsonToStruct("{}", log));
+    EXPECT_THAT(FakeLogger().Records(), ElementsAre(Record(4, "JsonToStruct", 123, TOO_FEW_ARGUMENTS)));
+}
+
+TEST_F(JsonToStructTest, LogsEachKindOfExceptionAndLeavesTheDefaults) {
+    ST_OptLog log;
+    log.eventID = "left over";
+    for (const Throws what : {Throws::Poco, Throws::Std, Throws::Other}) {
+        g_scriptedJson.throws = what;
+        EXPECT_FALSE(m_server.JsonToStruct("{}", log));
+    }
+    EXPECT_EQ(log.eventID, "");
+    const auto records = FakeLogger().Records();
+    ASSERT_EQ(records.size(), 3U);
+    EXPECT_EQ(records[0], Record(3, "JsonToStruct", 164, "Poco exception :I/O error: scripted "));
+    EXPECT_EQ(records[1], Record(3, "JsonToStruct", 164, "Std exception :scripted "));
+    EXPECT_EQ(records[2], Record(3, "JsonToStruct", 164, records[2].message));
+    EXPECT_THAT(records[2].message, ::testing::MatchesRegex("Unknown exception :[0-9]+-.*"));
 }
 
 TEST_F(JsonToStructTest, TenCharactersOfTimeAreSeconds) {

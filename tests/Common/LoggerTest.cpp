@@ -1,6 +1,7 @@
 #include "Common/Common.h"
 
 #include <chrono>
+#include <utility>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -102,6 +103,26 @@ TEST(WriteLog, LeavesLongNumbersThatBelongToNoDirectiveAlone) {
     EXPECT_EQ(Logged("a%|0000000000005t|b"), Plain("a0000b")) << "leading zeros make no large number";
 }
 
+TEST(WriteLog, FormatsATabulationWhoseFillIsAPercentSign) {
+    EXPECT_EQ(Logged("%1T%%|9t|"), Plain("%        "));
+    std::string many;
+    for (int i = 0; i < 1000; ++i)
+        many += "%1T%%|9t|";
+    EXPECT_EQ(Logged(many).level, 2) << "as many directives as a datagram has room for";
+}
+
+TEST(WriteLog, ChecksTheNumbersOfEveryDirective) {
+    for (const std::string format : {"%5%%473123456789019", "%T%%81000000000-", "%|1$1234567890|",
+                                     "%1$.1234567890s", "%-1234567890d", "%.1234567890s", "%1234567890%"})
+        EXPECT_EQ(Logged(format), BoostLogError("a directive of the text has a number of more than 9 digits"))
+            << format;
+}
+
+TEST(WriteLog, FormatsADirectiveThatBoostIgnores) {
+    EXPECT_EQ(Logged("50%no"), Plain("50o"));
+    EXPECT_TRUE(IsBoostLogError(Logged("%0n%-hxo2"))) << "and no assertion ends the program";
+}
+
 TEST(WriteLog, BoundsATextOfManyTabulations) {
     std::string format;
     for (int column = 1; column <= 200; ++column)
@@ -109,9 +130,17 @@ TEST(WriteLog, BoundsATextOfManyTabulations) {
     EXPECT_EQ(Logged(format).message.size(), 200'000U + 1);
 }
 
-TEST(WriteLog, ReportsALoggerThatThrowsToTheLogger) {
-    // The first write throws; the report of that is a write too and throws again: all that is left is
-    // silence.
+TEST(WriteLog, ReportsAWriteThatThrows) {
+    bool hasThrown = false;
+    FakeLogger().onWrite = [&hasThrown](const LogRecord&) {
+        if (!std::exchange(hasThrown, true))
+            throw std::runtime_error("disk full");
+    };
+    EXPECT_EQ(Logged("text"), BoostLogError("disk full"));
+    FakeLogger().onWrite = nullptr;
+}
+
+TEST(WriteLog, IsSilentWhenTheLoggerKeepsThrowing) {
     for (const Throws what : {Throws::Poco, Throws::Std, Throws::Other}) {
         FakeLogger().throws = what;
         WriteLog(SITE, "text");

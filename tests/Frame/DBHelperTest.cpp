@@ -1,6 +1,6 @@
 #include "Frame/DBHelper.h"
 
-#include <chrono>
+#include <vector>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -8,6 +8,7 @@
 #include "Plugin/ModuleLoader.h"
 #include "tests/fakes/FakeLogger.h"
 #include "tests/fakes/FakeSqlite.h"
+#include "tests/support/ScriptedSleep.h"
 
 using SyncServiceReport::DBHelper;
 using ::testing::AllOf;
@@ -123,19 +124,16 @@ TEST_F(DBHelperTest, AQueryWithoutARowIsFalseAndLogsNothing) {
 
 TEST_F(DBHelperTest, ABatchThatFailsOnceIsTriedAgainAfterAPause) {
     m_db.answers = {false, true};
-    const auto begin = std::chrono::steady_clock::now();
     EXPECT_TRUE(m_helper.BatExecSql({"a", "b"}));
-    EXPECT_GE(std::chrono::steady_clock::now() - begin, std::chrono::milliseconds(1000));
+    EXPECT_THAT(Pauses(), ElementsAre(1000));
     EXPECT_THAT(m_db.calls, ElementsAre(Call{"BatExecSql", "a b"}, Call{"BatExecSql", "a b"}));
     EXPECT_THAT(FakeLogger().Records(), ElementsAre(Error("BatExecSql", "scripted error")));
 }
 
 TEST_F(DBHelperTest, ABatchThatKeepsFailingIsTriedThreeTimesWithThreePauses) {
     m_db.answer = false;
-    const auto begin = std::chrono::steady_clock::now();
     EXPECT_FALSE(m_helper.BatExecSql({"a"}));
-    EXPECT_GE(std::chrono::steady_clock::now() - begin, std::chrono::milliseconds(3000))
-        << "the last failure pauses too";
+    EXPECT_THAT(Pauses(), ElementsAre(1000, 1000, 1000)) << "the last failure pauses too";
     EXPECT_EQ(m_db.calls.size(), 3U);
     EXPECT_THAT(FakeLogger().Records(),
                 ElementsAre(Error("BatExecSql", "scripted error"), Error("BatExecSql", "scripted error"),
@@ -170,14 +168,19 @@ TEST_F(DBHelperTest, AFailedCountKeepsWhatThePluginStored) {
 }
 
 TEST_F(DBHelperTest, ThePluginsExceptionsGoToTheCaller) {
-    m_db.throws = Throws::Std;
     Rows rows;
     int count = 0;
-    EXPECT_THROW(m_helper.ExecSql("a"), std::runtime_error);
-    EXPECT_THROW(m_helper.CreateTable("a"), std::runtime_error);
-    EXPECT_THROW(m_helper.QuerySql("a", rows), std::runtime_error);
-    EXPECT_THROW(m_helper.BatExecSql({"a"}), std::runtime_error);
-    EXPECT_THROW(m_helper.GetTotalCount("a", count), std::runtime_error);
+    const auto expectAll = [&]<typename Exception>(Throws what, const Exception&) {
+        m_db.throws = what;
+        EXPECT_THROW(m_helper.ExecSql("a"), Exception);
+        EXPECT_THROW(m_helper.CreateTable("a"), Exception);
+        EXPECT_THROW(m_helper.QuerySql("a", rows), Exception);
+        EXPECT_THROW(m_helper.BatExecSql({"a"}), Exception);
+        EXPECT_THROW(m_helper.GetTotalCount("a", count), Exception);
+    };
+    expectAll(Throws::Poco, Poco::IOException());
+    expectAll(Throws::Std, std::runtime_error(""));
+    expectAll(Throws::Other, 42);
     EXPECT_THAT(FakeLogger().Records(), IsEmpty());
 }
 

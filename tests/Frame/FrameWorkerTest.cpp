@@ -214,6 +214,28 @@ TEST_F(FrameWorkerTest, AnInitThatFailsAfterOpeningLeavesTheDatabaseInUse) {
     EXPECT_TRUE(m_worker.Send(Log("B", "", "", 1)));
 }
 
+TEST_F(FrameWorkerTest, AnInitThatFailsWhileOpeningLeavesTheStoreUnused) {
+    m_db.throws = Throws::Std;
+    EXPECT_FALSE(m_worker.Init());
+    m_db.throws = Throws::Nothing;
+    FakeLogger().Clear();
+    EXPECT_FALSE(m_worker.Send(Log("B", "", "", 1)));
+    EXPECT_THAT(m_db.calls, ElementsAre(Call{"Open", m_db.calls.front().argument})) << "and no statement";
+    EXPECT_THAT(FakeLogger().Records(), IsEmpty());
+}
+
+TEST_F(FrameWorkerTest, AnExceptionOfThePluginsFactoryIsLogged) {
+    m_db.createThrows = Throws::Std;
+    EXPECT_FALSE(m_worker.Init());
+    EXPECT_THAT(FakeLogger().Records(), ElementsAre(Record(3, "Init", "Std exception :scripted ")));
+}
+
+TEST_F(FrameWorkerTest, ARowThatLacksItsValueIsPassedOver) {
+    InitWith({{"OpenID"}, {}, {"HubLinkVersion", "5"}});
+    EXPECT_EQ(m_server.GetBaseInfo().openID, "visitor");
+    EXPECT_EQ(m_server.GetBaseInfo().suiteVersion, "5");
+}
+
 TEST_F(FrameWorkerTest, ReadingTheBaseInformationHasNoGuardOfItsOwn) {
     InitWith({});
     m_db.throws = Throws::Std;

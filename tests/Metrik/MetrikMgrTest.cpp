@@ -45,9 +45,25 @@ protected:
 
     const ST_BaseInfo& Info() const { return m_server.GetBaseInfo(); }
 
+    /// A manager that lets a test register a worker of its own.
+    class Manager : public MetrikMgr {
+    public:
+        using MetrikMgr::m_mapWorkers;
+        using MetrikMgr::MetrikMgr;
+    };
+
+    class ThrowingWorker : public IWorker {
+    public:
+        bool Send(const ST_OptLog&) override {
+            ThrowIf(throws);
+            return true;
+        }
+        Throws throws = Throws::Nothing;
+    };
+
     FakeSdkState& m_sdk = FakeSdk();
     ReportServer m_server;
-    MetrikMgr m_mgr{&m_server};
+    Manager m_mgr{&m_server};
 };
 
 std::string InitMessage(const std::string& moduleID) {
@@ -237,6 +253,23 @@ TEST_F(MetrikMgrTest, EventsBeforeTheirModulesInitAreLost) {
     EXPECT_TRUE(m_mgr.Update(InitMessage("A100")));
     EXPECT_THAT(Started(), ElementsAre("A759", "A100"));
     EXPECT_EQ(m_sdk.calls.size(), 2U) << "nothing was kept for it, nothing went to the default module";
+}
+
+TEST_F(MetrikMgrTest, SendLogsEachKindOfException) {
+    Poco::SharedPtr<ThrowingWorker> worker(new ThrowingWorker);
+    m_mgr.m_mapWorkers["A1"] = worker;
+    for (const Throws what : {Throws::Poco, Throws::Std, Throws::Other}) {
+        worker->throws = what;
+        EXPECT_FALSE(Send("A1|1"));
+    }
+    const auto records = FakeLogger().Records();
+    ASSERT_EQ(records.size(), 3U);
+    EXPECT_EQ(records[0], Record(3, "Send", 122, "Poco exception :I/O error: scripted "));
+    EXPECT_EQ(records[1], Record(3, "Send", 122, "Std exception :scripted "));
+    EXPECT_EQ(records[2], Record(3, "Send", 122, records[2].message));
+    EXPECT_THAT(records[2].message, MatchesRegex("Unknown exception :[0-9]+-.*"));
+    worker->throws = Throws::Nothing;
+    EXPECT_TRUE(Send("A1|1"));
 }
 
 TEST_F(MetrikMgrTest, TheWorkersAnswerIsTheResult) {

@@ -8,6 +8,7 @@
 #include "SystemTool/IO/JsonDocument.h"
 #include "tests/fakes/FakeLogger.h"
 #include "tests/fakes/FakeSdk.h"
+#include "tests/support/ScriptedJson.h"
 
 using namespace SyncServiceReport;
 using ::testing::ElementsAre;
@@ -122,6 +123,24 @@ TEST_F(MetrikWorkerTest, InitDefalutLogsEachKindOfException) {
     EXPECT_THAT(records[2].message, ::testing::MatchesRegex("Unknown exception :[0-9]+-.+"));
 }
 
+TEST_F(MetrikWorkerTest, AnInitialisationThatFailedLeavesNothingToSendTo) {
+    m_sdk.initThrows = Throws::Std;
+    EXPECT_FALSE(m_worker.InitDefalut());
+    EXPECT_FALSE(Send("{}"));
+    EXPECT_THROW(m_worker.Init(MESSAGE), std::runtime_error);
+    EXPECT_FALSE(Send("{}"));
+    for (const Call& call : m_sdk.calls)
+        EXPECT_EQ(call.slot, 2) << "no event was reported";
+}
+
+TEST_F(MetrikWorkerTest, AnExceptionOfThePluginsFactoryIsLoggedByInitDefalut) {
+    m_sdk.createThrows = Throws::Std;
+    EXPECT_FALSE(m_worker.InitDefalut());
+    EXPECT_THAT(FakeLogger().Records(),
+                ElementsAre(Record(3, "InitDefalut", 56, "Std exception :scripted ")));
+    EXPECT_THROW(m_worker.Init(MESSAGE), std::runtime_error);
+}
+
 TEST_F(MetrikWorkerTest, AnExceptionLeavesInitUnlogged) {
     m_sdk.initThrows = Throws::Std;
     EXPECT_THROW(m_worker.Init(MESSAGE), std::runtime_error);
@@ -227,6 +246,26 @@ TEST_F(MetrikWorkerTest, TheSuccessCallbackWritesNothing) {
     ASSERT_TRUE(m_worker.InitDefalut());
     m_sdk.onSuccess("a", "b");
     EXPECT_THAT(FakeLogger().Records(), IsEmpty());
+}
+
+TEST_F(MetrikWorkerTest, AnAnnouncedModuleHasTheSameCallbacks) {
+    ASSERT_TRUE(m_worker.Init(MESSAGE));
+    m_sdk.onSuccess("a", "b");
+    EXPECT_THAT(FakeLogger().Records(), IsEmpty());
+    m_sdk.onFailure("a", "b");
+    EXPECT_THAT(FakeLogger().Records(), ElementsAre(Record(4, "FailCallBackFun", 21, "a-b")));
+}
+
+TEST_F(MetrikWorkerTest, AParsersTextIsAFormat) {
+    ASSERT_TRUE(m_worker.InitDefalut());
+    g_scriptedJson.error = "near %d";
+    EXPECT_FALSE(Send("{}"));
+    EXPECT_THAT(FakeLogger().Records(),
+                ElementsAre(Record(
+                    4, "Send", 107,
+                    "[BoostLogError]boost::too_few_args: format-string referred to more arguments than "
+                    "were passed")));
+    EXPECT_EQ(m_sdk.calls.size(), 1U);
 }
 
 TEST_F(MetrikWorkerTest, DestructionGivesTheSdkObjectBack) {

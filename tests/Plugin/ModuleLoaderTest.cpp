@@ -116,6 +116,15 @@ TEST(ModuleLoader, ANullObjectIsStoredAsItIs) {
     EXPECT_TRUE(loader.Load());
 }
 
+TEST(ModuleLoader, APluginsOwnExceptionCanBeReadByWhoCatchesIt) {
+    try {
+        Loader loader(PathOf("libModuleThrows.dylib"));
+        FAIL() << "nothing was thrown";
+    } catch (const std::exception& error) {
+        EXPECT_STREQ(error.what(), "the plug-in's own error");
+    }
+}
+
 TEST(ModuleLoader, LoadingTwiceMakesOneObject) {
     Loader loader(PathOf(MODULE));
     IFakeModule* const first = loader.GetModule();
@@ -169,7 +178,8 @@ TEST(ModuleLoader, UnloadWithoutDestoryModuleThrows) {
 }
 
 TEST(ModuleLoaderDeathTest, DestroyingALoaderWithoutDestoryModuleEndsTheProcess) {
-    EXPECT_EXIT({ Loader loader(PathOf(WITHOUT_DESTORY_MODULE)); }, ::testing::KilledBySignal(SIGABRT), "");
+    EXPECT_EXIT({ Loader loader(PathOf(WITHOUT_DESTORY_MODULE)); }, ::testing::KilledBySignal(SIGABRT),
+                "DestoryModule");
 }
 
 TEST(ModuleLoader, EachLoaderOfOneLibraryHasItsOwnObject) {

@@ -1,5 +1,6 @@
 #include "SystemTool/CommonTool.h"
 
+#include <cstdio>
 #include <cstdlib>
 
 #include <gtest/gtest.h>
@@ -9,6 +10,19 @@
 
 using SystemTool::CommonTool::GetOSVersionString;
 using SystemTool::CommonTool::GetUserDataDir;
+
+namespace {
+
+/// What os-release calls the system, as a shell reads it.
+std::string PrettyName() {
+    FILE* const shell = ::popen(". /etc/os-release && printf %s \"$PRETTY_NAME\"", "r");
+    std::string name(200, '\0');
+    name.resize(std::fread(name.data(), 1, name.size(), shell));
+    ::pclose(shell);
+    return name;
+}
+
+} // namespace
 
 TEST(UserDataDir, IsTheDataHomeOfTheDesktopWhenThatIsAbsolute) {
     ::setenv("XDG_DATA_HOME", "/somewhere/data", 1);
@@ -45,5 +59,6 @@ TEST(OSVersionString, EndsWithTheKernelsRelease) {
     ASSERT_EQ(::uname(&kernel), 0);
     const std::string version = GetOSVersionString();
     EXPECT_TRUE(version.ends_with(std::string(" ") + kernel.release)) << version;
+    EXPECT_TRUE(version.starts_with(PrettyName())) << version;
     EXPECT_EQ(version.find('"'), std::string::npos) << "the quotes of os-release are not part of the name";
 }

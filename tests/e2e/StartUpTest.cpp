@@ -119,6 +119,8 @@ TEST_F(StartUp, WithoutTheLoggerItIsSilentAndWorks) {
     EXPECT_THAT(m_service.Rows("eventID"), ElementsAre("B1"));
     EXPECT_EQ(m_service.Output(), outputOfInstallation) << "not even an error";
     EXPECT_FALSE(std::filesystem::exists(m_service.LogFile()));
+    EXPECT_EQ(m_service.RunAnother(), 1) << "a second one is refused";
+    EXPECT_EQ(m_service.Output(), outputOfInstallation);
 }
 
 TEST_F(StartUp, WithoutTheStoreItLogsThatOnceAndForwardsEvents) {

@@ -1,18 +1,33 @@
 #include "tests/fakes/FakeLogger.h"
 
+#include <cstdlib>
+
 #include "Plugin/ILogger.h"
+#include "SystemTool/BSException.h"
 
 namespace {
 
 FakeLoggerState& State() {
-    static auto* state = new FakeLoggerState; // outlives the statics of the program, which log while they go
+    static auto* state = [] {
+        auto* made = new FakeLoggerState; // outlives the statics of the program, which log while they go
+        made->echoes = std::getenv("FAKE_LOGGER_ECHOES") != nullptr;
+        return made;
+    }();
     return *state;
 }
 
 class Logger final : public SystemTool::IO::ILogger {
 public:
-    void InitLog(const std::string&, const std::string&, const std::string&, const std::string&, std::int64_t,
-                 std::int64_t, int, int) override {}
+    void InitLog(const std::string& logDir, const std::string& fileName, const std::string& appName,
+                 const std::string& moduleName, std::int64_t maxFileBytes, std::int64_t maxTotalBytes,
+                 int flushEach, int console) override {
+        if (std::getenv("FAKE_LOGGER_REFUSES") != nullptr)
+            throw SystemTool::BSException("no log") << SystemTool::BSErrorText("disk full");
+        if (State().echoes)
+            std::cerr << "InitLog " << logDir << ' ' << fileName << ' ' << appName << ' ' << moduleName << ' '
+                      << maxFileBytes << ' ' << maxTotalBytes << ' ' << flushEach << ' ' << console
+                      << std::endl;
+    }
 
     void WriteLog(int level, const std::string& tag, const std::string& file, const std::string& function,
                   int line, const std::string& message, int reserved) override {

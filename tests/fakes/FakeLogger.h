@@ -1,5 +1,6 @@
 #pragma once
 
+#include <functional>
 #include <iostream>
 #include <mutex>
 #include <ostream>
@@ -36,6 +37,8 @@ struct FakeLoggerState {
             std::cerr << record << std::endl;
         while (hangs)
             ::pause();
+        if (onWrite)
+            onWrite(record);
         const std::lock_guard lock(mutex);
         records.push_back(std::move(record));
     }
@@ -54,7 +57,8 @@ struct FakeLoggerState {
         records.clear();
     }
 
-    int created = 0; ///< Instances that "CreateModule" made.
+    std::function<void(const LogRecord&)> onWrite; ///< Called with each record before it is kept.
+    int created = 0;                               ///< Instances that "CreateModule" made.
     Throws throws = Throws::Nothing;
     bool echoes =
         false; ///< Copies each record to standard error, for tests that see no more of a child than that.

@@ -4,6 +4,14 @@ namespace {
 
 FakeModuleState g_state;
 
+#ifdef CREATE_THROWS
+/// Of a class that only this library has.
+class OwnError : public std::exception {
+public:
+    const char* what() const noexcept override { return "the plug-in's own error"; }
+};
+#endif
+
 class Module final : public IFakeModule {
 public:
     int Answer() override { return 42; }
@@ -18,7 +26,9 @@ FAKE_EXPORT FakeModuleState* FakeState() {
 #ifndef WITHOUT_CREATE
 FAKE_EXPORT IFakeModule* CreateModule() {
     ++g_state.created;
-#ifdef CREATES_NULL
+#if defined(CREATE_THROWS)
+    throw OwnError();
+#elif defined(CREATES_NULL)
     return nullptr;
 #else
     return new Module;

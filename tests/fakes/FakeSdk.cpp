@@ -7,6 +7,14 @@ FakeSdkState& State() {
     return *state;
 }
 
+#ifdef INIT_THROWS_OWN_CLASS
+/// Of a class that only this library has, whose code goes with the library.
+class OwnError : public std::exception {
+public:
+    const char* what() const noexcept override { return "the SDK's own error"; }
+};
+#endif
+
 class Sdk final : public IMetrikSdk {
 public:
     explicit Sdk(int number) : m_number(number) {}
@@ -24,6 +32,9 @@ public:
         State().calls.push_back({2, m_number, {moduleId, moduleVersion, moduleName, logDir, dbDir}});
         State().onFailure = onFailure;
         State().onSuccess = onSuccess;
+#ifdef INIT_THROWS_OWN_CLASS
+        throw OwnError();
+#endif
         ThrowIf(State().initThrows);
         return State().initAnswer;
     }
@@ -45,10 +56,13 @@ FAKE_EXPORT FakeSdkState* FakeState() {
 
 FAKE_EXPORT IMetrikSdk* CreateModule() {
     ++State().created;
+    ThrowIf(State().createThrows);
     return State().createsNothing ? nullptr : new Sdk(State().created);
 }
 
 FAKE_EXPORT void DestoryModule(IMetrikSdk* sdk) {
     ++State().destroyed;
+    if (State().sequence != nullptr)
+        State().destroyedAt = ++*State().sequence;
     delete static_cast<Sdk*>(sdk);
 }

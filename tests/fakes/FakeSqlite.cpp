@@ -50,12 +50,17 @@ FAKE_EXPORT FakeSqliteState* FakeState() {
     return &State();
 }
 
+#ifndef WITHOUT_CREATE
 FAKE_EXPORT ISqliteDatabase* CreateModule() {
     ++State().created;
+    ThrowIf(State().createThrows);
     return State().createsNothing ? nullptr : new Database;
 }
+#endif
 
 FAKE_EXPORT void DestoryModule(ISqliteDatabase* database) {
     ++State().destroyed;
+    if (State().sequence != nullptr)
+        State().destroyedAt = ++*State().sequence;
     delete static_cast<Database*>(database);
 }

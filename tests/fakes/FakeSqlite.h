@@ -37,6 +37,9 @@ struct FakeSqliteState {
     int created = 0;
     int destroyed = 0;
     bool createsNothing = false;
+    Throws createThrows = Throws::Nothing;
+    int* sequence = nullptr; ///< A counter that both destinations' fakes may share,
+    int destroyedAt = 0;     ///< and what it said when an object was destroyed last.
 };
 
 inline FakeSqliteState& FakeSqlite() {

@@ -111,9 +111,9 @@ TEST(JsonDocument, InvalidUtf8IsAnError) {
 }
 
 TEST(JsonDocument, HalfASurrogatePairIsAnError) {
-    for (const std::string text :
-         {R"("\ud800")", R"("\ud800x")", R"("\udc00")", R"({"\udfff":1})", R"("a\udc00b")"})
+    for (const std::string text : {R"("\ud800")", R"("\ud800x")", R"({"\udfff":1})", R"("a\udc00b")"})
         EXPECT_NE(ErrorOf(text), "") << text;
+    EXPECT_EQ(ErrorOf(R"("\udc00")"), "Half a surrogate pair in string. At byte 8.");
     EXPECT_EQ(Parsed(R"("\ud7ff\ue000")").ToString(), "\ud7ff\ue000")
         << "the code points next to them are whole";
 }
@@ -121,6 +121,13 @@ TEST(JsonDocument, HalfASurrogatePairIsAnError) {
 TEST(JsonDocument, AControlCharacterInAStringIsAnError) {
     EXPECT_NE(ErrorOf("\"a\nb\""), "");
     EXPECT_NE(ErrorOf(std::string("\"a\0b\"", 5)), "");
+}
+
+TEST(JsonDocument, APartOfAByteOrderMarkIsAnError) {
+    for (const std::string text :
+         {"\xef{}", "\xbb{}", "\xbf{}", "\xef\xbf{}", "\xef\xbb{}", "\xef\xbb\xbf\xef\xbb\xbf{}"})
+        EXPECT_NE(ErrorOf(text), "") << ::testing::PrintToString(text);
+    EXPECT_EQ(ErrorOf("\xef\xbb\xbf!"), "Invalid value. At byte 3.");
 }
 
 TEST(JsonDocument, AByteOrderMarkIsSkipped) {
@@ -164,6 +171,13 @@ TEST(JsonDocument, KeysAreComparedWhole) {
     EXPECT_EQ(document.GetKeyValue("a").ToInt(), 3);
 }
 
+TEST(JsonDocument, AMovedFromDocumentIsStillOne) {
+    JsonDocument document = Parsed(R"({"a":1})");
+    const JsonDocument moved = std::move(document);
+    EXPECT_EQ(document.ToJson(), R"({"a":1})");
+    EXPECT_EQ(moved.ToJson(), R"({"a":1})");
+}
+
 TEST(JsonDocument, AMemberOutlivesTheDocumentItCameFrom) {
     JsonDocument member;
     {
@@ -197,6 +211,13 @@ TEST(JsonDocument, SettingInACopyLeavesTheOriginalAlone) {
     EXPECT_EQ(original.ToJson(), R"({"a":{"b":1}})");
     EXPECT_EQ(copy.ToJson(), R"({"a":{"b":1},"x":"y"})");
     EXPECT_EQ(member.ToJson(), R"({"b":"z"})");
+}
+
+TEST(JsonDocument, ATextThatIsNoUtf8IsSetWithReplacementCharacters) {
+    JsonDocument document;
+    document.SetKeyValue("a", std::string("x\xff\xc3(\xe2\x82y\0z\xc3\xa9", 11));
+    EXPECT_EQ(document.ToJson(), "{\"a\":\"x\ufffd\ufffd(\ufffd\ufffdy\\u0000z\u00e9\"}");
+    EXPECT_EQ(Parsed(document.ToJson()).ToJson(), document.ToJson());
 }
 
 TEST(JsonDocument, CanBeSetAsAMemberOfItself) {

@@ -1,0 +1,80 @@
+#include <csignal>
+#include <cstdlib>
+#include <string>
+
+#include <fcntl.h>
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include "SystemTool/CommonTool.h"
+#include "SystemTool/IO/Directory.h"
+#include "tests/support/WaitUntil.h"
+
+using ::testing::HasSubstr;
+using ::testing::MatchesRegex;
+using ::testing::StartsWith;
+
+// The program's main, linked as it is, beside a fake logger that echoes what it is told.
+
+namespace {
+
+class Program {
+public:
+    explicit Program(const char* environment) {
+        if (::pipe(m_output) != 0)
+            throw std::runtime_error("no pipe");
+        m_process = ::fork();
+        if (m_process == 0) {
+            ::dup2(m_output[1], STDOUT_FILENO);
+            ::dup2(m_output[1], STDERR_FILENO);
+            ::setenv(environment, "1", 1);
+            const std::string path = SystemTool::IO::Directory::GetExcutableDirectory() + "main_beside_fakes";
+            ::execl(path.c_str(), path.c_str(), nullptr);
+            ::_exit(127);
+        }
+        ::fcntl(m_output[0], F_SETFL, O_NONBLOCK);
+    }
+    ~Program() {
+        ::kill(m_process, SIGKILL);
+        ::waitpid(m_process, nullptr, 0);
+        ::close(m_output[0]);
+        ::close(m_output[1]);
+    }
+    Program(const Program&) = delete;
+    Program& operator=(const Program&) = delete;
+
+    /// What it has written when it has written `text`.
+    std::string OutputUpTo(const std::string& text) {
+        EXPECT_TRUE(WaitUntil([&] {
+            char bytes[4096];
+            const auto count = ::read(m_output[0], bytes, sizeof bytes);
+            if (count > 0)
+                m_text.append(bytes, static_cast<std::size_t>(count));
+            return m_text.find(text) != std::string::npos;
+        })) << m_text;
+        return m_text;
+    }
+
+private:
+    pid_t m_process;
+    int m_output[2];
+    std::string m_text;
+};
+
+} // namespace
+
+TEST(Main, ConfiguresTheLoggerBeforeAnythingIsLogged) {
+    Program program("FAKE_LOGGER_ECHOES");
+    EXPECT_THAT(program.OutputUpTo("FrameWorker load success"),
+                StartsWith("InitLog " + SystemTool::CommonTool::GetUserDataDir() +
+                           "/hublink/log/metrik Report.log QUILLON APP 10485760 104857600 1 0\n"));
+}
+
+TEST(Main, PrintsARefusedConfigurationAndGoesOn) {
+    Program program("FAKE_LOGGER_REFUSES");
+    const std::string line = program.OutputUpTo("\n\n");
+    EXPECT_THAT(
+        line, MatchesRegex("Error:\\[[-0-9]+ [:0-9]+\\]\\[STL ERR\\] no log \\[BOOST ERR\\] disk full\n\n"));
+}
