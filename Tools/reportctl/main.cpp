@@ -2,6 +2,7 @@
 
 #include <sys/stat.h>
 
+#include "Tools/reportctl/Send.h"
 #include "Tools/reportctl/Setup.h"
 
 int main(int argc, char** argv) {
@@ -17,6 +18,7 @@ int main(int argc, char** argv) {
 
     int exitCode = 0;
     reportctl::AddSetup(app, exitCode);
+    reportctl::AddSend(app, exitCode);
 
     CLI11_PARSE(app, argc, argv);
     return exitCode;
