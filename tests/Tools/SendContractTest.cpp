@@ -17,6 +17,7 @@ protected:
         ::setenv("XDG_DATA_HOME", Data().c_str(), 1);
         ASSERT_TRUE(m_service.Start());
         FakeLogger().Clear();
+        FakeSdk().calls.clear();
     }
 
     void TearDown() override { m_service.Stop(); }
@@ -33,7 +34,7 @@ protected:
     }
 
     int Rows() const { return std::stoi(Ask("select count(*) from OperLog")); }
-    static std::size_t Events() { return FakeSdk().calls.size() - 1; } // beside the initialisation
+    static std::size_t Events() { return FakeSdk().calls.size(); }
 
     /// A control message whose log line tells that everything before it has been handled.
     static constexpr auto AN_END = R"({"msgType":"updateOpenID","exdata":{"openID":"the end"}})";
