@@ -13,8 +13,8 @@ struct PaceSettings {
     /// report of usual size, and for 12 ms without losing the largest.
     int perSecond = 1000;
 
-    /// How much lateness is made up for. A sleep ends late by some 60 microseconds, which would slow down a
-    /// quick pace; more than this at once would be the burst that the pace is there to prevent.
+    /// How much lateness is made up for. Each sleep ends a little late, which would slow down a quick pace;
+    /// more than this at once would be the burst that the pace is there to prevent.
     std::chrono::microseconds catchUp = std::chrono::milliseconds(5);
 };
 

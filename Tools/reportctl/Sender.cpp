@@ -14,8 +14,8 @@ namespace {
 
 constexpr std::uint16_t PORT = 9997;
 
-/// How long the system may take to tell that nobody listens. Linux tells before the send returns, macOS hands
-/// the datagram to another thread first; nobody notices the wait at the end of a command.
+/// How long the system may take to tell that nobody listens. Linux tells before the send over loopback
+/// returns, but nothing promises that, there or elsewhere. Nobody notices the wait at the end of a command.
 constexpr long REFUSAL_WAIT_MS = 20;
 
 } // namespace
