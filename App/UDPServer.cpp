@@ -90,12 +90,16 @@ void UDPServer::run() {
     } while (!m_bStop);
 }
 
-/// Whether a datagram came within the poll timeout. A poll that fails (a closed socket) would fail again at
-/// once and for ever: it is printed when it begins, and each one waits out the timeout that it did not use.
+/// Whether a datagram came within the poll timeout. Asking for one that is there already is one system call, where a poll
+/// makes, fills, waits for and closes a set of its own.
+///
+/// A poll that fails (a closed socket) would fail again at once and for ever: it is printed when it begins, and each one
+/// waits out the timeout that it did not use.
 bool UDPServer::WaitForDatagram() {
+    const Poco::Timespan timeout(POLL_TIMEOUT_MS * Poco::Timespan::MILLISECONDS);
     try {
-        const bool readable = m_socket.poll(Poco::Timespan(POLL_TIMEOUT_MS * Poco::Timespan::MILLISECONDS),
-                                            Poco::Net::Socket::SELECT_READ);
+        const bool readable =
+            m_socket.available() > 0 || m_socket.poll(timeout, Poco::Net::Socket::SELECT_READ);
         m_pollFailed = false;
         return readable;
     } catch (...) {
