@@ -9,6 +9,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "tests/support/Fastest.h"
 #include "tests/support/WaitUntil.h"
 
 using ::testing::ElementsAre;
@@ -140,14 +141,15 @@ TEST(PocoTasker, GoesOnAfterAWakeUpWithoutAnItem) {
 }
 
 TEST(PocoTasker, StopsPromptlyWhileIdle) {
-    Tasker tasker;
-    tasker.Start();
-    tasker.Produce("the loop runs");
-    tasker.Await(1);
-    const auto begin = std::chrono::steady_clock::now();
-    tasker.StopThread();
-    EXPECT_LT(std::chrono::steady_clock::now() - begin, std::chrono::milliseconds(200));
-    EXPECT_FALSE(tasker.IsRunning());
+    const auto startAndStop = [] {
+        Tasker tasker;
+        tasker.Start();
+        tasker.Produce("the loop runs");
+        tasker.Await(1);
+        tasker.StopThread();
+        EXPECT_FALSE(tasker.IsRunning());
+    };
+    EXPECT_LT(Fastest(startAndStop), std::chrono::milliseconds(100));
 }
 
 TEST(PocoTasker, AStopWaitsForTheItemUnderWayAndDropsTheBacklog) {
