@@ -1,0 +1,44 @@
+#include "Modules/MetrikSdk/FailureReporter.h"
+
+namespace Metrik {
+
+const char* NameOf(Cause cause) {
+    switch (cause) {
+    case Cause::Configuration:
+        return "configuration";
+    case Cause::Directory:
+        return "directory";
+    case Cause::File:
+        return "outbox file";
+    case Cause::Damage:
+        return "outbox damaged";
+    case Cause::Vanished:
+        return "outbox vanished";
+    case Cause::Event:
+        return "event";
+    case Cause::Drop:
+        return "events dropped";
+    case Cause::Upload:
+        return "upload";
+    case Cause::Refusal:
+        return "events refused";
+    case Cause::Count:
+        break;
+    }
+    return "unknown";
+}
+
+std::optional<std::string> FailureReporter::Report(Cause cause, const std::string& text, SteadyTime now) {
+    auto& history = m_histories[static_cast<std::size_t>(cause)];
+    if (history.lastTold && now - *history.lastTold < m_interval) {
+        ++history.keptBack;
+        return std::nullopt;
+    }
+    auto told = text;
+    if (history.keptBack > 0)
+        told += " (and " + std::to_string(history.keptBack) + " more of this kind since the last time)";
+    history = {now, 0};
+    return told;
+}
+
+} // namespace Metrik

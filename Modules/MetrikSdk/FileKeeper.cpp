@@ -1,0 +1,90 @@
+#include "Modules/MetrikSdk/FileKeeper.h"
+
+#include <utility>
+
+namespace Metrik {
+namespace {
+
+constexpr const char* FILE_NAME = "/MetrikOutbox.db";
+
+} // namespace
+
+FileKeeper::FileKeeper(std::string directory, const FileSettings& settings)
+    : m_directory(std::move(directory)), m_path(m_directory + FILE_NAME), m_settings(settings) {}
+
+OutboxStore& FileKeeper::Ready(SteadyTime now, std::vector<News>& news) {
+    if (m_store && !IsStillTheFile(now)) {
+        m_store.reset(); // SQLite leaves the files at the path alone once the path names another
+        news.push_back({Cause::Vanished, m_path + " was deleted or replaced, with all events that waited in it"});
+    }
+    if (m_store)
+        return *m_store;
+    if (m_failedAt && now - *m_failedAt < m_settings.reopenInterval)
+        throw StoreError(StoreFault::TryLater, m_lastError);
+    try {
+        OpenOrBegin(news);
+    } catch (const StoreError& error) {
+        CloseUntilLater(error.what(), now);
+        throw;
+    }
+    m_failedAt.reset();
+    m_nextIdentityCheck = now + m_settings.identityCheckInterval;
+    return *m_store;
+}
+
+void FileKeeper::OpenOrBegin(std::vector<News>& news) {
+    try {
+        Open();
+    } catch (const StoreError& error) {
+        if (error.fault != StoreFault::SetAside)
+            throw;
+        SetAside(error.what(), news);
+        Open();
+    }
+}
+
+void FileKeeper::Open() {
+    OutboxFiles::MakeDirectory(m_directory);
+    m_identity = OutboxFiles::Prepare(m_path);
+    m_store = std::make_unique<OutboxStore>(m_path, m_settings.shortLockPatience);
+    ++m_generation;
+}
+
+bool FileKeeper::IsStillTheFile(SteadyTime now) {
+    if (now < m_nextIdentityCheck)
+        return true;
+    m_nextIdentityCheck = now + m_settings.identityCheckInterval;
+    return OutboxFiles::IdentityOf(m_path) == m_identity;
+}
+
+bool FileKeeper::Failed(const StoreError& error, bool firstAttempt, SteadyTime now, std::vector<News>& news) {
+    if (error.fault == StoreFault::TryLater || !m_store)
+        return false;
+    if (error.fault == StoreFault::SetAside)
+        m_store->KeepLogOnClose();
+    m_store.reset();
+    try {
+        if (error.fault == StoreFault::SetAside)
+            SetAside(error.what(), news);
+    } catch (const StoreError& worse) {
+        CloseUntilLater(worse.what(), now);
+        return false;
+    }
+    if (!firstAttempt)
+        CloseUntilLater(error.what(), now);
+    return firstAttempt;
+}
+
+void FileKeeper::CloseUntilLater(const std::string& reason, SteadyTime now) {
+    m_store.reset();
+    m_failedAt = now;
+    m_lastError = reason;
+}
+
+void FileKeeper::SetAside(const std::string& reason, std::vector<News>& news) {
+    const auto name = OutboxFiles::SetAside(m_path, m_identity, WallNow());
+    if (!name.empty())
+        news.push_back({Cause::Damage, reason + "; the file was set aside as " + name});
+}
+
+} // namespace Metrik

@@ -1,0 +1,56 @@
+#pragma once
+
+#include <memory>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "Modules/MetrikSdk/Notifier.h"
+#include "Modules/MetrikSdk/OutboxFiles.h"
+#include "Modules/MetrikSdk/OutboxStore.h"
+#include "Modules/MetrikSdk/Settings.h"
+#include "Modules/MetrikSdk/StoreError.h"
+
+namespace Metrik {
+
+/// Keeps the outbox file of one directory open and usable:
+///
+///     closed ──► open ──┬─► damaged   set aside, and a new file begun at once
+///       ▲               ├─► vanished  deleted or replaced by somebody: a new file begun at once
+///       └───────────────┴─► failing   closed, and opened again by a later call
+///
+/// Threads: one at a time. News is appended for the caller to tell when it holds no lock.
+class FileKeeper {
+public:
+    FileKeeper(std::string directory, const FileSettings& settings);
+
+    /// The open store. Throws StoreError while the file cannot be opened, which is tried once in
+    /// FileSettings::reopenInterval.
+    OutboxStore& Ready(SteadyTime now, std::vector<News>& news);
+
+    /// To be called when an operation of the store failed. Whether a first attempt is worth a second one at
+    /// once; a second failure closes the file for FileSettings::reopenInterval.
+    bool Failed(const StoreError& error, bool firstAttempt, SteadyTime now, std::vector<News>& news);
+
+    /// Changes with every file that is opened: what is known of the file before is no longer true.
+    unsigned Generation() const { return m_generation; }
+
+private:
+    void Open();
+    void OpenOrBegin(std::vector<News>& news);
+    void CloseUntilLater(const std::string& reason, SteadyTime now);
+    bool IsStillTheFile(SteadyTime now);
+    void SetAside(const std::string& reason, std::vector<News>& news);
+
+    const std::string m_directory;
+    const std::string m_path;
+    const FileSettings m_settings;
+    std::unique_ptr<OutboxStore> m_store;
+    OutboxFiles::Identity m_identity{};
+    unsigned m_generation = 0;
+    SteadyTime m_nextIdentityCheck{};
+    std::optional<SteadyTime> m_failedAt;
+    std::string m_lastError;
+};
+
+} // namespace Metrik

@@ -1,0 +1,66 @@
+#include "Modules/MetrikSdk/Notifier.h"
+
+#include <atomic>
+
+namespace Metrik {
+namespace {
+
+std::atomic<bool> g_silent = false;
+
+void Add(std::map<IMetrikSdk::Callback, int>& subscribers, IMetrikSdk::Callback callback) {
+    if (callback != nullptr)
+        ++subscribers[callback];
+}
+
+void Take(std::map<IMetrikSdk::Callback, int>& subscribers, IMetrikSdk::Callback callback) {
+    const auto found = subscribers.find(callback);
+    if (found != subscribers.end() && --found->second == 0)
+        subscribers.erase(found);
+}
+
+} // namespace
+
+void Notifier::Subscribe(IMetrikSdk::Callback onFailure, IMetrikSdk::Callback onSuccess) {
+    const std::lock_guard lock(m_mutex);
+    Add(m_onFailure, onFailure);
+    Add(m_onSuccess, onSuccess);
+}
+
+void Notifier::Unsubscribe(IMetrikSdk::Callback onFailure, IMetrikSdk::Callback onSuccess) {
+    const std::lock_guard lock(m_mutex);
+    Take(m_onFailure, onFailure);
+    Take(m_onSuccess, onSuccess);
+}
+
+void Notifier::TellFailure(const News& news) {
+    const std::lock_guard lock(m_mutex);
+    if (const auto text = m_reporter.Report(news.cause, news.text, std::chrono::steady_clock::now()))
+        Tell(m_onFailure, NameOf(news.cause), *text);
+}
+
+void Notifier::TellFailures(const std::vector<News>& news) {
+    for (const auto& one : news)
+        TellFailure(one);
+}
+
+void Notifier::TellSuccess(const std::string& what, const std::string& detail) {
+    const std::lock_guard lock(m_mutex);
+    Tell(m_onSuccess, what, detail);
+}
+
+void Notifier::Silence() {
+    g_silent = true;
+}
+
+void Notifier::Tell(const Subscribers& subscribers, const std::string& what, const std::string& detail) {
+    for (const auto& [callback, count] : subscribers) {
+        if (g_silent)
+            return;
+        try {
+            callback(what, detail);
+        } catch (...) { // a stranger's exception must not end the uploader's thread
+        }
+    }
+}
+
+} // namespace Metrik

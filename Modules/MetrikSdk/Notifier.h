@@ -1,0 +1,53 @@
+#pragma once
+
+#include <map>
+#include <mutex>
+#include <string>
+#include <vector>
+
+#include "Modules/MetrikSdk/FailureReporter.h"
+#include "Plugin/IMetrikSdk.h"
+
+namespace Metrik {
+
+/// A failure on its way to whoever wants to know.
+struct News {
+    Cause cause;
+    std::string text;
+};
+
+/// Tells the callbacks of all modules that share an outbox. Thousands of modules usually bring the same
+/// function, which is then called once.
+///
+/// Threads: any. A callback runs while the notifier's lock is held, so that after Unsubscribe no call to it
+/// is under way or will come; it may report events, but not initialise or destroy an SDK object.
+/// Failure: what a callback throws goes nowhere.
+class Notifier {
+public:
+    explicit Notifier(std::chrono::milliseconds tellInterval) : m_reporter(tellInterval) {}
+
+    /// Null functions are allowed, and are not called. Each call is undone by one Unsubscribe.
+    void Subscribe(IMetrikSdk::Callback onFailure, IMetrikSdk::Callback onSuccess);
+    void Unsubscribe(IMetrikSdk::Callback onFailure, IMetrikSdk::Callback onSuccess);
+
+    void TellFailure(const News& news);
+    void TellFailures(const std::vector<News>& news);
+    void TellSuccess(const std::string& what, const std::string& detail);
+
+    /// From now on nobody in this process is told anything: exit() is running, and what the callbacks use may
+    /// be destroyed already.
+    static void Silence();
+
+private:
+    using Subscribers = std::map<IMetrikSdk::Callback, int>;
+
+    static void Tell(const Subscribers& subscribers, const std::string& what, const std::string& detail);
+
+    /// Guards all below. Recursive, because a callback may come back with an event that fails in its turn.
+    std::recursive_mutex m_mutex;
+    FailureReporter m_reporter;
+    Subscribers m_onFailure;
+    Subscribers m_onSuccess;
+};
+
+} // namespace Metrik

@@ -1,0 +1,171 @@
+#include "Modules/MetrikSdk/Outbox.h"
+
+#include <algorithm>
+#include <utility>
+
+#include "Modules/MetrikSdk/PruneRule.h"
+#include "Modules/MetrikSdk/Uuid.h"
+
+namespace Metrik {
+
+Outbox::Outbox(const std::string& directory, const OutboxSettings& settings, Notifier& notifier)
+    : m_settings(settings), m_notifier(notifier), m_keeper(directory, settings.file) {}
+
+/// Runs `operation` on the open store, a second time on a new or reopened file when the first one turns out
+/// to be unusable.
+template <typename Operation>
+auto Outbox::AttemptTwice(Operation operation) {
+    for (bool first = true;; first = false) {
+        try {
+            auto& store = m_keeper.Ready(m_now, m_news);
+            LearnAbout(store);
+            return operation(store);
+        } catch (const StoreError& error) {
+            if (!m_keeper.Failed(error, first, m_now, m_news))
+                throw;
+        }
+    }
+}
+
+/// Locks, runs `operation`, unlocks, and tells what there was to tell.
+template <typename Operation>
+auto Outbox::WithStore(Operation operation) {
+    struct TellAtEnd {
+        Notifier& notifier;
+        std::vector<News> news;
+        ~TellAtEnd() { notifier.TellFailures(news); }
+    } tell{m_notifier, {}};
+    const std::lock_guard lock(m_mutex);
+    struct CollectNews {
+        std::vector<News>& from;
+        std::vector<News>& to;
+        ~CollectNews() { to.swap(from); }
+    } collect{m_news, tell.news};
+    m_now = std::chrono::steady_clock::now();
+    return AttemptTwice(std::move(operation));
+}
+
+bool Outbox::Open() {
+    try {
+        WithStore([](OutboxStore&) {});
+        return true;
+    } catch (const StoreError& error) {
+        m_notifier.TellFailure({Cause::File, error.what()});
+        return false;
+    }
+}
+
+bool Outbox::Append(const ModuleIdentity& module, std::string eventId, std::string payload) {
+    if (eventId.size() + payload.size() > m_settings.caps.maxEventBytes) {
+        m_notifier.TellFailure({Cause::Event, "An event of " + std::to_string(payload.size()) +
+                                                  " bytes is over the bound and was refused"});
+        return false;
+    }
+    try {
+        const auto now = WallNow();
+        const NewEvent event{NewUuid(now), std::move(eventId), std::move(payload), now};
+        WithStore([&](OutboxStore& store) { StoreEvent(store, module, event); });
+        return true;
+    } catch (const StoreError& error) {
+        m_notifier.TellFailure({Cause::File, error.what()});
+        return false;
+    }
+}
+
+void Outbox::StoreEvent(OutboxStore& store, const ModuleIdentity& module, const NewEvent& event) {
+    store.SetLockPatience(m_patienceUsedUp ? m_settings.file.shortLockPatience
+                                           : m_settings.file.lockPatience);
+    m_patienceUsedUp = true; // unless what follows succeeds
+    m_waitingBytes += static_cast<std::int64_t>(store.Store(module, event));
+    m_patienceUsedUp = false;
+    m_bell.Report(++m_waitingEvents);
+    try {
+        KeepWithinCaps(store);
+    } catch (const StoreError& error) { // the event itself is safe
+        m_news.push_back({Cause::File, error.what()});
+    }
+}
+
+/// What is to be known of a file that was just opened.
+void Outbox::LearnAbout(OutboxStore& store) {
+    store.SetLockPatience(m_settings.file.shortLockPatience);
+    if (m_knownGeneration == m_keeper.Generation())
+        return;
+    Recount(store);
+    m_underWayUpTo = 0;
+    m_openedSteady = m_now;
+    m_openedAt = WallNow();
+    m_nextAgeCheck = m_now;
+    m_knownGeneration = m_keeper.Generation();
+}
+
+void Outbox::Recount(OutboxStore& store) {
+    const auto status = store.Status();
+    m_waitingEvents = status.waiting;
+    m_waitingBytes = status.waitingBytes;
+    m_bell.Report(m_waitingEvents);
+}
+
+void Outbox::KeepWithinCaps(OutboxStore& store) {
+    const auto excess = PruneRule::ExcessBytes(m_waitingBytes, m_settings.caps);
+    const bool lookForOld = m_now >= m_nextAgeCheck;
+    if (excess == 0 && !lookForOld)
+        return;
+    const auto elapsed = std::chrono::duration_cast<std::chrono::milliseconds>(m_now - m_openedSteady);
+    Drop(store, PruneRule::OldestAllowed(WallNow(), m_openedAt, elapsed, m_settings.caps), excess);
+}
+
+void Outbox::Drop(OutboxStore& store, WallTime before, std::int64_t excess) {
+    const auto maxRows = m_settings.caps.maxDropsAtOnce;
+    const auto dropped = store.DropOldest(m_underWayUpTo, before, excess, maxRows);
+    Recount(store);
+    if (dropped < maxRows) // else more may be due: the next event goes on
+        m_nextAgeCheck = m_now + m_settings.caps.ageCheckInterval;
+    if (dropped > 0)
+        TellDrop(dropped);
+}
+
+void Outbox::TellDrop(std::size_t dropped) {
+    if (PruneRule::BeginsRun(m_lastDrop, m_now, m_settings.caps))
+        m_news.push_back({Cause::Drop, "The outbox is over its bounds: the oldest events are being dropped, " +
+                                           std::to_string(dropped) +
+                                           " of them just now; the outbox counts the others"});
+    m_lastDrop = m_now;
+}
+
+Batch Outbox::Take(std::size_t maxEvents) {
+    return WithStore([&](OutboxStore& store) {
+        auto batch = store.Oldest(maxEvents, m_settings.batch.maxBytes);
+        if (batch.events.empty())
+            Recount(store);
+        else
+            m_underWayUpTo = batch.events.back().row;
+        return batch;
+    });
+}
+
+void Outbox::Release() {
+    const std::lock_guard lock(m_mutex);
+    m_underWayUpTo = 0;
+}
+
+void Outbox::RemoveDelivered(const Batch& batch, std::size_t refused) {
+    WithStore([&](OutboxStore& store) {
+        store.RemoveDelivered(batch, refused);
+        Recount(store);
+    });
+}
+
+void Outbox::MoveToDeadLetters(const StoredEvent& event, const Refusal& refusal) {
+    WithStore([&](OutboxStore& store) {
+        store.MoveToDeadLetters(event, refusal, WallNow());
+        store.TrimDeadLetters(m_settings.caps.maxDeadLetters, m_settings.caps.maxDeadLetterBytes);
+        Recount(store);
+    });
+}
+
+OutboxStatus Outbox::Status() {
+    return WithStore([](OutboxStore& store) { return store.Status(); });
+}
+
+} // namespace Metrik

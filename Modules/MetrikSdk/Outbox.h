@@ -1,0 +1,77 @@
+#pragma once
+
+#include <mutex>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "Modules/MetrikSdk/Bell.h"
+#include "Modules/MetrikSdk/FileKeeper.h"
+#include "Modules/MetrikSdk/Notifier.h"
+#include "Modules/MetrikSdk/OutboxStore.h"
+#include "Modules/MetrikSdk/Settings.h"
+
+namespace Metrik {
+
+/// The outbox of one directory, for all modules and the uploader of a process, kept within its caps.
+///
+/// Threads: any. One lock over one connection, because every operation is short, and a connection that
+/// nobody else in the process uses can be closed safely when its file is to be set aside.
+/// Failure: Append and Open return false, the others throw StoreError. Append and Open tell the notifier,
+/// as everybody does who notices damage or drops; never while the lock is held.
+class Outbox {
+public:
+    Outbox(const std::string& directory, const OutboxSettings& settings, Notifier& notifier);
+
+    /// Opens the file, so that a problem is known early. False is not final: later calls try again.
+    bool Open();
+
+    /// Stores the event. True once it survives kill -9 of this process.
+    bool Append(const ModuleIdentity& module, std::string eventId, std::string payload);
+
+    /// The oldest events. They are under way until Release: a cap drops others first.
+    Batch Take(std::size_t maxEvents);
+    void Release();
+
+    void RemoveDelivered(const Batch& batch, std::size_t refused);
+    void MoveToDeadLetters(const StoredEvent& event, const Refusal& refusal);
+
+    OutboxStatus Status();
+
+    /// Rings with the number of waiting events, as far as this process knows it: what another process does to
+    /// the same file is learned within a minute.
+    Bell& WaitingBell() { return m_bell; }
+
+private:
+    template <typename Operation>
+    auto WithStore(Operation operation);
+    template <typename Operation>
+    auto AttemptTwice(Operation operation);
+
+    void StoreEvent(OutboxStore& store, const ModuleIdentity& module, const NewEvent& event);
+    void LearnAbout(OutboxStore& store);
+    void Recount(OutboxStore& store);
+    void KeepWithinCaps(OutboxStore& store);
+    void Drop(OutboxStore& store, WallTime before, std::int64_t excess);
+    void TellDrop(std::size_t dropped);
+
+    const OutboxSettings m_settings;
+    Notifier& m_notifier;
+    Bell m_bell;
+
+    std::mutex m_mutex; ///< Guards all below.
+    FileKeeper m_keeper;
+    unsigned m_knownGeneration = 0;
+    std::int64_t m_waitingEvents = 0;
+    std::int64_t m_waitingBytes = 0;
+    std::int64_t m_underWayUpTo = 0;   ///< The last row that was taken and not released.
+    bool m_patienceUsedUp = false;     ///< The last event found the file locked for all of the patience.
+    SteadyTime m_now{};                ///< Of the operation under way.
+    SteadyTime m_openedSteady{};       ///< Both times of when the file was opened.
+    WallTime m_openedAt{};
+    SteadyTime m_nextAgeCheck{};
+    std::optional<SteadyTime> m_lastDrop;
+    std::vector<News> m_news; ///< Told once the lock is released.
+};
+
+} // namespace Metrik

@@ -1,0 +1,48 @@
+#include "Modules/MetrikSdk/OutboxEngine.h"
+
+#include <cstdlib>
+#include <system_error>
+#include <utility>
+
+#include "Modules/MetrikSdk/HttpSender.h"
+
+namespace Metrik {
+namespace {
+
+/// exit() may be called while the uploader is at work, by the service's crash handler on any thread. What it
+/// destroys afterwards must not be in use: the logger behind the callbacks, and the TLS library's own state.
+void OnExit() {
+    Notifier::Silence();
+    HttpSender::AbandonAll(std::chrono::milliseconds(500));
+}
+
+/// Registered after the TLS library has registered its own, and therefore run before it.
+void RegisterOnExit() {
+    [[maybe_unused]] static const int registered = std::atexit(&OnExit);
+}
+
+} // namespace
+
+OutboxEngine::OutboxEngine(const std::string& directory, const OutboxSettings& settings,
+                           const std::optional<EndpointConfig>& endpoint, std::vector<std::string> complaints)
+    : m_core(std::make_shared<OutboxCore>(directory, settings)), m_complaints(std::move(complaints)) {
+    if (endpoint)
+        StartUploader(*endpoint);
+    RegisterOnExit();
+}
+
+void OutboxEngine::StartUploader(const EndpointConfig& endpoint) {
+    try {
+        m_uploader = std::make_unique<Uploader>(m_core, std::make_shared<HttpSender>(endpoint));
+    } catch (const std::exception& error) { // the events are stored all the same
+        m_complaints.push_back(std::string("The uploader cannot be started: ") + error.what());
+    }
+}
+
+bool OutboxEngine::Open() {
+    for (const auto& complaint : m_complaints)
+        m_core->notifier.TellFailure({Cause::Configuration, complaint});
+    return m_core->outbox.Open();
+}
+
+} // namespace Metrik

@@ -1,0 +1,53 @@
+#pragma once
+
+#include <cstddef>
+#include <map>
+#include <memory>
+#include <mutex>
+#include <string>
+
+#include "Modules/MetrikSdk/EndpointConfig.h"
+#include "Modules/MetrikSdk/FailureReporter.h"
+#include "Modules/MetrikSdk/OutboxEngine.h"
+
+namespace Metrik {
+
+/// The outboxes of this process: one for each database directory, however many modules announce themselves.
+///
+/// Directories come from outside, in datagrams. Empty and relative ones mean the one that the process gave
+/// first. So does every new one once MAX_OUTBOXES are in use: an outbox costs a file and a thread.
+///
+/// Threads: any.
+class OutboxRegistry {
+public:
+    /// The suite uses one directory, a test installation a second one; the rest is room for the unforeseen.
+    static constexpr std::size_t MAX_OUTBOXES = 8;
+
+    OutboxRegistry(const OutboxSettings& settings, LookUp lookUp);
+
+    /// The process's own, with production's settings. Never destroyed: SDK objects may outlive static ones.
+    static OutboxRegistry& Instance();
+
+    /// The outbox for `directory`; null when there is no directory to use at all. To be given back by Release.
+    std::shared_ptr<OutboxEngine> Acquire(const std::string& directory);
+
+    /// Gives `engine` up. The last user's call stops its uploader before it returns; nobody can open the same
+    /// file meanwhile.
+    void Release(std::shared_ptr<OutboxEngine>& engine);
+
+    /// What to tell a module that got no outbox, if it is time to tell.
+    std::optional<std::string> ReportNoDirectory();
+
+private:
+    std::string Choose(const std::string& directory);
+    void ForgetReleased();
+
+    const OutboxSettings m_settings;
+    const LookUp m_lookUp;
+    std::mutex m_mutex; ///< Guards all below.
+    FailureReporter m_reporter;
+    std::string m_firstDirectory;
+    std::map<std::string, std::weak_ptr<OutboxEngine>> m_engines; ///< By canonical directory.
+};
+
+} // namespace Metrik

@@ -1,0 +1,27 @@
+#pragma once
+
+#include <cstdint>
+#include <optional>
+
+#include "Modules/MetrikSdk/Settings.h"
+#include "Modules/MetrikSdk/Time.h"
+
+/// What is too much and what is too old. Pure; dropping, and when to look, are the outbox's.
+namespace Metrik::PruneRule {
+
+/// Bytes that must go; 0 while the cap holds. A little more than the excess, so that the next event does not
+/// come into the same position.
+std::int64_t ExcessBytes(std::int64_t waitingBytes, const CapSettings& caps);
+
+/// Events that were stored before this are too old.
+///
+/// `now` is the wall clock. `openedAt` and `elapsed` are the wall clock when the outbox was opened and the
+/// steady time since: a clock that is set years ahead while the service runs must not cost every waiting
+/// event, so the earlier reading counts. A machine that slept keeps its events longer, at worst.
+WallTime OldestAllowed(WallTime now, WallTime openedAt, std::chrono::milliseconds elapsed,
+                       const CapSettings& caps);
+
+/// Whether a drop now is the first of a run of drops, which is the one that is told.
+bool BeginsRun(std::optional<SteadyTime> lastDrop, SteadyTime now, const CapSettings& caps);
+
+} // namespace Metrik::PruneRule

@@ -1,0 +1,17 @@
+#pragma once
+
+#include <chrono>
+
+namespace Metrik {
+
+/// A point of wall-clock time as the outbox stores it. Decisions take it as an argument named `now`.
+using WallTime = std::chrono::sys_time<std::chrono::milliseconds>;
+
+/// For what must not jump with the wall clock: how often something is tried or told.
+using SteadyTime = std::chrono::steady_clock::time_point;
+
+inline WallTime WallNow() {
+    return std::chrono::time_point_cast<std::chrono::milliseconds>(std::chrono::system_clock::now());
+}
+
+} // namespace Metrik
