@@ -1,0 +1,35 @@
+#include "Modules/MetrikSdk/FailureReporter.h"
+
+#include <gtest/gtest.h>
+
+using Metrik::Cause;
+using Metrik::FailureReporter;
+using Metrik::SteadyTime;
+using namespace std::chrono_literals;
+
+namespace {
+
+const SteadyTime START{1000h};
+
+TEST(FailureReporter, TellsTheFirstFailureAtOnce) {
+    FailureReporter reporter(1min);
+    EXPECT_EQ(reporter.Report(Cause::Upload, "no route", START), "no route");
+}
+
+TEST(FailureReporter, TellsTheSameCauseOnceAMinuteWithTheNumberKeptBack) {
+    FailureReporter reporter(1min);
+    reporter.Report(Cause::Upload, "no route", START);
+    for (int i = 0; i < 9'999; ++i)
+        EXPECT_EQ(reporter.Report(Cause::Upload, "no route", START + 59s), std::nullopt);
+    EXPECT_EQ(reporter.Report(Cause::Upload, "no route", START + 60s),
+              "no route (and 9999 more of this kind since the last time)");
+    EXPECT_EQ(reporter.Report(Cause::Upload, "no route", START + 61s), std::nullopt);
+}
+
+TEST(FailureReporter, TellsAnotherCauseWithoutRegardToTheFirst) {
+    FailureReporter reporter(1min);
+    reporter.Report(Cause::Upload, "no route", START);
+    EXPECT_EQ(reporter.Report(Cause::File, "disk full", START), "disk full");
+}
+
+} // namespace
