@@ -61,7 +61,7 @@ bool FileKeeper::Failed(const StoreError& error, bool firstAttempt, SteadyTime n
     if (error.fault == StoreFault::TryLater || !m_store)
         return false;
     if (error.fault == StoreFault::SetAside)
-        m_store->KeepLogOnClose();
+        m_store->KeepLogOnClose(true);
     m_store.reset();
     try {
         if (error.fault == StoreFault::SetAside)

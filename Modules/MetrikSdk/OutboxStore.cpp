@@ -74,6 +74,7 @@ SQLite::Database OpenDatabase(const std::string& path) {
 OutboxStore::OutboxStore(const std::string& path, std::chrono::milliseconds lockPatience)
     : m_database(OpenDatabase(path)) {
     SetLockPatience(lockPatience);
+    KeepLogOnClose(true); // until the file is known to be in order
     Guarded("Cannot open the outbox", [&] {
         Configure();
         CreateOrCheckSchema();
@@ -86,6 +87,7 @@ OutboxStore::OutboxStore(const std::string& path, std::chrono::milliseconds lock
         m_delete = std::make_unique<SQLite::Statement>(m_database,
                                                        "DELETE FROM event WHERE id = ?1 AND uuid = ?2");
     });
+    KeepLogOnClose(false);
 }
 
 void OutboxStore::Configure() {
@@ -120,8 +122,8 @@ void OutboxStore::SetLockPatience(std::chrono::milliseconds patience) {
     ::sqlite3_busy_timeout(m_database.getHandle(), static_cast<int>(patience.count()));
 }
 
-void OutboxStore::KeepLogOnClose() {
-    ::sqlite3_db_config(m_database.getHandle(), SQLITE_DBCONFIG_NO_CKPT_ON_CLOSE, 1, nullptr);
+void OutboxStore::KeepLogOnClose(bool keep) {
+    ::sqlite3_db_config(m_database.getHandle(), SQLITE_DBCONFIG_NO_CKPT_ON_CLOSE, keep ? 1 : 0, nullptr);
 }
 
 std::size_t OutboxStore::Store(const ModuleIdentity& module, const NewEvent& event) {

@@ -59,8 +59,8 @@ public:
     /// How long the operations wait for another process that holds the lock.
     void SetLockPatience(std::chrono::milliseconds patience);
 
-    /// Closing leaves the write-ahead log as it is: a damaged file is set aside together with it.
-    void KeepLogOnClose();
+    /// Whether closing leaves the write-ahead log as it is: a damaged file is set aside together with it.
+    void KeepLogOnClose(bool keep);
 
     /// Stores the event as its module's next one. Returns the bytes that it counts for.
     std::size_t Store(const ModuleIdentity& module, const NewEvent& event);

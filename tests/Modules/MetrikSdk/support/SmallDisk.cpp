@@ -1,0 +1,52 @@
+#include "tests/Modules/MetrikSdk/support/SmallDisk.h"
+
+#include <cstdio>
+#include <fstream>
+
+#include <sched.h>
+#include <sys/mount.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <gtest/gtest.h>
+
+namespace {
+
+constexpr int PASSED = 0;
+constexpr int FAILED = 1;
+constexpr int UNAVAILABLE = 77;
+
+bool EnterOwnMountNamespace() {
+    const auto user = ::getuid();
+    if (user == 0)
+        return ::unshare(CLONE_NEWNS) == 0;
+    if (::unshare(CLONE_NEWUSER | CLONE_NEWNS) != 0)
+        return false;
+    std::ofstream("/proc/self/uid_map") << "0 " << user << " 1";
+    return true;
+}
+
+int RunChild(const std::string& directory, int bytes, const std::function<void()>& test) {
+    if (!EnterOwnMountNamespace() || ::mount("none", "/", nullptr, MS_REC | MS_PRIVATE, nullptr) != 0 ||
+        ::mount("tmpfs", directory.c_str(), "tmpfs", 0, ("size=" + std::to_string(bytes)).c_str()) != 0)
+        return UNAVAILABLE;
+    test();
+    return testing::Test::HasFailure() ? FAILED : PASSED;
+}
+
+} // namespace
+
+SmallDiskResult RunOnSmallDisk(const std::string& directory, int bytes, const std::function<void()>& test) {
+    const auto child = ::fork();
+    if (child == 0) {
+        const int code = RunChild(directory, bytes, test);
+        std::fflush(nullptr);
+        ::_exit(code);
+    }
+    int status = 0;
+    ::waitpid(child, &status, 0);
+    if (WIFEXITED(status) && WEXITSTATUS(status) == UNAVAILABLE)
+        return SmallDiskResult::Unavailable;
+    return WIFEXITED(status) && WEXITSTATUS(status) == PASSED ? SmallDiskResult::Passed
+                                                              : SmallDiskResult::Failed;
+}
