@@ -116,7 +116,8 @@ bool LoopbackServer::Read(Poco::Net::StreamSocket& socket, std::string& buffer, 
         }
     }
     request.body = buffer.substr(head, wanted - head);
-    if (request.headers["content-encoding"] == "gzip")
+    const auto encoding = request.headers.find("content-encoding");
+    if (encoding != request.headers.end() && encoding->second == "gzip")
         request.body = Unpacked(request.body);
     buffer.erase(0, wanted);
     return true;

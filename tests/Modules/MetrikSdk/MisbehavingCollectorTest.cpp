@@ -1,0 +1,237 @@
+#include <algorithm>
+#include <ctime>
+
+#include "tests/Modules/MetrikSdk/support/PluginFixture.h"
+
+using namespace std::chrono_literals;
+
+namespace {
+
+using Manner = Reply::Manner;
+
+/// A collector that answers its first requests as listed and takes everything afterwards. It keeps account of
+/// what it took.
+class MisbehavingCollectorTest : public PluginFixture {
+protected:
+    void StartAgainst(std::vector<Reply> replies) {
+        StartAgainstScript([this, replies](const Request&) {
+            return m_answered < replies.size() ? replies[m_answered++] : Reply();
+        });
+    }
+
+    void StartAgainstScript(LoopbackServer::Script script) {
+        m_server = std::make_unique<LoopbackServer>([this, script](const Request& request) {
+            auto reply = script(request);
+            if (reply.manner == Manner::Answer && reply.status == 200)
+                for (const auto& event : EventsOf(request.body))
+                    m_taken.insert(event.uuid);
+            return reply;
+        });
+        Configure("ENDPOINT", m_server->Url());
+        Start();
+    }
+
+    /// Every event is in exactly one place, and what the outbox calls delivered is what the collector took.
+    void ExpectEverythingDelivered(int count) {
+        EXPECT_TRUE(WaitUntilNothingWaits());
+        Stop();
+        const auto status = Totals();
+        EXPECT_EQ(status.stored, count);
+        EXPECT_EQ(status.delivered, count);
+        EXPECT_EQ(status.stored, status.delivered + status.refused + status.deadLettered + status.dropped);
+        EXPECT_EQ(m_taken.size(), static_cast<std::size_t>(count));
+    }
+
+    /// The times between the requests could be measured here only by the clock of the machine; the requests'
+    /// number says the same: without a wait there would be many more.
+    std::size_t m_answered = 0;
+    std::set<std::string> m_taken;
+    std::unique_ptr<LoopbackServer> m_server;
+};
+
+Reply Status(int status, const std::string& headers = {}, const std::string& body = "{}") {
+    Reply reply;
+    reply.status = status;
+    reply.headers = headers;
+    reply.body = body;
+    return reply;
+}
+
+Reply Misbehave(Manner manner) {
+    Reply reply;
+    reply.manner = manner;
+    return reply;
+}
+
+TEST_F(MisbehavingCollectorTest, GetsWellFormedRequestsOverOneConnection) {
+    Configure("HEADERS", "api-key=secret%20word");
+    StartAgainst({});
+    Report(1500);
+    ExpectEverythingDelivered(1500);
+    const auto requests = m_server->Requests();
+    for (const auto& request : requests) {
+        EXPECT_EQ(request.line, "POST /v1/logs HTTP/1.1");
+        EXPECT_EQ(request.headers.at("content-type"), "application/json");
+        EXPECT_EQ(request.headers.at("api-key"), "secret word");
+        EXPECT_EQ(request.headers.count("content-encoding"), 0U);
+        EXPECT_EQ(request.connection, 1);
+    }
+    EXPECT_EQ(EventsOf(requests.at(0).body).size(), 512U);
+    EXPECT_EQ(Told::Failures().All().size(), 0U);
+}
+
+TEST_F(MisbehavingCollectorTest, GetsEveryEventOnceAndInOrder) {
+    StartAgainst({});
+    Report(1500);
+    ExpectEverythingDelivered(1500);
+    int next = 0;
+    for (const auto& request : m_server->Requests())
+        for (const auto& event : EventsOf(request.body)) {
+            EXPECT_EQ(event.number, next++);
+            EXPECT_EQ(event.sequence, next);
+        }
+    EXPECT_EQ(next, 1500);
+}
+
+TEST_F(MisbehavingCollectorTest, GetsCompressedBodiesWhenAskedFor) {
+    Configure("COMPRESSION", "gzip");
+    StartAgainst({});
+    Report(10);
+    ExpectEverythingDelivered(10);
+    EXPECT_EQ(m_server->Requests().at(0).headers.at("content-encoding"), "gzip");
+}
+
+TEST_F(MisbehavingCollectorTest, Answers503AndGetsTheSameEventsAgain) {
+    StartAgainst({Status(503)});
+    Report(10);
+    ExpectEverythingDelivered(10);
+    const auto requests = m_server->Requests();
+    ASSERT_EQ(requests.size(), 2U);
+    EXPECT_EQ(EventsOf(requests[0].body)[0].uuid, EventsOf(requests[1].body)[0].uuid);
+    EXPECT_EQ(Told::Failures().Count("upload: "), 1);
+}
+
+TEST_F(MisbehavingCollectorTest, AsksForATimeInSecondsAndIsGivenIt) {
+    StartAgainst({Status(429, "Retry-After: 2\r\n")});
+    const auto start = std::chrono::steady_clock::now();
+    Report(512);
+    ExpectEverythingDelivered(512);
+    EXPECT_GE(std::chrono::steady_clock::now() - start, 2s);
+    EXPECT_EQ(m_server->RequestCount(), 2U);
+}
+
+TEST_F(MisbehavingCollectorTest, AsksForATimeByADateAndIsGivenIt) {
+    const std::time_t until = std::time(nullptr) + 3;
+    std::tm utc{};
+    ::gmtime_r(&until, &utc);
+    char date[64];
+    std::strftime(date, sizeof(date), "Retry-After: %a, %d %b %Y %H:%M:%S GMT\r\n", &utc);
+    StartAgainst({Status(503, date)});
+    Report(512);
+    ExpectEverythingDelivered(512);
+    EXPECT_GE(std::time(nullptr), until);
+    EXPECT_EQ(m_server->RequestCount(), 2U);
+}
+
+TEST_F(MisbehavingCollectorTest, RefusesOnePoisonousEventAmong500) {
+    StartAgainstScript([](const Request& request) {
+        const auto events = EventsOf(request.body);
+        const bool poisonous =
+            std::any_of(events.begin(), events.end(), [](const auto& event) { return event.number == 321; });
+        return poisonous ? Status(400, {}, R"({"code":3,"message":"event 321 is bad"})") : Status(200);
+    });
+    Report(500);
+    EXPECT_TRUE(WaitUntilNothingWaits());
+    Stop();
+    EXPECT_EQ(Totals().delivered, 499);
+    EXPECT_EQ(m_taken.size(), 499U);
+    SQLite::Database outbox(File());
+    EXPECT_EQ(outbox.execAndGet("SELECT count(*) FROM dead_letter").getInt(), 1);
+    EXPECT_EQ(outbox.execAndGet("SELECT payload FROM dead_letter").getString(), NumberedPayload(321));
+    EXPECT_EQ(outbox.execAndGet("SELECT reason FROM dead_letter").getString(),
+              "HTTP status 400: event 321 is bad");
+    EXPECT_EQ(Told::Failures().Count("events refused: "), 1);
+}
+
+TEST_F(MisbehavingCollectorTest, RejectsSomeEventsOfARequest) {
+    StartAgainst({Status(200, {}, R"({"partialSuccess":{"rejectedLogRecords":"7","errorMessage":"old"}})")});
+    Report(100);
+    EXPECT_TRUE(WaitUntilNothingWaits());
+    Stop();
+    const auto status = Totals();
+    EXPECT_EQ(status.delivered, 93);
+    EXPECT_EQ(status.refused, 7);
+    EXPECT_EQ(m_server->RequestCount(), 1U);
+    EXPECT_EQ(Told::Failures().Count("events refused: The collector rejected 7 of 100"), 1);
+}
+
+TEST_F(MisbehavingCollectorTest, NeverAnswers) {
+    Configure("TIMEOUT", "300");
+    StartAgainst({Misbehave(Manner::Never)});
+    Report(10);
+    ExpectEverythingDelivered(10);
+    EXPECT_EQ(Told::Failures().Count("upload: "), 1);
+}
+
+TEST_F(MisbehavingCollectorTest, ClosesAfterReading) {
+    StartAgainst({Misbehave(Manner::Close)});
+    Report(10);
+    ExpectEverythingDelivered(10);
+}
+
+TEST_F(MisbehavingCollectorTest, ClosesHalfWayThroughTheBody) {
+    StartAgainst({Misbehave(Manner::CloseHalfway)});
+    Report(10);
+    ExpectEverythingDelivered(10);
+    EXPECT_EQ(m_server->RequestCount(), 2U);
+}
+
+TEST_F(MisbehavingCollectorTest, AnswersGarbage) {
+    StartAgainst({Misbehave(Manner::SpeakNonsense)});
+    Report(10);
+    ExpectEverythingDelivered(10);
+    EXPECT_EQ(m_server->RequestCount(), 2U);
+}
+
+TEST_F(MisbehavingCollectorTest, AnswersABodyWithoutAnEnd) {
+    StartAgainst({Misbehave(Manner::Flood)});
+    Report(10);
+    EXPECT_TRUE(WaitUntilNothingWaits());
+    Stop();
+    EXPECT_EQ(Totals().delivered, 10) << "the status said so, and no more is read of the body";
+    EXPECT_EQ(m_server->RequestCount(), 1U);
+}
+
+TEST_F(MisbehavingCollectorTest, IsALogInPage) {
+    StartAgainst({Status(200, "Content-Type: text/html\r\n", "<html>log in</html>")});
+    Report(10);
+    ExpectEverythingDelivered(10);
+    EXPECT_EQ(m_server->RequestCount(), 2U);
+}
+
+TEST_F(MisbehavingCollectorTest, RedirectsAndIsNotFollowed) {
+    LoopbackServer elsewhere([](const Request&) { return Reply(); });
+    Configure("HEADERS", "authorization=secret");
+    StartAgainst({Status(307, "Location: " + elsewhere.Url() + "/v1/logs\r\n")});
+    Report(10);
+    ExpectEverythingDelivered(10);
+    EXPECT_EQ(elsewhere.RequestCount(), 0U);
+}
+
+TEST_F(MisbehavingCollectorTest, IsAwayAndComesBack) {
+    std::string url;
+    {
+        LoopbackServer gone([](const Request&) { return Reply(); });
+        url = gone.Url();
+    }
+    Configure("ENDPOINT", url);
+    Start();
+    Report(10);
+    EXPECT_TRUE(WaitUntil([] { return Told::Failures().Count("upload: ") == 1; }));
+    Stop();
+    EXPECT_EQ(Totals().waiting, 10);
+    StartAgainst({});
+    ExpectEverythingDelivered(10);
+}
+
+} // namespace

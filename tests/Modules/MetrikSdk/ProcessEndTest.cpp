@@ -1,0 +1,107 @@
+#include <filesystem>
+#include <map>
+#include <random>
+#include <sstream>
+
+#include <sys/wait.h>
+
+#include "tests/Modules/MetrikSdk/support/ChildProcess.h"
+#include "tests/Modules/MetrikSdk/support/PluginFixture.h"
+
+using namespace std::chrono_literals;
+
+namespace {
+
+/// What happens to the outbox when its process ends, in every way in which processes end.
+class ProcessEndTest : public PluginFixture {
+protected:
+    ProcessEndTest() { Configure("ENDPOINT", m_server.Url()); }
+
+    Reply Take(const Request& request) {
+        for (const auto& event : EventsOf(request.body)) {
+            m_uuids[event.number].insert(event.uuid);
+            m_sequences.insert(event.sequence);
+        }
+        return m_reply;
+    }
+
+    /// A "stream" child is killed after a moment; the numbers that it was told were accepted.
+    std::vector<int> KillAtARandomMoment(int firstNumber) {
+        ChildProcess child(m_directory.Path(), firstNumber, "stream");
+        child.AwaitOutput();
+        const auto moment = std::chrono::steady_clock::now() +
+                            std::chrono::microseconds(std::uniform_int_distribution(0, 120'000)(m_random));
+        WaitUntil([&] { return std::chrono::steady_clock::now() > moment; });
+        child.Kill();
+        EXPECT_TRUE(WIFSIGNALED(child.AwaitEnd().value_or(0)));
+        std::istringstream output(child.Output());
+        std::vector<int> accepted;
+        for (std::string line; std::getline(output, line);)
+            accepted.push_back(std::stoi(line));
+        return accepted;
+    }
+
+    void ExpectACleanExit(const std::string& way) {
+        ChildProcess child(m_directory.Path(), 0, way);
+        const auto status = child.AwaitEnd();
+        ASSERT_TRUE(status) << "the process hangs";
+        EXPECT_TRUE(WIFEXITED(*status)) << "signal " << WTERMSIG(*status);
+        EXPECT_EQ(WEXITSTATUS(*status), 0);
+        EXPECT_GT(Totals().stored, 0);
+        EXPECT_EQ(SQLite::Database(File()).execAndGet("PRAGMA integrity_check").getString(), "ok");
+    }
+
+    Reply m_reply;
+    std::map<int, std::set<std::string>> m_uuids; ///< Under which ids each number arrived.
+    std::set<std::int64_t> m_sequences;
+    LoopbackServer m_server{[this](const Request& request) { return Take(request); }};
+    std::mt19937 m_random{std::random_device{}()};
+};
+
+TEST_F(ProcessEndTest, LosesNothingThatWasAcceptedBeforeFiftyKills) {
+    std::vector<int> accepted;
+    for (int i = 0; i < 50; ++i) {
+        const auto more = KillAtARandomMoment(i * 1'000'000);
+        ASSERT_FALSE(more.empty());
+        accepted.insert(accepted.end(), more.begin(), more.end());
+    }
+    Start();
+    ASSERT_TRUE(WaitUntilNothingWaits());
+    Stop();
+    for (const int number : accepted)
+        ASSERT_EQ(m_uuids[number].size(), 1U) << number << " arrived under so many ids";
+    const auto totals = Totals();
+    EXPECT_GE(totals.stored, static_cast<std::int64_t>(accepted.size()));
+    EXPECT_LE(totals.stored, static_cast<std::int64_t>(accepted.size()) + 50) << "one a kill was not reported";
+    EXPECT_EQ(totals.delivered, totals.stored);
+    EXPECT_EQ(static_cast<std::int64_t>(m_sequences.size()), totals.stored);
+    EXPECT_EQ(*m_sequences.rbegin(), totals.stored) << "sequences have neither gaps nor repeats";
+    EXPECT_EQ(std::distance(std::filesystem::directory_iterator(m_directory.Path()), {}), 1)
+        << "nothing was taken for damaged";
+    RecordProperty("accepted", static_cast<int>(accepted.size()));
+}
+
+TEST_F(ProcessEndTest, ExitsCleanlyWhileItUploads) {
+    ExpectACleanExit("exit");
+}
+
+TEST_F(ProcessEndTest, ExitsCleanlyWhileTheCollectorKeepsItWaiting) {
+    m_reply.manner = Reply::Manner::Never;
+    ExpectACleanExit("exit");
+}
+
+TEST_F(ProcessEndTest, ExitsCleanlyWhenTheLoaderIsDestroyedMeanwhile) {
+    m_reply.manner = Reply::Manner::Never;
+    ExpectACleanExit("static");
+}
+
+TEST_F(ProcessEndTest, ExitsCleanlyFromTheHandlerOfACrashOnAnotherThread) {
+    ExpectACleanExit("crash");
+}
+
+TEST_F(ProcessEndTest, ExitsCleanlyFromTheUploadersOwnThread) {
+    m_reply.status = 503;
+    ExpectACleanExit("callback");
+}
+
+} // namespace

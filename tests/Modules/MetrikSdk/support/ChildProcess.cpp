@@ -1,0 +1,68 @@
+#include "tests/Modules/MetrikSdk/support/ChildProcess.h"
+
+#include <array>
+#include <csignal>
+#include <stdexcept>
+
+#include <fcntl.h>
+#include <poll.h>
+#include <spawn.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include "SystemTool/IO/Directory.h"
+#include "tests/support/WaitUntil.h"
+
+ChildProcess::ChildProcess(const std::string& directory, int firstNumber, const std::string& way) {
+    std::array<int, 2> ends{};
+    if (::pipe2(ends.data(), O_CLOEXEC) != 0)
+        throw std::runtime_error("no pipe");
+    // Room for all that is written before it is read: the child must die at work, not while it waits for us.
+    ::fcntl(ends[1], F_SETPIPE_SZ, 1 << 20);
+    posix_spawn_file_actions_t actions;
+    ::posix_spawn_file_actions_init(&actions);
+    ::posix_spawn_file_actions_adddup2(&actions, ends[1], STDOUT_FILENO);
+    auto program = SystemTool::IO::Directory::GetExcutableDirectory() + "metrik_outbox_child";
+    auto path = directory;
+    auto number = std::to_string(firstNumber);
+    auto how = way;
+    std::array<char*, 5> arguments{program.data(), path.data(), number.data(), how.data(), nullptr};
+    const int error = ::posix_spawn(&m_process, program.c_str(), &actions, nullptr, arguments.data(), environ);
+    ::posix_spawn_file_actions_destroy(&actions);
+    ::close(ends[1]);
+    m_output = ends[0];
+    if (error != 0)
+        throw std::runtime_error("cannot start " + program);
+}
+
+ChildProcess::~ChildProcess() {
+    if (!m_status) {
+        Kill();
+        ::waitpid(m_process, nullptr, 0);
+    }
+    ::close(m_output);
+}
+
+void ChildProcess::AwaitOutput() {
+    pollfd output{m_output, POLLIN, 0};
+    ::poll(&output, 1, -1);
+}
+
+void ChildProcess::Kill() {
+    ::kill(m_process, SIGKILL);
+}
+
+std::string ChildProcess::Output() {
+    std::string text;
+    std::array<char, 65536> bytes{};
+    for (ssize_t count = 0; (count = ::read(m_output, bytes.data(), bytes.size())) > 0;)
+        text.append(bytes.data(), static_cast<std::size_t>(count));
+    return text;
+}
+
+std::optional<int> ChildProcess::AwaitEnd(std::chrono::milliseconds deadline) {
+    int status = 0;
+    if (WaitUntil([&] { return ::waitpid(m_process, &status, WNOHANG) == m_process; }, deadline))
+        m_status = status;
+    return m_status;
+}

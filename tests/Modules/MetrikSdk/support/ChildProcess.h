@@ -1,0 +1,32 @@
+#pragma once
+
+#include <chrono>
+#include <optional>
+#include <string>
+
+#include <sys/types.h>
+
+/// The program of Child.cpp as a process. Killed with this object.
+class ChildProcess {
+public:
+    ChildProcess(const std::string& directory, int firstNumber, const std::string& way);
+    ~ChildProcess();
+    ChildProcess(const ChildProcess&) = delete;
+    ChildProcess& operator=(const ChildProcess&) = delete;
+
+    /// Blocks until it has written something, or has ended.
+    void AwaitOutput();
+
+    void Kill();
+
+    /// Everything that it has written, after it has ended.
+    std::string Output();
+
+    /// How it ended, as waitpid tells it; nothing when it does not end in time.
+    std::optional<int> AwaitEnd(std::chrono::milliseconds deadline = std::chrono::seconds(20));
+
+private:
+    pid_t m_process = -1;
+    int m_output = -1;
+    std::optional<int> m_status;
+};

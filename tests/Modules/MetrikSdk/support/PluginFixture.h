@@ -1,0 +1,79 @@
+#pragma once
+
+#include <cstdlib>
+#include <memory>
+#include <mutex>
+#include <set>
+#include <string>
+#include <vector>
+
+#include <gtest/gtest.h>
+
+#include "Modules/MetrikSdk/OutboxStore.h"
+#include "Plugin/IMetrikSdk.h"
+#include "Plugin/ModuleLoader.h"
+#include "SystemTool/IO/Directory.h"
+#include "tests/Modules/MetrikSdk/support/LoopbackServer.h"
+#include "tests/Modules/MetrikSdk/support/ReceivedEvents.h"
+#include "tests/Modules/MetrikSdk/support/Told.h"
+#include "tests/support/TemporaryDirectory.h"
+#include "tests/support/WaitUntil.h"
+
+/// The real plug-in, loaded as the service loads it, with a database directory of its own.
+class PluginFixture : public testing::Test {
+protected:
+    using Loader = SystemTool::ModuleLoader<IMetrikSdk>;
+
+    PluginFixture() { Told::Forget(); }
+
+    ~PluginFixture() override {
+        for (const auto& name : m_variables)
+            ::unsetenv(name.c_str());
+    }
+
+    /// Sets OTEL_EXPORTER_OTLP_<name>; before Start, because the environment is read when an outbox is opened.
+    void Configure(const std::string& name, const std::string& value) {
+        SetVariable("OTEL_EXPORTER_OTLP_" + name, value);
+    }
+
+    void SetVariable(const std::string& name, const std::string& value) {
+        m_variables.push_back(name);
+        ::setenv(name.c_str(), value.c_str(), 1);
+    }
+
+    static std::unique_ptr<Loader> Load() {
+        return std::make_unique<Loader>(SystemTool::IO::Directory::GetExcutableDirectory() +
+                                        "libMetrikSdk.dylib");
+    }
+
+    void Start() {
+        m_loader = Load();
+        ASSERT_NE(m_loader->GetModule(), nullptr) << m_loader->GetLastError();
+        ASSERT_TRUE(m_loader->GetModule()->InitSdk("A759", "1", "default", "", m_directory.Path(),
+                                                   &Told::OnFailure, &Told::OnSuccess));
+    }
+
+    void Report(int count) {
+        for (int i = 0; i < count; ++i)
+            ASSERT_TRUE(m_loader->GetModule()->ReportEvent("A759|10001", NumberedPayload(m_next++)));
+    }
+
+    void Stop() { m_loader.reset(); }
+
+    std::string File() const { return m_directory.Path() + "/MetrikOutbox.db"; }
+
+    Metrik::OutboxStatus Totals() const {
+        return Metrik::OutboxStore(File(), std::chrono::seconds(5)).Status();
+    }
+
+    bool WaitUntilNothingWaits() const {
+        return WaitUntil([this] { return Totals().waiting == 0; }, std::chrono::seconds(30));
+    }
+
+    TemporaryDirectory m_directory;
+    std::unique_ptr<Loader> m_loader;
+    int m_next = 0;
+
+private:
+    std::vector<std::string> m_variables;
+};
