@@ -10,8 +10,8 @@ namespace Metrik {
 
 /// Which of the oldest waiting events travel together, and when.
 struct BatchPlan {
-    std::size_t count = 0;               ///< From the head of the list.
-    std::chrono::milliseconds wait{0};   ///< For more company; 0: at once.
+    std::size_t count = 0;             ///< From the head of the list.
+    std::chrono::milliseconds wait{0}; ///< For more company; 0: at once.
 };
 
 /// Plans the next request from the oldest events. A batch is sent at once when it is full by count or by

@@ -8,8 +8,9 @@ namespace Metrik {
 /// How many events go into the next request while one that the collector refuses is searched for. Batches are
 /// always the oldest events, so a number is all that has to be remembered. Pure.
 ///
-/// A refused request of n events is followed by its halves in turn; a refused half by its own, until one event
-/// is left, which is the bad one. Once everything that was under suspicion is gone, batches are full again.
+/// A refused request of n events is followed by its halves in turn; a refused half by its own, until one
+/// event is left, which is the bad one. Once everything that was under suspicion is gone, batches are full
+/// again.
 class BatchSplitter {
 public:
     explicit BatchSplitter(std::size_t maxEvents) : m_max(maxEvents), m_limit(maxEvents) {}

@@ -15,7 +15,8 @@ FileKeeper::FileKeeper(std::string directory, const FileSettings& settings)
 OutboxStore& FileKeeper::Ready(SteadyTime now, std::vector<News>& news) {
     if (m_store && !IsStillTheFile(now)) {
         m_store.reset(); // SQLite leaves the files at the path alone once the path names another
-        news.push_back({Cause::Vanished, m_path + " was deleted or replaced, with all events that waited in it"});
+        news.push_back(
+            {Cause::Vanished, m_path + " was deleted or replaced, with all events that waited in it"});
     }
     if (m_store)
         return *m_store;

@@ -73,7 +73,7 @@ void HttpSender::Configure() {
     Set(easy, CURLOPT_HTTPHEADER, m_headers.get());
     Set(easy, CURLOPT_FOLLOWLOCATION, 0L); // a redirect could carry the credentials to another host
     Set(easy, CURLOPT_TIMEOUT_MS, static_cast<long>(m_config.timeout.count()));
-    Set(easy, CURLOPT_NOSIGNAL, 1L);  // signals are the service's
+    Set(easy, CURLOPT_NOSIGNAL, 1L);   // signals are the service's
     Set(easy, CURLOPT_QUICK_EXIT, 1L); // ending must not wait for a name server
     Set(easy, CURLOPT_ERRORBUFFER, m_error);
     Set(easy, CURLOPT_WRITEFUNCTION, &HttpSender::OnBody);

@@ -11,9 +11,9 @@
 
 namespace Metrik {
 
-/// Posts over HTTP. The connection is kept between requests. TLS is verified; redirects are not followed; only
-/// http and https are spoken; the proxies of the standard variables are used. Of an answer's body no more than
-/// 64 KiB is read.
+/// Posts over HTTP. The connection is kept between requests. TLS is verified; redirects are not followed;
+/// only http and https are spoken; the proxies of the standard variables are used. Of an answer's body no
+/// more than 64 KiB is read.
 ///
 /// Threads: Abandon by any; all else by one at a time.
 class HttpSender : public Sender {

@@ -14,8 +14,8 @@ namespace Metrik {
 ///
 /// ReportEvent is true once the event survives kill -9 of the process, and false when it was not stored. The
 /// log directory is not used: what there is to say goes to the callbacks, whose texts the service logs. The
-/// failure callback gets what failed and why; the success callback "init" and the module's id, or "upload" and
-/// how many events.
+/// failure callback gets what failed and why; the success callback "init" and the module's id, or "upload"
+/// and how many events.
 ///
 /// A second InitSdk begins anew with its arguments, and ends what the first began. One that returns false for
 /// a file that cannot be opened is not final: a later event tries again.

@@ -127,9 +127,9 @@ void Outbox::Drop(OutboxStore& store, WallTime before, std::int64_t excess) {
 
 void Outbox::TellDrop(std::size_t dropped) {
     if (PruneRule::BeginsRun(m_lastDrop, m_now, m_settings.caps))
-        m_news.push_back({Cause::Drop, "The outbox is over its bounds: the oldest events are being dropped, " +
-                                           std::to_string(dropped) +
-                                           " of them just now; the outbox counts the others"});
+        m_news.push_back(
+            {Cause::Drop, "The outbox is over its bounds: the oldest events are being dropped, " +
+                              std::to_string(dropped) + " of them just now; the outbox counts the others"});
     m_lastDrop = m_now;
 }
 

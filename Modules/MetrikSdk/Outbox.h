@@ -64,10 +64,10 @@ private:
     unsigned m_knownGeneration = 0;
     std::int64_t m_waitingEvents = 0;
     std::int64_t m_waitingBytes = 0;
-    std::int64_t m_underWayUpTo = 0;   ///< The last row that was taken and not released.
-    bool m_patienceUsedUp = false;     ///< The last event found the file locked for all of the patience.
-    SteadyTime m_now{};                ///< Of the operation under way.
-    SteadyTime m_openedSteady{};       ///< Both times of when the file was opened.
+    std::int64_t m_underWayUpTo = 0; ///< The last row that was taken and not released.
+    bool m_patienceUsedUp = false;   ///< The last event found the file locked for all of the patience.
+    SteadyTime m_now{};              ///< Of the operation under way.
+    SteadyTime m_openedSteady{};     ///< Both times of when the file was opened.
     WallTime m_openedAt{};
     SteadyTime m_nextAgeCheck{};
     std::optional<SteadyTime> m_lastDrop;

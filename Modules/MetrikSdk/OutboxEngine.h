@@ -10,9 +10,8 @@
 
 namespace Metrik {
 
-/// Everything of one database directory in this process: the outbox, whom to tell, and the uploader when there
-/// is an endpoint. Destruction stops the uploader: within a second, see there.
-/// Threads: any.
+/// Everything of one database directory in this process: the outbox, whom to tell, and the uploader when
+/// there is an endpoint. Destruction stops the uploader: within a second, see there. Threads: any.
 class OutboxEngine {
 public:
     OutboxEngine(const std::string& directory, const OutboxSettings& settings,

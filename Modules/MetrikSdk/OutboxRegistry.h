@@ -28,7 +28,8 @@ public:
     /// The process's own, with production's settings. Never destroyed: SDK objects may outlive static ones.
     static OutboxRegistry& Instance();
 
-    /// The outbox for `directory`; null when there is no directory to use at all. To be given back by Release.
+    /// The outbox for `directory`; null when there is no directory to use at all. To be given back by
+    /// Release.
     std::shared_ptr<OutboxEngine> Acquire(const std::string& directory);
 
     /// Gives `engine` up. The last user's call stops its uploader before it returns; nobody can open the same

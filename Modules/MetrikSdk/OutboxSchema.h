@@ -1,7 +1,7 @@
 #pragma once
 
-/// The outbox as a database. docs/Outbox.md shows people how to read it; a change of any name here is a change
-/// there, and a new SCHEMA_VERSION.
+/// The outbox as a database. docs/Outbox.md shows people how to read it; a change of any name here is a
+/// change there, and a new SCHEMA_VERSION.
 namespace Metrik {
 
 /// "MOBX": lets file(1) and a person tell an outbox from another database.

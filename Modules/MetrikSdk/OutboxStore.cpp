@@ -79,13 +79,14 @@ OutboxStore::OutboxStore(const std::string& path, std::chrono::milliseconds lock
         Configure();
         CreateOrCheckSchema();
         m_insert = std::make_unique<SQLite::Statement>(
-            m_database, "INSERT INTO event(uuid, module, release, sequence, event_id, payload, stored_ms, bytes) "
-                        "SELECT ?1, id, ?3, last_sequence + 1, ?4, ?5, ?6, ?7 FROM module WHERE id = ?2");
+            m_database,
+            "INSERT INTO event(uuid, module, release, sequence, event_id, payload, stored_ms, bytes) "
+            "SELECT ?1, id, ?3, last_sequence + 1, ?4, ?5, ?6, ?7 FROM module WHERE id = ?2");
         m_oldest = std::make_unique<SQLite::Statement>(
             m_database, "SELECT id, uuid, release, sequence, event_id, payload, stored_ms, bytes FROM event "
                         "ORDER BY id LIMIT ?1");
-        m_delete = std::make_unique<SQLite::Statement>(m_database,
-                                                       "DELETE FROM event WHERE id = ?1 AND uuid = ?2");
+        m_delete =
+            std::make_unique<SQLite::Statement>(m_database, "DELETE FROM event WHERE id = ?1 AND uuid = ?2");
     });
     KeepLogOnClose(false);
 }
@@ -273,7 +274,8 @@ void OutboxStore::TrimDeadLetters(std::size_t maxRows, std::size_t maxBytes) {
         while (excess.executeStep()) {
             excess.reset();
             auto transaction = WriteTransaction(m_database);
-            const auto oldest = m_database.execAndGet("SELECT coalesce(min(id), 0) FROM dead_letter").getInt64();
+            const auto oldest =
+                m_database.execAndGet("SELECT coalesce(min(id), 0) FROM dead_letter").getInt64();
             SQLite::Statement held(m_database,
                                    "UPDATE totals SET dead_letters = dead_letters - 1, dead_letter_bytes = "
                                    "dead_letter_bytes - b.bytes FROM (SELECT bytes FROM dead_letter WHERE "
@@ -321,9 +323,9 @@ std::size_t OutboxStore::DropOldest(std::int64_t afterRow, WallTime before, std:
 
 OutboxStatus OutboxStore::Status() {
     return Guarded("Cannot read the outbox's status", [&] {
-        SQLite::Statement query(m_database,
-                                "SELECT outbox_id, stored, delivered, refused, dead_lettered, dropped, waiting, "
-                                "waiting_bytes, dead_letters, dead_letter_bytes FROM outbox_status");
+        SQLite::Statement query(
+            m_database, "SELECT outbox_id, stored, delivered, refused, dead_lettered, dropped, waiting, "
+                        "waiting_bytes, dead_letters, dead_letter_bytes FROM outbox_status");
         query.executeStep();
         const auto number = [&](int column) { return query.getColumn(column).getInt64(); };
         return OutboxStatus{query.getColumn(0).getString(),

@@ -31,7 +31,8 @@ bool AsksToWait(long status) {
 
 std::string OneLine(const std::string& text) {
     auto line = ValidUtf8(CutUtf8(text, MAX_QUOTED_BYTES));
-    std::replace_if(line.begin(), line.end(), [](char c) { return static_cast<unsigned char>(c) < 0x20; }, ' ');
+    std::replace_if(
+        line.begin(), line.end(), [](char c) { return static_cast<unsigned char>(c) < 0x20; }, ' ');
     return line;
 }
 

@@ -13,7 +13,7 @@ namespace Metrik {
 
 /// What to wait for before the next pass.
 struct Pause {
-    std::chrono::milliseconds duration{0}; ///< At most this long.
+    std::chrono::milliseconds duration{0};   ///< At most this long.
     std::int64_t untilWaiting = Bell::NEVER; ///< Or until so many events wait.
 };
 
@@ -21,8 +21,8 @@ struct Pause {
 /// own, and no clock: the caller passes the time and sleeps.
 ///
 /// An event leaves the outbox only through here (or for a cap): after its delivery is known, or with its
-/// verdict into the dead letters. What was delivered and could not be deleted, for a full disk say, is kept in
-/// mind and deleted before anything else is sent.
+/// verdict into the dead letters. What was delivered and could not be deleted, for a full disk say, is kept
+/// in mind and deleted before anything else is sent.
 ///
 /// Threads: one. Failure: told to the notifier, and waited for.
 class UploadCycle {

@@ -70,13 +70,13 @@ Uploader::Uploader(std::shared_ptr<OutboxCore> core, std::shared_ptr<Sender> sen
     std::promise<void> finished;
     m_finished = finished.get_future();
     const BlockedSignals blocked;
-    m_thread = std::thread([sharedCore = m_core, sharedSender = m_sender,
-                            done = std::move(finished)]() mutable {
-        RunUntilStopped(*sharedCore, *sharedSender);
-        sharedSender.reset();
-        sharedCore.reset();
-        done.set_value();
-    });
+    m_thread =
+        std::thread([sharedCore = m_core, sharedSender = m_sender, done = std::move(finished)]() mutable {
+            RunUntilStopped(*sharedCore, *sharedSender);
+            sharedSender.reset();
+            sharedCore.reset();
+            done.set_value();
+        });
 }
 
 Uploader::~Uploader() {

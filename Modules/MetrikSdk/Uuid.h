@@ -6,9 +6,9 @@
 
 namespace Metrik {
 
-/// A new UUID of version 7 in its usual text form: the time in milliseconds, then a counter, then random bits.
-/// Every one is greater, as a text too, than all that this process made before, also when the clock goes
-/// backwards. Any thread.
+/// A new UUID of version 7 in its usual text form: the time in milliseconds, then a counter, then random
+/// bits. Every one is greater, as a text too, than all that this process made before, also when the clock
+/// goes backwards. Any thread.
 std::string NewUuid(WallTime now);
 
 } // namespace Metrik

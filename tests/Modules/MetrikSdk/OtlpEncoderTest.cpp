@@ -109,10 +109,11 @@ TEST(OtlpEncoder, NamesTheEventAndCarriesItsIdAndSequence) {
 }
 
 TEST(OtlpEncoder, WritesThePayloadAsAStructure) {
-    EXPECT_EQ(Body(R"({"a":{"b":[1,"x",null,true]},"c":1.5})"),
-              R"({"kvlistValue":{"values":[{"key":"a","value":{"kvlistValue":{"values":[{"key":"b","value":)"
-              R"({"arrayValue":{"values":[{"intValue":"1"},{"stringValue":"x"},{},{"boolValue":true}]}}}]}}},)"
-              R"({"key":"c","value":{"doubleValue":1.5}}]}})");
+    EXPECT_EQ(
+        Body(R"({"a":{"b":[1,"x",null,true]},"c":1.5})"),
+        R"({"kvlistValue":{"values":[{"key":"a","value":{"kvlistValue":{"values":[{"key":"b","value":)"
+        R"({"arrayValue":{"values":[{"intValue":"1"},{"stringValue":"x"},{},{"boolValue":true}]}}}]}}},)"
+        R"({"key":"c","value":{"doubleValue":1.5}}]}})");
 }
 
 TEST(OtlpEncoder, KeepsEveryDigitOfA64BitInteger) {

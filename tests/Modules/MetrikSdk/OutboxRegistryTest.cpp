@@ -38,7 +38,7 @@ TEST_F(OutboxRegistryTest, FallsBackToTheFirstDirectoryAlsoAfterItsRelease) {
     auto first = m_registry.Acquire(path);
     const auto second = m_registry.Acquire(m_directory.Path() + "/second");
     for (const auto& bad : {std::string(), std::string("relative"), std::string("../up"),
-                                  std::string("/a\0b", 4), std::string("/") + std::string(10'000, 'x')})
+                            std::string("/a\0b", 4), std::string("/") + std::string(10'000, 'x')})
         EXPECT_EQ(m_registry.Acquire(bad), first) << bad;
     m_registry.Release(first);
     auto again = m_registry.Acquire("");

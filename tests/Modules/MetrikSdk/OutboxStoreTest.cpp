@@ -150,7 +150,8 @@ TEST_F(OutboxStoreTest, KeepsTheNewestDeadLettersWithinBothBounds) {
     EXPECT_LE(status.deadLetterBytes, 400);
     EXPECT_EQ(status.deadLettered, 10);
     SQLite::Database reader(m_path);
-    EXPECT_EQ(reader.execAndGet("SELECT payload FROM dead_letter LIMIT 1").getString(), std::string(100, '8'));
+    EXPECT_EQ(reader.execAndGet("SELECT payload FROM dead_letter LIMIT 1").getString(),
+              std::string(100, '8'));
     EXPECT_EQ(reader.execAndGet("SELECT status || reason FROM dead_letter LIMIT 1").getString(), "400bad");
 }
 

@@ -155,7 +155,8 @@ TEST_F(OutboxTest, SetsADamagedFileAsideBeginsANewOneAndTells) {
     EXPECT_TRUE(Append());
     const auto files = SetAsideFiles();
     EXPECT_EQ(std::count_if(files.begin(), files.end(), [](const auto& f) { return f.ends_with("Z"); }), 1);
-    EXPECT_EQ(std::count_if(files.begin(), files.end(), [](const auto& f) { return f.ends_with("Z-wal"); }), 1)
+    EXPECT_EQ(std::count_if(files.begin(), files.end(), [](const auto& f) { return f.ends_with("Z-wal"); }),
+              1)
         << "its log goes with it";
     EXPECT_EQ(Told::Failures().Count("outbox damaged: "), 1);
     EXPECT_EQ(m_outbox->Status().waiting, 1);
@@ -169,12 +170,14 @@ TEST_F(OutboxTest, SetsAFileAsideThatIsDamagedWhileInUse) {
     {
         std::fstream file(File(), std::ios::in | std::ios::out);
         file.seekp(4096);
-        const std::string rubbish(static_cast<std::size_t>(std::filesystem::file_size(File())) - 4096, '\x7f');
+        const std::string rubbish(static_cast<std::size_t>(std::filesystem::file_size(File())) - 4096,
+                                  '\x7f');
         file.write(rubbish.data(), static_cast<std::streamsize>(rubbish.size()));
     }
     // The cache may hide the damage for a while; a connection that looks at the file does not.
     EXPECT_TRUE(WaitUntil([&] {
-        EXPECT_TRUE(Append(std::string(1000, 'y'))) << "an event that meets the damage goes into the new file";
+        EXPECT_TRUE(Append(std::string(1000, 'y')))
+            << "an event that meets the damage goes into the new file";
         try {
             m_outbox->Take(512);
         } catch (const StoreError&) {

@@ -15,8 +15,8 @@ protected:
     static std::ptrdiff_t CountEntries(const std::string& directory) {
         return std::distance(std::filesystem::directory_iterator(directory), {});
     }
-    /// Runs `test` in a new process that knows no directory yet: the plug-in remembers the first one for good.
-    /// To be called first thing, because that process repeats all before it.
+    /// Runs `test` in a new process that knows no directory yet: the plug-in remembers the first one for
+    /// good. To be called first thing, because that process repeats all before it.
     template <typename Test>
     static void InAFreshProcess(Test test) {
         GTEST_FLAG_SET(death_test_style, "threadsafe");
@@ -66,7 +66,8 @@ TEST_F(MetrikSdkTest, RefusesEventsAndTellsWhenNoDirectoryWasEverGiven) {
     InAFreshProcess([] {
         const auto loader = Load();
         for (const auto* directory : {"", "relative"}) {
-            EXPECT_FALSE(loader->GetModule()->InitSdk("B1", "1", "b", "", directory, &Told::OnFailure, nullptr));
+            EXPECT_FALSE(
+                loader->GetModule()->InitSdk("B1", "1", "b", "", directory, &Told::OnFailure, nullptr));
             EXPECT_FALSE(loader->GetModule()->ReportEvent("B1|1", "{}"));
         }
         EXPECT_EQ(Told::Failures().Count("directory: "), 1);
@@ -109,7 +110,8 @@ TEST_F(MetrikSdkTest, TakesTenThousandHostileModulesInOneFileWithOneThread) {
     }
     EXPECT_EQ(Threads(), threads);
     for (int i = 0; i < 10'000; i += 50)
-        EXPECT_TRUE(modules[static_cast<std::size_t>(i)]->GetModule()->ReportEvent("X|1", NumberedPayload(i)));
+        EXPECT_TRUE(
+            modules[static_cast<std::size_t>(i)]->GetModule()->ReportEvent("X|1", NumberedPayload(i)));
     EXPECT_TRUE(WaitUntilNothingWaits());
     EXPECT_EQ(Totals().delivered, 200);
     EXPECT_LE(CountEntries(m_directory.Path()), 3) << "the database and its two side files";
@@ -134,8 +136,8 @@ TEST_F(MetrikSdkTest, BoundsTheOutboxesThatHostileDirectoriesCanMake) {
         std::vector<std::unique_ptr<Loader>> modules;
         for (int i = 0; i < 100; ++i) {
             auto& module = modules.emplace_back(Load());
-            module->GetModule()->InitSdk("x", "", "", "", m_directory.Path() + "/" + std::to_string(i), nullptr,
-                                         nullptr);
+            module->GetModule()->InitSdk("x", "", "", "", m_directory.Path() + "/" + std::to_string(i),
+                                         nullptr, nullptr);
             EXPECT_TRUE(module->GetModule()->ReportEvent("X|1", "{}"));
         }
         EXPECT_LE(CountEntries(m_directory.Path()), 3 + 8);
@@ -218,7 +220,8 @@ TEST_F(MetrikSdkTest, SharesOneFileBetweenTwoProcesses) {
     Report(1);
     const auto child = ::fork();
     if (child == 0) {
-        // What a second instance does: the descriptors of its parent are nothing to it, so it goes by the path.
+        // What a second instance does: the descriptors of its parent are nothing to it, so it goes by the
+        // path.
         Metrik::OutboxStore store(File(), 5s);
         for (int i = 0; i < 100; ++i)
             store.Store({"A759", "1", "default"}, {"child-" + std::to_string(i), "A759|1", "{}", {}});

@@ -72,7 +72,8 @@ TEST_F(ProcessEndTest, LosesNothingThatWasAcceptedBeforeFiftyKills) {
         ASSERT_EQ(m_uuids[number].size(), 1U) << number << " arrived under so many ids";
     const auto totals = Totals();
     EXPECT_GE(totals.stored, static_cast<std::int64_t>(accepted.size()));
-    EXPECT_LE(totals.stored, static_cast<std::int64_t>(accepted.size()) + 50) << "one a kill was not reported";
+    EXPECT_LE(totals.stored, static_cast<std::int64_t>(accepted.size()) + 50)
+        << "one a kill was not reported";
     EXPECT_EQ(totals.delivered, totals.stored);
     EXPECT_EQ(static_cast<std::int64_t>(m_sequences.size()), totals.stored);
     EXPECT_EQ(*m_sequences.rbegin(), totals.stored) << "sequences have neither gaps nor repeats";

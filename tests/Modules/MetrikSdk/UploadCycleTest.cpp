@@ -146,7 +146,8 @@ TEST_F(UploadCycleTest, DeletesAPartialSuccessAndReportsTheRefusedCount) {
     EXPECT_EQ(status.delivered, 6);
     EXPECT_EQ(status.refused, 4);
     EXPECT_EQ(status.waiting, 0);
-    EXPECT_EQ(Told::Failures().Count("events refused: The collector rejected 4 of 10 events for good: too old"), 1);
+    EXPECT_EQ(
+        Told::Failures().Count("events refused: The collector rejected 4 of 10 events for good: too old"), 1);
 }
 
 TEST_F(UploadCycleTest, MovesTheOnePoisonousEventToTheDeadLettersAndDeliversTheOthers) {

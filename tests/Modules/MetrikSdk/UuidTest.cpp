@@ -1,10 +1,10 @@
 #include "Modules/MetrikSdk/Uuid.h"
 
-#include <regex>
 #include <set>
 #include <thread>
 #include <vector>
 
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 using Metrik::NewUuid;
@@ -15,9 +15,10 @@ namespace {
 const WallTime NOW{std::chrono::milliseconds(0x0123'4567'89ab)};
 
 TEST(Uuid, HasTheFormVersionAndVariantOfVersionSeven) {
-    const std::regex form("[0-9a-f]{8}-[0-9a-f]{4}-7[0-9a-f]{3}-[89ab][0-9a-f]{3}-[0-9a-f]{12}");
     for (int i = 0; i < 100; ++i)
-        EXPECT_TRUE(std::regex_match(NewUuid(NOW), form));
+        EXPECT_THAT(NewUuid(NOW),
+                    testing::MatchesRegex("[0-9a-f]{8}-[0-9a-f]{4}-7[0-9a-f]{3}-[89ab][0-9a-f]{3}-"
+                                          "[0-9a-f]{12}"));
 }
 
 TEST(Uuid, BeginsWithTheTime) {

@@ -1,12 +1,12 @@
-// A process to kill: loads the plug-in as the service does, reports numbered events, and ends in the way that the
-// test wants.
+// A process to kill: loads the plug-in as the service does, reports numbered events, and ends in the way that
+// the test wants.
 //
 //     child <database directory> <first number> <way>
 //
-// Ways: "stream" reports without an end and writes the number of each accepted event as a line; the others report a
-// few thousand events and then call exit(0): "exit" on the main thread, "static" with a loader that is destroyed
-// during exit(), "crash" in the handler of a segmentation fault on another thread while the main thread goes on
-// reporting, "callback" on the uploader's own thread.
+// Ways: "stream" reports without an end and writes the number of each accepted event as a line; the others
+// report a few thousand events and then call exit(0): "exit" on the main thread, "static" with a loader that
+// is destroyed during exit(), "crash" in the handler of a segmentation fault on another thread while the main
+// thread goes on reporting, "callback" on the uploader's own thread.
 
 #include <csignal>
 #include <cstdlib>
@@ -42,9 +42,9 @@ void OnSegmentationFault(int) {
     std::exit(0);
 }
 
+/// The signal itself and no bad access: the sanitizers would have their own say about that.
 void Fault() {
-    volatile int* nowhere = nullptr;
-    *nowhere = 1;
+    std::raise(SIGSEGV);
 }
 
 bool Report(int number) {
@@ -80,8 +80,8 @@ int main(int, char** arguments) {
     int number = std::stoi(arguments[2]);
     const std::string way = arguments[3];
     g_exitInCallback = way == "callback";
-    g_loader = std::make_unique<Loader>(SystemTool::IO::Directory::GetExcutableDirectory() +
-                                        "libMetrikSdk.dylib");
+    g_loader =
+        std::make_unique<Loader>(SystemTool::IO::Directory::GetExcutableDirectory() + "libMetrikSdk.dylib");
     g_sdk = g_loader->GetModule();
     if (way != "static") // the service's loaders are never destroyed by exit()
         static_cast<void>(g_loader.release());

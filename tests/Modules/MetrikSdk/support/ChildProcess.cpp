@@ -27,7 +27,8 @@ ChildProcess::ChildProcess(const std::string& directory, int firstNumber, const 
     auto number = std::to_string(firstNumber);
     auto how = way;
     std::array<char*, 5> arguments{program.data(), path.data(), number.data(), how.data(), nullptr};
-    const int error = ::posix_spawn(&m_process, program.c_str(), &actions, nullptr, arguments.data(), environ);
+    const int error =
+        ::posix_spawn(&m_process, program.c_str(), &actions, nullptr, arguments.data(), environ);
     ::posix_spawn_file_actions_destroy(&actions);
     ::close(ends[1]);
     m_output = ends[0];

@@ -37,8 +37,8 @@ struct Reply {
     Manner manner = Manner::Answer;
 };
 
-/// An HTTP server on an ephemeral port of the loopback address that does to each request what the script says.
-/// Unlike a library's server it can also misbehave.
+/// An HTTP server on an ephemeral port of the loopback address that does to each request what the script
+/// says. Unlike a library's server it can also misbehave.
 class LoopbackServer {
 public:
     using Script = std::function<Reply(const Request&)>;

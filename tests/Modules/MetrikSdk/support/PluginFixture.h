@@ -31,7 +31,8 @@ protected:
             ::unsetenv(name.c_str());
     }
 
-    /// Sets OTEL_EXPORTER_OTLP_<name>; before Start, because the environment is read when an outbox is opened.
+    /// Sets OTEL_EXPORTER_OTLP_<name>; before Start, because the environment is read when an outbox is
+    /// opened.
     void Configure(const std::string& name, const std::string& value) {
         SetVariable("OTEL_EXPORTER_OTLP_" + name, value);
     }

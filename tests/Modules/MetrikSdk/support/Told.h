@@ -31,7 +31,8 @@ public:
     /// How many of them begin with `start`.
     std::ptrdiff_t Count(const std::string& start) const {
         const auto all = All();
-        return std::count_if(all.begin(), all.end(), [&](const auto& text) { return text.starts_with(start); });
+        return std::count_if(all.begin(), all.end(),
+                             [&](const auto& text) { return text.starts_with(start); });
     }
 
 private:

@@ -1,0 +1,65 @@
+#include <cstdlib>
+#include <fstream>
+
+#include "tests/Modules/MetrikSdk/support/PluginFixture.h"
+
+// Request bodies of the plug-in, under the eyes of the protocol's own definition.
+
+namespace {
+
+class OtlpSchemaTest : public PluginFixture {
+protected:
+    /// Whether the definition accepts the body.
+    bool Passes(const std::string& body) {
+        const auto file = m_files.Path() + "/" + std::to_string(m_count++) + ".json";
+        std::ofstream(file) << body;
+        return std::system(("node '" OTLP_SCHEMA_DIR "/check.js' '" + file + "'").c_str()) == 0;
+    }
+
+    /// The body with which the plug-in reports the events.
+    std::string BodyOf(const std::vector<std::string>& payloads) {
+        LoopbackServer server([](const Request&) { return Reply(); });
+        Configure("ENDPOINT", server.Url());
+        Start();
+        for (const auto& payload : payloads)
+            EXPECT_TRUE(m_loader->GetModule()->ReportEvent("A759|10001", payload));
+        EXPECT_TRUE(WaitUntilNothingWaits());
+        return server.Requests().at(0).body;
+    }
+
+    static std::string Replaced(std::string body, const std::string& from, const std::string& to) {
+        const auto place = body.find(from);
+        EXPECT_NE(place, std::string::npos) << from;
+        return body.replace(place, from.size(), to);
+    }
+
+    TemporaryDirectory m_files;
+    int m_count = 0;
+};
+
+TEST_F(OtlpSchemaTest, AcceptsThePluginsRequests) {
+    EXPECT_TRUE(Passes(BodyOf({
+        NumberedPayload(1),
+        R"({"extend":{"createTime":"1700000000123"},"eventData":{"a":[1,-2.5,"x",null,true,{"b":{}},[]]}})",
+        R"({"big":9223372036854775807,"small":-9223372036854775808,"over":18446744073709551615})",
+        R"({"twice":1,"twice":2,"":"empty key","nul":"\u0000","e":"\u20ac\ud83d\ude00"})",
+        "not json at all",
+        "{\"bad utf8\":\"\xff\xfe\"}",
+        "",
+        std::string(5000, '['),
+    })));
+}
+
+TEST_F(OtlpSchemaTest, NoticesABodyThatIsWrong) {
+    const auto good = BodyOf({NumberedPayload(1)});
+    EXPECT_TRUE(Passes(good));
+    EXPECT_FALSE(Passes("{"));
+    EXPECT_FALSE(Passes(Replaced(good, "eventName", "event_nome"))) << "a member that does not exist";
+    EXPECT_FALSE(Passes(Replaced(good, R"("timeUnixNano":"1700000000123000000")", R"("timeUnixNano":1.5)")));
+    EXPECT_FALSE(Passes(Replaced(good, R"("intValue":"1")", R"("intValue":1)"))) << "a number for a text";
+    EXPECT_FALSE(Passes(Replaced(good, R"("intValue":"1")", R"("intValue":"one")")));
+    EXPECT_FALSE(Passes(Replaced(good, "kvlistValue", "kvListValue"))) << "a body of no type";
+    EXPECT_FALSE(Passes(Replaced(good, R"({"stringValue":"u1"})", R"("u1")"))) << "a value without its type";
+}
+
+} // namespace
