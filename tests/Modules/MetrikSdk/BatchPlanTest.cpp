@@ -61,6 +61,7 @@ TEST(BatchPlan, WaitsForCompanyUntilTheOldestIsOldEnough) {
 
 TEST(BatchPlan, DoesNotHoldEventsFromTheFuture) {
     EXPECT_EQ(Plan(Waiting(3, 1, NOW + 24h)).wait, 0ms);
+    EXPECT_EQ(Plan(Waiting(3, 1, NOW + 2ms)).wait, 1002ms) << "stored while the plan was made";
 }
 
 /// Lets a splitter work off `events` events of which `bad` are refused; the number of requests it took.

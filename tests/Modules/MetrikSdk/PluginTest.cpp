@@ -1,9 +1,9 @@
 #include <filesystem>
 #include <fstream>
 
-#include <sys/wait.h>
 #include <unistd.h>
 
+#include "SystemTool/Platform.h"
 #include "tests/Modules/MetrikSdk/support/PluginFixture.h"
 
 using namespace std::chrono_literals;
@@ -16,15 +16,16 @@ protected:
         return std::distance(std::filesystem::directory_iterator(directory), {});
     }
     /// Runs `test` in a new process that knows no directory yet: the plug-in remembers the first one for
-    /// good. To be called first thing, because that process repeats all before it.
+    /// good. To be called first thing, because that process runs the whole of the present test.
     template <typename Test>
     static void InAFreshProcess(Test test) {
-        GTEST_FLAG_SET(death_test_style, "threadsafe");
-        const auto runAndExit = [&] {
-            test();
-            ::_exit(testing::Test::HasFailure() ? 1 : 0);
-        };
-        EXPECT_EXIT(runAndExit(), testing::ExitedWithCode(0), "");
+        constexpr const char* MARK = "SSR_TEST_IS_FRESH";
+        if (std::getenv(MARK) != nullptr)
+            return test();
+        const auto* info = testing::UnitTest::GetInstance()->current_test_info();
+        const auto name = std::string(info->test_suite_name()) + "." + info->name();
+        const auto program = SystemTool::Platform::ExecutablePath();
+        EXPECT_EQ(std::system((MARK + ("=1 '" + program) + "' --gtest_filter=" + name).c_str()), 0);
     }
 
     static std::ptrdiff_t Threads() { return CountEntries("/proc/self/task"); }
@@ -213,28 +214,6 @@ TEST_F(MetrikSdkTest, TellsAConfigurationThatMakesNoSenseAndKeepsTheEvents) {
     Report(1);
     EXPECT_EQ(Told::Failures().Count("configuration: OTEL_EXPORTER_OTLP_ENDPOINT"), 1);
     EXPECT_EQ(Totals().waiting, 1);
-}
-
-TEST_F(MetrikSdkTest, SharesOneFileBetweenTwoProcesses) {
-    Start();
-    Report(1);
-    const auto child = ::fork();
-    if (child == 0) {
-        // What a second instance does: the descriptors of its parent are nothing to it, so it goes by the
-        // path.
-        Metrik::OutboxStore store(File(), 5s);
-        for (int i = 0; i < 100; ++i)
-            store.Store({"A759", "1", "default"}, {"child-" + std::to_string(i), "A759|1", "{}", {}});
-        ::_exit(0);
-    }
-    Report(100);
-    int status = 0;
-    ::waitpid(child, &status, 0);
-    EXPECT_EQ(status, 0);
-    EXPECT_EQ(Totals().waiting, 201);
-    std::int64_t expected = 0;
-    for (const auto& event : Metrik::OutboxStore(File(), 5s).Oldest(1000, 10'000'000).events)
-        EXPECT_EQ(event.sequence, ++expected);
 }
 
 } // namespace

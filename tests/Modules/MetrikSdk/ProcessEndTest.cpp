@@ -17,7 +17,13 @@ class ProcessEndTest : public PluginFixture {
 protected:
     ProcessEndTest() { Configure("ENDPOINT", m_server.Url()); }
 
+    void AnswerWith(const Reply& reply) {
+        const std::lock_guard lock(m_mutex);
+        m_reply = reply;
+    }
+
     Reply Take(const Request& request) {
+        const std::lock_guard lock(m_mutex);
         for (const auto& event : EventsOf(request.body)) {
             m_uuids[event.number].insert(event.uuid);
             m_sequences.insert(event.sequence);
@@ -51,6 +57,7 @@ protected:
         EXPECT_EQ(SQLite::Database(File()).execAndGet("PRAGMA integrity_check").getString(), "ok");
     }
 
+    std::mutex m_mutex; ///< Guards what the server's threads use, until the server is idle.
     Reply m_reply;
     std::map<int, std::set<std::string>> m_uuids; ///< Under which ids each number arrived.
     std::set<std::int64_t> m_sequences;
@@ -87,12 +94,16 @@ TEST_F(ProcessEndTest, ExitsCleanlyWhileItUploads) {
 }
 
 TEST_F(ProcessEndTest, ExitsCleanlyWhileTheCollectorKeepsItWaiting) {
-    m_reply.manner = Reply::Manner::Never;
+    Reply never;
+    never.manner = Reply::Manner::Never;
+    AnswerWith(never);
     ExpectACleanExit("exit");
 }
 
 TEST_F(ProcessEndTest, ExitsCleanlyWhenTheLoaderIsDestroyedMeanwhile) {
-    m_reply.manner = Reply::Manner::Never;
+    Reply never;
+    never.manner = Reply::Manner::Never;
+    AnswerWith(never);
     ExpectACleanExit("static");
 }
 
@@ -101,8 +112,23 @@ TEST_F(ProcessEndTest, ExitsCleanlyFromTheHandlerOfACrashOnAnotherThread) {
 }
 
 TEST_F(ProcessEndTest, ExitsCleanlyFromTheUploadersOwnThread) {
-    m_reply.status = 503;
+    Reply busy;
+    busy.status = 503;
+    AnswerWith(busy);
     ExpectACleanExit("callback");
+}
+
+TEST_F(ProcessEndTest, SharesItsFileWithAnotherProcessWithoutGapsOrRepeats) {
+    SetVariable("OTEL_SDK_DISABLED", "true");
+    Start();
+    ChildProcess child(m_directory.Path(), 1'000'000, "exit");
+    Report(3000);
+    EXPECT_EQ(child.AwaitEnd(), 0);
+    const auto batch = Metrik::OutboxStore(File(), 5s).Oldest(10'000, 100'000'000);
+    std::int64_t expected = 0;
+    for (const auto& event : batch.events)
+        EXPECT_EQ(event.sequence, ++expected);
+    EXPECT_EQ(expected, 6000);
 }
 
 } // namespace
