@@ -1,11 +1,12 @@
 #include "Modules/MetrikSdk/OutboxStore.h"
 
+#include <algorithm>
 #include <utility>
 
 #include <sqlite3.h>
 
 #include "Modules/MetrikSdk/OutboxSchema.h"
-#include "Modules/MetrikSdk/StoreError.h"
+#include "Modules/MetrikSdk/SqliteGuard.h"
 #include "Modules/MetrikSdk/Uuid.h"
 
 namespace Metrik {
@@ -13,51 +14,6 @@ namespace {
 
 /// Row and b-tree overhead of an event, roughly, so that a million empty events do not count as nothing.
 constexpr std::size_t ROW_OVERHEAD_BYTES = 80;
-
-StoreFault FaultOf(const SQLite::Exception& error) {
-    switch (error.getErrorCode() & 0xff) {
-    case SQLITE_CORRUPT:
-    case SQLITE_NOTADB:
-        return StoreFault::SetAside;
-    case SQLITE_BUSY:
-    case SQLITE_LOCKED:
-    case SQLITE_FULL:
-    case SQLITE_NOMEM:
-    case SQLITE_INTERRUPT:
-        return StoreFault::TryLater;
-    default:
-        return StoreFault::Reopen;
-    }
-}
-
-/// Runs one operation of the store, with SQLite's failures turned into ours.
-template <typename Operation>
-auto Guarded(const char* what, Operation operation) {
-    try {
-        return operation();
-    } catch (const SQLite::Exception& error) {
-        throw StoreError(FaultOf(error), std::string(what) + ": " + error.what());
-    }
-}
-
-/// Leaves a statement ready for its next use also when it fails: one that was left in the middle would hold
-/// its read lock, and the log could never be checkpointed again.
-class Use {
-public:
-    explicit Use(SQLite::Statement& statement) : m_statement(statement) {}
-    ~Use() { m_statement.tryReset(); }
-    Use(const Use&) = delete;
-    Use& operator=(const Use&) = delete;
-    SQLite::Statement* operator->() const { return &m_statement; }
-
-private:
-    SQLite::Statement& m_statement;
-};
-
-SQLite::Transaction WriteTransaction(SQLite::Database& database) {
-    // A deferred one could fail in its middle when another process writes between its read and its write.
-    return SQLite::Transaction(database, SQLite::TransactionBehavior::IMMEDIATE);
-}
 
 std::int64_t Number(SQLite::Database& database, const char* query) {
     return database.execAndGet(query).getInt64();
@@ -92,6 +48,9 @@ OutboxStore::OutboxStore(const std::string& path, std::chrono::milliseconds lock
 }
 
 void OutboxStore::Configure() {
+    // Each event writes two pages into the log. Small ones take less of the disk: on a busy one an event
+    // costs 17 us with 1 KiB, and 50 us with the usual 4 KiB.
+    m_database.exec("PRAGMA page_size = 1024");
     m_database.exec("PRAGMA journal_mode = WAL");
     // FULL would sync at each commit: see the figures in docs/Outbox.md.
     m_database.exec("PRAGMA synchronous = NORMAL");
