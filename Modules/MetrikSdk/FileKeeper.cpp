@@ -12,20 +12,23 @@ constexpr const char* FILE_NAME = "/MetrikOutbox.db";
 FileKeeper::FileKeeper(std::string directory, const FileSettings& settings)
     : m_directory(std::move(directory)), m_path(m_directory + FILE_NAME), m_settings(settings) {}
 
-OutboxStore& FileKeeper::Ready(SteadyTime now, std::vector<News>& news) {
+OutboxStore& FileKeeper::Ready(SteadyTime now, std::chrono::milliseconds patience, std::vector<News>& news) {
     if (m_store && !IsStillTheFile(now)) {
         m_store.reset(); // SQLite leaves the files at the path alone once the path names another
         news.push_back(
             {Cause::Vanished, m_path + " was deleted or replaced, with all events that waited in it"});
     }
-    if (m_store)
+    if (m_store) {
+        m_store->SetLockPatience(patience);
         return *m_store;
+    }
     if (m_failedAt && now - *m_failedAt < m_settings.reopenInterval)
         throw StoreError(StoreFault::TryLater, m_lastError);
     try {
-        OpenOrBegin(news);
+        OpenOrBegin(patience, news);
     } catch (const StoreError& error) {
-        CloseUntilLater(error.what(), now);
+        if (error.fault != StoreFault::TryLater)
+            CloseUntilLater(error.what(), now);
         throw;
     }
     m_failedAt.reset();
@@ -33,21 +36,21 @@ OutboxStore& FileKeeper::Ready(SteadyTime now, std::vector<News>& news) {
     return *m_store;
 }
 
-void FileKeeper::OpenOrBegin(std::vector<News>& news) {
+void FileKeeper::OpenOrBegin(std::chrono::milliseconds patience, std::vector<News>& news) {
     try {
-        Open();
+        Open(patience);
     } catch (const StoreError& error) {
         if (error.fault != StoreFault::SetAside)
             throw;
         SetAside(error.what(), news);
-        Open();
+        Open(patience);
     }
 }
 
-void FileKeeper::Open() {
+void FileKeeper::Open(std::chrono::milliseconds patience) {
     OutboxFiles::MakeDirectory(m_directory);
     m_identity = OutboxFiles::Prepare(m_path);
-    m_store = std::make_unique<OutboxStore>(m_path, m_settings.shortLockPatience);
+    m_store = std::make_unique<OutboxStore>(m_path, patience);
     ++m_generation;
 }
 

@@ -24,9 +24,10 @@ class FileKeeper {
 public:
     FileKeeper(std::string directory, const FileSettings& settings);
 
-    /// The open store. Throws StoreError while the file cannot be opened, which is tried once in
-    /// FileSettings::reopenInterval.
-    OutboxStore& Ready(SteadyTime now, std::vector<News>& news);
+    /// The open store, which waits for another process's lock as long as `patience`. Throws StoreError while
+    /// the file cannot be opened, which is tried once in FileSettings::reopenInterval, or whenever called if
+    /// only the lock or the disk's space was in the way.
+    OutboxStore& Ready(SteadyTime now, std::chrono::milliseconds patience, std::vector<News>& news);
 
     /// To be called when an operation of the store failed. Whether a first attempt is worth a second one at
     /// once; a second failure closes the file for FileSettings::reopenInterval.
@@ -36,8 +37,8 @@ public:
     unsigned Generation() const { return m_generation; }
 
 private:
-    void Open();
-    void OpenOrBegin(std::vector<News>& news);
+    void Open(std::chrono::milliseconds patience);
+    void OpenOrBegin(std::chrono::milliseconds patience, std::vector<News>& news);
     void CloseUntilLater(const std::string& reason, SteadyTime now);
     bool IsStillTheFile(SteadyTime now);
     void SetAside(const std::string& reason, std::vector<News>& news);

@@ -22,18 +22,11 @@ constexpr int POLL_MS = 50;
 
 std::atomic<bool> g_abandonAll = false;
 std::atomic<int> g_requestsUnderWay = 0;
-thread_local bool t_inRequest = false;
 
 class RequestUnderWay {
 public:
-    RequestUnderWay() {
-        t_inRequest = true;
-        ++g_requestsUnderWay;
-    }
-    ~RequestUnderWay() {
-        --g_requestsUnderWay;
-        t_inRequest = false;
-    }
+    RequestUnderWay() { ++g_requestsUnderWay; }
+    ~RequestUnderWay() { --g_requestsUnderWay; }
     RequestUnderWay(const RequestUnderWay&) = delete;
     RequestUnderWay& operator=(const RequestUnderWay&) = delete;
 };
@@ -186,10 +179,9 @@ std::size_t HttpSender::OnHeader(char* bytes, std::size_t size, std::size_t coun
 
 void HttpSender::AbandonAll(std::chrono::milliseconds patience) {
     g_abandonAll = true;
-    const int own = t_inRequest ? 1 : 0;
     const auto deadline = std::chrono::steady_clock::now() + patience;
     // No condition variable: the thread that called exit() may have been interrupted anywhere.
-    while (g_requestsUnderWay > own && std::chrono::steady_clock::now() < deadline)
+    while (g_requestsUnderWay > 0 && std::chrono::steady_clock::now() < deadline)
         std::this_thread::sleep_for(std::chrono::milliseconds(1));
 }
 

@@ -26,7 +26,7 @@ public:
 
     /// Ends every request of the process, waits until none is under way, at most `patience`, and lets no new
     /// one begin. For exit(): the TLS library is about to clean itself up, and must not be in use then.
-    /// Called by a thread that is itself within a request, it does not wait for itself.
+    /// (Called by a thread that crashed within a request, it waits in vain.)
     static void AbandonAll(std::chrono::milliseconds patience);
 
 private:

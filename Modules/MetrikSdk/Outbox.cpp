@@ -17,7 +17,7 @@ template <typename Operation>
 auto Outbox::AttemptTwice(Operation operation) {
     for (bool first = true;; first = false) {
         try {
-            auto& store = m_keeper.Ready(m_now, m_news);
+            auto& store = m_keeper.Ready(m_now, m_patience, m_news);
             LearnAbout(store);
             return operation(store);
         } catch (const StoreError& error) {
@@ -29,7 +29,7 @@ auto Outbox::AttemptTwice(Operation operation) {
 
 /// Locks, runs `operation`, unlocks, and tells what there was to tell.
 template <typename Operation>
-auto Outbox::WithStore(Operation operation) {
+auto Outbox::WithStore(Caller caller, Operation operation) {
     struct TellAtEnd {
         Notifier& notifier;
         std::vector<News> news;
@@ -42,12 +42,14 @@ auto Outbox::WithStore(Operation operation) {
         ~CollectNews() { to.swap(from); }
     } collect{m_news, tell.news};
     m_now = std::chrono::steady_clock::now();
+    m_patience = caller == Caller::Module && !m_patienceUsedUp ? m_settings.file.lockPatience
+                                                               : m_settings.file.shortLockPatience;
     return AttemptTwice(std::move(operation));
 }
 
 bool Outbox::Open() {
     try {
-        WithStore([](OutboxStore&) {});
+        WithStore(Caller::Module, [](OutboxStore&) {});
         return true;
     } catch (const StoreError& error) {
         m_notifier.TellFailure({Cause::File, error.what()});
@@ -64,18 +66,16 @@ bool Outbox::Append(const ModuleIdentity& module, std::string eventId, std::stri
     try {
         const auto now = WallNow();
         const NewEvent event{NewUuid(now), std::move(eventId), std::move(payload), now};
-        WithStore([&](OutboxStore& store) { StoreEvent(store, module, event); });
+        WithStore(Caller::Module, [&](OutboxStore& store) { StoreEvent(store, module, event); });
         return true;
     } catch (const StoreError& error) {
+        m_patienceUsedUp = true;
         m_notifier.TellFailure({Cause::File, error.what()});
         return false;
     }
 }
 
 void Outbox::StoreEvent(OutboxStore& store, const ModuleIdentity& module, const NewEvent& event) {
-    store.SetLockPatience(m_patienceUsedUp ? m_settings.file.shortLockPatience
-                                           : m_settings.file.lockPatience);
-    m_patienceUsedUp = true; // unless what follows succeeds
     m_waitingBytes += static_cast<std::int64_t>(store.Store(module, event));
     m_patienceUsedUp = false;
     m_bell.Report(++m_waitingEvents);
@@ -88,7 +88,6 @@ void Outbox::StoreEvent(OutboxStore& store, const ModuleIdentity& module, const 
 
 /// What is to be known of a file that was just opened.
 void Outbox::LearnAbout(OutboxStore& store) {
-    store.SetLockPatience(m_settings.file.shortLockPatience);
     if (m_knownGeneration == m_keeper.Generation())
         return;
     Recount(store);
@@ -134,7 +133,7 @@ void Outbox::TellDrop(std::size_t dropped) {
 }
 
 Batch Outbox::Take(std::size_t maxEvents) {
-    return WithStore([&](OutboxStore& store) {
+    return WithStore(Caller::Uploader, [&](OutboxStore& store) {
         auto batch = store.Oldest(maxEvents, m_settings.batch.maxBytes);
         if (batch.events.empty())
             Recount(store);
@@ -150,14 +149,14 @@ void Outbox::Release() {
 }
 
 void Outbox::RemoveDelivered(const Batch& batch, std::size_t refused) {
-    WithStore([&](OutboxStore& store) {
+    WithStore(Caller::Uploader, [&](OutboxStore& store) {
         store.RemoveDelivered(batch, refused);
         Recount(store);
     });
 }
 
 void Outbox::MoveToDeadLetters(const StoredEvent& event, const Refusal& refusal) {
-    WithStore([&](OutboxStore& store) {
+    WithStore(Caller::Uploader, [&](OutboxStore& store) {
         store.MoveToDeadLetters(event, refusal, WallNow());
         store.TrimDeadLetters(m_settings.caps.maxDeadLetters, m_settings.caps.maxDeadLetterBytes);
         Recount(store);
@@ -165,7 +164,7 @@ void Outbox::MoveToDeadLetters(const StoredEvent& event, const Refusal& refusal)
 }
 
 OutboxStatus Outbox::Status() {
-    return WithStore([](OutboxStore& store) { return store.Status(); });
+    return WithStore(Caller::Uploader, [](OutboxStore& store) { return store.Status(); });
 }
 
 } // namespace Metrik

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <atomic>
 #include <mutex>
 #include <optional>
 #include <string>
@@ -43,8 +44,11 @@ public:
     Bell& WaitingBell() { return m_bell; }
 
 private:
+    /// Who waits for a lock: a module's event would be lost, the uploader comes back.
+    enum class Caller { Module, Uploader };
+
     template <typename Operation>
-    auto WithStore(Operation operation);
+    auto WithStore(Caller caller, Operation operation);
     template <typename Operation>
     auto AttemptTwice(Operation operation);
 
@@ -59,15 +63,18 @@ private:
     Notifier& m_notifier;
     Bell m_bell;
 
+    /// The last event was refused, perhaps after all of the patience: the next one has less.
+    std::atomic<bool> m_patienceUsedUp = false;
+
     std::mutex m_mutex; ///< Guards all below.
     FileKeeper m_keeper;
     unsigned m_knownGeneration = 0;
     std::int64_t m_waitingEvents = 0;
     std::int64_t m_waitingBytes = 0;
-    std::int64_t m_underWayUpTo = 0; ///< The last row that was taken and not released.
-    bool m_patienceUsedUp = false;   ///< The last event found the file locked for all of the patience.
-    SteadyTime m_now{};              ///< Of the operation under way.
-    SteadyTime m_openedSteady{};     ///< Both times of when the file was opened.
+    std::int64_t m_underWayUpTo = 0;         ///< The last row that was taken and not released.
+    std::chrono::milliseconds m_patience{0}; ///< Of the operation under way.
+    SteadyTime m_now{};                      ///< Of the operation under way.
+    SteadyTime m_openedSteady{};             ///< Both times of when the file was opened.
     WallTime m_openedAt{};
     SteadyTime m_nextAgeCheck{};
     std::optional<SteadyTime> m_lastDrop;
