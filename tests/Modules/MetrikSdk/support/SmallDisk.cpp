@@ -18,11 +18,15 @@ constexpr int UNAVAILABLE = 77;
 
 bool EnterOwnMountNamespace() {
     const auto user = ::getuid();
+    const auto group = ::getgid();
     if (user == 0)
         return ::unshare(CLONE_NEWNS) == 0;
     if (::unshare(CLONE_NEWUSER | CLONE_NEWNS) != 0)
         return false;
+    // Both ids must mean something there: a file system refuses files of nobody and nothing.
+    std::ofstream("/proc/self/setgroups") << "deny";
     std::ofstream("/proc/self/uid_map") << "0 " << user << " 1";
+    std::ofstream("/proc/self/gid_map") << "0 " << group << " 1";
     return true;
 }
 
