@@ -1,0 +1,102 @@
+#include <cstdlib>
+#include <filesystem>
+#include <set>
+
+#include <SQLiteCpp/SQLiteCpp.h>
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "App/ReportServer.h"
+#include "Metrik/MetrikMgr.h"
+#include "tests/fakes/FakeLogger.h"
+#include "tests/support/TemporaryDirectory.h"
+
+using namespace SyncServiceReport;
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+
+// MetrikMgr and MetrikWorker with the real SDK plug-in and an outbox on a real file.
+
+namespace {
+
+#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
+constexpr int MANY_MODULES = 500;
+#else
+constexpr int MANY_MODULES = 10'000;
+#endif
+
+class RealSdk : public ::testing::Test {
+protected:
+    RealSdk() {
+        ::setenv("XDG_DATA_HOME", m_data.Path().c_str(), 1);
+        m_server.InitBaseInfo();
+        EXPECT_TRUE(m_mgr.Init());
+        FakeLogger().Clear();
+    }
+
+    bool Send(const std::string& eventID, const std::string& value = "") {
+        ST_OptLog log;
+        log.eventID = eventID;
+        log.value = value;
+        log.createTime = "1700000000123";
+        return m_mgr.Send(log);
+    }
+
+    std::vector<std::string> Outbox(const std::string& sql) const {
+        SQLite::Database database(m_data.Path() + "/hublink/database/MetrikOutbox.db", SQLite::OPEN_READWRITE,
+                                  5000);
+        SQLite::Statement query(database, sql);
+        std::vector<std::string> rows;
+        while (query.executeStep())
+            rows.push_back(query.getColumn(0).getString());
+        return rows;
+    }
+
+    std::set<std::string> Files() const {
+        std::set<std::string> files;
+        for (const auto& entry : std::filesystem::recursive_directory_iterator(m_data.Path()))
+            files.insert(entry.path().filename().string());
+        return files;
+    }
+
+    TemporaryDirectory m_data;
+    ReportServer m_server;
+    MetrikMgr m_mgr{&m_server};
+};
+
+std::string InitMessage(const std::string& moduleID, const std::string& dbPath) {
+    return R"({"msgType":"init","exdata":{"moduleID":")" + moduleID +
+           R"(","moduleVersion":"1","moduleName":"m","dbPath":")" + dbPath + R"("}})";
+}
+
+std::ptrdiff_t ThreadCount() {
+    return std::distance(std::filesystem::directory_iterator("/proc/self/task"), {});
+}
+
+} // namespace
+
+TEST_F(RealSdk, KeepsAnEventOfTheDefaultModule) {
+    EXPECT_TRUE(Send("A759|10001", R"({"a":1})"));
+    EXPECT_THAT(Outbox("select event_id from event"), ElementsAre("A759|10001"));
+    EXPECT_THAT(Outbox("select payload ->> '$.eventData.openid' from event"), ElementsAre("visitor"));
+    EXPECT_THAT(FakeLogger().Records(), IsEmpty());
+}
+
+TEST_F(RealSdk, ManyModulesCostNeitherFilesNorThreads) {
+    const auto files = Files();
+    const auto threads = ThreadCount();
+    for (int i = 0; i < MANY_MODULES; ++i)
+        ASSERT_TRUE(m_mgr.Update(InitMessage("../A" + std::to_string(i) + "'; drop table event; --", "")));
+    EXPECT_EQ(Files(), files);
+    EXPECT_EQ(ThreadCount(), threads);
+    EXPECT_TRUE(Send("../A7'; drop table event; --|1"));
+    EXPECT_THAT(Outbox("select event_id from event"), ElementsAre("../A7'; drop table event; --|1"));
+}
+
+TEST_F(RealSdk, AModuleWithARelativeDirectoryUsesTheFirstOne) {
+    ASSERT_TRUE(m_mgr.Update(InitMessage("A100", "relative/path")));
+    EXPECT_TRUE(Send("A100|1"));
+    EXPECT_THAT(Outbox("select module_id from event join module on module.id = event.module"),
+                ElementsAre("A100"));
+    EXPECT_FALSE(std::filesystem::exists("relative"));
+}
