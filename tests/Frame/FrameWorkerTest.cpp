@@ -8,6 +8,7 @@
 #include "SystemTool/CommonTool.h"
 #include "tests/fakes/FakeLogger.h"
 #include "tests/fakes/FakeSqlite.h"
+#include "tests/support/CaughtExceptions.h"
 
 using namespace SyncServiceReport;
 using ::testing::AllOf;
@@ -83,17 +84,8 @@ TEST_F(FrameWorkerTest, APluginThatMakesNoObjectIsLogged) {
 }
 
 TEST_F(FrameWorkerTest, InitLogsEachKindOfException) {
-    m_db.throws = Throws::Poco;
-    EXPECT_FALSE(m_worker.Init());
-    m_db.throws = Throws::Std;
-    EXPECT_FALSE(m_worker.Init());
-    m_db.throws = Throws::Other;
-    EXPECT_FALSE(m_worker.Init());
-    EXPECT_THAT(FakeLogger().Records(),
-                ElementsAre(Record(3, "Init", "Poco exception :I/O error: scripted "),
-                            Record(3, "Init", "Std exception :scripted "),
-                            AllOf(Field(&LogRecord::level, 3),
-                                  Field(&LogRecord::message, ::testing::StartsWith("Unknown exception :")))));
+    ExpectEachKindOfExceptionToBeLogged(m_db.throws, "Frame/FrameWorker", "Init", 0,
+                                        [this] { return m_worker.Init(); });
 }
 
 TEST_F(FrameWorkerTest, SendsBeforeInitFailSilently) {
@@ -195,16 +187,8 @@ TEST_F(FrameWorkerTest, ARejectedStatementIsLoggedOnceAndNotRetried) {
 
 TEST_F(FrameWorkerTest, SendLogsEachKindOfException) {
     InitWith({});
-    FakeLogger().Clear();
-    for (const Throws what : {Throws::Poco, Throws::Std, Throws::Other}) {
-        m_db.throws = what;
-        EXPECT_FALSE(m_worker.Send(Log("B", "", "", 1)));
-    }
-    EXPECT_THAT(FakeLogger().Records(),
-                ElementsAre(Record(3, "Send", "Poco exception :I/O error: scripted "),
-                            Record(3, "Send", "Std exception :scripted "),
-                            AllOf(Field(&LogRecord::level, 3),
-                                  Field(&LogRecord::message, ::testing::StartsWith("Unknown exception :")))));
+    ExpectEachKindOfExceptionToBeLogged(m_db.throws, "Frame/FrameWorker", "Send", 0,
+                                        [this] { return m_worker.Send(Log("B", "", "", 1)); });
 }
 
 TEST_F(FrameWorkerTest, AnInitThatFailsAfterOpeningLeavesTheDatabaseInUse) {

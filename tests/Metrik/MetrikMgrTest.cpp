@@ -6,11 +6,11 @@
 #include "App/ReportServer.h"
 #include "tests/fakes/FakeLogger.h"
 #include "tests/fakes/FakeSdk.h"
+#include "tests/support/CaughtExceptions.h"
 
 using namespace SyncServiceReport;
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
-using ::testing::MatchesRegex;
 
 namespace {
 
@@ -195,16 +195,8 @@ TEST_F(MetrikMgrTest, TextThatIsNoJsonIsLoggedAndChangesNothing) {
 }
 
 TEST_F(MetrikMgrTest, UpdateLogsEachKindOfExceptionAndTheMapIsAsItWas) {
-    for (const Throws what : {Throws::Poco, Throws::Std, Throws::Other}) {
-        m_sdk.initThrows = what;
-        EXPECT_FALSE(m_mgr.Update(InitMessage("A100")));
-    }
-    const auto records = FakeLogger().Records();
-    ASSERT_EQ(records.size(), 3U);
-    EXPECT_EQ(records[0], Record(3, "Update", 93, "Poco exception :I/O error: scripted "));
-    EXPECT_EQ(records[1], Record(3, "Update", 93, "Std exception :scripted "));
-    EXPECT_EQ(records[2], Record(3, "Update", 93, records[2].message));
-    EXPECT_THAT(records[2].message, MatchesRegex("Unknown exception :[0-9]+-.*"));
+    ExpectEachKindOfExceptionToBeLogged(m_sdk.initThrows, "Metrik/MetrikMgr", "Update", 93,
+                                        [this] { return m_mgr.Update(InitMessage("A100")); });
     FakeLogger().Clear();
     EXPECT_FALSE(Send("A100|1"));
     EXPECT_THAT(FakeLogger().Records(), ElementsAre(Record(3, "Send", 115, "module not init :A100")));
@@ -258,17 +250,8 @@ TEST_F(MetrikMgrTest, EventsBeforeTheirModulesInitAreLost) {
 TEST_F(MetrikMgrTest, SendLogsEachKindOfException) {
     Poco::SharedPtr<ThrowingWorker> worker(new ThrowingWorker);
     m_mgr.m_mapWorkers["A1"] = worker;
-    for (const Throws what : {Throws::Poco, Throws::Std, Throws::Other}) {
-        worker->throws = what;
-        EXPECT_FALSE(Send("A1|1"));
-    }
-    const auto records = FakeLogger().Records();
-    ASSERT_EQ(records.size(), 3U);
-    EXPECT_EQ(records[0], Record(3, "Send", 122, "Poco exception :I/O error: scripted "));
-    EXPECT_EQ(records[1], Record(3, "Send", 122, "Std exception :scripted "));
-    EXPECT_EQ(records[2], Record(3, "Send", 122, records[2].message));
-    EXPECT_THAT(records[2].message, MatchesRegex("Unknown exception :[0-9]+-.*"));
-    worker->throws = Throws::Nothing;
+    ExpectEachKindOfExceptionToBeLogged(worker->throws, "Metrik/MetrikMgr", "Send", 122,
+                                        [this] { return Send("A1|1"); });
     EXPECT_TRUE(Send("A1|1"));
 }
 

@@ -8,6 +8,7 @@
 #include "SystemTool/IO/JsonDocument.h"
 #include "tests/fakes/FakeLogger.h"
 #include "tests/fakes/FakeSdk.h"
+#include "tests/support/CaughtExceptions.h"
 #include "tests/support/ScriptedJson.h"
 
 using namespace SyncServiceReport;
@@ -108,19 +109,8 @@ TEST_F(MetrikWorkerTest, AnSdkThatMakesNoObjectIsLogged) {
 }
 
 TEST_F(MetrikWorkerTest, InitDefalutLogsEachKindOfException) {
-    for (const Throws what : {Throws::Poco, Throws::Std}) {
-        m_sdk.initThrows = what;
-        EXPECT_FALSE(m_worker.InitDefalut());
-    }
-    errno = ENOENT;
-    m_sdk.initThrows = Throws::Other;
-    EXPECT_FALSE(m_worker.InitDefalut());
-    const auto records = FakeLogger().Records();
-    ASSERT_EQ(records.size(), 3U);
-    EXPECT_EQ(records[0], Record(3, "InitDefalut", 56, "Poco exception :I/O error: scripted "));
-    EXPECT_EQ(records[1], Record(3, "InitDefalut", 56, "Std exception :scripted "));
-    EXPECT_EQ(records[2], Record(3, "InitDefalut", 56, records[2].message));
-    EXPECT_THAT(records[2].message, ::testing::MatchesRegex("Unknown exception :[0-9]+-.+"));
+    ExpectEachKindOfExceptionToBeLogged(m_sdk.initThrows, "Metrik/MetrikWorker", "InitDefalut", 56,
+                                        [this] { return m_worker.InitDefalut(); });
 }
 
 TEST_F(MetrikWorkerTest, AnInitialisationThatFailedLeavesNothingToSendTo) {
@@ -224,16 +214,8 @@ TEST_F(MetrikWorkerTest, TheSdksAnswerIsTheResult) {
 
 TEST_F(MetrikWorkerTest, SendLogsEachKindOfException) {
     ASSERT_TRUE(m_worker.InitDefalut());
-    for (const Throws what : {Throws::Poco, Throws::Std, Throws::Other}) {
-        m_sdk.reportThrows = what;
-        EXPECT_FALSE(Send("{}"));
-    }
-    const auto records = FakeLogger().Records();
-    ASSERT_EQ(records.size(), 3U);
-    EXPECT_EQ(records[0], Record(3, "Send", 121, "Poco exception :I/O error: scripted "));
-    EXPECT_EQ(records[1], Record(3, "Send", 121, "Std exception :scripted "));
-    EXPECT_EQ(records[2], Record(3, "Send", 121, records[2].message));
-    EXPECT_THAT(records[2].message, ::testing::MatchesRegex("Unknown exception :[0-9]+-.*"));
+    ExpectEachKindOfExceptionToBeLogged(m_sdk.reportThrows, "Metrik/MetrikWorker", "Send", 121,
+                                        [this] { return Send("{}"); });
 }
 
 TEST_F(MetrikWorkerTest, TheFailureCallbackLogsBothTexts) {

@@ -55,14 +55,10 @@ FAKE_EXPORT FakeSdkState* FakeState() {
 }
 
 FAKE_EXPORT IMetrikSdk* CreateModule() {
-    ++State().created;
-    ThrowIf(State().createThrows);
-    return State().createsNothing ? nullptr : new Sdk(State().created);
+    return State().Create() ? new Sdk(State().created) : nullptr;
 }
 
 FAKE_EXPORT void DestoryModule(IMetrikSdk* sdk) {
-    ++State().destroyed;
-    if (State().sequence != nullptr)
-        State().destroyedAt = ++*State().sequence;
+    State().Destroy();
     delete static_cast<Sdk*>(sdk);
 }

@@ -52,15 +52,11 @@ FAKE_EXPORT FakeSqliteState* FakeState() {
 
 #ifndef WITHOUT_CREATE
 FAKE_EXPORT ISqliteDatabase* CreateModule() {
-    ++State().created;
-    ThrowIf(State().createThrows);
-    return State().createsNothing ? nullptr : new Database;
+    return State().Create() ? new Database : nullptr;
 }
 #endif
 
 FAKE_EXPORT void DestoryModule(ISqliteDatabase* database) {
-    ++State().destroyed;
-    if (State().sequence != nullptr)
-        State().destroyedAt = ++*State().sequence;
+    State().Destroy();
     delete static_cast<Database*>(database);
 }

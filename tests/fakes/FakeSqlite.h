@@ -4,10 +4,10 @@
 #include <string>
 #include <vector>
 
-#include "tests/fakes/FakePlugin.h"
+#include "tests/fakes/FakeFactory.h"
 
 /// What the fake database was asked, and what it answers.
-struct FakeSqliteState {
+struct FakeSqliteState : FakeFactory {
     struct Call {
         std::string operation;
         std::string argument; ///< The path or statement; a batch's statements joined by blanks.
@@ -34,12 +34,6 @@ struct FakeSqliteState {
     std::string errorText = "scripted error";
     std::vector<std::vector<std::string>> rows; ///< What a query appends.
     int count = 0; ///< What a counting statement stores; nothing is stored for a negative.
-    int created = 0;
-    int destroyed = 0;
-    bool createsNothing = false;
-    Throws createThrows = Throws::Nothing;
-    int* sequence = nullptr; ///< A counter that both destinations' fakes may share,
-    int destroyedAt = 0;     ///< and what it said when an object was destroyed last.
 };
 
 inline FakeSqliteState& FakeSqlite() {

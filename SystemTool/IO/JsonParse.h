@@ -1,0 +1,116 @@
+#pragma once
+
+#include <cstring>
+#include <string>
+#include <string_view>
+
+#include <rapidjson/document.h>
+#include <rapidjson/error/en.h>
+#include <rapidjson/memorystream.h>
+#include <rapidjson/reader.h>
+
+#include "SystemTool/IO/JsonDocument.h"
+
+// How JsonDocument reads a text; of no use to anybody else.
+namespace SystemTool::IO {
+
+inline constexpr unsigned JSON_PARSE_FLAGS = rapidjson::kParseIterativeFlag |
+                                             rapidjson::kParseFullPrecisionFlag |
+                                             rapidjson::kParseValidateEncodingFlag;
+
+/// Whether decoded text holds half a surrogate pair: what an escape such as \udc00 on its own decodes to,
+/// which is no UTF-8 and which the parser lets pass.
+inline bool HasLoneSurrogate(const char* text, rapidjson::SizeType length) {
+    constexpr char LEAD = '\xed';
+    const char* const end = text + length;
+    while ((text = static_cast<const char*>(std::memchr(text, LEAD, static_cast<std::size_t>(end - text)))) !=
+           nullptr)
+        if (static_cast<unsigned char>(*++text) >= 0xa0) // in a valid text, a lead byte is never the last
+            return true;
+    return false;
+}
+
+/// Hands a parser's events on to a document, and ends the parse for what the parser itself would let pass.
+class JsonGuard {
+public:
+    using Ch = char;
+
+    explicit JsonGuard(rapidjson::Document& document) : m_document(document) {}
+
+    bool Null() { return m_document.Null(); }
+    bool Bool(bool value) { return m_document.Bool(value); }
+    bool Int(int value) { return m_document.Int(value); }
+    bool Uint(unsigned value) { return m_document.Uint(value); }
+    bool Int64(std::int64_t value) { return m_document.Int64(value); }
+    bool Uint64(std::uint64_t value) { return m_document.Uint64(value); }
+    bool Double(double value) { return m_document.Double(value); }
+    bool RawNumber(const Ch* text, rapidjson::SizeType length, bool copy) {
+        return m_document.RawNumber(text, length, copy);
+    }
+    bool String(const Ch* text, rapidjson::SizeType length, bool copy) {
+        return IsText(text, length) && m_document.String(text, length, copy);
+    }
+    bool Key(const Ch* text, rapidjson::SizeType length, bool copy) {
+        return IsText(text, length) && m_document.Key(text, length, copy);
+    }
+    bool StartObject() { return Enter() && m_document.StartObject(); }
+    bool EndObject(rapidjson::SizeType members) { return --m_depth, m_document.EndObject(members); }
+    bool StartArray() { return Enter() && m_document.StartArray(); }
+    bool EndArray(rapidjson::SizeType elements) { return --m_depth, m_document.EndArray(elements); }
+
+    /// Why the parse was ended.
+    const char* Refusal() const { return m_refusal; }
+
+private:
+    bool Enter() { return ++m_depth <= JsonDocument::MAX_DEPTH || Refuse("Nested deeper than 128 levels."); }
+    bool IsText(const Ch* text, rapidjson::SizeType length) {
+        return !HasLoneSurrogate(text, length) || Refuse("Half a surrogate pair in string.");
+    }
+    bool Refuse(const char* refusal) {
+        m_refusal = refusal;
+        return false;
+    }
+
+    static_assert(JsonDocument::MAX_DEPTH == 128, "the refusal's text names the limit");
+
+    rapidjson::Document& m_document;
+    int m_depth = 0;
+    const char* m_refusal = "";
+};
+
+/// One parse, in the shape that rapidjson::Document::Populate wants: it calls this with itself as the handler.
+class JsonParse {
+public:
+    explicit JsonParse(const std::string& text)
+        : m_text(text), m_start(text.starts_with(BYTE_ORDER_MARK) ? BYTE_ORDER_MARK.size() : 0) {}
+
+    bool operator()(rapidjson::Document& document) {
+        rapidjson::MemoryStream bytes(m_text.data() + m_start, m_text.size() - m_start);
+        JsonGuard guard(document);
+        rapidjson::Reader reader;
+        m_result = reader.Parse<JSON_PARSE_FLAGS>(bytes, guard);
+        m_refusal = guard.Refusal();
+        // The parser takes a zero byte for the end of the text; the text says where it really ends.
+        if (!m_result.IsError() && bytes.Tell() != m_text.size() - m_start)
+            m_result.Set(rapidjson::kParseErrorDocumentRootNotSingular, bytes.Tell());
+        return !m_result.IsError();
+    }
+
+    std::string Error() const {
+        if (!m_result.IsError())
+            return {};
+        const bool refused = m_result.Code() == rapidjson::kParseErrorTermination;
+        const std::string what = refused ? m_refusal : rapidjson::GetParseError_En(m_result.Code());
+        return what + " At byte " + std::to_string(m_start + m_result.Offset()) + ".";
+    }
+
+private:
+    static constexpr std::string_view BYTE_ORDER_MARK = "\xef\xbb\xbf";
+
+    const std::string& m_text;
+    const std::size_t m_start; ///< Behind a byte order mark.
+    rapidjson::ParseResult m_result;
+    const char* m_refusal = "";
+};
+
+} // namespace SystemTool::IO

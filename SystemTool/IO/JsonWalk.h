@@ -1,0 +1,76 @@
+#pragma once
+
+#include <vector>
+
+#include <rapidjson/document.h>
+
+// How JsonDocument goes through a value; of no use to anybody else.
+namespace SystemTool::IO {
+
+/// Tells `handler` the whole of `root`, in order, as a parser would. The open arrays and objects are kept on
+/// the heap, where rapidjson's own Accept and CopyFrom call themselves for each level.
+template <typename Handler>
+class JsonWalk {
+public:
+    explicit JsonWalk(Handler& handler) : m_handler(handler) {}
+
+    void operator()(const rapidjson::Value& root) {
+        Tell(root);
+        while (!m_open.empty()) {
+            if (m_open.back().next == SizeOf(*m_open.back().value))
+                Close();
+            else
+                TellNextChild(m_open.back());
+        }
+    }
+
+private:
+    struct Level {
+        const rapidjson::Value* value;
+        rapidjson::SizeType next;
+    };
+
+    static rapidjson::SizeType SizeOf(const rapidjson::Value& value) {
+        return value.IsObject() ? value.MemberCount() : value.Size();
+    }
+
+    void Tell(const rapidjson::Value& value) {
+        if (value.IsObject() ? m_handler.StartObject() : value.IsArray() && m_handler.StartArray())
+            m_open.push_back({&value, 0});
+        else
+            value.Accept(m_handler); // a scalar: one event
+    }
+
+    void TellNextChild(Level& level) {
+        const auto index = level.next++;
+        if (level.value->IsArray())
+            return Tell((*level.value)[index]);
+        const auto& member = *(level.value->MemberBegin() + index);
+        m_handler.Key(member.name.GetString(), member.name.GetStringLength(), true);
+        Tell(member.value);
+    }
+
+    void Close() {
+        const rapidjson::Value& value = *m_open.back().value;
+        m_open.pop_back();
+        if (value.IsObject())
+            m_handler.EndObject(value.MemberCount());
+        else
+            m_handler.EndArray(value.Size());
+    }
+
+    Handler& m_handler;
+    std::vector<Level> m_open;
+};
+
+/// Fills a document with a copy of a value, for rapidjson::Document::Populate.
+struct JsonCopy {
+    const rapidjson::Value& source;
+
+    bool operator()(rapidjson::Document& document) const {
+        JsonWalk{document}(source);
+        return true;
+    }
+};
+
+} // namespace SystemTool::IO
