@@ -56,7 +56,8 @@ constexpr int OPEN_FLAGS = SQLITE_OPEN_READWRITE | SQLITE_OPEN_NOMUTEX;
 } // namespace
 
 Connection::Connection(const std::string& path, const Settings& settings)
-    : m_database(MadePrivate(path), OPEN_FLAGS, static_cast<int>(settings.busyTimeout.count())) {
+    : m_database(MadePrivate(path), OPEN_FLAGS, static_cast<int>(settings.busyTimeout.count())),
+      m_others(sqlite3_db_filename(m_database.getHandle(), "main")) {
     auto* connection = m_database.getHandle();
     m_guard.Install(connection, settings.limits);
     Harden(connection);
@@ -72,10 +73,16 @@ Connection::Connection(const std::string& path, const Settings& settings)
 /// Emptying the log into the file that it belongs to keeps both databases whole. A file that kept its name
 /// and was damaged gets its rows, too, for the same reason.
 Connection::~Connection() {
+    RollBack();
     if (!HasLostItsName())
         return;
     sqlite3_busy_timeout(m_database.getHandle(), 0); // a reader that stays is no reason to wait here
     sqlite3_wal_checkpoint_v2(m_database.getHandle(), "main", SQLITE_CHECKPOINT_TRUNCATE, nullptr, nullptr);
+}
+
+void Connection::RollBack() noexcept {
+    if (InTransaction())
+        sqlite3_exec(m_database.getHandle(), "rollback", nullptr, nullptr, nullptr);
 }
 
 bool Connection::IsInPlace() {

@@ -1,9 +1,11 @@
 #pragma once
 
+#include <chrono>
 #include <string>
 
 #include <SQLiteCpp/Database.h>
 
+#include "Modules/OrvekSqlite/OtherUsers.h"
 #include "Modules/OrvekSqlite/Settings.h"
 #include "Modules/OrvekSqlite/Statement.h"
 #include "Modules/OrvekSqlite/StatementGuard.h"
@@ -13,8 +15,8 @@ namespace OrvekSqlite {
 /// An open database file: write-ahead log, guarded statements, and files that only their owner can read.
 ///
 /// After a statement outside a transaction returned, its effect survives the end of the process, kill -9
-/// included. Power loss may take the last moments' rows, never the database: that is what synchronous NORMAL
-/// means with a write-ahead log, and it costs no sync per row.
+/// included; the effect of one inside does after Commit. Power loss may take the last moments' rows, never
+/// the database: that is what synchronous NORMAL means with a write-ahead log, and it costs no sync per row.
 ///
 /// Life: opened by the constructor, closed by the destructor. A connection whose file was replaced is of no
 /// use any more and does not heal: the owner drops it and opens the path again.
@@ -32,8 +34,26 @@ public:
         return Statement(m_database.getHandle(), m_guard, sql, permission);
     }
 
-    /// For the transactions of the plug-in itself.
-    SQLite::Database& Handle() { return m_database; }
+    /// Takes the write lock at once: a transaction that began by reading could not wait for it.
+    void Begin() { m_database.exec("begin immediate"); }
+
+    /// Once it returned, the transaction survives the end of the process. When it throws, nothing of the
+    /// transaction is stored, but the transaction may still be open.
+    void Commit() { m_database.exec("commit"); }
+
+    /// Ends the transaction, if there is one, without its effect.
+    void RollBack() noexcept;
+
+    /// SQLite's own word: some errors of a statement end the transaction around it.
+    bool InTransaction() const { return sqlite3_get_autocommit(m_database.getHandle()) == 0; }
+
+    /// How long statements wait for the lock of another connection from here on.
+    void WaitForLocks(std::chrono::milliseconds patience) {
+        sqlite3_busy_timeout(m_database.getHandle(), static_cast<int>(patience.count()));
+    }
+
+    /// Whether another process has the database open, be it to write or to read.
+    bool IsShared() { return m_others.Exist(); }
 
     /// Whether the path still leads to the file that is open here, and that is still a database. Asked after
     /// each operation: a row that was written to a file which has no name any more is lost, and only looking
@@ -46,6 +66,7 @@ private:
 
     StatementGuard m_guard; ///< outlives the connection that calls it
     SQLite::Database m_database;
+    OtherUsers m_others;
 };
 
 } // namespace OrvekSqlite

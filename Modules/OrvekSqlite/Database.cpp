@@ -1,41 +1,12 @@
 #include "Modules/OrvekSqlite/Database.h"
 
-#include <filesystem>
 #include <limits>
 #include <new>
 
 #include <SQLiteCpp/Exception.h>
-#include <SQLiteCpp/Transaction.h>
 
 namespace OrvekSqlite {
 namespace {
-
-/// Errors that are the open file's rather than the statement's: another look at the path may be the remedy.
-bool IsAboutTheFile(int code) {
-    switch (code & 0xff) {
-    case SQLITE_READONLY:
-    case SQLITE_IOERR:
-    case SQLITE_CORRUPT:
-    case SQLITE_CANTOPEN:
-    case SQLITE_PROTOCOL:
-    case SQLITE_NOTADB:
-        return true;
-    default:
-        return false;
-    }
-}
-
-/// A file that is replaced again while it is opened anew is somebody's busy script; one that is replaced each
-/// time is no store.
-constexpr int MAX_ATTEMPTS = 3;
-
-/// A later change of the working directory must not lead to another file, and no name is special to SQLite
-/// (":memory:") once it starts with a slash. An empty path stays empty.
-std::string AsAbsolute(const std::string& path) {
-    std::error_code error;
-    const auto absolute = std::filesystem::absolute(path, error);
-    return error ? path : absolute.string();
-}
 
 std::vector<std::string> CellsOf(const Statement& statement) {
     std::vector<std::string> cells;
@@ -57,33 +28,65 @@ int NumberIn(Statement& statement) {
 
 } // namespace
 
+/// One operation's time inside: the lock, and which thread has it.
+class Database::Entry {
+public:
+    explicit Entry(Database& database) : m_lock(database.m_mutex), m_database(database) {
+        m_database.m_inside = m_database.m_lastInside = std::this_thread::get_id();
+    }
+    ~Entry() { m_database.m_inside = std::thread::id(); }
+
+    Entry(const Entry&) = delete;
+    Entry& operator=(const Entry&) = delete;
+
+private:
+    std::lock_guard<std::mutex> m_lock;
+    Database& m_database;
+};
+
 bool Database::Open(const std::string& path) {
-    m_connection.reset();
-    m_path = AsAbsolute(path);
-    return Run([](Connection&) {});
+    const Entry entry(*this);
+    // What the old file did not take goes to the new one: it was accepted, and this is the store from now on.
+    Report([&] { m_group.Commit(); });
+    m_file.Set(path);
+    return Report([&] { m_file.Run([](Connection&) {}); });
 }
 
 bool Database::CreateTable(const std::string& sql) {
-    return Run([&](Connection& connection) { connection.Prepare(sql, Permission::CreateTable).Execute(); });
+    const Entry entry(*this);
+    // Kept statements go first, but may wait for this very table.
+    Report([&] { m_group.Commit(); });
+    return Report([&] {
+        m_file.Run(
+            [&](Connection& connection) { connection.Prepare(sql, Permission::CreateTable).Execute(); });
+    });
 }
 
 bool Database::ExecSql(const std::string& sql) {
-    return Run([&](Connection& connection) { connection.Prepare(sql, Permission::Write).Execute(); });
+    const Entry entry(*this);
+    const bool done = Report([&] { m_group.Execute(sql); });
+    if (done)
+        m_committer.Notice();
+    return done;
 }
 
 bool Database::BatExecSql(const std::vector<std::string>& sqls) {
-    return Run([&](Connection& connection) {
-        // The write lock first: a batch that began by reading could not wait for it.
-        SQLite::Transaction transaction(connection.Handle(), SQLite::TransactionBehavior::IMMEDIATE);
-        for (const auto& sql : sqls)
-            connection.Prepare(sql, Permission::Write).Execute();
-        transaction.commit();
+    return RunAfterCommit([&](Connection& connection) {
+        connection.Begin();
+        try {
+            for (const auto& sql : sqls)
+                connection.Prepare(sql, Permission::Write).Execute();
+            connection.Commit();
+        } catch (...) {
+            connection.RollBack();
+            throw;
+        }
     });
 }
 
 bool Database::QuerySql(const std::string& sql, std::vector<std::vector<std::string>>& rows) {
     const auto before = rows.size();
-    const bool done = Run([&](Connection& connection) {
+    const bool done = RunAfterCommit([&](Connection& connection) {
         rows.resize(before);
         auto statement = connection.Prepare(sql, Permission::Read);
         while (statement.NextRow())
@@ -95,17 +98,47 @@ bool Database::QuerySql(const std::string& sql, std::vector<std::vector<std::str
 }
 
 bool Database::GetTotalCount(const std::string& sql, int& count) {
-    return Run([&](Connection& connection) {
+    return RunAfterCommit([&](Connection& connection) {
         auto statement = connection.Prepare(sql, Permission::Read);
         count = NumberIn(statement);
     });
 }
 
+std::string Database::GetLastErrorMsg() {
+    const Entry entry(*this);
+    return m_lastError;
+}
+
+bool Database::Finish() {
+    if (m_inside == std::this_thread::get_id() || m_committer.IsThisThread())
+        return false; // the thread that crashed in here is not coming back
+    const bool isOwnersThread =
+        m_lastInside == std::thread::id() || m_lastInside == std::this_thread::get_id();
+    if (!LockBefore(Clock::now() + m_settings.group.farewell))
+        return false;
+    m_file.WaitForLocks(std::chrono::milliseconds(0));
+    Report([&] { m_group.Commit(); });
+    m_file.Close();
+    m_isFinished = true;
+    m_mutex.unlock();
+    m_committer.Stop();
+    return isOwnersThread;
+}
+bool Database::RunAfterCommit(const OpenFile::Operation& operation) {
+    const Entry entry(*this);
+    return Report([&] {
+        m_group.Commit();
+        m_file.Run(operation);
+    });
+}
+
 /// The one place where failures become texts.
-template <typename Operation>
-bool Database::Run(Operation operation) {
+template <typename Action>
+bool Database::Report(Action action) {
     try {
-        RunOnTheFileInPlace(operation);
+        if (m_isFinished)
+            throw SQLite::Exception("the database object is destroyed", SQLITE_MISUSE);
+        action();
         return true;
     } catch (const std::bad_alloc&) {
         m_lastError = "out of memory"; // short enough to need none itself
@@ -115,36 +148,15 @@ bool Database::Run(Operation operation) {
     return false;
 }
 
-/// Runs the operation, and once more on a new connection when the old one turns out to have lost its file. A
-/// connection that was opened for this very operation and fails has nothing newer to offer.
-template <typename Operation>
-void Database::RunOnTheFileInPlace(Operation operation) {
-    for (int attempt = 0; attempt < MAX_ATTEMPTS; ++attempt) {
-        const bool isNew = !m_connection;
-        if (isNew)
-            Connect();
-        try {
-            operation(*m_connection);
-            if (m_connection->IsInPlace())
-                return;
-        } catch (const SQLite::Exception& error) {
-            if (!IsAboutTheFile(error.getErrorCode()) && m_connection->IsInPlace())
-                throw;
-            if (isNew) {
-                m_connection.reset();
-                throw;
-            }
-        }
-        m_connection.reset();
+/// By looking again and again: a mutex that can be waited for with a deadline is a slower one, and this is
+/// once in an object's life.
+bool Database::LockBefore(Clock::time_point deadline) {
+    while (!m_mutex.try_lock()) {
+        if (Clock::now() > deadline)
+            return false;
+        std::this_thread::sleep_for(std::chrono::milliseconds(1));
     }
-    throw SQLite::Exception("the database file is being replaced again and again", SQLITE_CANTOPEN);
-}
-
-void Database::Connect() {
-    // SQLite would take an empty name for a database in memory, and a zero byte for the end of the name.
-    if (m_path.empty() || m_path.find('\0') != std::string::npos)
-        throw SQLite::Exception(sqlite3_errstr(SQLITE_CANTOPEN), SQLITE_CANTOPEN);
-    m_connection = std::make_unique<Connection>(m_path, m_settings);
+    return true;
 }
 
 } // namespace OrvekSqlite

@@ -1,10 +1,14 @@
 #pragma once
 
-#include <memory>
+#include <atomic>
+#include <mutex>
 #include <string>
+#include <thread>
 #include <vector>
 
-#include "Modules/OrvekSqlite/Connection.h"
+#include "Modules/OrvekSqlite/Committer.h"
+#include "Modules/OrvekSqlite/Group.h"
+#include "Modules/OrvekSqlite/OpenFile.h"
 #include "Modules/OrvekSqlite/Settings.h"
 #include "Plugin/ISqliteDatabase.h"
 
@@ -12,23 +16,43 @@ namespace OrvekSqlite {
 
 /// The plug-in's object: one database file, opened when it can be and again when it must be.
 ///
-/// Threads: one at a time.
+/// Threads: operations one at a time, as the interface says; a second thread would wait. The object has a
+/// thread of its own, the committer, from the first burst on.
 ///
-/// Durability: after ExecSql, CreateTable or BatExecSql returned true, its effect survives the end of the
-/// process, kill -9 included. BatExecSql is one transaction: all of its statements or none.
+/// Durability, of ExecSql: a statement that comes alone (nothing for 10 ms before it) is committed when
+/// ExecSql returns. In a burst, statements share a transaction that is committed after at most 10 ms or 1,000
+/// statements (or 4 MiB of their texts), by the committer when nothing follows. A statement's own error is
+/// its own result, and leaves the others of the transaction alone. Every other operation commits first, and
+/// so does destruction; after CreateTable or BatExecSql returned true, its effect is committed too.
+/// BatExecSql is one transaction: all of its statements or none.
+///
+/// What is committed survives the end of the process, kill -9 included, which so loses at most the last 10 ms
+/// of a burst. A commit that fails loses nothing: the group's statements are kept and committed, in order,
+/// once the database takes them, by the committer if nothing follows; new statements fail with the error text
+/// meanwhile, at once but for one in a tenth of a second, which tries. Kept are the group's texts, 5 MiB at
+/// most; they end with the process.
+///
+/// Other programs: the write lock is free between groups. When another process has the file open, it stays
+/// free for as long as the group held it, so that the other gets its turn. Another program's lock is waited
+/// for by the thread that calls, for Settings::busyTimeout; what calls for that long keeps its queue. The
+/// committer does not wait, so it never keeps a caller waiting.
 ///
 /// Failure: no operation throws. Each that returns false leaves its reason for GetLastErrorMsg, in SQLite's
 /// own words when SQLite refused, in the guard's when the plug-in did ("not authorized: ..."). A failure
 /// never deletes, replaces or creates the database file.
 ///
 /// A file that is missing, damaged, read-only or replaced: every operation looks anew, so it works again as
-/// soon as the file does, without a restart. A row that was written while the file lost its name is written
-/// once more into the file that took its place.
+/// soon as the file does, without a restart; within a burst every group looks. Statements that are not
+/// committed when the file loses its name go to the file that takes its place; those that are committed are
+/// the old file's and are not repeated there, but for a group in whose very commit the file was replaced.
 ///
 /// What the statements may do stands in StatementGuard.h and Settings.h.
 class Database final : public ISqliteDatabase {
 public:
     explicit Database(Settings settings = {}) : m_settings(settings) {}
+
+    /// Finish must have been called.
+    ~Database() = default;
 
     /// Remembers `path` for all later operations, also when it cannot be opened now. An object that has
     /// another file open lets go of it.
@@ -50,19 +74,34 @@ public:
     bool GetTotalCount(const std::string& sql, int& count) override;
 
     /// Empty before the first failure.
-    std::string GetLastErrorMsg() override { return m_lastError; }
+    std::string GetLastErrorMsg() override;
+
+    /// The end: commits what is kept, without waiting for another process's lock, stops the committer and
+    /// closes the file. May be called from an exit handler on any thread, also from within an operation that
+    /// crashed, and takes a fifth of a second at most; when an operation does not end in that time, a crash
+    /// may cost the last 10 ms of a burst.
+    ///
+    /// False: another thread may still be in an operation, or come back with the next. Then the object must
+    /// stay where it is, and the code too; operations fail from here on.
+    [[nodiscard]] bool Finish();
 
 private:
-    template <typename Operation>
-    bool Run(Operation operation);
-    template <typename Operation>
-    void RunOnTheFileInPlace(Operation operation);
-    void Connect();
+    class Entry;
 
-    Settings m_settings;
-    std::string m_path;
-    std::unique_ptr<Connection> m_connection; ///< null: to be opened by the next operation
+    bool RunAfterCommit(const OpenFile::Operation& operation);
+    template <typename Action>
+    bool Report(Action action);
+    bool LockBefore(Clock::time_point deadline);
+
+    const Settings m_settings;
+    std::mutex m_mutex; ///< guards all below but the two thread ids; held throughout an operation
+    OpenFile m_file{m_settings};
+    Group m_group{m_file, m_settings.group};
     std::string m_lastError;
+    bool m_isFinished = false;
+    std::atomic<std::thread::id> m_inside;     ///< the thread in an operation, if one is
+    std::atomic<std::thread::id> m_lastInside; ///< the thread of the operation before
+    Committer m_committer{m_mutex, m_group, m_file};
 };
 
 } // namespace OrvekSqlite

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <chrono>
+#include <cstddef>
 #include <cstdint>
 
 namespace OrvekSqlite {
@@ -37,6 +38,38 @@ struct Limits {
     std::int64_t statementSteps = 100'000'000;
 };
 
+/// When statements share a transaction, and for how long. A commit of its own costs a statement three times
+/// what the statement does.
+struct GroupSettings {
+    /// A statement that comes after this long without one is alone, and committed when it returns. So a
+    /// person's click is as safe as ever, and more than a hundred statements a second are a burst.
+    std::chrono::milliseconds quiet{10};
+
+    /// How long a group stays open. What a kill may cost is 10 milliseconds; two of them are left for the
+    /// committer to wake up and for the commit itself.
+    std::chrono::milliseconds span{8};
+
+    /// Statements in a group. From a hundred to ten thousand the cost of one is nearly the same, so the least
+    /// that is surely enough.
+    std::size_t statements = 1000;
+
+    /// Bytes of the texts that are kept until the commit, for running them again. A group passes it by one
+    /// statement at most, so that with the longest statement it is 5 MiB. Usual groups have 0.4 MB.
+    std::size_t bytes = 4'194'304;
+
+    /// How often a group that could not be committed is tried again. Somebody made room on the disk or ended
+    /// a transaction: a person does not notice a tenth of a second, and ten tries a second cost nothing.
+    std::chrono::milliseconds retry{100};
+
+    /// The longest that the lock is left free for others after a group. They get as long as the group had it;
+    /// a group that was held up for seconds need not be made up for.
+    std::chrono::milliseconds longestPause{10};
+
+    /// How long the object's end waits for an operation on another thread. A process that exits after a crash
+    /// must be gone within a second, and the operation may be one that never ends.
+    std::chrono::milliseconds farewell{200};
+};
+
 /// How the database is opened.
 struct Settings {
     /// How long a statement waits for another process's write lock before it fails. A backup or a person's
@@ -49,6 +82,7 @@ struct Settings {
     std::int64_t journalBytes = 16'777'216;
 
     Limits limits;
+    GroupSettings group;
 };
 
 } // namespace OrvekSqlite

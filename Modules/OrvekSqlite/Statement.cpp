@@ -1,6 +1,7 @@
 #include "Modules/OrvekSqlite/Statement.h"
 
 #include <new>
+#include <string_view>
 
 #include <SQLiteCpp/Exception.h>
 
@@ -93,6 +94,10 @@ std::string Statement::Text(int column) const {
 void Statement::Fail(int code) const {
     if (m_guard.Refusal() != nullptr)
         throw SQLite::Exception(m_guard.Refusal(), code);
+    // Stopped by the guard when it begins to attach its copy, or before that by a transaction around it: what
+    // a statement is told must not depend on whether others came just before.
+    if (std::string_view(sqlite3_errmsg(m_connection)).starts_with("cannot VACUUM"))
+        throw SQLite::Exception("not authorized: VACUUM", SQLITE_AUTH);
     throw SQLite::Exception(m_connection, code);
 }
 

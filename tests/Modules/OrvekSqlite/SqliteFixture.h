@@ -50,9 +50,11 @@ protected:
                "')";
     }
 
-    /// The first cell that a query of the test's own connection returns; empty for NULL.
+    /// The first cell that a query of the test's own connection returns; empty for NULL. Asked with the write
+    /// lock, so that a group of statements that is open is committed before.
     static std::string Ask(const std::string& path, const std::string& query) {
         SQLite::Database database(path, SQLite::OPEN_READWRITE, 5000);
+        database.exec("begin immediate");
         SQLite::Statement statement(database, query);
         return statement.executeStep() ? statement.getColumn(0).getString() : "(no row)";
     }

@@ -1,0 +1,60 @@
+#pragma once
+
+#include <optional>
+#include <string>
+
+#include "Modules/OrvekSqlite/GroupPolicy.h"
+#include "Modules/OrvekSqlite/KeptStatements.h"
+#include "Modules/OrvekSqlite/OpenFile.h"
+#include "Modules/OrvekSqlite/Settings.h"
+
+namespace OrvekSqlite {
+
+/// Runs single statements, and lets those of a burst share a transaction.
+///
+///     nothing kept ── a statement in a burst ──→ open ── commit ──→ nothing kept
+///                                                 │                      ↑
+///                                                 └─ failure ──→ owed ───┘ run again and committed
+///
+/// Open: the write lock is ours, and the transaction holds the effect of every statement kept. Owed: no
+/// transaction, the lock is free, and the kept statements wait for the database to take them. Which of the
+/// two it is, SQLite says (OpenFile::InTransaction): it ends a transaction by itself on some errors.
+///
+/// Threads: one at a time.
+/// Failure: throws; a statement that was accepted is kept until it is committed.
+class Group {
+public:
+    Group(OpenFile& file, const GroupSettings& settings) : m_file(file), m_policy(settings) {}
+
+    /// Runs one statement. Alone, it is committed when this returns. In a burst it joins a group, and is
+    /// committed with it; should that fail, it is run again. Its own error is thrown and leaves the group as
+    /// it was. While a group is owed, this throws the reason, but for one try every GroupSettings::retry.
+    void Execute(const std::string& sql);
+
+    /// Commits what is kept, if anything.
+    void Commit();
+
+    /// When Commit is to be called; nothing while nothing is kept.
+    std::optional<Clock::time_point> Due() const;
+
+private:
+    void ExecuteAlone(const std::string& sql);
+    void ExecuteInGroup(const std::string& sql);
+    void RefuseWhileOwed();
+    void Open(Connection& connection);
+    void RunAgain(Connection& connection);
+    void TryToCommit() noexcept;
+    void LeaveTheLockToOthers();
+    bool IsOwed() const { return !m_kept.IsEmpty() && !m_file.InTransaction(); }
+
+    OpenFile& m_file;
+    const GroupPolicy m_policy;
+    KeptStatements m_kept; ///< accepted, and not known to be committed
+    Clock::time_point m_began;
+    std::optional<Clock::time_point> m_last; ///< end of the statement before
+    Clock::time_point m_freeUntil;           ///< others may have the lock until then
+    Clock::time_point m_lastTry;             ///< to commit, which failed with m_failure
+    std::string m_failure;
+};
+
+} // namespace OrvekSqlite
