@@ -89,6 +89,11 @@ bool Connection::IsInPlace() {
     return !HasLostItsName() && HasDatabaseHeader();
 }
 
+void Connection::RequireInPlace() {
+    if (!IsInPlace())
+        throw SQLite::Exception(sqlite3_errstr(SQLITE_CANTOPEN), SQLITE_CANTOPEN);
+}
+
 bool Connection::HasLostItsName() {
     int moved = 0;
     sqlite3_file_control(m_database.getHandle(), "main", SQLITE_FCNTL_HAS_MOVED, &moved);

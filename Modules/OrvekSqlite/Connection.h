@@ -60,6 +60,10 @@ public:
     /// afterwards tells. Costs a stat and a read of 16 bytes, about a microsecond.
     bool IsInPlace();
 
+    /// Throws when not. Asked before what could not be undone: what is not in the old file need not be in
+    /// both.
+    void RequireInPlace();
+
 private:
     bool HasLostItsName();
     bool HasDatabaseHeader();

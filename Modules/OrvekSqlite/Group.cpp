@@ -22,7 +22,10 @@ void Group::Execute(const std::string& sql) {
 
 void Group::ExecuteAlone(const std::string& sql) {
     Commit();
-    m_file.Run([&](Connection& connection) { connection.Prepare(sql, Permission::Write).Execute(); });
+    m_file.Run([&](Connection& connection) {
+        connection.RequireInPlace();
+        connection.Prepare(sql, Permission::Write).Execute();
+    });
 }
 
 void Group::ExecuteInGroup(const std::string& sql) {
@@ -58,9 +61,7 @@ void Group::Commit() {
     try {
         m_file.Run([&](Connection& connection) {
             Open(connection);
-            // Looked for before the commit, too: what is not in the old file need not be in both.
-            if (!connection.IsInPlace())
-                throw SQLite::Exception(sqlite3_errstr(SQLITE_CANTOPEN), SQLITE_CANTOPEN);
+            connection.RequireInPlace();
             connection.Commit();
         });
     } catch (const std::exception& error) {

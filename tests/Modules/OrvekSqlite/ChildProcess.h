@@ -1,10 +1,14 @@
 #pragma once
 
+#include <chrono>
 #include <csignal>
 #include <functional>
+#include <optional>
 
 #include <sys/wait.h>
 #include <unistd.h>
+
+#include "tests/support/WaitUntil.h"
 
 /// A second process that runs a function of the test. Started before this process opens the database: SQLite
 /// does not survive a fork.
@@ -38,6 +42,21 @@ public:
     bool WaitUntilItTold() {
         char mark = 0;
         return ::read(m_signal, &mark, 1) == 1;
+    }
+
+    /// Ends the child as kill -9 does; its wait status.
+    int Kill() {
+        ::kill(m_id, SIGKILL);
+        return Wait();
+    }
+
+    /// The child's wait status, if it ends before the deadline.
+    std::optional<int> WaitFor(std::chrono::milliseconds deadline) {
+        int status = -1;
+        if (!WaitUntil([&] { return ::waitpid(m_id, &status, WNOHANG) == m_id; }, deadline))
+            return std::nullopt;
+        m_id = -1;
+        return status;
     }
 
     /// The child's wait status.

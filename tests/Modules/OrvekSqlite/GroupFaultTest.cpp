@@ -1,0 +1,216 @@
+#include <chrono>
+#include <csignal>
+#include <filesystem>
+#include <functional>
+
+#include <sqlite3.h>
+#include <sys/resource.h>
+
+#include "tests/Modules/OrvekSqlite/SqliteFixture.h"
+#include "tests/support/WaitUntil.h"
+
+// What becomes of a group whose commit fails.
+namespace {
+
+namespace fs = std::filesystem;
+using namespace std::chrono_literals;
+
+class OwedGroup : public SqliteFixture {
+protected:
+    void SetUp() override {
+        SqliteFixture::SetUp();
+        ::signal(SIGXFSZ, SIG_IGN); // the write fails instead
+        ::getrlimit(RLIMIT_FSIZE, &m_unlimited);
+        MakeStore(Store());
+        ASSERT_TRUE(Plugin()->Open(Store())) << Error();
+    }
+
+    void TearDown() override { ::setrlimit(RLIMIT_FSIZE, &m_unlimited); }
+
+    bool Exec(const std::string& sql) { return Plugin()->ExecSql(sql); }
+    std::string Error() { return Plugin()->GetLastErrorMsg(); }
+
+    /// No file can grow from here on. A write then fails in this process as it does on a full disk.
+    void MakeFilesFull() {
+        auto full = m_unlimited;
+        full.rlim_cur = 1;
+        ASSERT_EQ(::setrlimit(RLIMIT_FSIZE, &full), 0);
+    }
+
+    void MakeRoom() { ASSERT_EQ(::setrlimit(RLIMIT_FSIZE, &m_unlimited), 0); }
+
+    /// Runs numbered statements until one is refused; returns how many were accepted.
+    int ExecUntilRefused(int first = 0) {
+        int next = first;
+        EXPECT_TRUE(WaitUntil([&] {
+            for (int i = 0; i < 100; ++i, ++next)
+                if (!Exec(Insert(std::to_string(next))))
+                    return true;
+            return false;
+        }));
+        return next;
+    }
+
+    static std::string AllUpTo(int count) {
+        std::string all;
+        for (int i = 0; i < count; ++i)
+            all += std::to_string(i) + ",";
+        return all;
+    }
+
+    static std::string All(const std::string& path) {
+        return Ask(path, "select group_concat(eventID || ',', '') from (select * from OperLog order by id)");
+    }
+
+    bool WaitForAllUpTo(int count) {
+        return WaitUntil([&] { return All(Store()) == AllUpTo(count); });
+    }
+
+    /// A group that could not be committed because the disk was full.
+    int OweAGroup() {
+        EXPECT_TRUE(Exec(Insert("0"))) << Error();
+        MakeFilesFull();
+        const int accepted = ExecUntilRefused(1);
+        EXPECT_GT(accepted, 1);
+        return accepted;
+    }
+
+private:
+    rlimit m_unlimited{};
+};
+
+TEST_F(OwedGroup, IsCommittedInItsOrderByItselfOnceThereIsRoom) {
+    const int accepted = OweAGroup();
+    EXPECT_NE(Error(), "");
+    MakeRoom();
+    EXPECT_TRUE(WaitForAllUpTo(accepted)) << All(Store());
+    EXPECT_EQ(Ask(Store(), "pragma integrity_check"), "ok");
+}
+
+TEST_F(OwedGroup, HasNewStatementsFailWithItsErrorAndAtOnce) {
+    OweAGroup();
+    const auto error = Error();
+    EXPECT_TRUE(error == "disk I/O error" || error == "database or disk is full") << error;
+    const auto start = std::chrono::steady_clock::now();
+    for (int i = 0; i < 5000; ++i) {
+        ASSERT_FALSE(Exec(Insert("refused")));
+        ASSERT_EQ(Error(), error);
+    }
+    EXPECT_LT(std::chrono::steady_clock::now() - start, 2s);
+    MakeRoom();
+}
+
+TEST_F(OwedGroup, GoesBeforeTheStatementsThatFollow) {
+    const int accepted = OweAGroup();
+    MakeRoom();
+    ASSERT_TRUE(WaitUntil([&] { return Exec(Insert(std::to_string(accepted))); }));
+    EXPECT_TRUE(WaitForAllUpTo(accepted + 1)) << All(Store());
+}
+
+TEST_F(OwedGroup, LeavesTheLockToOthers) {
+    SQLite::Database other(Store(), SQLite::OPEN_READWRITE);
+    other.exec("begin immediate; rollback"); // has all its files open before they are full
+    const int accepted = OweAGroup();
+    EXPECT_TRUE(WaitUntil([&] { // between two tries of the plug-in, each of which takes the lock
+        return sqlite3_exec(other.getHandle(), "begin immediate; rollback", nullptr, nullptr, nullptr) ==
+               SQLITE_OK;
+    }));
+    EXPECT_EQ(other.execAndGet("select count(*) from OperLog").getInt(), 1) << "more than the lone one";
+    MakeRoom();
+    EXPECT_TRUE(WaitForAllUpTo(accepted));
+}
+
+TEST_F(OwedGroup, LosesOnlyTheStatementThatAConstraintRefusesWhenItIsRunAgain) {
+    SQLite::Database other(Store(), SQLite::OPEN_READWRITE, 5000);
+    other.exec("begin immediate; rollback");
+    const int accepted = OweAGroup();
+    other.exec("begin immediate");
+    MakeRoom();
+    other.exec("create trigger t before insert on OperLog when new.eventID = '1' begin"
+               " select raise(rollback, 'not that one'); end; commit");
+    EXPECT_TRUE(WaitUntil([&] { return Rows(Store()) == std::to_string(accepted - 1); })) << All(Store());
+    EXPECT_EQ("0,1," + All(Store()).substr(2), AllUpTo(accepted));
+}
+
+TEST_F(OwedGroup, FailsTheOperationsThatWouldCommitIt) {
+    const int accepted = OweAGroup();
+    std::vector<std::vector<std::string>> rows;
+    int count = 7;
+    EXPECT_FALSE(Plugin()->QuerySql("select 1", rows));
+    EXPECT_FALSE(Plugin()->GetTotalCount("select 1", count));
+    EXPECT_FALSE(Plugin()->BatExecSql({Insert("x")}));
+    MakeRoom();
+    EXPECT_TRUE(Plugin()->GetTotalCount("select count(*) from OperLog", count)) << Error();
+    EXPECT_EQ(count, accepted);
+    EXPECT_EQ(All(Store()), AllUpTo(accepted));
+}
+
+TEST_F(OwedGroup, SurvivesManyTriesWithoutDoubles) {
+    const int accepted = OweAGroup();
+    int tries = 0;
+    EXPECT_TRUE(WaitUntil([&] {
+        EXPECT_FALSE(Exec(Insert("refused")));
+        return ++tries == 400;
+    }));
+    MakeRoom();
+    EXPECT_TRUE(WaitForAllUpTo(accepted)) << All(Store());
+}
+
+/// A file that changes while a group is open. The group closes by itself after some milliseconds, so the
+/// change may come just after it: the statements until the first refusal are in one of the two files, in
+/// order, and none in both.
+class ChangedFile : public OwedGroup {
+protected:
+    void ReplaceStore() {
+        const auto fresh = Directory() + "/fresh";
+        MakeStore(fresh);
+        fs::rename(fresh, Store());
+    }
+
+    int Burst(int first, int count) {
+        for (int i = first; i < first + count; ++i)
+            EXPECT_TRUE(Exec(Insert(std::to_string(i)))) << Error();
+        return first + count;
+    }
+};
+
+TEST_F(ChangedFile, HandsTheOpenGroupToTheOneThatReplacesIt) {
+    const auto old = Directory() + "/Old.db";
+    int next = Burst(0, 50);
+    fs::create_hard_link(Store(), old); // so that the replaced file can still be looked into
+    MakeStore(Directory() + "/fresh");
+    next = Burst(next, 50);
+    fs::rename(Directory() + "/fresh", Store());
+    next = Burst(next, 50);
+    int count = 0; // makes the plug-in look for its file: the test must not open it beside the old one's log
+    ASSERT_TRUE(Plugin()->GetTotalCount("select count(*) from OperLog", count)) << Error();
+    EXPECT_EQ(All(old) + All(Store()), AllUpTo(next));
+    EXPECT_NE(Rows(Store()), "0");
+    EXPECT_EQ(Ask(Store(), "pragma integrity_check"), "ok");
+}
+
+TEST_F(ChangedFile, KeepsTheOpenGroupUntilADeletedOneIsBack) {
+    const auto old = Directory() + "/Old.db";
+    int next = Burst(0, 20);
+    fs::rename(Store(), old);
+    next = ExecUntilRefused(next);
+    EXPECT_EQ(Error(), "unable to open database file");
+    ReplaceStore();
+    ASSERT_TRUE(WaitUntil([&] { return All(old) + All(Store()) == AllUpTo(next); })) << All(old) << "\n"
+                                                                                     << All(Store());
+}
+
+TEST_F(ChangedFile, GetsTheGroupOnceItsTableIsMade) {
+    const auto old = Directory() + "/Old.db";
+    int next = Burst(0, 20);
+    fs::rename(Store(), old);
+    { SQLite::Database empty(Store(), SQLite::OPEN_READWRITE | SQLite::OPEN_CREATE); }
+    next = ExecUntilRefused(next);
+    EXPECT_EQ(Error(), "no such table: OperLog");
+    (void)Plugin()->CreateTable("create table OperLog (id integer primary key, eventID text, value text,"
+                                " createTime text, pType integer, extData3 text, extData4 text)");
+    ASSERT_TRUE(WaitUntil([&] { return All(old) + All(Store()) == AllUpTo(next); })) << All(old) << "\n"
+                                                                                     << All(Store());
+}
+
+} // namespace

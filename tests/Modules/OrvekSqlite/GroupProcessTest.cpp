@@ -1,0 +1,217 @@
+#include <algorithm>
+#include <atomic>
+#include <chrono>
+#include <csignal>
+#include <random>
+#include <thread>
+
+#include <pthread.h>
+#include <sys/mman.h>
+
+#include "tests/Modules/OrvekSqlite/ChildProcess.h"
+#include "tests/Modules/OrvekSqlite/SqliteFixture.h"
+#include "tests/support/WaitUntil.h"
+
+// Groups and other processes: what a kill costs, how a process ends in the middle of a burst, and whether
+// another program gets its turn.
+namespace {
+
+using namespace std::chrono_literals;
+using Clock = std::chrono::steady_clock; ///< the same in every process of the machine
+
+/// What the machine may add to the ten milliseconds by not running the committer.
+constexpr auto SCHEDULING = 50ms;
+
+/// What a streaming child tells its parent, also when it is killed in the middle.
+struct Progress {
+    static constexpr std::size_t MAX = 1'000'000;
+    std::atomic<std::size_t> returned;         ///< statements whose ExecSql has returned true
+    std::atomic<Clock::duration::rep> at[MAX]; ///< when each did
+    std::atomic<bool> failed;
+};
+
+class GroupAndProcesses : public SqliteFixture {
+protected:
+    void SetUp() override {
+        SqliteFixture::SetUp();
+        MakeStore(Store());
+        void* memory =
+            ::mmap(nullptr, sizeof(Progress), PROT_READ | PROT_WRITE, MAP_SHARED | MAP_ANONYMOUS, -1, 0);
+        ASSERT_NE(memory, MAP_FAILED);
+        m_progress = static_cast<Progress*>(memory);
+    }
+
+    void TearDown() override { ::munmap(m_progress, sizeof(Progress)); }
+
+    /// Stores numbered rows at full speed, in a child, for as long as it lives.
+    void Stream(ISqliteDatabase& database) {
+        const auto first = m_progress->returned.load();
+        for (auto i = first; i < first + Progress::MAX; ++i) {
+            if (!database.ExecSql(Insert(std::to_string(i)))) {
+                m_progress->failed = true;
+                return;
+            }
+            if (i < Progress::MAX)
+                m_progress->at[i] = Clock::now().time_since_epoch().count();
+            m_progress->returned = i + 1;
+        }
+    }
+
+    /// How many statements had returned at that time.
+    std::size_t ReturnedBefore(Clock::time_point time) const {
+        const std::atomic<Clock::duration::rep>* first = m_progress->at;
+        const auto* end = first + std::min(m_progress->returned.load(), Progress::MAX);
+        const auto* later = std::partition_point(
+            first, end, [&](const auto& at) { return at <= time.time_since_epoch().count(); });
+        return static_cast<std::size_t>(later - first);
+    }
+
+    void ForgetProgress() { m_progress->returned = 0; }
+    const Progress& Shared() const { return *m_progress; }
+
+    static bool IsPrefixInOrder(const std::string& path, const std::string& rows) {
+        return Ask(path, "select count(*) from OperLog where eventID = id - 1 and id <= " + rows) == rows;
+    }
+
+    std::mt19937 m_random{20261120};
+
+private:
+    Progress* m_progress = nullptr;
+};
+
+TEST_F(GroupAndProcesses, LoseAtMostTenMillisecondsOfABurstByAKill) {
+    for (int round = 0; round < 20; ++round) {
+        ForgetProgress();
+        ChildProcess writer([&](const auto& tell) {
+            if (!Plugin()->Open(Store()))
+                return 1;
+            tell();
+            Stream(*Plugin());
+            return 2;
+        });
+        ASSERT_TRUE(writer.WaitUntilItTold());
+        const auto life = std::chrono::milliseconds(std::uniform_int_distribution(1, 60)(m_random));
+        const auto start = Clock::now();
+        ASSERT_TRUE(WaitUntil([&] { return Clock::now() - start >= life && Shared().returned > 1; }));
+        const auto killed = Clock::now();
+        const int status = writer.Kill();
+        ASSERT_TRUE(WIFSIGNALED(status) && WTERMSIG(status) == SIGKILL && !Shared().failed);
+
+        const auto rows = Rows(Store());
+        EXPECT_GE(std::stoul(rows), ReturnedBefore(killed - 10ms - SCHEDULING)) << "of " << Shared().returned;
+        EXPECT_LE(std::stoul(rows), Shared().returned + 1);
+        EXPECT_TRUE(IsPrefixInOrder(Store(), rows));
+        EXPECT_EQ(Ask(Store(), "pragma integrity_check"), "ok");
+        SQLite::Database(Store(), SQLite::OPEN_READWRITE).exec("delete from OperLog");
+    }
+}
+
+/// Another program as anybody writes one: SQLite's own busy timeout, one insert after the other.
+TEST_F(GroupAndProcesses, LetAnotherProgramHaveItsTurnUnderConstantLoad) {
+    ChildProcess writer([&](const auto& tell) {
+        if (!Plugin()->Open(Store()))
+            return 1;
+        tell();
+        Stream(*Plugin());
+        return 2;
+    });
+    ASSERT_TRUE(writer.WaitUntilItTold());
+    ASSERT_TRUE(WaitUntil([&] { return Shared().returned > 5000; }));
+
+    SQLite::Database other(Store(), SQLite::OPEN_READWRITE, 5000);
+    std::vector<Clock::duration> waits;
+    const auto before = Shared().returned.load();
+    for (int i = 0; i < 100; ++i) {
+        const auto start = Clock::now();
+        ASSERT_NO_THROW(other.exec("insert into BaseInfo values ('other', '')")) << "number " << i;
+        waits.push_back(Clock::now() - start);
+    }
+    EXPECT_GT(Shared().returned, before) << "nobody else was writing";
+    EXPECT_FALSE(Shared().failed);
+    std::sort(waits.begin(), waits.end());
+    const auto ms = [](auto wait) { return std::chrono::duration<double, std::milli>(wait).count(); };
+    RecordProperty("median_ms", std::to_string(ms(waits[50])));
+    RecordProperty("longest_ms", std::to_string(ms(waits.back())));
+    std::printf("waits for the lock: median %.1f ms, longest %.1f ms\n", ms(waits[50]), ms(waits.back()));
+    EXPECT_LT(waits.back(), 1s);
+    writer.Kill();
+}
+
+/// A program whose plug-in is destroyed by exit, while another thread streams.
+class ProcessThatExits : public GroupAndProcesses {
+protected:
+    static constexpr int ROUNDS = 20;
+
+    /// Runs `end` in a child while another of its threads streams, which `end` is given. The child's status.
+    int StreamAndEnd(const std::function<void(std::thread&)>& end) {
+        ForgetProgress();
+        ChildProcess program([&](const auto& tell) {
+            static Loader loader(PluginPath()); // exit destroys it
+            if (!loader.GetModule()->Open(Store()))
+                return 1;
+            std::thread consumer([&] { Stream(*loader.GetModule()); });
+            tell();
+            const auto rows = std::uniform_int_distribution<std::size_t>(2, 5000)(m_random);
+            if (!WaitUntil([&] { return Shared().returned > rows; }))
+                return 2;
+            end(consumer);
+            consumer.join();
+            return 3;
+        });
+        m_random.discard(1); // the child's copy has drawn
+        EXPECT_TRUE(program.WaitUntilItTold());
+        EXPECT_TRUE(WaitUntil([&] { return Shared().returned > 1; }));
+        const auto status = program.WaitFor(5s);
+        EXPECT_TRUE(status) << "the child hangs";
+        EXPECT_TRUE(IsPrefixInOrder(Store(), Rows(Store())));
+        return status.value_or(-1);
+    }
+};
+
+TEST_F(ProcessThatExits, EndsAtOnceThoughAnotherThreadIsWriting) {
+    for (int round = 0; round < ROUNDS; ++round) {
+        const auto start = Clock::now();
+        const int status = StreamAndEnd([](std::thread&) { std::exit(0); });
+        EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 0) << status;
+        EXPECT_LT(Clock::now() - start, 1s);
+        EXPECT_GE(std::stoul(Rows(Store())) + 1, Shared().returned) << "what had returned was not committed";
+        SQLite::Database(Store(), SQLite::OPEN_READWRITE).exec("delete from OperLog");
+    }
+}
+
+/// The service's crash handler: it exits on the thread that crashed, wherever that was. Should that thread
+/// hold the allocator's lock, no exit handler can run; the service's alarm ends it then.
+void ExitAsTheCrashHandlerDoes(int) {
+    ::alarm(1);
+    std::exit(0);
+}
+
+TEST_F(ProcessThatExits, EndsFromTheCrashHandlerOfTheThreadThatIsWriting) {
+#if defined(__SANITIZE_THREAD__) || defined(__SANITIZE_ADDRESS__)
+    GTEST_SKIP() << "the sanitizer's allocator does not survive an exit out of its middle";
+#endif
+    ::signal(SIGSEGV, ExitAsTheCrashHandlerDoes);
+    int alarms = 0;
+    for (int round = 0; round < ROUNDS; ++round) {
+        const int status =
+            StreamAndEnd([](std::thread& consumer) { ::pthread_kill(consumer.native_handle(), SIGSEGV); });
+        alarms += WIFSIGNALED(status) && WTERMSIG(status) == SIGALRM ? 1 : 0;
+        EXPECT_TRUE(status == 0 || WTERMSIG(status) == SIGALRM) << status;
+        SQLite::Database(Store(), SQLite::OPEN_READWRITE).exec("delete from OperLog");
+    }
+    EXPECT_LE(alarms, ROUNDS / 5);
+}
+
+TEST_F(ProcessThatExits, EndsFromACrashOnAnyOtherThread) {
+#if defined(__SANITIZE_THREAD__) || defined(__SANITIZE_ADDRESS__)
+    GTEST_SKIP() << "the sanitizers have the signal to themselves";
+#endif
+    ::signal(SIGSEGV, ExitAsTheCrashHandlerDoes);
+    for (int round = 0; round < ROUNDS; ++round) {
+        const int status = StreamAndEnd([](std::thread&) { ::raise(SIGSEGV); });
+        EXPECT_EQ(status, 0);
+        SQLite::Database(Store(), SQLite::OPEN_READWRITE).exec("delete from OperLog");
+    }
+}
+
+} // namespace
