@@ -65,6 +65,9 @@ Connection::Connection(const std::string& path, const Settings& settings)
     // The first statement that reads the file: what is no database is found out here.
     m_database.exec("pragma journal_mode = wal");
     m_database.exec("pragma synchronous = normal");
+    // Checkpoints stay SQLite's: one in a thousand pages, which is some 25,000 rows and 25 ms of waiting for
+    // the disk, within the call of the statement whose commit is due. Ten times as many pages saved 3 % of
+    // the thread's time, and cost 40 MB of disk.
     m_database.exec("pragma journal_size_limit = " + std::to_string(settings.journalBytes));
 }
 

@@ -3,10 +3,18 @@
 #include <vector>
 
 #include <dlfcn.h>
+#include <sqlite3.h>
 
 #define SSR_EXPORT __attribute__((visibility("default")))
 
 namespace {
+
+/// SQLite counts the bytes of every allocation, under a mutex of the whole process; nobody reads the count.
+/// Without it a statement costs a quarter less. Possible before the process first uses SQLite; later the call
+/// changes nothing.
+void DoWithoutStatistics() {
+    sqlite3_config(SQLITE_CONFIG_MEMSTATUS, 0);
+}
 
 /// Keeps an object that another thread may still use, and this library with it. Destruction like that comes
 /// once at most: in a process that exits while its other threads go on.
@@ -25,6 +33,7 @@ extern "C" {
 /// A new database object without a file; null when there is no memory for one. An exception could not cross
 /// into a program that expects a C function.
 SSR_EXPORT ISqliteDatabase* CreateModule() {
+    DoWithoutStatistics();
     try {
         return new OrvekSqlite::Database();
     } catch (...) {

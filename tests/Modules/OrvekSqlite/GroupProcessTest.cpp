@@ -149,7 +149,10 @@ protected:
             static Loader loader(PluginPath()); // exit destroys it
             if (!loader.GetModule()->Open(Store()))
                 return 1;
-            std::thread consumer([&] { Stream(*loader.GetModule()); });
+            std::thread consumer([&] {
+                Stream(*loader.GetModule());
+                ::pause(); // a service's thread does not end before its process
+            });
             tell();
             const auto rows = std::uniform_int_distribution<std::size_t>(2, 5000)(m_random);
             if (!WaitUntil([&] { return Shared().returned > rows; }))
