@@ -2,7 +2,7 @@
 #include <cstdint>
 #include <filesystem>
 #include <fstream>
-#include <thread>
+#include <utility>
 
 #include "tests/Modules/OrvekSqlite/SqliteFixture.h"
 #include "tests/support/WaitUntil.h"
@@ -67,8 +67,8 @@ protected:
         return rows;
     }
 
-    /// The commits in the write-ahead log: each ends with a frame that tells the size of the database. The
-    /// test's own connection keeps the log from being emptied meanwhile.
+    /// The commits in the write-ahead log: each ends with a frame that tells the size of the database. Too
+    /// few rows here for SQLite to start the log over.
     int Commits() const {
         std::ifstream log(Store() + "-wal", std::ios::binary);
         const std::string content(std::istreambuf_iterator<char>(log), {});
@@ -78,8 +78,6 @@ protected:
             commits += content.compare(frame + 4, 4, std::string(4, '\0')) != 0 ? 1 : 0;
         return commits;
     }
-
-private:
 };
 
 TEST_F(GroupCommit, HasALoneStatementCommittedWhenExecSqlReturns) {
