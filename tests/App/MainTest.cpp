@@ -5,6 +5,7 @@
 #include <fcntl.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <sys/resource.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -22,7 +23,7 @@ namespace {
 
 class Program {
 public:
-    explicit Program(const char* environment) {
+    explicit Program(const char* environment, rlim_t stackBytes = RLIM_INFINITY) {
         if (::pipe(m_output) != 0)
             throw std::runtime_error("no pipe");
         m_process = ::fork();
@@ -30,6 +31,10 @@ public:
             ::dup2(m_output[1], STDOUT_FILENO);
             ::dup2(m_output[1], STDERR_FILENO);
             ::setenv(environment, "1", 1);
+            if (stackBytes != RLIM_INFINITY) {
+                const rlimit limit{stackBytes, stackBytes};
+                ::setrlimit(RLIMIT_STACK, &limit);
+            }
             const std::string path = SystemTool::IO::Directory::GetExcutableDirectory() + "main_beside_fakes";
             ::execl(path.c_str(), path.c_str(), nullptr);
             ::_exit(127);
@@ -37,8 +42,10 @@ public:
         ::fcntl(m_output[0], F_SETFL, O_NONBLOCK);
     }
     ~Program() {
-        ::kill(m_process, SIGKILL);
-        ::waitpid(m_process, nullptr, 0);
+        if (m_process > 0) {
+            ::kill(m_process, SIGKILL);
+            ::waitpid(m_process, nullptr, 0);
+        }
         ::close(m_output[0]);
         ::close(m_output[1]);
     }
@@ -55,6 +62,20 @@ public:
             return m_text.find(text) != std::string::npos;
         })) << m_text;
         return m_text;
+    }
+
+    bool IsRunning() const {
+        siginfo_t state{};
+        return ::waitid(P_PID, static_cast<id_t>(m_process), &state, WEXITED | WNOHANG | WNOWAIT) == 0 &&
+               state.si_pid == 0;
+    }
+
+    /// The signal that ends it.
+    int AwaitSignal() {
+        int status = 0;
+        ::waitpid(m_process, &status, 0);
+        m_process = -1;
+        return WIFSIGNALED(status) ? WTERMSIG(status) : 0;
     }
 
 private:
@@ -77,4 +98,22 @@ TEST(Main, PrintsARefusedConfigurationAndGoesOn) {
     const std::string line = program.OutputUpTo("\n\n");
     EXPECT_THAT(
         line, MatchesRegex("Error:\\[[-0-9]+ [:0-9]+\\]\\[STL ERR\\] no log \\[BOOST ERR\\] disk full\n\n"));
+}
+
+TEST(Main, CatchesNoOtherExceptionOfTheConfiguration) {
+    Program program("FAKE_LOGGER_BREAKS");
+    EXPECT_EQ(program.AwaitSignal(), SIGABRT);
+}
+
+TEST(Main, StaysWhenTheServerCannotStart) {
+#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
+    GTEST_SKIP() << "the sanitizers' runtimes need threads themselves";
+#endif
+    constexpr rlim_t MORE_THAN_THERE_IS = rlim_t{1}
+                                          << 46; // for the stack of each thread, so that none can start
+    Program program("FAKE_LOGGER_ECHOES", MORE_THAN_THERE_IS);
+    const std::string output = program.OutputUpTo("[App/ReportServer:35 Start]");
+    EXPECT_THAT(output, HasSubstr("Poco exception: ")) << "the receiving thread's, printed";
+    EXPECT_THAT(output, HasSubstr("3 [App/ReportServer:35 Start] tag= Poco exception :"));
+    EXPECT_TRUE(program.IsRunning());
 }

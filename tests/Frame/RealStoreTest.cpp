@@ -55,6 +55,8 @@ protected:
 
     std::vector<Row> Query(const std::string& sql) const {
         SQLite::Database database(File(), SQLite::OPEN_READWRITE, 5000);
+        database.exec(
+            "begin immediate"); // which a burst's rows, committed together, let through once they are there
         SQLite::Statement query(database, sql);
         std::vector<Row> rows;
         while (query.executeStep()) {

@@ -154,14 +154,17 @@ TEST_F(RoadOfAReport, AnAnalyticsValueThatIsNoJsonIsLoggedAndNotForwarded) {
 }
 
 TEST_F(RoadOfAReport, LettersAndKeysDecideAsTheyAreWritten) {
-    Service::Send(R"({"eventID":"a759|1"})");                     // lower case: the store
-    Service::Send(R"({"eventID":""})");                           // empty: the store
-    Service::Send(R"({"other":"eventID"})");                      // mentioned: a report
-    Service::Send(R"({"msgType":"Init","exdata":{"openID":1}})"); // no such kind: nothing
-    Service::Send("");                                            // no bytes: nothing at all
+    Service::Send(R"({"eventID":"a759|1"})");                                     // lower case: the store
+    Service::Send(R"({"eventID":""})");                                           // empty: the store
+    Service::Send(R"({"other":"eventID"})");                                      // mentioned: a report
+    Service::Send(R"({"msgType":"Init","exdata":{"openID":1}})");                 // no such kind: nothing
+    Service::Send("");                                                            // no bytes: nothing at all
+    Service::Send(R"({"msgType":"updateOpenID","exdata":{"openID":"eventID"}})"); // mentioned: a report
     m_service.AwaitQuiet();
-    EXPECT_THAT(m_service.Rows("eventID"), ElementsAre("a759|1", "", ""));
-    EXPECT_EQ(Messages("App/ReportServer:42 Recv").size(), 5U) << "four of these and the marker";
+    EXPECT_THAT(m_service.Rows("eventID,extData4"),
+                ElementsAre("a759|1|visitor", "|visitor", "|visitor", "|visitor"));
+    EXPECT_THAT(Messages("App/ReportServer:111 SetBaseInfo"), IsEmpty());
+    EXPECT_EQ(Messages("App/ReportServer:42 Recv").size(), 6U) << "five of these and the marker";
 }
 
 TEST_F(RoadOfAReport, ADatagramIsCutAtAZeroByteAndAt10240Bytes) {

@@ -6,6 +6,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <sys/stat.h>
+#include <sys/wait.h>
 
 #include "tests/e2e/support/Service.h"
 #include "tests/support/WaitUntil.h"
@@ -75,6 +76,11 @@ TEST_F(StartUp, HoldsThePidFileAndAUmaskOfZero) {
 TEST_F(StartUp, ASecondInstanceIsRefusedAndTheFirstGoesOn) {
     m_service.Install();
     m_service.Start();
+    Service::Send(REPORT);
+    Service::Send(EVENT);
+    Service::Send("no JSON");
+    Service::Send(R"({"eventID":"B1","value":"it's"})");
+    m_service.AwaitQuiet(); // after all of which nothing has dropped the lock
     EXPECT_EQ(m_service.RunAnother(), 1);
     const auto locked = m_service.LogLines("App/MiniDump:318 IsAlreadyRun");
     EXPECT_THAT(MessagesOf(locked),
@@ -120,6 +126,8 @@ TEST_F(StartUp, WithoutTheLoggerItIsSilentAndWorks) {
     EXPECT_EQ(m_service.Output(), outputOfInstallation) << "not even an error";
     EXPECT_FALSE(std::filesystem::exists(m_service.LogFile()));
     EXPECT_EQ(m_service.RunAnother(), 1) << "a second one is refused";
+    m_service.Signal(SIGSEGV);
+    EXPECT_EQ(m_service.AwaitEnd(), 0);
     EXPECT_EQ(m_service.Output(), outputOfInstallation);
 }
 
@@ -182,6 +190,37 @@ TEST_F(StartUp, WithoutThePreferencesDirectoryItEndsWithOne) {
     EXPECT_THAT(MessagesOf(m_service.LogLines("App/MiniDump:304 IsAlreadyRun")),
                 ElementsAre("Open file failed, error : No such file or directory"));
     EXPECT_FALSE(Service::Bound());
+}
+
+TEST_F(StartUp, WithAPidFileThatCannotBeWrittenItEndsWithOne) {
+    m_service.Install();
+    std::filesystem::remove(Service::PID_FILE);
+    std::filesystem::create_symlink("/dev/full", Service::PID_FILE);
+    m_service.Launch();
+    EXPECT_EQ(m_service.AwaitEnd(), 1);
+    EXPECT_THAT(
+        MessagesOf(m_service.LogLines("App/MiniDump:330 IsAlreadyRun")),
+        ElementsAre(
+            "Write file failed, file: /Library/Preferences/hublink/Report.pid, error: No space left on "
+            "device"));
+}
+
+TEST_F(StartUp, OfManyStartedAtOnceOneStays) {
+    m_service.Install();
+    constexpr int MANY = 8;
+    std::vector<pid_t> started;
+    for (int i = 0; i < MANY; ++i)
+        started.push_back(m_service.LaunchAnother());
+    const auto refused = [&] { return m_service.LogLines("App/main:14 main").size(); };
+    EXPECT_TRUE(WaitUntil([&] { return refused() == MANY - 1 && Service::Bound(); }));
+    int running = 0;
+    for (const pid_t process : started) {
+        if (ContentOfPidFile() == std::to_string(process))
+            ++running;
+        ::kill(process, SIGKILL);
+        ::waitpid(process, nullptr, 0);
+    }
+    EXPECT_EQ(running, 1) << "and its id stands in the file";
 }
 
 TEST_F(StartUp, WithoutADatabaseEachReportIsLoggedUntilSetUpHasMadeIt) {

@@ -114,9 +114,13 @@ void Service::Start() {
         throw std::runtime_error("the service neither bound its port nor ended");
 }
 
+pid_t Service::LaunchAnother() const {
+    return Spawn(m_program.Path() + "/" + PROGRAM, {});
+}
+
 int Service::RunAnother() const {
     int status = 0;
-    ::waitpid(Spawn(m_program.Path() + "/" + PROGRAM, {}), &status, 0);
+    ::waitpid(LaunchAnother(), &status, 0);
     return CodeOf(status);
 }
 

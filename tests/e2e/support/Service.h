@@ -50,6 +50,9 @@ public:
     /// Starts a second program beside the first, and gives its exit code; -1 when it was killed by a signal.
     int RunAnother() const;
 
+    /// Starts a second program beside the first and waits for nothing; the caller ends it.
+    pid_t LaunchAnother() const;
+
     bool IsRunning();
 
     /// Sends a signal to the process, or to one of its threads.
