@@ -27,10 +27,11 @@ constexpr std::chrono::milliseconds LOCK_PAUSE{1};
 FileFailure MakeDirectory(const std::string& path) {
     for (std::size_t end = path.find('/', 1);; end = path.find('/', end + 1)) {
         const std::string part = path.substr(0, end);
-        if (mkdir(part.c_str(), DIRECTORY_MODE) == 0)
+        const int refusal = mkdir(part.c_str(), DIRECTORY_MODE) == 0 ? 0 : errno;
+        if (refusal == 0)
             chmod(part.c_str(), DIRECTORY_MODE); // for a umask that takes the owner's own rights away
         else if (struct stat status{}; stat(part.c_str(), &status) != 0)
-            return {errno, "make the directory"};
+            return {refusal, "make the directory"}; // that it is not there either explains nothing
         else if (!S_ISDIR(status.st_mode))
             return {ENOTDIR, "make the directory"};
         if (end == std::string::npos)

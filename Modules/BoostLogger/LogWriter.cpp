@@ -20,8 +20,8 @@ const char* const NO_LINE = "out of memory, or logged by a signal handler inside
 
 constexpr int WARNING = 3;
 
-/// Set while this thread holds the writer's lock. The crash handler logs on the thread that crashed: should
-/// that ever be in here, its records must be lost and not wait for ever.
+/// Set while this thread waits for the writer's lock or holds it. The crash handler logs on the thread that
+/// crashed: should that ever be in here, its records must be lost and not wait for ever.
 thread_local bool t_isInside = false;
 
 struct Inside {
@@ -48,8 +48,8 @@ FileFailure LogWriter::Start() {
 void LogWriter::Append(std::string_view line, TimePoint now) noexcept {
     if (t_isInside)
         return CountLost();
+    const Inside inside; // before the lock: a signal between the two would wait for the lock for ever
     const std::lock_guard lock(m_mutex);
-    const Inside inside;
     try {
         AppendLocked(line, now);
     } catch (...) { // no memory for the list of rotated files

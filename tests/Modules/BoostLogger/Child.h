@@ -3,9 +3,18 @@
 #include <csignal>
 #include <cstdio>
 #include <exception>
+#include <string>
 
 #include <sys/wait.h>
 #include <unistd.h>
+
+/// Rights do not bind root: a scenario about rights runs as another user then, to whom `directory` is given.
+inline bool BecomeOrdinaryUser(const std::string& directory) {
+    constexpr uid_t NOBODY = 65534;
+    if (geteuid() != 0)
+        return true;
+    return chown(directory.c_str(), NOBODY, NOBODY) == 0 && setgid(NOBODY) == 0 && setuid(NOBODY) == 0;
+}
 
 /// A scenario in a process of its own. It ends without running exit handlers, unless it calls exit itself.
 class Child {

@@ -79,6 +79,16 @@ TEST_F(LiveFileTest, LeavesTheModeOfADirectoryThatIsThere) {
     EXPECT_EQ(ModeOf(directory), 0755U);
 }
 
+TEST_F(LiveFileTest, SaysWhyADirectoryCouldNotBeMade) {
+    const std::string parent = m_directory.Path();
+    Child child([&] {
+        return BecomeOrdinaryUser(parent) && chmod(parent.c_str(), 0555) == 0 &&
+               MakeDirectory(parent + "/log/metrik").Text() == "cannot make the directory: Permission denied";
+    });
+    EXPECT_EQ(child.Wait(), 0);
+    chmod(parent.c_str(), 0700); // for whoever removes it
+}
+
 TEST_F(LiveFileTest, IsNoLinkAndNoPipeAndNoDirectory) {
     ASSERT_EQ(symlink("elsewhere", m_path.c_str()), 0);
     EXPECT_EQ(m_file.Open(m_path).error, ELOOP);

@@ -51,14 +51,6 @@ void LimitFileSize(rlim_t bytes) {
     setrlimit(RLIMIT_FSIZE, &limit);
 }
 
-/// Rights do not bind root: a scenario about rights runs as another user then, to whom `directory` is given.
-bool BecomeOrdinaryUser(const std::string& directory) {
-    constexpr uid_t NOBODY = 65534;
-    if (geteuid() != 0)
-        return true;
-    return chown(directory.c_str(), NOBODY, NOBODY) == 0 && setgid(NOBODY) == 0 && setuid(NOBODY) == 0;
-}
-
 } // namespace
 
 TEST_F(LogWriterTest, RotatesBeforeAFileWouldBecomeTooLarge) {
