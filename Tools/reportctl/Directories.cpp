@@ -10,6 +10,9 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include "Tools/reportctl/PidFile.h"
+#include "Tools/reportctl/Quoted.h"
+
 namespace reportctl {
 namespace {
 
@@ -61,35 +64,28 @@ void Make(const fs::path& path, const Kind& kind) {
     MakeOne(path.string(), kind.mode, kind.openFlags);
 }
 
-void Ensure(Worklog& log, const std::string& path, const Kind& kind, const std::string& makeAdvice,
+bool Ensure(Worklog& log, const std::string& path, const Kind& kind, const std::string& makeAdvice,
             const std::string& changeAdvice) {
     const auto thing = fmt::format("directory {} (mode {:04o})", path, kind.mode);
     std::error_code error;
     const bool mayBeLink = (kind.openFlags & O_NOFOLLOW) == 0;
     const auto status = mayBeLink ? fs::status(path, error) : fs::symlink_status(path, error);
     if (status.type() == fs::file_type::not_found)
-        log.Do(
+        return log.Do(
             MAKE, thing, [&] { Make(path, kind); }, makeAdvice);
-    else if (status.type() == fs::file_type::none)
+    if (status.type() == fs::file_type::none) {
         log.Fail(fmt::format("Cannot look at {}: {}.", path, error.message()));
-    else if (!fs::is_directory(status))
+        return false;
+    }
+    if (!fs::is_directory(status)) {
         log.Fail(fmt::format("{} is not a directory. Move it away and run this again.", path));
-    else if (static_cast<mode_t>(status.permissions()) != kind.mode)
-        log.Do(
+        return false;
+    }
+    if (static_cast<mode_t>(status.permissions()) != kind.mode)
+        return log.Do(
             CHANGE, thing, [&] { SetMode(path, kind.mode, kind.openFlags); }, changeAdvice);
-    else
-        log.Keep(thing);
-}
-
-/// The path as a shell takes it.
-std::string Quoted(const std::string& path) {
-    if (path.find_first_not_of("/._-0123456789ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz") ==
-        std::string::npos)
-        return path;
-    std::string quoted = "'";
-    for (const char c : path)
-        quoted += c == '\'' ? "'\\''" : std::string(1, c);
-    return quoted + "'";
+    log.Keep(thing);
+    return true;
 }
 
 } // namespace
@@ -99,9 +95,10 @@ void EnsurePrivateDirectory(Worklog& log, const std::string& path) {
            fmt::format("Run: sudo chown \"$(id -u)\" {}, then this again.", Quoted(path)));
 }
 
-void EnsureSharedDirectory(Worklog& log, const std::string& path) {
-    Ensure(log, path, SHARED, fmt::format("Run: sudo install -d -m 1777 {}", Quoted(path)),
-           fmt::format("Run: sudo chmod 1777 {}", Quoted(path)));
+bool EnsureSharedDirectory(Worklog& log, const std::string& path) {
+    return Ensure(log, path, SHARED,
+                  fmt::format("Run: sudo install -d -m 1777 {} && {}", Quoted(path), CommandForPidFile(path)),
+                  fmt::format("Run: sudo chmod 1777 {}", Quoted(path)));
 }
 
 } // namespace reportctl

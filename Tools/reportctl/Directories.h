@@ -13,7 +13,7 @@ void EnsurePrivateDirectory(Worklog& log, const std::string& path);
 /// Makes sure of a directory in which every user of the machine may make files and nobody may remove
 /// another's: mode 1777. Its parents are everybody's to read. A symbolic link is refused: whoever could put
 /// one there would choose which directory becomes everybody's. When the right to make it is missing, the
-/// failure tells the command that gives it.
-void EnsureSharedDirectory(Worklog& log, const std::string& path);
+/// failure tells the command that makes it, with the pid file in it. True when it is there, or a dry run would make it.
+bool EnsureSharedDirectory(Worklog& log, const std::string& path);
 
 } // namespace reportctl

@@ -9,6 +9,7 @@
 #include "SystemTool/CommonTool.h"
 #include "Tools/reportctl/BaseInfo.h"
 #include "Tools/reportctl/Directories.h"
+#include "Tools/reportctl/PidFile.h"
 #include "Tools/reportctl/Store.h"
 #include "Tools/reportctl/Worklog.h"
 
@@ -40,7 +41,9 @@ void SetUpUserData(Worklog& log, const SetupOptions& options) {
 
 int RunSetup(const SetupOptions& options) {
     Worklog log(options.dryRun);
-    EnsureSharedDirectory(log, std::filesystem::absolute(options.preferencesDir).string());
+    const auto preferences = std::filesystem::absolute(options.preferencesDir).string();
+    if (EnsureSharedDirectory(log, preferences))
+        EnsurePidFile(log, preferences);
     SetUpUserData(log, options);
     return log.Close() ? 0 : 1;
 }

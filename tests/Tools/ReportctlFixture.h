@@ -30,9 +30,12 @@ protected:
     }
 
     Outcome Reportctl(const std::string& arguments, const std::string& shell = {}) const {
-        const auto command = shell + " XDG_DATA_HOME='" + Data() + "' '" REPORTCTL "' " + arguments + " 2>&1";
+        return Run(shell + " XDG_DATA_HOME='" + Data() + "' '" REPORTCTL "' " + arguments);
+    }
+
+    static Outcome Run(const std::string& command) {
         Outcome outcome;
-        FILE* pipe = ::popen(command.c_str(), "r");
+        FILE* pipe = ::popen((command + " 2>&1").c_str(), "r");
         if (pipe == nullptr)
             return outcome;
         for (int c = std::fgetc(pipe); c != EOF; c = std::fgetc(pipe))

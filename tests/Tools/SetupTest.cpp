@@ -1,3 +1,6 @@
+#include <sys/stat.h>
+#include <unistd.h>
+
 #include "tests/Tools/ReportctlFixture.h"
 
 namespace {
@@ -8,6 +11,8 @@ class Setup : public ReportctlFixture {
 protected:
     void ExpectEverythingMade() const {
         EXPECT_EQ(ModeOf(Preferences()), 01777u);
+        EXPECT_EQ(ModeOf(PidFile()), 0666u);
+        EXPECT_EQ(OwnerOf(PidFile()), OwnerOf(Preferences()));
         for (const auto* directory : {"", "/database", "/log", "/log/metrik"})
             EXPECT_EQ(ModeOf(Data() + "/hublink" + directory), 0700u) << directory;
         EXPECT_EQ(ModeOf(Store()), 0600u);
@@ -16,6 +21,13 @@ protected:
         EXPECT_EQ(Ask("pragma user_version"), "1");
         EXPECT_EQ(Ask("pragma journal_mode"), "wal");
         EXPECT_EQ(Ask("pragma integrity_check"), "ok");
+    }
+
+    std::string PidFile() const { return Preferences() + "/Report.pid"; }
+
+    static uid_t OwnerOf(const std::string& path) {
+        struct stat status {};
+        return ::lstat(path.c_str(), &status) == 0 ? status.st_uid : static_cast<uid_t>(-1);
     }
 
     std::string Files() const {
@@ -30,6 +42,8 @@ TEST_F(Setup, MakesEverythingThatIsMissing) {
     const auto outcome = RunSetup();
     EXPECT_EQ(outcome.exitCode, 0) << outcome.output;
     EXPECT_TRUE(outcome.Says("made directory " + Preferences() + " (mode 1777)\n")) << outcome.output;
+    EXPECT_TRUE(outcome.Says("made pid file " + PidFile() + " (mode 0666)\n")) << outcome.output;
+    EXPECT_EQ(ContentOf(PidFile()), "");
     EXPECT_TRUE(outcome.Says("made store " + Store() + " (mode 0600, schema version 1)\n"));
     ExpectEverythingMade();
     EXPECT_EQ(Files(), "Report.db ");
@@ -62,6 +76,7 @@ TEST_F(Setup, SaysWhatItWouldMakeAndMakesNothing) {
     const auto outcome = RunSetup("--dry-run --open-id u1");
     EXPECT_EQ(outcome.exitCode, 0) << outcome.output;
     EXPECT_TRUE(outcome.Says("would make directory " + Preferences())) << outcome.output;
+    EXPECT_TRUE(outcome.Says("would make pid file " + PidFile())) << outcome.output;
     EXPECT_TRUE(outcome.Says("would make store " + Store()));
     EXPECT_TRUE(outcome.Says("would set OpenID to \"u1\""));
     EXPECT_TRUE(Everything() == before);
@@ -108,13 +123,17 @@ TEST_F(Setup, TellsHowToGetTheRightToThePreferencesDirectoryAndDoesTheRest) {
     // Nobody, not even root, can make a directory there.
     const auto outcome = Reportctl("setup --preferences-dir /sys/reportctl-test/hublink");
     EXPECT_EQ(outcome.exitCode, 1);
-    EXPECT_TRUE(outcome.Says("Run: sudo install -d -m 1777 /sys/reportctl-test/hublink\n")) << outcome.output;
+    EXPECT_TRUE(outcome.Says("Run: sudo install -d -m 1777 /sys/reportctl-test/hublink && "
+                             "sudo install -m 0666 /dev/null /sys/reportctl-test/hublink/Report.pid\n"))
+        << outcome.output;
     EXPECT_EQ(ModeOf(Store()), 0600u);
 }
 
 TEST_F(Setup, QuotesThePathInTheCommandThatItTells) {
     const auto outcome = Reportctl("setup --preferences-dir \"/sys/it's here\"");
-    EXPECT_TRUE(outcome.Says("sudo install -d -m 1777 '/sys/it'\\''s here'\n")) << outcome.output;
+    EXPECT_TRUE(outcome.Says("sudo install -d -m 1777 '/sys/it'\\''s here' && "
+                             "sudo install -m 0666 /dev/null '/sys/it'\\''s here/Report.pid'\n"))
+        << outcome.output;
 }
 
 TEST_F(Setup, CorrectsTheModeOfThePreferencesDirectory) {
@@ -136,6 +155,90 @@ TEST_F(Setup, DoesNotOpenToAllWhatALinkPointsTo) {
     EXPECT_TRUE(outcome.Says(Preferences() + " is not a directory")) << outcome.output;
     EXPECT_EQ(ModeOf(target), 0700u);
     EXPECT_TRUE(fs::exists(Store()));
+}
+
+TEST_F(Setup, LeavesThePidFileOfARunningServiceAlone) {
+    ASSERT_EQ(RunSetup().exitCode, 0);
+    std::ofstream(PidFile()) << "4711";
+    struct stat before {};
+    ASSERT_EQ(::lstat(PidFile().c_str(), &before), 0);
+    EXPECT_EQ(RunSetup().exitCode, 0);
+    struct stat after {};
+    ASSERT_EQ(::lstat(PidFile().c_str(), &after), 0);
+    EXPECT_EQ(after.st_ino, before.st_ino);
+    EXPECT_EQ(ContentOf(PidFile()), "4711");
+}
+
+TEST_F(Setup, RefusesALinkInThePlaceOfThePidFile) {
+    ASSERT_EQ(RunSetup().exitCode, 0);
+    fs::remove(PidFile());
+    fs::create_symlink(Preferences() + "/target", PidFile());
+    const auto outcome = RunSetup();
+    EXPECT_EQ(outcome.exitCode, 1);
+    EXPECT_TRUE(outcome.Says(PidFile() + " is no regular file. Remove it")) << outcome.output;
+    EXPECT_FALSE(fs::exists(Preferences() + "/target"));
+}
+
+TEST_F(Setup, TellsHowAPidFileBecomesWritableForAll) {
+    ASSERT_EQ(RunSetup().exitCode, 0);
+    fs::permissions(PidFile(), fs::perms{0644});
+    EXPECT_TRUE(RunSetup().Says("Run: sudo chmod 0666 " + PidFile() + "\n"));
+    EXPECT_EQ(ModeOf(PidFile()), 0644u);
+}
+
+/// A directory for pid files that is another's, and a user who runs set-up: where the test runs as root, that must be
+/// made.
+class SetupInAnothersDirectory : public Setup {
+protected:
+    static constexpr uid_t NOBODY = 65534;
+
+    void SetUp() override {
+        if (::geteuid() != 0)
+            GTEST_SKIP() << "only root can give a directory to another user";
+        ASSERT_EQ(RunSetup().exitCode, 0);
+        fs::remove(PidFile());
+    }
+
+    /// The program where the other user can reach it, run on data of that user's own.
+    Outcome RunSetupAsNobody() const {
+        const auto root = fs::path(Data()).parent_path();
+        fs::permissions(root, fs::perms{0755});
+        fs::copy_file(REPORTCTL, root / "program", fs::copy_options::overwrite_existing);
+        fs::create_directories(root / "nobody");
+        if (::chown((root / "nobody").c_str(), NOBODY, NOBODY) != 0)
+            return {};
+        return Run("setpriv --reuid 65534 --regid 65534 --clear-groups env XDG_DATA_HOME='" +
+                   (root / "nobody").string() + "' '" + (root / "program").string() +
+                   "' setup --preferences-dir '" + Preferences() + "'");
+    }
+};
+
+TEST_F(SetupInAnothersDirectory, GivesThePidFileToItsOwnerAsRoot) {
+    ASSERT_EQ(::chown(Preferences().c_str(), NOBODY, NOBODY), 0);
+    const auto outcome = RunSetup();
+    EXPECT_EQ(outcome.exitCode, 0) << outcome.output;
+    EXPECT_EQ(OwnerOf(PidFile()), NOBODY);
+    EXPECT_EQ(ModeOf(PidFile()), 0666u);
+}
+
+TEST_F(SetupInAnothersDirectory, MakesNoPidFileThatWouldKeepOthersOutAndTellsTheCommand) {
+    const auto outcome = RunSetupAsNobody();
+    EXPECT_EQ(outcome.exitCode, 1) << outcome.output;
+    EXPECT_TRUE(outcome.Says("Run: sudo install -m 0666 /dev/null " + PidFile() + "\n")) << outcome.output;
+    EXPECT_FALSE(fs::exists(PidFile()));
+}
+
+TEST_F(SetupInAnothersDirectory, AsksNothingOfAUserWhenThePidFileIsThere) {
+    ASSERT_EQ(RunSetup().exitCode, 0);
+    const auto outcome = RunSetupAsNobody();
+    EXPECT_EQ(outcome.exitCode, 0) << outcome.output;
+    EXPECT_FALSE(outcome.Says("warning")) << outcome.output;
+}
+
+TEST_F(SetupInAnothersDirectory, WarnsOfAPidFileThatKeepsOthersOut) {
+    ASSERT_EQ(RunSetup().exitCode, 0);
+    ASSERT_EQ(::chown(PidFile().c_str(), NOBODY, NOBODY), 0);
+    EXPECT_TRUE(RunSetup().Says("Run: sudo chown --no-dereference 0 " + PidFile() + "\n"));
 }
 
 TEST_F(Setup, MakesTheUsersOwnDirectoriesPrivate) {
