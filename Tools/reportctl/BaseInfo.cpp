@@ -56,12 +56,16 @@ void EnsureBaseInfo(Worklog& log, const std::string& path, const std::string& ke
             log.Do(SET, thing, [] {});
             return;
         }
-        auto database = OpenStore(path);
-        if (HasBaseInfo(database, key, value))
+        if (auto database = OpenStoreToLook(path); HasBaseInfo(database, key, value))
             log.Keep(fmt::format("{} \"{}\" in the table BaseInfo", key, value));
         else
             log.Do(
-                SET, thing, [&] { WriteBaseInfo(database, key, value); }, "Run this again.");
+                SET, thing,
+                [&] {
+                    auto store = OpenStore(path);
+                    WriteBaseInfo(store, key, value);
+                },
+                "Run this again.");
     } catch (const std::exception& error) {
         log.Fail(fmt::format("{}: {}.", path, error.what()));
     }

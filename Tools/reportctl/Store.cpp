@@ -1,8 +1,11 @@
 #include "Tools/reportctl/Store.h"
 
+#include <algorithm>
+#include <array>
 #include <cerrno>
 #include <cstdlib>
 #include <filesystem>
+#include <iterator>
 #include <stdexcept>
 #include <system_error>
 
@@ -23,7 +26,7 @@ constexpr auto PRIVATE_FILE = fs::perms::owner_read | fs::perms::owner_write;
 /// A running service holds the write lock for moments; a person can wait for five seconds, not for ever.
 constexpr int BUSY_TIMEOUT_MS = 5000;
 
-constexpr auto SIDE_FILES = {"-wal", "-shm", "-journal"};
+constexpr std::array SIDE_FILES{"-wal", "-shm", "-journal"};
 
 /// A new, private, empty file beside the one that it is for. Gone, with SQLite's files beside it, at the end.
 class DraftFile {
@@ -51,12 +54,30 @@ private:
     std::string m_path;
 };
 
-/// Side files without their database: what a deleted one left behind, or what a service that still has the
-/// deleted one open goes on writing. SQLite would read the new database through them and damage it.
-void RemoveOrphanedSideFiles(Worklog& log, const std::string& path) {
+/// A path beside the store's at which there is nothing, nor anything that would be taken for its side file.
+std::string FreeName(const std::string& path) {
+    const auto isTaken = [](const std::string& name) {
+        return fs::exists(name) || std::any_of(std::begin(SIDE_FILES), std::end(SIDE_FILES),
+                                               [&](const char* suffix) { return fs::exists(name + suffix); });
+    };
+    for (int number = 1;; ++number)
+        if (auto name = fmt::format("{}.left-{}", path, number); !isTaken(name))
+            return name;
+}
+
+/// Side files without their database: what a lost one left behind, or what a service that still has the deleted one
+/// open goes on writing. SQLite would read the new database through them and damage it. They may hold the newest rows,
+/// so they are kept, all under one new name: with their database beside them under that name, SQLite reads them again.
+bool MoveOrphanedSideFilesAway(Worklog& log, const std::string& path) {
+    const auto name = FreeName(path);
+    bool areAway = true;
     for (const auto* suffix : SIDE_FILES)
         if (const auto file = path + suffix; fs::exists(file))
-            log.Do(REMOVE, file + ", which belonged to a store that is gone", [&] { fs::remove(file); });
+            areAway &= log.Do(
+                RENAME,
+                fmt::format("{}, which belonged to a store that is gone, to {}{}", file, name, suffix),
+                [&] { fs::rename(file, name + suffix); }, "Move it away and run this again.");
+    return areAway;
 }
 
 void CreateStore(const std::string& path) {
@@ -70,13 +91,15 @@ void CreateStore(const std::string& path) {
 }
 
 bool EnsureNewStore(Worklog& log, const std::string& path) {
-    RemoveOrphanedSideFiles(log, path);
+    if (!MoveOrphanedSideFilesAway(log, path))
+        return false;
     return log.Do(
         MAKE, fmt::format("store {} (mode 0600, schema version {})", path, SCHEMA_VERSION),
         [&] { CreateStore(path); }, "Run this again once that is remedied.");
 }
 
-bool EnsureSchema(Worklog& log, SQLite::Database& database, const std::string& path) {
+bool EnsureSchema(Worklog& log, const std::string& path) {
+    auto database = OpenStoreToLook(path);
     const int version = SchemaVersionOf(database);
     if (version > SCHEMA_VERSION) {
         log.Fail(fmt::format("{} has schema version {}, this program knows {}: it was left as it is. Use the "
@@ -92,7 +115,11 @@ bool EnsureSchema(Worklog& log, SQLite::Database& database, const std::string& p
     }
     return log.Do(
         MIGRATE, fmt::format("{} from version {}, keeping its rows", thing, version),
-        [&] { RunInTransaction(database, statements); }, "The store was left as it is.");
+        [&] {
+            auto store = OpenStore(path);
+            RunInTransaction(store, statements);
+        },
+        "The store was left as it is.");
 }
 
 bool IsPrivate(const std::string& file) {
@@ -107,21 +134,21 @@ void EnsurePrivateFiles(Worklog& log, const std::string& path) {
                 "The file's owner must do that.");
 }
 
-void EnsureWriteAheadLog(Worklog& log, SQLite::Database& database, const std::string& path) {
-    if (database.execAndGet("pragma journal_mode").getString() != "wal")
+void EnsureWriteAheadLog(Worklog& log, const std::string& path) {
+    if (OpenStoreToLook(path).execAndGet("pragma journal_mode").getString() != "wal")
         log.Do(
             CHANGE, fmt::format("journal of {} to a write-ahead log", path),
-            [&] { database.exec("pragma journal_mode = wal"); }, "Stop who uses it and run this again.");
+            [&] { OpenStore(path).exec("pragma journal_mode = wal"); },
+            "Stop who uses it and run this again.");
 }
 
 /// The modes are looked at while the store is closed: opening it makes side files of the mode that is about
 /// to be changed.
 bool EnsureExistingStore(Worklog& log, const std::string& path) {
-    if (auto database = OpenStore(path); !EnsureSchema(log, database, path))
+    if (!EnsureSchema(log, path))
         return false;
     EnsurePrivateFiles(log, path);
-    auto database = OpenStore(path);
-    EnsureWriteAheadLog(log, database, path);
+    EnsureWriteAheadLog(log, path);
     return true;
 }
 
@@ -129,6 +156,16 @@ bool EnsureExistingStore(Worklog& log, const std::string& path) {
 
 SQLite::Database OpenStore(const std::string& path) {
     return SQLite::Database(path, SQLite::OPEN_READWRITE, BUSY_TIMEOUT_MS);
+}
+
+SQLite::Database OpenStoreToLook(const std::string& path) {
+    const auto log = path + "-wal";
+    const bool hasRows = fs::exists(log) && fs::file_size(log) > 0;
+    auto database = OpenStore(path);
+    // Without rows in it the side files go away at the end, as they should: they were made by this opening.
+    if (hasRows)
+        sqlite3_db_config(database.getHandle(), SQLITE_DBCONFIG_NO_CKPT_ON_CLOSE, 1, nullptr);
+    return database;
 }
 
 bool EnsureStore(Worklog& log, const std::string& path) {

@@ -15,7 +15,7 @@ inline constexpr Verb MAKE{"made", "would make"};
 inline constexpr Verb CHANGE{"changed", "would change"};
 inline constexpr Verb SET{"set", "would set"};
 inline constexpr Verb MIGRATE{"migrated", "would migrate"};
-inline constexpr Verb REMOVE{"removed", "would remove"};
+inline constexpr Verb RENAME{"renamed", "would rename"};
 
 /// Does things and tells the person, one line each: results on standard output, failures and warnings on
 /// standard error. In a dry run nothing is done, only told.

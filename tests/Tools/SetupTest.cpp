@@ -268,14 +268,41 @@ TEST_F(Setup, FailsOverAFileInTheWayOfADirectory) {
     EXPECT_EQ(ContentOf(Data() + "/hublink"), "in the way");
 }
 
-TEST_F(Setup, RemovesWhatADeletedStoreLeftBehind) {
+TEST_F(Setup, KeepsUnderAnotherNameWhatALostStoreLeftBehind) {
     fs::create_directories(Database());
-    for (const auto* suffix : {"-wal", "-shm", "-journal"})
-        std::ofstream(Store() + suffix) << "left behind";
+    for (const auto* suffix : {"-wal", "-shm", "-journal", ".left-1-wal"})
+        std::ofstream(Store() + suffix) << "rows of " << suffix;
     const auto outcome = RunSetup();
     EXPECT_EQ(outcome.exitCode, 0) << outcome.output;
-    EXPECT_TRUE(outcome.Says("removed " + Store() + "-wal")) << outcome.output;
+    EXPECT_TRUE(outcome.Says("renamed " + Store() + "-wal, which belonged to a store that is gone, to " +
+                             Store() + ".left-2-wal\n"))
+        << outcome.output;
     ExpectEverythingMade();
+    EXPECT_EQ(ContentOf(Store() + ".left-1-wal"), "rows of .left-1-wal");
+    for (const std::string suffix : {"-wal", "-shm", "-journal"})
+        EXPECT_EQ(ContentOf(Store() + ".left-2" + suffix), "rows of " + suffix);
+}
+
+TEST_F(Setup, RenamesNothingInADryRun) {
+    fs::create_directories(Database());
+    std::ofstream(Store() + "-wal") << "rows";
+    const auto before = Everything();
+    EXPECT_TRUE(RunSetup("--dry-run").Says("would rename " + Store() + "-wal"));
+    EXPECT_TRUE(Everything() == before);
+}
+
+TEST_F(Setup, MakesNoStoreBesideALeftOverLogThatItCannotRename) {
+    // What something is mounted on cannot be renamed, not even by root.
+    const std::string withMounts = "unshare --user --map-root-user --mount ";
+    if (Run(withMounts + "true").exitCode != 0)
+        GTEST_SKIP() << "this machine does not allow user namespaces";
+    const auto log = Store() + "-wal";
+    fs::create_directories(log);
+    const auto outcome =
+        RunSetup("", withMounts + "sh -c 'mount -t tmpfs none \"$0\" && exec env \"$@\"' '" + log + "'");
+    EXPECT_EQ(outcome.exitCode, 1) << outcome.output;
+    EXPECT_TRUE(outcome.Says("Not renamed: " + log)) << outcome.output;
+    EXPECT_FALSE(fs::exists(Store()));
 }
 
 TEST_F(Setup, MakesTheStorePrivateThatOthersCouldRead) {

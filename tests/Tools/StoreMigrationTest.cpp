@@ -21,6 +21,35 @@ protected:
         EXPECT_EQ(ContentOf(Store()), before);
     }
 
+    /// What kill -9 leaves of a store when the service had run these statements: what they wrote is in the log alone.
+    void RunInAServiceThatIsKilled(const std::string& sql) const {
+        namespace fs = std::filesystem;
+        const auto aside = Data() + "/aside";
+        {
+            SQLite::Database service(Store(), SQLite::OPEN_READWRITE);
+            service.exec("pragma journal_mode = wal");
+            service.exec(sql);
+            fs::copy(Database(), aside);
+        }
+        fs::remove_all(Database());
+        fs::rename(aside, Database());
+        fs::permissions(Database(), fs::perms{0700});
+        ASSERT_GT(fs::file_size(Log()), 0u);
+    }
+
+    /// Set-up ends like this, says this, and changes neither the store nor its log.
+    void ExpectUntouched(const std::string& arguments, int exitCode, const std::string& text) const {
+        const auto store = ContentOf(Store());
+        const auto log = ContentOf(Log());
+        const auto outcome = RunSetup(arguments);
+        EXPECT_EQ(outcome.exitCode, exitCode);
+        EXPECT_TRUE(outcome.Says(text)) << outcome.output;
+        EXPECT_EQ(ContentOf(Store()), store);
+        EXPECT_EQ(ContentOf(Log()), log);
+    }
+
+    std::string Log() const { return Store() + "-wal"; }
+
     static constexpr auto OLD_STORE =
         "create table OperLog (id integer primary key, eventID text, value text, createTime text,"
         " pType integer);"
@@ -85,6 +114,28 @@ TEST_F(StoreMigration, SwitchesAStoreToTheWriteAheadLog) {
 TEST_F(StoreMigration, LeavesANewerStoreAlone) {
     MakeStore("pragma user_version = 2; create table OperLog (a); create table New (b)");
     ExpectLeftAlone("has schema version 2, this program knows 1: it was left as it is");
+}
+
+TEST_F(StoreMigration, LeavesTheLogOfAKilledServiceAloneInADryRun) {
+    MakeStore("create table OperLog (id integer primary key, eventID text)");
+    RunInAServiceThatIsKilled("insert into OperLog values (1, 'newest')");
+    ExpectUntouched("--dry-run --open-id u1", 0, "would migrate store");
+    EXPECT_EQ(RunSetup().exitCode, 0);
+    EXPECT_EQ(Ask("select eventID from OperLog"), "newest");
+    ExpectTheCurrentSchema();
+}
+
+TEST_F(StoreMigration, LeavesTheLogOfAKilledServiceAloneWhenThereIsNothingToDo) {
+    ASSERT_EQ(RunSetup("--open-id u1").exitCode, 0);
+    RunInAServiceThatIsKilled("insert into OperLog (eventID) values ('newest')");
+    ExpectUntouched("--open-id u1", 0, "nothing to do");
+    EXPECT_EQ(Ask("select eventID from OperLog"), "newest");
+}
+
+TEST_F(StoreMigration, LeavesANewerStoreAloneWithTheLogOfAKilledService) {
+    MakeStore("create table OperLog (a)");
+    RunInAServiceThatIsKilled("pragma user_version = 2");
+    ExpectUntouched("--open-id u1", 1, "it was left as it is");
 }
 
 TEST_F(StoreMigration, LeavesAFileAloneThatIsNoDatabase) {
