@@ -22,6 +22,25 @@ in_log() {
     grep -hF -- "$1" "$log_directory"/Report*.log
 }
 
+# whole_log: all of it, the oldest line first: the rotated files in the order of their numbers, then the live one.
+whole_log() {
+    local file number
+    for file in "$log_directory"/Report_*.log; do
+        number=${file##*_}
+        printf '%s %s\n' "${number%.log}" "$file"
+    done | sort -n | cut -d ' ' -f 2- | while read -r file; do
+        cat "$file" 2>/dev/null || true # none was rotated, or this one was deleted meanwhile
+    done
+    cat "$log_directory"/Report.log
+}
+
+# line_after MESSAGE TEXT: the first line of the log with that text behind the line that logs the message's arrival.
+# Reads all of it: a reader that left early would fail the writer. Through the environment, since -v reads escapes.
+line_after() {
+    whole_log | message="Recv] $1" text=$2 awk \
+        'seen && !found && index($0, ENVIRON["text"]) { print; found = 1 } index($0, ENVIRON["message"]) { seen = 1 }'
+}
+
 query() {
     sqlite3 -readonly -cmd '.timeout 5000' "$1" "$2" 2>/dev/null
 }
@@ -47,11 +66,19 @@ found_quietly() {
     [ -n "$("$@" 2>/dev/null)" ]
 }
 
-# send_and_show DATA_DIRECTORY: true when each message ended where it belongs.
+# can_be_sent_back TEXT: whether it may stand as it is in JSON, in a format string, which the service takes each message
+# for when it logs it, and in an SQL literal.
+can_be_sent_back() {
+    [[ $1 != *[\"\\%\'[:cntrl:]]* ]]
+}
+
+# send_and_show DATA_DIRECTORY STARTED: true when each message ended where it belongs. STARTED is "yes" when nobody else
+# has been using the service. Otherwise a line that does not name its message may be another message's.
 send_and_show() {
     local store=$1/database/Report.db outbox=$1/database/MetrikOutbox.db
     local log_directory=$1/log/metrik
-    local id message missing=0
+    local id message missing=0 site="log "
+    [ "$2" = yes ] || site="log  (a line of that site; it may be another program's message that caused it)"
     id=$(date +%s%N)
 
     message='{"eventID":"DEMO|'$id'","value":{"page":"start"},"createTime":'${id:0:13}'}'
@@ -80,15 +107,19 @@ send_and_show() {
     local user version
     user=$(query "$store" "select extData4 from OperLog where eventID='DEMO|$id'")
     version=$(query "$store" "select extData3 from OperLog where eventID='DEMO|$id'")
-    message='{"msgType":"updateOpenID","exdata":{"openID":"'$user'","hublinkVersion":"'$version'","demo":"'$id'"}}'
-    show "The signed-in user" "$message"
-    send "$message"
-    found "log " line_after "$message" "[App/ReportServer:111 SetBaseInfo] SetBaseInfo $user-$version"
+    if [ -n "$user" ] && can_be_sent_back "$user$version"; then
+        message='{"msgType":"updateOpenID","exdata":{"openID":"'$user'","hublinkVersion":"'$version'","demo":"'$id'"}}'
+        show "The signed-in user" "$message"
+        send "$message"
+        found "$site" line_after "$message" "[App/ReportServer:111 SetBaseInfo] SetBaseInfo $user-$version"
+    else
+        printf '\n%s\n' "The signed-in user: left out; there is no row above, or its user and version cannot be sent."
+    fi
 
     message='{"eventID":"DEMO|'$id'", this is no JSON'
     show "A report that cannot be parsed" "$message"
     send "$message"
-    found "log " line_after "$message" "[App/ReportServer:123 JsonToStruct]"
+    found "$site" line_after "$message" "[App/ReportServer:123 JsonToStruct]"
 
     echo
     if [ "$missing" -gt 0 ]; then
@@ -96,10 +127,4 @@ send_and_show() {
         return 1
     fi
     echo "Each message ended where it belongs."
-}
-
-# line_after MESSAGE TEXT: the first line of the log with that text behind the line that logs the message's arrival.
-line_after() {
-    cat "$log_directory"/Report.log | awk -v message="$1" -v text="$2" \
-        'seen && index($0, text) { print; exit } index($0, "Recv] " message) { seen = 1 }'
 }
