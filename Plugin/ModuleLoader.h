@@ -3,6 +3,7 @@
 #include <memory>
 #include <mutex>
 #include <string>
+#include <vector>
 
 #include "SystemTool/DllLoader.h"
 #include "SystemTool/IO/Directory.h"
@@ -109,7 +110,8 @@ private:
         try {
             return m_pDllLoader->template get<T*()>("CreateModule")();
         } catch (...) {
-            m_pDllLoader.release(); // not closed, and not ours any more
+            static auto* const keptOpen = new std::vector<std::unique_ptr<DllLoader>>;
+            keptOpen->push_back(std::move(m_pDllLoader));
             throw;
         }
     }

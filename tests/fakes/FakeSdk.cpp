@@ -3,8 +3,8 @@
 namespace {
 
 FakeSdkState& State() {
-    static auto* state = new FakeSdkState;
-    return *state;
+    static FakeSdkState state;
+    return state;
 }
 
 #ifdef INIT_THROWS_OWN_CLASS

@@ -7,8 +7,8 @@
 namespace {
 
 FakeSqliteState& State() {
-    static auto* state = new FakeSqliteState;
-    return *state;
+    static FakeSqliteState state;
+    return state;
 }
 
 bool Record(const std::string& operation, const std::string& argument) {
