@@ -22,7 +22,7 @@ BatchPlan PlanBatch(const Batch& oldest, std::size_t maxEvents, WallTime now, co
         return {};
     const auto count = CountWithin(oldest, maxEvents, settings.maxBytes);
     const bool full = count == maxEvents || count < oldest.events.size();
-    const auto age = now - oldest.events.front().storedAt;
+    const auto age = now - Computable(oldest.events.front().storedAt);
     if (full || age < -settings.linger || age >= settings.linger)
         return {count, std::chrono::milliseconds(0)};
     return {count, settings.linger - age};

@@ -111,16 +111,33 @@ private:
         return variable;
     }
 
-    std::string ReadUrl() {
-        const auto endpoint = Pair("ENDPOINT");
-        if (endpoint.value.empty())
-            return {};
-        const auto url = ParseUrl(endpoint.value);
-        if (!url) {
-            m_complaints.push_back(endpoint.name + " is no http or https URL: events stay in the outbox");
-            return {};
+    /// Offers the signal's own variable and then the common one, where they are set, until `accept` says yes.
+    template <typename Accept>
+    void OfferPair(const std::string& name, Accept accept) {
+        for (const char* prefix : {SIGNAL_PREFIX, COMMON_PREFIX}) {
+            const Variable variable{prefix + name, Value(prefix + name)};
+            if (!variable.value.empty() && accept(variable))
+                return;
         }
-        if (endpoint.name == std::string(SIGNAL_PREFIX) + "ENDPOINT")
+    }
+
+    std::string ReadUrl() {
+        std::string result;
+        OfferPair("ENDPOINT", [&](const Variable& endpoint) {
+            result = UrlOf(endpoint);
+            if (result.empty())
+                m_complaints.push_back(endpoint.name + " is no http or https URL and counts as unset");
+            return !result.empty();
+        });
+        return result;
+    }
+
+    /// Empty when it makes no sense.
+    static std::string UrlOf(const Variable& endpoint) {
+        const auto url = ParseUrl(endpoint.value);
+        if (!url)
+            return {};
+        if (endpoint.name.starts_with(SIGNAL_PREFIX))
             return endpoint.value;
         auto path = Part(url, CURLUPART_PATH);
         path += (path.ends_with('/') ? "" : "/");
@@ -151,24 +168,34 @@ private:
     }
 
     void ReadTimeout(EndpointConfig& config) {
-        const auto timeout = Pair("TIMEOUT");
-        if (timeout.value.empty())
-            return;
+        OfferPair("TIMEOUT", [&](const Variable& timeout) {
+            const bool valid = ParseTimeout(timeout.value, config.timeout);
+            if (!valid)
+                m_complaints.push_back(timeout.name +
+                                       " is no positive number of milliseconds and counts as unset");
+            return valid;
+        });
+    }
+
+    static bool ParseTimeout(const std::string& text, std::chrono::milliseconds& timeout) {
         constexpr std::int64_t MAX_MS = 600'000; // a request that takes longer than ten minutes never ends
         std::int64_t milliseconds = 0;
-        const auto end = timeout.value.data() + timeout.value.size();
-        const auto parsed = std::from_chars(timeout.value.data(), end, milliseconds);
-        if (parsed.ec == std::errc() && parsed.ptr == end && milliseconds > 0)
-            config.timeout = std::chrono::milliseconds(std::min(milliseconds, MAX_MS));
-        else
-            m_complaints.push_back(timeout.name + " is no positive number of milliseconds");
+        const auto end = text.data() + text.size();
+        const auto parsed = std::from_chars(text.data(), end, milliseconds);
+        if (parsed.ec != std::errc() || parsed.ptr != end || milliseconds <= 0)
+            return false;
+        timeout = std::chrono::milliseconds(std::min(milliseconds, MAX_MS));
+        return true;
     }
 
     void ReadCompression(EndpointConfig& config) {
-        const auto compression = Pair("COMPRESSION");
-        config.gzip = compression.value == "gzip";
-        if (!compression.value.empty() && !config.gzip && compression.value != "none")
-            m_complaints.push_back(compression.name + " is neither gzip nor none: nothing is compressed");
+        OfferPair("COMPRESSION", [&](const Variable& compression) {
+            config.gzip = compression.value == "gzip";
+            const bool valid = config.gzip || compression.value == "none";
+            if (!valid)
+                m_complaints.push_back(compression.name + " is neither gzip nor none and counts as unset");
+            return valid;
+        });
     }
 
     const LookUp& m_lookUp;

@@ -13,7 +13,8 @@ FileKeeper::FileKeeper(std::string directory, const FileSettings& settings)
     : m_directory(std::move(directory)), m_path(m_directory + FILE_NAME), m_settings(settings) {}
 
 OutboxStore& FileKeeper::Ready(SteadyTime now, std::chrono::milliseconds patience, std::vector<News>& news) {
-    if (m_store && !IsStillTheFile(now)) {
+    // Looked at for every event: one that went into a deleted file would be lost after we said yes to it.
+    if (m_store && OutboxFiles::IdentityOf(m_path) != m_identity) {
         m_store.reset(); // SQLite leaves the files at the path alone once the path names another
         news.push_back(
             {Cause::Vanished, m_path + " was deleted or replaced, with all events that waited in it"});
@@ -32,7 +33,6 @@ OutboxStore& FileKeeper::Ready(SteadyTime now, std::chrono::milliseconds patienc
         throw;
     }
     m_failedAt.reset();
-    m_nextIdentityCheck = now + m_settings.identityCheckInterval;
     return *m_store;
 }
 
@@ -52,13 +52,6 @@ void FileKeeper::Open(std::chrono::milliseconds patience) {
     m_identity = OutboxFiles::Prepare(m_path);
     m_store = std::make_unique<OutboxStore>(m_path, patience);
     ++m_generation;
-}
-
-bool FileKeeper::IsStillTheFile(SteadyTime now) {
-    if (now < m_nextIdentityCheck)
-        return true;
-    m_nextIdentityCheck = now + m_settings.identityCheckInterval;
-    return OutboxFiles::IdentityOf(m_path) == m_identity;
 }
 
 bool FileKeeper::Failed(const StoreError& error, bool firstAttempt, SteadyTime now, std::vector<News>& news) {

@@ -40,7 +40,6 @@ private:
     void Open(std::chrono::milliseconds patience);
     void OpenOrBegin(std::chrono::milliseconds patience, std::vector<News>& news);
     void CloseUntilLater(const std::string& reason, SteadyTime now);
-    bool IsStillTheFile(SteadyTime now);
     void SetAside(const std::string& reason, std::vector<News>& news);
 
     const std::string m_directory;
@@ -49,7 +48,6 @@ private:
     std::unique_ptr<OutboxStore> m_store;
     OutboxFiles::Identity m_identity{};
     unsigned m_generation = 0;
-    SteadyTime m_nextIdentityCheck{};
     std::optional<SteadyTime> m_failedAt;
     std::string m_lastError;
 };

@@ -4,6 +4,7 @@
 #include <chrono>
 #include <cstring>
 #include <new>
+#include <stdexcept>
 #include <string_view>
 #include <thread>
 #include <utility>
@@ -37,9 +38,12 @@ void InitialiseLibrary() {
     [[maybe_unused]] static const CURLcode done = ::curl_global_init(CURL_GLOBAL_DEFAULT);
 }
 
+/// Every option is one that this library's minimum version knows. One that is refused all the same, by a TLS
+/// backend that cannot do it say, must not be passed over: the next request would be less safe than was asked for.
 template <typename Value>
 void Set(CURL* easy, CURLoption option, Value value) {
-    ::curl_easy_setopt(easy, option, value);
+    if (const auto code = ::curl_easy_setopt(easy, option, value); code != CURLE_OK)
+        throw std::runtime_error("HTTP option " + std::to_string(option) + ": " + ::curl_easy_strerror(code));
 }
 
 } // namespace
@@ -78,8 +82,11 @@ void HttpSender::ConfigureTls() {
     Set(easy, CURLOPT_SSL_VERIFYPEER, 1L);
     Set(easy, CURLOPT_SSL_VERIFYHOST, 2L);
     Set(easy, CURLOPT_SSLVERSION, static_cast<long>(CURL_SSLVERSION_TLSv1_2));
-    if (!m_config.certificate.empty())
+    if (!m_config.certificate.empty()) {
         Set(easy, CURLOPT_CAINFO, m_config.certificate.c_str());
+        // Whom the file does not name is not trusted; the library would look into the system's directory too.
+        Set(easy, CURLOPT_CAPATH, static_cast<const char*>(nullptr));
+    }
     if (!m_config.clientKey.empty())
         Set(easy, CURLOPT_SSLKEY, m_config.clientKey.c_str());
     if (!m_config.clientCertificate.empty())

@@ -96,8 +96,8 @@ private:
 
     /// The protocol's JSON writes 64-bit integers as texts, because many readers' numbers are doubles.
     static std::string Nanoseconds(WallTime time) {
-        const std::chrono::nanoseconds nanoseconds = time.time_since_epoch();
-        return std::to_string(std::max<std::int64_t>(nanoseconds.count(), 0));
+        const std::chrono::nanoseconds nanoseconds = Computable(time).time_since_epoch();
+        return std::to_string(nanoseconds.count());
     }
 
     void TextMember(const char* name, const std::string& text) {

@@ -52,6 +52,7 @@ bool Outbox::Open() {
         WithStore(Caller::Module, [](OutboxStore&) {});
         return true;
     } catch (const StoreError& error) {
+        m_patienceUsedUp = true; // thousands of modules may announce themselves while the lock is held
         m_notifier.TellFailure({Cause::File, error.what()});
         return false;
     }
@@ -91,7 +92,6 @@ void Outbox::LearnAbout(OutboxStore& store) {
     if (m_knownGeneration == m_keeper.Generation())
         return;
     Recount(store);
-    m_underWayUpTo = 0;
     m_openedSteady = m_now;
     m_openedAt = WallNow();
     m_nextAgeCheck = m_now;

@@ -30,7 +30,8 @@ public:
     /// Stores the event. True once it survives kill -9 of this process.
     bool Append(const ModuleIdentity& module, std::string eventId, std::string payload);
 
-    /// The oldest events. They are under way until Release: a cap drops others first.
+    /// The oldest events. They are under way until Release, also when the file is opened anew meanwhile: a cap drops
+    /// others first.
     Batch Take(std::size_t maxEvents);
     void Release();
 
@@ -63,7 +64,7 @@ private:
     Notifier& m_notifier;
     Bell m_bell;
 
-    /// The last event was refused, perhaps after all of the patience: the next one has less.
+    /// The last event or opening failed, perhaps after all of the patience: the next one has less.
     std::atomic<bool> m_patienceUsedUp = false;
 
     std::mutex m_mutex; ///< Guards all below.

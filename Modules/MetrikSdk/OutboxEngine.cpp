@@ -21,6 +21,13 @@ void RegisterOnExit() {
     [[maybe_unused]] static const int registered = std::atexit(&OnExit);
 }
 
+std::string Joined(const std::vector<std::string>& texts) {
+    std::string joined;
+    for (const auto& text : texts)
+        joined += (joined.empty() ? "" : "; ") + text;
+    return joined;
+}
+
 } // namespace
 
 OutboxEngine::OutboxEngine(const std::string& directory, const OutboxSettings& settings,
@@ -40,8 +47,8 @@ void OutboxEngine::StartUploader(const EndpointConfig& endpoint) {
 }
 
 bool OutboxEngine::Open() {
-    for (const auto& complaint : m_complaints)
-        m_core->notifier.TellFailure({Cause::Configuration, complaint});
+    if (!m_complaints.empty()) // one text: a second one would be kept back as a repetition of the first
+        m_core->notifier.TellFailure({Cause::Configuration, Joined(m_complaints)});
     return m_core->outbox.Open();
 }
 

@@ -59,7 +59,15 @@ void OutboxStore::Configure() {
     m_database.exec("PRAGMA trusted_schema = OFF"); // somebody may have put another file in the place
 }
 
+bool OutboxStore::IsOutbox() {
+    return Number(m_database, "PRAGMA application_id") == APPLICATION_ID &&
+           Number(m_database, "PRAGMA user_version") == SCHEMA_VERSION &&
+           Number(m_database, "SELECT count(*) FROM totals") == 1;
+}
+
 void OutboxStore::CreateOrCheckSchema() {
+    if (IsOutbox()) // known by reading: another process's write lock does not keep us from opening
+        return;
     auto transaction = WriteTransaction(m_database);
     const auto version = Number(m_database, "PRAGMA user_version");
     const auto objects = Number(m_database, "SELECT count(*) FROM sqlite_schema");

@@ -96,6 +96,7 @@ private:
     };
 
     void Configure();
+    bool IsOutbox();
     void CreateOrCheckSchema();
     ReleaseKeys KeysOf(const ModuleIdentity& module);
     ReleaseKeys AddRelease(const ModuleIdentity& module);

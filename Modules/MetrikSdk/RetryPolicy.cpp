@@ -3,6 +3,9 @@
 #include <algorithm>
 #include <charconv>
 #include <cmath>
+#include <string_view>
+
+#include <strings.h>
 
 #include <curl/curl.h>
 
@@ -19,10 +22,11 @@ bool IsSuccess(long status) {
     return status >= 200 && status < 300;
 }
 
-/// A hotel's log-in page answers every plain request with 200 and a page. Collectors answer with JSON, with
-/// nothing, or with a word; none answers with a page.
+/// A hotel's log-in page answers every plain request with 200 and a page. Collectors answer that with JSON, with
+/// nothing, or with a word; a page of theirs comes with errors only, from the proxy before them.
 bool IsWebPage(const HttpResult& result) {
-    return result.contentType.starts_with("text/html");
+    static constexpr std::string_view PAGE = "text/html"; // media types have no letter case
+    return ::strncasecmp(result.contentType.c_str(), PAGE.data(), PAGE.size()) == 0;
 }
 
 bool AsksToWait(long status) {
@@ -46,10 +50,10 @@ SystemTool::IO::JsonDocument ParseAnswer(const std::string& body) {
 } // namespace
 
 Verdict Judge(const HttpResult& result) {
-    if (!result.fault.empty() || IsWebPage(result))
+    if (!result.fault.empty())
         return Verdict::Wait;
     if (IsSuccess(result.status))
-        return Verdict::Delete;
+        return IsWebPage(result) ? Verdict::Wait : Verdict::Delete;
     // A redirect is the address's fault and not the events'. It is not followed: it could carry the
     // credentials to another host.
     return result.status < 400 || AsksToWait(result.status) ? Verdict::Wait : Verdict::Halve;
@@ -68,18 +72,20 @@ PartialSuccess ReadPartialSuccess(const HttpResult& result, std::size_t sent) {
 }
 
 std::optional<std::chrono::milliseconds> ParseRetryAfter(const std::string& header, WallTime now) {
+    constexpr std::int64_t FAR = 1'000'000'000; // seconds; keeps the sums of a hostile number in range
     std::int64_t seconds = 0;
     const auto end = header.data() + header.size();
     const auto parsed = std::from_chars(header.data(), end, seconds);
     if (parsed.ec == std::errc::result_out_of_range)
         return header[0] == '-' ? std::chrono::milliseconds(0) : std::chrono::milliseconds::max();
-    if (parsed.ec == std::errc() && parsed.ptr == end) {
-        constexpr std::int64_t FAR = 1'000'000'000; // keeps the product of a hostile number in range
+    if (parsed.ec == std::errc() && parsed.ptr == end)
         return std::chrono::seconds(std::clamp<std::int64_t>(seconds, 0, FAR));
-    }
     const auto date = ::curl_getdate(header.c_str(), nullptr);
     if (date < 0)
         return std::nullopt;
+    const auto today = std::chrono::floor<std::chrono::seconds>(now).time_since_epoch().count();
+    if (date > today + FAR) // the date's year may have ten digits
+        return std::chrono::seconds(FAR);
     const WallTime until{std::chrono::seconds(date)};
     return std::max(until - now, std::chrono::milliseconds(0));
 }

@@ -32,13 +32,15 @@ struct CapSettings {
 struct BatchSettings {
     /// The batch size that telemetry SDKs agree on by default; larger ones gain nothing on a local network.
     std::size_t maxEvents = 512;
-    /// Structured JSON is two to three times the stored size, and collectors accept 4 MiB and more.
+    /// Structured JSON is two to three times the stored size, about nine times where the payload is a list of
+    /// small integers. The common case fits the 4 MiB that collectors accept; one that does not is answered with
+    /// 413, and halved.
     std::size_t maxBytes = std::size_t{1024} * 1024;
     /// An event waits this long for company before it is sent alone.
     std::chrono::milliseconds linger = std::chrono::seconds(1);
 };
 
-/// When to try again. The wait before attempt n is uniform in [0, min(maxWait, firstWait * 2^n)]: a fleet
+/// When to try again. The wait after n failures is uniform in [0, min(maxWait, firstWait * 2^(n-1))]: a fleet
 /// that lost its collector together must not come back together.
 struct RetrySettings {
     std::chrono::milliseconds firstWait = std::chrono::seconds(1);
@@ -55,9 +57,6 @@ struct RetrySettings {
 struct FileSettings {
     /// A file that cannot be opened is tried again this often; the first event after that interval pays.
     std::chrono::milliseconds reopenInterval = std::chrono::milliseconds(500);
-    /// How often an event looks whether the file is still the one that was opened. Events that are further
-    /// apart than this are therefore never written to a deleted file.
-    std::chrono::milliseconds identityCheckInterval = std::chrono::milliseconds(100);
     /// Patience with another process that holds the write lock. Reports queue up behind this, which loses
     /// nothing; giving up loses the event.
     std::chrono::milliseconds lockPatience = std::chrono::seconds(5);

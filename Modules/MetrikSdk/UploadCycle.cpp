@@ -14,19 +14,23 @@ constexpr std::chrono::milliseconds IDLE = std::chrono::seconds(30);
 
 constexpr Pause AT_ONCE{};
 
-/// Keeps the batch from being dropped for a cap while it is under way.
-class UnderWay {
+} // namespace
+
+/// Keeps the batch from being dropped for a cap while it is under way. What was delivered and is not deleted yet
+/// stays so until Settle: dropped, it would be counted as lost.
+class UploadCycle::UnderWay {
 public:
-    explicit UnderWay(Outbox& outbox) : m_outbox(outbox) {}
-    ~UnderWay() { m_outbox.Release(); }
+    explicit UnderWay(UploadCycle& cycle) : m_cycle(cycle) {}
+    ~UnderWay() {
+        if (!m_cycle.m_removal)
+            m_cycle.m_outbox.Release();
+    }
     UnderWay(const UnderWay&) = delete;
     UnderWay& operator=(const UnderWay&) = delete;
 
 private:
-    Outbox& m_outbox;
+    UploadCycle& m_cycle;
 };
-
-} // namespace
 
 UploadCycle::UploadCycle(Outbox& outbox, Sender& sender, Notifier& notifier, const OutboxSettings& settings,
                          std::function<double()> random)
@@ -46,7 +50,7 @@ Pause UploadCycle::Pass(WallTime now) {
 }
 
 Pause UploadCycle::TakeAndSend(WallTime now) {
-    const UnderWay underWay(m_outbox);
+    const UnderWay underWay(*this);
     auto batch = m_outbox.Take(m_splitter.Limit());
     const auto plan = PlanBatch(batch, m_splitter.Limit(), now, m_settings.batch);
     if (plan.count == 0)
@@ -98,6 +102,7 @@ void UploadCycle::Settle() {
         return;
     m_outbox.RemoveDelivered(m_removal->batch, m_removal->refused);
     m_removal.reset();
+    m_outbox.Release();
 }
 
 Pause UploadCycle::Refused(const Batch& batch, const HttpResult& result, WallTime now) {

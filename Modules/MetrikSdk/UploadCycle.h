@@ -33,6 +33,7 @@ public:
     Pause Pass(WallTime now);
 
 private:
+    class UnderWay;
     struct Removal {
         Batch batch;
         std::size_t refused = 0;

@@ -64,6 +64,11 @@ TEST(BatchPlan, DoesNotHoldEventsFromTheFuture) {
     EXPECT_EQ(Plan(Waiting(3, 1, NOW + 2ms)).wait, 1002ms) << "stored while the plan was made";
 }
 
+TEST(BatchPlan, DoesNotHoldEventsOfAnImpossibleTime) {
+    for (const auto time : {WallTime::min(), WallTime::max()})
+        EXPECT_EQ(Plan(Waiting(3, 1, time)).wait, 0ms);
+}
+
 /// Lets a splitter work off `events` events of which `bad` are refused; the number of requests it took.
 int WorkOff(std::size_t events, const std::set<std::size_t>& bad, std::set<std::size_t>& found) {
     BatchSplitter splitter(512);

@@ -148,9 +148,11 @@ TEST_F(MisbehavingCollectorTest, RefusesOnePoisonousEventAmong500) {
     });
     EXPECT_TRUE(WaitUntilNothingWaits());
     Stop();
+    EXPECT_EQ(Totals().stored, 500);
     EXPECT_EQ(Totals().delivered, 499);
     EXPECT_EQ(m_taken.size(), 499U);
     SQLite::Database outbox(File());
+    EXPECT_FALSE(m_taken.contains(outbox.execAndGet("SELECT uuid FROM dead_letter").getString()));
     EXPECT_EQ(outbox.execAndGet("SELECT count(*) FROM dead_letter").getInt(), 1);
     EXPECT_EQ(outbox.execAndGet("SELECT payload FROM dead_letter").getString(), NumberedPayload(321));
     EXPECT_EQ(outbox.execAndGet("SELECT reason FROM dead_letter").getString(),
@@ -212,6 +214,20 @@ TEST_F(MisbehavingCollectorTest, IsALogInPage) {
     StartAgainst({Status(200, "Content-Type: text/html\r\n", "<html>log in</html>")});
     ExpectEverythingDelivered(10);
     EXPECT_EQ(m_server->RequestCount(), 2U);
+}
+
+TEST_F(MisbehavingCollectorTest, RefusesOneEventWithAPage) {
+    ReportBeforehand(20);
+    StartAgainstScript([](const Request& request) {
+        const auto events = EventsOf(request.body);
+        const bool poisonous =
+            std::any_of(events.begin(), events.end(), [](const auto& event) { return event.number == 13; });
+        return poisonous ? Status(413, "Content-Type: TEXT/html\r\n", "<html>too large</html>") : Status(200);
+    });
+    EXPECT_TRUE(WaitUntilNothingWaits());
+    Stop();
+    EXPECT_EQ(Totals().delivered, 19);
+    EXPECT_EQ(Totals().deadLettered, 1);
 }
 
 TEST_F(MisbehavingCollectorTest, RedirectsAndIsNotFollowed) {

@@ -57,6 +57,14 @@ std::string Body(const std::string& payload) {
     return Record(One(payload), "body");
 }
 
+TEST(OtlpEncoder, BoundsATimeThatDoesNotFitTheProtocol) {
+    auto batch = One("{}");
+    batch.events[0].storedAt = WallTime::max();
+    EXPECT_EQ(Record(batch, "observedTimeUnixNano"), R"("9223372036854000000")");
+    batch.events[0].storedAt = WallTime::min();
+    EXPECT_EQ(Record(batch, "observedTimeUnixNano"), R"("0")");
+}
+
 TEST(OtlpEncoder, WritesOneResourceForAModule) {
     auto document = Parsed(One("{}"));
     EXPECT_EQ(Text(document["resourceLogs"][0]["resource"]),

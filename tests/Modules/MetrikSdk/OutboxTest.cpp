@@ -28,7 +28,6 @@ protected:
         Told::Forget();
         m_notifier.Subscribe(&Told::OnFailure, &Told::OnSuccess);
         m_settings.file.reopenInterval = 0ms;
-        m_settings.file.identityCheckInterval = 0ms;
         m_settings.file.lockPatience = 100ms;
         m_settings.file.shortLockPatience = 1ms;
     }
@@ -198,6 +197,18 @@ TEST_F(OutboxTest, BeginsAnewWhenTheFileIsDeletedAndTells) {
     EXPECT_EQ(Open().Status().waiting, 1) << "the event is in the new file";
 }
 
+TEST_F(OutboxTest, WritesNoEventIntoADeletedFileHoweverSoonItComes) {
+    m_settings.file.reopenInterval = OutboxSettings().file.reopenInterval;
+    Open();
+    for (int i = 0; i < 20; ++i) {
+        Append();
+        for (const std::string suffix : {"", "-wal", "-shm"})
+            std::filesystem::remove(File() + suffix);
+        ASSERT_TRUE(Append());
+        ASSERT_EQ(Metrik::OutboxStore(File(), 1s).Status().stored, 1) << "round " << i;
+    }
+}
+
 TEST_F(OutboxTest, BeginsAnewWhenTheWholeDirectoryIsDeleted) {
     Open();
     Append();
@@ -250,6 +261,32 @@ TEST_F(OutboxTest, WaitsForALockOnceAndNotForEveryEvent) {
     other.exec("COMMIT");
     EXPECT_TRUE(Append());
     EXPECT_EQ(Told::Failures().Count("outbox file: "), 1);
+}
+
+TEST_F(OutboxTest, OpensAnExistingFileWhileAnotherProcessHoldsTheLock) {
+    Open();
+    Append();
+    SQLite::Database other(File(), SQLite::OPEN_READWRITE);
+    other.exec("BEGIN IMMEDIATE");
+    EXPECT_TRUE(Open().Open());
+    other.exec("COMMIT");
+}
+
+TEST_F(OutboxTest, WaitsForALockOnceAndNotForEveryOpening) {
+    std::filesystem::create_directories(m_path);
+    SQLite::Database other(File(), SQLite::OPEN_READWRITE | SQLite::OPEN_CREATE);
+    other.exec("PRAGMA journal_mode = WAL"); // empty, so that opening has to write
+    other.exec("BEGIN IMMEDIATE");
+    m_settings.file.lockPatience = 1s;
+    m_outbox = std::make_unique<Outbox>(m_path, m_settings, m_notifier);
+    const auto start = std::chrono::steady_clock::now();
+    EXPECT_FALSE(m_outbox->Open());
+    EXPECT_FALSE(m_outbox->Open());
+    const auto took = std::chrono::steady_clock::now() - start;
+    EXPECT_GE(took, 900ms);
+    EXPECT_LT(took, 1500ms);
+    other.exec("COMMIT");
+    EXPECT_TRUE(m_outbox->Open());
 }
 
 TEST_F(OutboxTest, StoresAnEventOnceTheLockIsReleasedWithinThePatience) {

@@ -208,6 +208,19 @@ TEST_F(MetrikSdkTest, StoresEventsWhileItUploadsOthers) {
     EXPECT_EQ(Totals().delivered, 5000);
 }
 
+TEST_F(MetrikSdkTest, TellsEverythingThatIsWrongWithTheConfiguration) {
+    Configure("ENDPOINT", "http://127.0.0.1:1");
+    Configure("TIMEOUT", "soon");
+    Configure("COMPRESSION", "zstd");
+    Start();
+    const auto told = Told::Failures().All();
+    const auto complaint = std::find_if(told.begin(), told.end(),
+                                        [](const auto& text) { return text.starts_with("configuration: "); });
+    ASSERT_NE(complaint, told.end());
+    EXPECT_NE(complaint->find("OTEL_EXPORTER_OTLP_TIMEOUT"), std::string::npos) << *complaint;
+    EXPECT_NE(complaint->find("OTEL_EXPORTER_OTLP_COMPRESSION"), std::string::npos) << *complaint;
+}
+
 TEST_F(MetrikSdkTest, TellsAConfigurationThatMakesNoSenseAndKeepsTheEvents) {
     Configure("ENDPOINT", "gopher://x");
     Start();

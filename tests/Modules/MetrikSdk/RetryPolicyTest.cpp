@@ -46,8 +46,22 @@ TEST(RetryPolicy, KeepsTheBatchWhenTheAnswerIsNotComplete) {
 
 TEST(RetryPolicy, TakesAWebPageForALogInPage) {
     auto page = Answer(200, "<html>Welcome to the hotel</html>");
-    page.contentType = "text/html; charset=utf-8";
-    EXPECT_EQ(Judge(page), Verdict::Wait);
+    for (const auto* type : {"text/html; charset=utf-8", "Text/HTML"}) {
+        page.contentType = type;
+        EXPECT_EQ(Judge(page), Verdict::Wait) << type;
+    }
+}
+
+TEST(RetryPolicy, JudgesAnErrorByItsStatusAlsoWhenItsTextIsAPage) {
+    const auto judge = [](long status) {
+        auto page = Answer(status, "<html>Error</html>");
+        page.contentType = "text/html";
+        return Judge(page);
+    };
+    for (const long status : {400, 401, 413, 500})
+        EXPECT_EQ(judge(status), Verdict::Halve) << status;
+    for (const long status : {302, 429, 502, 503, 504})
+        EXPECT_EQ(judge(status), Verdict::Wait) << status;
 }
 
 TEST(RetryPolicy, TakesAnAnswerThatIsNoJsonForAnAcceptance) {
@@ -79,6 +93,15 @@ TEST(RetryPolicy, UnderstandsRetryAfterInSeconds) {
 TEST(RetryPolicy, UnderstandsRetryAfterAsADate) {
     EXPECT_EQ(RetryPolicy::ParseRetryAfter("Tue, 21 Nov 2023 08:02:00 GMT", NOW), 120s);
     EXPECT_EQ(RetryPolicy::ParseRetryAfter("Tue, 21 Nov 2023 07:00:00 GMT", NOW), 0s);
+}
+
+TEST(RetryPolicy, BoundsARetryAfterOfAHostileYear) {
+    for (const auto* date : {"Tue, 21 Nov 2147483647 08:00:00 GMT", "Tue, 21 Nov 292277026 08:00:00 GMT"}) {
+        const auto wait = RetryPolicy::ParseRetryAfter(date, NOW);
+        EXPECT_TRUE(!wait || *wait > 24h) << date;
+        EXPECT_TRUE(!wait || *wait < 24h * 366 * 100) << date;
+    }
+    EXPECT_GT(RetryPolicy::ParseRetryAfter("Tue, 21 Nov 2147483647 08:00:00 GMT", NOW).value_or(0ms), 24h);
 }
 
 TEST(RetryPolicy, IgnoresARetryAfterThatIsNeither) {

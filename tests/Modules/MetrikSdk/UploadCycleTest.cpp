@@ -209,6 +209,30 @@ TEST_F(UploadCycleTest, DeletesWhatWasDeliveredBeforeItSendsAnythingElse) {
     EXPECT_EQ(m_outbox.Status().delivered, 2);
 }
 
+TEST_F(UploadCycleTest, DoesNotDropForACapWhatWasDeliveredAndIsNotDeletedYet) {
+    const TemporaryDirectory directory;
+    m_settings.caps.maxWaitingBytes = 10'000;
+    Outbox outbox(directory.Path(), m_settings, m_notifier);
+    UploadCycle cycle(outbox, m_sender, m_notifier, m_settings, [] { return 0.5; });
+    const auto append = [&](int count) {
+        for (int i = 0; i < count; ++i)
+            ASSERT_TRUE(outbox.Append({"A759", "1", "default"}, "A759|1", NumberedPayload(i)));
+    };
+    append(5);
+    SQLite::Database other(directory.Path() + "/MetrikOutbox.db", SQLite::OPEN_READWRITE);
+    m_sender.answer = [&](const auto&) {
+        other.exec("BEGIN IMMEDIATE");
+        return Status(200);
+    };
+    EXPECT_GT(cycle.Pass(WallNow() + 1h).duration, 0ms) << "taken, and cannot be deleted";
+    other.exec("COMMIT");
+    append(200);
+    EXPECT_GT(outbox.Status().dropped, 0) << "the cap dropped others";
+    AnswerAlways(Status(503));
+    cycle.Pass(WallNow() + 1h);
+    EXPECT_EQ(outbox.Status().delivered, 5);
+}
+
 TEST_F(UploadCycleTest, SaysNothingWhenARequestEndsBecauseItIsToStop) {
     Append(1);
     HttpResult abandoned;
