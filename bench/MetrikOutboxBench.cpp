@@ -27,6 +27,10 @@ const std::string PAYLOAD =
     R"({"extend":{"hublinkVersion":"5.1.0.2","createTime":"1700000000123"},"eventData":{"button":"ok",)"
     R"("count":3,"ratio":1.5,"openid":"visitor","sys_version":"Debian GNU/Linux 12 (bookworm) 6.1.0"}})";
 
+std::shared_ptr<FailureReporter> Reporter() {
+    return std::make_shared<FailureReporter>(1min);
+}
+
 constexpr const char* BARE_SCHEMA = "CREATE TABLE event(id INTEGER PRIMARY KEY, event_id TEXT, payload TEXT)";
 
 void Bare(benchmark::State& state, const char* synchronous) {
@@ -123,9 +127,9 @@ void UploadEverything(benchmark::State& state) {
         Outbox(directory.Path(), OutboxSettings(), notifier).Append(MODULE, "A759|10001", PAYLOAD);
         Fill(directory.Path(), state.range(0));
         state.ResumeTiming();
-        OutboxEngine engine(directory.Path(), OutboxSettings(), endpoint, {});
+        OutboxEngine engine(directory.Path(), OutboxSettings(), endpoint, {}, Reporter());
         engine.Open();
-        if (!WaitUntil([&] { return engine.Events().Status().waiting == 0; }, 60s))
+        if (!WaitUntil([&] { return engine.Events().Status().waiting == 0; }, 600s))
             state.SkipWithError("not delivered");
     }
     state.SetItemsProcessed(state.iterations() * (state.range(0) + 1));
@@ -137,7 +141,7 @@ void StoreWhileUploading(benchmark::State& state) {
     EndpointConfig endpoint;
     endpoint.url = collector.Url() + "/v1/logs";
     const TemporaryDirectory directory;
-    OutboxEngine engine(directory.Path(), OutboxSettings(), endpoint, {});
+    OutboxEngine engine(directory.Path(), OutboxSettings(), endpoint, {}, Reporter());
     for (auto _ : state)
         if (!engine.Events().Append(MODULE, "A759|10001", PAYLOAD))
             state.SkipWithError("not stored");
@@ -160,6 +164,7 @@ BENCHMARK(EncodeABatch)->Unit(benchmark::kMicrosecond);
 BENCHMARK(UploadEverything)
     ->Args({50'000, 0})
     ->Args({50'000, 1})
+    ->Args({1'000'000, 0})
     ->ArgNames({"events", "gzip"})
     ->Unit(benchmark::kMillisecond)
     ->UseRealTime();

@@ -22,6 +22,8 @@ const char* NameOf(Cause cause) {
         return "upload";
     case Cause::Refusal:
         return "events refused";
+    case Cause::Init:
+        return "init";
     case Cause::Count:
         break;
     }
@@ -29,6 +31,7 @@ const char* NameOf(Cause cause) {
 }
 
 std::optional<std::string> FailureReporter::Report(Cause cause, const std::string& text, SteadyTime now) {
+    const std::lock_guard lock(m_mutex);
     auto& history = m_histories[static_cast<std::size_t>(cause)];
     if (history.lastTold && now - *history.lastTold < m_interval) {
         ++history.keptBack;

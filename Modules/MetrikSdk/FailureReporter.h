@@ -2,6 +2,7 @@
 
 #include <array>
 #include <chrono>
+#include <mutex>
 #include <optional>
 #include <string>
 
@@ -20,6 +21,7 @@ enum class Cause {
     Drop,          ///< Events given up for a cap.
     Upload,        ///< The collector cannot be reached or asks to wait.
     Refusal,       ///< Events that the collector will never take.
+    Init,          ///< A module could not be initialised for a reason that nobody foresaw.
     Count          ///< How many causes there are.
 };
 
@@ -27,7 +29,8 @@ enum class Cause {
 const char* NameOf(Cause cause);
 
 /// Decides which failures are told: of the same cause at most one in an interval, with the number of those
-/// that were kept back since. Pure: the clock is the caller's. One thread at a time.
+/// that were kept back since. All outboxes of a process share one: they end in the same log, and a full disk
+/// hits them all. The clock is the caller's. Threads: any.
 class FailureReporter {
 public:
     explicit FailureReporter(std::chrono::milliseconds interval) : m_interval(interval) {}
@@ -41,7 +44,8 @@ private:
         unsigned long keptBack = 0;
     };
 
-    std::chrono::milliseconds m_interval;
+    const std::chrono::milliseconds m_interval;
+    std::mutex m_mutex; ///< Guards the histories.
     std::array<History, static_cast<std::size_t>(Cause::Count)> m_histories{};
 };
 

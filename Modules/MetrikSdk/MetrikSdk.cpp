@@ -45,8 +45,16 @@ bool MetrikSdk::InitSdk(std::string moduleId, std::string moduleVersion, std::st
         m_onSuccess = onSuccess;
         return Attach(dbDir);
     } catch (const std::exception& error) {
-        Call(onFailure, "init", error.what());
+        TellInitFailure(onFailure, error.what());
         return false;
+    }
+}
+
+void MetrikSdk::TellInitFailure(Callback onFailure, const char* reason) noexcept {
+    try {
+        if (const auto text = m_registry.Report(Cause::Init, reason))
+            Call(onFailure, NameOf(Cause::Init), *text);
+    } catch (...) { // no memory to tell it with
     }
 }
 

@@ -35,6 +35,7 @@ public:
 private:
     bool Attach(const std::string& dbDir);
     void Detach();
+    void TellInitFailure(Callback onFailure, const char* reason) noexcept;
 
     OutboxRegistry& m_registry;
     std::shared_ptr<OutboxEngine> m_engine; ///< Null before InitSdk, and without any directory.

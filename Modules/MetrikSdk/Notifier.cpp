@@ -32,13 +32,16 @@ void Notifier::Unsubscribe(IMetrikSdk::Callback onFailure, IMetrikSdk::Callback 
     Take(m_onSuccess, onSuccess);
 }
 
-void Notifier::TellFailure(const News& news) {
-    const std::lock_guard lock(m_mutex);
-    if (const auto text = m_reporter.Report(news.cause, news.text, std::chrono::steady_clock::now()))
-        Tell(m_onFailure, NameOf(news.cause), *text);
+void Notifier::TellFailure(const News& news) noexcept {
+    try {
+        const std::lock_guard lock(m_mutex);
+        if (const auto text = m_reporter->Report(news.cause, news.text, std::chrono::steady_clock::now()))
+            Tell(m_onFailure, NameOf(news.cause), *text);
+    } catch (...) { // no memory for the text
+    }
 }
 
-void Notifier::TellFailures(const std::vector<News>& news) {
+void Notifier::TellFailures(const std::vector<News>& news) noexcept {
     for (const auto& one : news)
         TellFailure(one);
 }

@@ -1,8 +1,10 @@
 #pragma once
 
 #include <map>
+#include <memory>
 #include <mutex>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "Modules/MetrikSdk/FailureReporter.h"
@@ -21,17 +23,22 @@ struct News {
 ///
 /// Threads: any. A callback runs while the notifier's lock is held, so that after Unsubscribe no call to it
 /// is under way or will come; it may report events, but not initialise or destroy an SDK object.
-/// Failure: what a callback throws goes nowhere.
+/// Failure: what a callback throws goes nowhere, and a failure that cannot be told, for want of memory, neither:
+/// whoever tells one is in the middle of handling it.
 class Notifier {
 public:
-    explicit Notifier(std::chrono::milliseconds tellInterval) : m_reporter(tellInterval) {}
+    explicit Notifier(std::shared_ptr<FailureReporter> reporter) : m_reporter(std::move(reporter)) {}
+
+    /// With a limit of its own.
+    explicit Notifier(std::chrono::milliseconds tellInterval)
+        : Notifier(std::make_shared<FailureReporter>(tellInterval)) {}
 
     /// Null functions are allowed, and are not called. Each call is undone by one Unsubscribe.
     void Subscribe(IMetrikSdk::Callback onFailure, IMetrikSdk::Callback onSuccess);
     void Unsubscribe(IMetrikSdk::Callback onFailure, IMetrikSdk::Callback onSuccess);
 
-    void TellFailure(const News& news);
-    void TellFailures(const std::vector<News>& news);
+    void TellFailure(const News& news) noexcept;
+    void TellFailures(const std::vector<News>& news) noexcept;
     void TellSuccess(const std::string& what, const std::string& detail);
 
     /// From now on nobody in this process is told anything: exit() is running, and what the callbacks use may
@@ -45,7 +52,7 @@ private:
 
     /// Guards all below. Recursive, because a callback may come back with an event that fails in its turn.
     std::recursive_mutex m_mutex;
-    FailureReporter m_reporter;
+    const std::shared_ptr<FailureReporter> m_reporter;
     Subscribers m_onFailure;
     Subscribers m_onSuccess;
 };

@@ -3,7 +3,6 @@
 #include <algorithm>
 #include <utility>
 
-#include "Modules/MetrikSdk/PruneRule.h"
 #include "Modules/MetrikSdk/Uuid.h"
 
 namespace Metrik {
@@ -94,6 +93,7 @@ void Outbox::LearnAbout(OutboxStore& store) {
     Recount(store);
     m_openedSteady = m_now;
     m_openedAt = WallNow();
+    m_clocks = PruneRule::BeginWatch(m_openedAt, m_now);
     m_nextAgeCheck = m_now;
     m_knownGeneration = m_keeper.Generation();
 }
@@ -110,8 +110,16 @@ void Outbox::KeepWithinCaps(OutboxStore& store) {
     const bool lookForOld = m_now >= m_nextAgeCheck;
     if (excess == 0 && !lookForOld)
         return;
+    Drop(store, OldestAllowed(), excess);
+}
+
+WallTime Outbox::OldestAllowed() {
+    const auto wall = WallNow();
+    m_clocks = PruneRule::LookAgain(m_clocks, wall, m_now);
+    if (!PruneRule::MayDropByAge(m_clocks, m_settings.caps))
+        return WallTime::min();
     const auto elapsed = std::chrono::duration_cast<std::chrono::milliseconds>(m_now - m_openedSteady);
-    Drop(store, PruneRule::OldestAllowed(WallNow(), m_openedAt, elapsed, m_settings.caps), excess);
+    return PruneRule::OldestAllowed(wall, m_openedAt, elapsed, m_settings.caps);
 }
 
 void Outbox::Drop(OutboxStore& store, WallTime before, std::int64_t excess) {
@@ -158,9 +166,22 @@ void Outbox::RemoveDelivered(const Batch& batch, std::size_t refused) {
 void Outbox::MoveToDeadLetters(const StoredEvent& event, const Refusal& refusal) {
     WithStore(Caller::Uploader, [&](OutboxStore& store) {
         store.MoveToDeadLetters(event, refusal, WallNow());
-        store.TrimDeadLetters(m_settings.caps.maxDeadLetters, m_settings.caps.maxDeadLetterBytes);
+        KeepDeadLettersWithinCaps(store);
         Recount(store);
     });
+}
+
+void Outbox::KeepDeadLettersWithinCaps(OutboxStore& store) {
+    try {
+        const auto trimmed =
+            store.TrimDeadLetters(m_settings.caps.maxDeadLetters, m_settings.caps.maxDeadLetterBytes);
+        if (trimmed > 0)
+            m_news.push_back(
+                {Cause::Drop, "The dead letters are over their bounds: the oldest were deleted, " +
+                                  std::to_string(trimmed) + " of them just now"});
+    } catch (const StoreError& error) { // the event itself was moved, which is what is to be told next
+        m_news.push_back({Cause::File, error.what()});
+    }
 }
 
 OutboxStatus Outbox::Status() {

@@ -10,6 +10,7 @@
 #include "Modules/MetrikSdk/FileKeeper.h"
 #include "Modules/MetrikSdk/Notifier.h"
 #include "Modules/MetrikSdk/OutboxStore.h"
+#include "Modules/MetrikSdk/PruneRule.h"
 #include "Modules/MetrikSdk/Settings.h"
 
 namespace Metrik {
@@ -57,7 +58,9 @@ private:
     void LearnAbout(OutboxStore& store);
     void Recount(OutboxStore& store);
     void KeepWithinCaps(OutboxStore& store);
+    WallTime OldestAllowed();
     void Drop(OutboxStore& store, WallTime before, std::int64_t excess);
+    void KeepDeadLettersWithinCaps(OutboxStore& store);
     void TellDrop(std::size_t dropped);
 
     const OutboxSettings m_settings;
@@ -77,6 +80,7 @@ private:
     SteadyTime m_now{};                      ///< Of the operation under way.
     SteadyTime m_openedSteady{};             ///< Both times of when the file was opened.
     WallTime m_openedAt{};
+    PruneRule::ClockWatch m_clocks;
     SteadyTime m_nextAgeCheck{};
     std::optional<SteadyTime> m_lastDrop;
     std::vector<News> m_news; ///< Told once the lock is released.

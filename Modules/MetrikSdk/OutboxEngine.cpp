@@ -31,8 +31,10 @@ std::string Joined(const std::vector<std::string>& texts) {
 } // namespace
 
 OutboxEngine::OutboxEngine(const std::string& directory, const OutboxSettings& settings,
-                           const std::optional<EndpointConfig>& endpoint, std::vector<std::string> complaints)
-    : m_core(std::make_shared<OutboxCore>(directory, settings)), m_complaints(std::move(complaints)) {
+                           const std::optional<EndpointConfig>& endpoint, std::vector<std::string> complaints,
+                           std::shared_ptr<FailureReporter> reporter)
+    : m_core(std::make_shared<OutboxCore>(directory, settings, std::move(reporter))),
+      m_complaints(std::move(complaints)) {
     if (endpoint)
         StartUploader(*endpoint);
     RegisterOnExit();

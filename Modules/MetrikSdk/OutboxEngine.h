@@ -15,7 +15,8 @@ namespace Metrik {
 class OutboxEngine {
 public:
     OutboxEngine(const std::string& directory, const OutboxSettings& settings,
-                 const std::optional<EndpointConfig>& endpoint, std::vector<std::string> complaints);
+                 const std::optional<EndpointConfig>& endpoint, std::vector<std::string> complaints,
+                 std::shared_ptr<FailureReporter> reporter);
 
     /// Opens the outbox file, and tells what was wrong with the configuration, which nobody could be told
     /// earlier.

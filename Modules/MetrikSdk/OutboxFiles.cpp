@@ -18,8 +18,8 @@ namespace {
 constexpr mode_t DIRECTORY_MODE = 0700;
 constexpr mode_t FILE_MODE = 0600;
 
-[[noreturn]] void Fail(const std::string& what, const std::string& path) {
-    const auto reason = std::generic_category().message(errno);
+[[noreturn]] void Fail(const std::string& what, const std::string& path, int error = errno) {
+    const auto reason = std::generic_category().message(error);
     throw StoreError(StoreFault::Reopen, what + " " + path + ": " + reason);
 }
 
@@ -69,8 +69,9 @@ void MakeDirectory(const std::string& directory) {
     for (auto end = directory.find('/', 1);; end = directory.find('/', end + 1)) {
         const auto level = directory.substr(0, end);
         // The umask can only take rights away from a mode given to mkdir.
-        if (::mkdir(level.c_str(), DIRECTORY_MODE) != 0 && errno != EEXIST && !Exists(level))
-            Fail("Cannot make the directory", level);
+        const int error = ::mkdir(level.c_str(), DIRECTORY_MODE) == 0 ? 0 : errno;
+        if (error != 0 && error != EEXIST && !Exists(level)) // which has an errno of its own
+            Fail("Cannot make the directory", level, error);
         if (end == std::string::npos)
             return;
     }

@@ -24,7 +24,8 @@ std::string Canonical(const std::string& directory) {
 } // namespace
 
 OutboxRegistry::OutboxRegistry(const OutboxSettings& settings, LookUp lookUp)
-    : m_settings(settings), m_lookUp(std::move(lookUp)), m_reporter(settings.tellInterval) {}
+    : m_settings(settings), m_lookUp(std::move(lookUp)),
+      m_reporter(std::make_shared<FailureReporter>(settings.tellInterval)) {}
 
 OutboxRegistry& OutboxRegistry::Instance() {
     static auto& instance =
@@ -43,7 +44,8 @@ std::shared_ptr<OutboxEngine> OutboxRegistry::Acquire(const std::string& directo
     if (!engine) {
         std::vector<std::string> complaints;
         const auto endpoint = ReadEndpoint(m_lookUp, complaints);
-        engine = std::make_shared<OutboxEngine>(chosen, m_settings, endpoint, std::move(complaints));
+        engine =
+            std::make_shared<OutboxEngine>(chosen, m_settings, endpoint, std::move(complaints), m_reporter);
         known = engine;
     }
     return engine;
@@ -68,14 +70,20 @@ void OutboxRegistry::ForgetReleased() {
 void OutboxRegistry::Release(std::shared_ptr<OutboxEngine>& engine) {
     const std::lock_guard lock(m_mutex);
     engine.reset();
+    ForgetReleased();
+    if (m_engines.empty())
+        m_reporter = std::make_shared<FailureReporter>(m_settings.tellInterval);
 }
 
 std::optional<std::string> OutboxRegistry::ReportNoDirectory() {
+    return Report(Cause::Directory,
+                  "No absolute database directory was given, neither now nor before: events of "
+                  "this module are refused");
+}
+
+std::optional<std::string> OutboxRegistry::Report(Cause cause, const std::string& text) {
     const std::lock_guard lock(m_mutex);
-    return m_reporter.Report(Cause::Directory,
-                             "No absolute database directory was given, neither now nor before: events of "
-                             "this module are refused",
-                             std::chrono::steady_clock::now());
+    return m_reporter->Report(cause, text, std::chrono::steady_clock::now());
 }
 
 } // namespace Metrik

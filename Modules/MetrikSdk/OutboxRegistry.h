@@ -36,8 +36,10 @@ public:
     /// file meanwhile.
     void Release(std::shared_ptr<OutboxEngine>& engine);
 
-    /// What to tell a module that got no outbox, if it is time to tell.
+    /// What to tell a module that got no outbox, if it is time to tell: the limit on what is told holds for the
+    /// process. It begins anew when the last outbox in use was released, whose users have heard it all.
     std::optional<std::string> ReportNoDirectory();
+    std::optional<std::string> Report(Cause cause, const std::string& text);
 
 private:
     std::string Choose(const std::string& directory);
@@ -45,8 +47,8 @@ private:
 
     const OutboxSettings m_settings;
     const LookUp m_lookUp;
-    std::mutex m_mutex; ///< Guards all below.
-    FailureReporter m_reporter;
+    std::mutex m_mutex;                          ///< Guards all below.
+    std::shared_ptr<FailureReporter> m_reporter; ///< Shared by all outboxes.
     std::string m_firstDirectory;
     std::map<std::string, std::weak_ptr<OutboxEngine>> m_engines; ///< By canonical directory.
 };

@@ -232,8 +232,9 @@ void OutboxStore::MoveToDeadLetters(const StoredEvent& event, const Refusal& ref
     });
 }
 
-void OutboxStore::TrimDeadLetters(std::size_t maxRows, std::size_t maxBytes) {
-    Guarded("Cannot trim the dead letters", [&] {
+std::size_t OutboxStore::TrimDeadLetters(std::size_t maxRows, std::size_t maxBytes) {
+    return Guarded("Cannot trim the dead letters", [&] {
+        std::size_t trimmed = 0;
         SQLite::Statement excess(m_database, "SELECT 1 FROM totals WHERE dead_letters > ?1 OR "
                                              "dead_letter_bytes > ?2");
         excess.bind(1, static_cast<std::int64_t>(maxRows));
@@ -252,9 +253,10 @@ void OutboxStore::TrimDeadLetters(std::size_t maxRows, std::size_t maxBytes) {
                 m_database.exec("UPDATE totals SET dead_letters = 0, dead_letter_bytes = 0");
             SQLite::Statement remove(m_database, "DELETE FROM dead_letter WHERE id = ?1");
             remove.bind(1, oldest);
-            remove.exec();
+            trimmed += remove.exec() == 1 ? 1U : 0U;
             transaction.commit();
         }
+        return trimmed;
     });
 }
 

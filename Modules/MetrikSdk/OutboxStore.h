@@ -74,8 +74,8 @@ public:
     /// Moves the event, if it is still there, to the dead-letter table.
     void MoveToDeadLetters(const StoredEvent& event, const Refusal& refusal, WallTime now);
 
-    /// Deletes the oldest dead letters until both bounds hold.
-    void TrimDeadLetters(std::size_t maxRows, std::size_t maxBytes);
+    /// Deletes the oldest dead letters until both bounds hold. Returns how many.
+    std::size_t TrimDeadLetters(std::size_t maxRows, std::size_t maxBytes);
 
     /// Deletes the oldest events behind row `afterRow`, at most `maxRows`, that were stored before `before`,
     /// or until `excessBytes` are gone. Returns how many.

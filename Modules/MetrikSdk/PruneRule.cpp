@@ -14,6 +14,23 @@ WallTime OldestAllowed(WallTime now, WallTime openedAt, std::chrono::millisecond
     return std::min(now, openedAt + elapsed) - caps.maxAge;
 }
 
+ClockWatch BeginWatch(WallTime wall, SteadyTime steady) {
+    return {wall, steady, steady};
+}
+
+ClockWatch LookAgain(const ClockWatch& watch, WallTime wall, SteadyTime steady) {
+    constexpr std::chrono::milliseconds TOLERANCE = std::chrono::minutes(1);
+    constexpr int MAX_SLEW = 1000; // a time daemon corrects by half of a thousandth at most
+    const auto elapsed = std::chrono::floor<std::chrono::milliseconds>(steady - watch.lastSteady);
+    const auto apart = std::chrono::abs((wall - watch.lastWall) - elapsed);
+    const bool agree = apart <= TOLERANCE + elapsed / MAX_SLEW;
+    return {wall, steady, agree ? watch.agreeingSince : steady};
+}
+
+bool MayDropByAge(const ClockWatch& watch, const CapSettings& caps) {
+    return watch.lastSteady - watch.agreeingSince >= caps.clockAgreement;
+}
+
 bool BeginsRun(std::optional<SteadyTime> lastDrop, SteadyTime now, const CapSettings& caps) {
     return !lastDrop || now - *lastDrop > caps.dropRunEnds;
 }

@@ -13,6 +13,9 @@ struct CapSettings {
     std::size_t maxWaitingBytes = std::size_t{512} * 1024 * 1024;
     /// Usage figures older than this change no decision any more, and a collector's store has closed the day.
     std::chrono::milliseconds maxAge = std::chrono::days(30);
+    /// So long must the wall clock have run without a step before events are dropped by age. A machine that starts
+    /// without the right time has it from the network within minutes.
+    std::chrono::milliseconds clockAgreement = std::chrono::hours(1);
     /// Looking for old events costs a read; they age by the day.
     std::chrono::milliseconds ageCheckInterval = std::chrono::minutes(1);
     /// Rows dropped in one transaction: a few milliseconds of one call.

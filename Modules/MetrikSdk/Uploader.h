@@ -13,8 +13,9 @@ namespace Metrik {
 
 /// What an outbox's users and its uploader share. Lives as long as any of them.
 struct OutboxCore {
-    OutboxCore(const std::string& directory, const OutboxSettings& outboxSettings)
-        : settings(outboxSettings), notifier(settings.tellInterval), outbox(directory, settings, notifier) {}
+    OutboxCore(const std::string& directory, const OutboxSettings& outboxSettings,
+               std::shared_ptr<FailureReporter> reporter)
+        : settings(outboxSettings), notifier(std::move(reporter)), outbox(directory, settings, notifier) {}
 
     const OutboxSettings settings;
     Notifier notifier;

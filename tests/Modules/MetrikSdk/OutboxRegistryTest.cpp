@@ -5,6 +5,7 @@
 
 #include <gtest/gtest.h>
 
+#include "tests/Modules/MetrikSdk/support/Told.h"
 #include "tests/support/TemporaryDirectory.h"
 
 using namespace Metrik;
@@ -43,6 +44,20 @@ TEST_F(OutboxRegistryTest, FallsBackToTheFirstDirectoryAlsoAfterItsRelease) {
     m_registry.Release(first);
     auto again = m_registry.Acquire("");
     EXPECT_EQ(again, m_registry.Acquire(path));
+}
+
+TEST_F(OutboxRegistryTest, TellsTheSameCauseOnceForAllOutboxes) {
+    Told::Forget();
+    std::vector<std::shared_ptr<OutboxEngine>> engines;
+    for (const std::string name : {"/1", "/2", "/3"}) {
+        std::filesystem::create_directories(m_directory.Path() + name + "/MetrikOutbox.db");
+        auto& engine = engines.emplace_back(m_registry.Acquire(m_directory.Path() + name));
+        engine->Listeners().Subscribe(&Told::OnFailure, nullptr);
+        EXPECT_FALSE(engine->Open());
+    }
+    EXPECT_EQ(Told::Failures().All().size(), 1U);
+    EXPECT_TRUE(m_registry.Report(Cause::Init, "why"));
+    EXPECT_FALSE(m_registry.Report(Cause::Init, "why"));
 }
 
 TEST_F(OutboxRegistryTest, BoundsTheOutboxesOfAProcess) {

@@ -121,7 +121,17 @@ TEST_F(OutboxTest, StaysWithinItsCapTellsARunOfDropsOnceAndCountsEveryOne) {
     EXPECT_EQ(Told::Failures().Count("events dropped: "), 1);
 }
 
+TEST_F(OutboxTest, DropsNothingByAgeBeforeItsClockHasProvedItself) {
+    Open();
+    Append();
+    SQLite::Database(File(), SQLite::OPEN_READWRITE).exec("UPDATE event SET stored_ms = 1000");
+    Open();
+    Append();
+    EXPECT_EQ(m_outbox->Status().waiting, 2);
+}
+
 TEST_F(OutboxTest, DropsEventsThatAreTooOld) {
+    m_settings.caps.clockAgreement = 0ms;
     Open();
     Append();
     Append();

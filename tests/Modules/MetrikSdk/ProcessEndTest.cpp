@@ -31,14 +31,21 @@ protected:
         return m_reply;
     }
 
-    /// A "stream" child is killed after a moment; the numbers that it was told were accepted.
-    std::vector<int> KillAtARandomMoment(int firstNumber) {
+    enum class KillAfter { AnEvent, ARequest };
+
+    /// A "stream" child is killed a moment after its first event, or after the first request that the server sees
+    /// of it; the numbers that it was told were accepted.
+    std::vector<int> KillAtARandomMoment(int firstNumber, KillAfter what) {
+        const auto before = m_server.RequestCount();
         ChildProcess child(m_directory.Path(), firstNumber, "stream");
         child.AwaitOutput();
+        if (what == KillAfter::ARequest)
+            EXPECT_TRUE(WaitUntil([&] { return m_server.RequestCount() > before; }));
         const auto moment = std::chrono::steady_clock::now() +
                             std::chrono::microseconds(std::uniform_int_distribution(0, 120'000)(m_random));
         WaitUntil([&] { return std::chrono::steady_clock::now() > moment; });
         child.Kill();
+        m_roundsWithRequests += m_server.RequestCount() > before ? 1 : 0;
         EXPECT_TRUE(WIFSIGNALED(child.AwaitEnd().value_or(0)));
         std::istringstream output(child.Output());
         std::vector<int> accepted;
@@ -62,16 +69,19 @@ protected:
     std::map<int, std::set<std::string>> m_uuids; ///< Under which ids each number arrived.
     std::set<std::int64_t> m_sequences;
     LoopbackServer m_server{[this](const Request& request) { return Take(request); }};
+    int m_roundsWithRequests = 0; ///< Kills before which events went out.
     std::mt19937 m_random{std::random_device{}()};
 };
 
 TEST_F(ProcessEndTest, LosesNothingThatWasAcceptedBeforeFiftyKills) {
     std::vector<int> accepted;
     for (int i = 0; i < 50; ++i) {
-        const auto more = KillAtARandomMoment(i * 1'000'000);
+        const auto after = i % 4 == 0 ? KillAfter::AnEvent : KillAfter::ARequest;
+        const auto more = KillAtARandomMoment(i * 1'000'000, after);
         ASSERT_FALSE(more.empty());
         accepted.insert(accepted.end(), more.begin(), more.end());
     }
+    EXPECT_GE(m_roundsWithRequests, 37) << "events went out while processes were killed";
     Start();
     ASSERT_TRUE(WaitUntilNothingWaits());
     Stop();

@@ -38,6 +38,37 @@ TEST(PruneRule, BelievesAClockThatGoesBack) {
     EXPECT_EQ(PruneRule::OldestAllowed(OPENED - 24h, OPENED, 1h, Caps()), OPENED - std::chrono::days(31));
 }
 
+/// Whether events may be dropped by age after looks once a minute for so long, with one step of the wall clock.
+bool MayDropAfter(std::chrono::minutes minutes, std::chrono::minutes stepAt, std::chrono::hours step) {
+    const SteadyTime start{100h};
+    auto watch = PruneRule::BeginWatch(OPENED, start);
+    for (auto minute = 1min; minute <= minutes; ++minute) {
+        const auto stepped = minute >= stepAt ? step : 0h;
+        watch = PruneRule::LookAgain(watch, OPENED + minute + stepped, start + minute);
+    }
+    return PruneRule::MayDropByAge(watch, Caps());
+}
+
+TEST(PruneRule, CallsNothingOldBeforeTheClocksHaveAgreedForAnHour) {
+    EXPECT_FALSE(MayDropAfter(59min, 59min, 0h));
+    EXPECT_TRUE(MayDropAfter(60min, 60min, 0h));
+}
+
+TEST(PruneRule, BeginsTheHourAnewWithEveryStepOfTheClock) {
+    for (const auto step : {std::chrono::hours(-24 * 4000), std::chrono::hours(24 * 4000), 1h}) {
+        EXPECT_FALSE(MayDropAfter(80min, 30min, step));
+        EXPECT_TRUE(MayDropAfter(90min, 30min, step));
+    }
+}
+
+TEST(PruneRule, TakesSlewingOverAMonthForAgreement) {
+    const SteadyTime start{100h};
+    const auto month = std::chrono::days(30);
+    const auto watch =
+        PruneRule::LookAgain(PruneRule::BeginWatch(OPENED, start), OPENED + month + 20min, start + month);
+    EXPECT_TRUE(PruneRule::MayDropByAge(watch, Caps()));
+}
+
 TEST(PruneRule, TellsTheFirstDropOfARunOnly) {
     const SteadyTime now{100h};
     EXPECT_TRUE(PruneRule::BeginsRun(std::nullopt, now, Caps()));

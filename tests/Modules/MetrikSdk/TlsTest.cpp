@@ -5,7 +5,9 @@
 #include <Poco/Net/SSLManager.h>
 #include <Poco/Net/SecureServerSocket.h>
 
+#include "Modules/MetrikSdk/HttpSender.h"
 #include "tests/Modules/MetrikSdk/support/PluginFixture.h"
+#include "tests/Modules/MetrikSdk/support/SmallDisk.h"
 
 using namespace std::chrono_literals;
 
@@ -25,9 +27,14 @@ void MakeCertificate(const std::string& name, const std::string& host) {
 class TlsTest : public PluginFixture {
 protected:
     void StartAgainst(const std::string& host, Poco::Net::Context::VerificationMode mode) {
-        const auto server = m_keys.Path() + "/server";
-        MakeCertificate(server, host);
+        MakeCertificate(m_keys.Path() + "/server", host);
         MakeCertificate(m_keys.Path() + "/client", "IP:127.0.0.1");
+        Serve(mode);
+        Start();
+    }
+
+    void Serve(Poco::Net::Context::VerificationMode mode) {
+        const auto server = m_keys.Path() + "/server";
         Poco::Net::Context::Params parameters;
         parameters.privateKeyFile = server + ".key";
         parameters.certificateFile = server + ".crt";
@@ -39,7 +46,6 @@ protected:
             [](const Request&) { return Reply(); },
             Poco::Net::SecureServerSocket(Poco::Net::SocketAddress("127.0.0.1", 0), 64, context));
         Configure("ENDPOINT", m_server->Url("https"));
-        Start();
     }
 
     void ExpectNothingLeaves() {
@@ -60,6 +66,45 @@ TEST_F(TlsTest, DeliversToACollectorWhoseCertificateWasNamed) {
     Report(10);
     EXPECT_TRUE(WaitUntilNothingWaits());
     EXPECT_EQ(Totals().delivered, 10);
+}
+
+TEST_F(TlsTest, TrustsTheNamedCertificateInsteadOfTheSystemsDirectory) {
+#if defined(__SANITIZE_THREAD__)
+    GTEST_SKIP() << "the sanitizer wants no threads in a child that was forked";
+#endif
+    const std::string system = "/etc/ssl/certs";
+    const auto result = RunOnSmallDisk(system, 1'000'000, [&] {
+        const auto keys = m_keys.Path();
+        MakeCertificate(keys + "/server", "IP:127.0.0.1");
+        MakeCertificate(keys + "/client", "IP:127.0.0.1");
+        const auto install = "cp '" + keys + "/client.crt' " + system + "/ca-certificates.crt && cp '" +
+                             keys + "/server.crt' " + system + "/$(openssl x509 -hash -noout -in '" + keys +
+                             "/server.crt').0";
+        ASSERT_EQ(std::system(install.c_str()), 0);
+        Serve(Poco::Net::Context::VERIFY_NONE);
+        Start();
+        Report(1);
+        EXPECT_TRUE(WaitUntilNothingWaits()) << "the system's directory vouches for the collector";
+        Stop();
+        Configure("CERTIFICATE", keys + "/client.crt");
+        Start();
+        Report(10);
+        EXPECT_TRUE(WaitUntil([] { return Told::Failures().Count("upload: ") == 1; }));
+        Stop();
+        EXPECT_EQ(Totals().waiting, 10) << "the named certificate does not";
+        m_server.reset();
+    });
+    if (result == SmallDiskResult::Unavailable)
+        GTEST_SKIP() << "no right to mount a file system here";
+    EXPECT_EQ(result, SmallDiskResult::Passed);
+}
+
+TEST(HttpSender, TellsAnOptionThatTheLibraryRefuses) {
+    Metrik::EndpointConfig config;
+    config.url = "https://127.0.0.1:1/";
+    EXPECT_NO_THROW(Metrik::HttpSender{config});
+    config.certificate = std::string(9'000'000, 'x'); // longer than the library takes any text
+    EXPECT_THROW(Metrik::HttpSender{config}, std::runtime_error);
 }
 
 TEST_F(TlsTest, DeliversNothingToACollectorThatNobodyVouchesFor) {

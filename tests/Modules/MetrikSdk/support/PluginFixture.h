@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstdlib>
+#include <filesystem>
 #include <memory>
 #include <mutex>
 #include <set>
@@ -25,6 +26,13 @@ protected:
     using Loader = SystemTool::ModuleLoader<IMetrikSdk>;
 
     PluginFixture() { Told::Forget(); }
+
+    /// Whatever a test did: what the counters say is what the tables hold.
+    void TearDown() override {
+        Stop();
+        if (std::filesystem::is_regular_file(File()))
+            ExpectTheCountersToBeTrue();
+    }
 
     ~PluginFixture() override {
         for (const auto& name : m_variables)
@@ -65,6 +73,22 @@ protected:
 
     Metrik::OutboxStatus Totals() const {
         return Metrik::OutboxStore(File(), std::chrono::seconds(5)).Status();
+    }
+
+    /// In one statement, because an uploader that hangs may still be at work.
+    void ExpectTheCountersToBeTrue() const {
+        SQLite::Database outbox(File(), SQLite::OPEN_READWRITE);
+        outbox.setBusyTimeout(5000);
+        SQLite::Statement query(outbox,
+                                "SELECT waiting, (SELECT count(*) FROM event), "
+                                "waiting_bytes, (SELECT coalesce(sum(bytes), 0) FROM event), "
+                                "dead_letters, (SELECT count(*) FROM dead_letter), "
+                                "dead_letter_bytes, (SELECT coalesce(sum(bytes), 0) FROM dead_letter) "
+                                "FROM outbox_status");
+        ASSERT_TRUE(query.executeStep());
+        for (int column = 0; column < 8; column += 2)
+            EXPECT_EQ(query.getColumn(column).getInt64(), query.getColumn(column + 1).getInt64())
+                << query.getColumn(column).getName();
     }
 
     bool WaitUntilNothingWaits() const {
