@@ -39,8 +39,9 @@ protected:
         const auto before = m_server.RequestCount();
         ChildProcess child(m_directory.Path(), firstNumber, "stream");
         child.AwaitOutput();
-        if (what == KillAfter::ARequest)
+        if (what == KillAfter::ARequest) {
             EXPECT_TRUE(WaitUntil([&] { return m_server.RequestCount() > before; }));
+        }
         const auto moment = std::chrono::steady_clock::now() +
                             std::chrono::microseconds(std::uniform_int_distribution(0, 120'000)(m_random));
         WaitUntil([&] { return std::chrono::steady_clock::now() > moment; });
