@@ -56,7 +56,9 @@ TEST_F(OtlpSchemaTest, AcceptsThePluginsRequests) {
     std::size_t events = 0;
     for (const auto& body : bodies) {
         EXPECT_TRUE(Passes(body));
-        events += EventsOf(body).size();
+        for (auto at = body.find("\"eventName\":"); at != std::string::npos;
+             at = body.find("\"eventName\":", at + 1))
+            ++events;
     }
     EXPECT_EQ(events, 8U);
 }

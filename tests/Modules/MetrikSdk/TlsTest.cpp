@@ -17,10 +17,9 @@ namespace {
 void MakeCertificate(const std::string& name, const std::string& host) {
     const auto command = "openssl req -x509 -newkey ec -pkeyopt ec_paramgen_curve:prime256v1 -nodes -days 2 "
                          "-keyout '" +
-                         name + ".key' -out '" + name +
-                         ".crt' -subj /CN=test "
-                         "-addext subjectAltName=" +
-                         host + " 2>/dev/null";
+                         name + ".key' -out '" + name + ".crt' -subj /CN=" +
+                         name.substr(name.rfind('/') + 1) + // two of one name would be taken for each other
+                         " -addext subjectAltName=" + host + " 2>/dev/null";
     ASSERT_EQ(std::system(command.c_str()), 0) << "openssl(1) is needed";
 }
 
