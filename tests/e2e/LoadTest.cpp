@@ -8,7 +8,6 @@
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <sys/stat.h>
 
 #include "tests/e2e/support/Service.h"
 #include "tests/support/WaitUntil.h"
@@ -62,10 +61,10 @@ public:
 
     void Continue() {
         for (const auto& entry : std::filesystem::directory_iterator(m_directory)) {
-            struct stat status {};
-            ::stat(entry.path().c_str(), &status);
-            std::streamoff& read = m_read[status.st_ino]; // a rotated file keeps its number
             std::ifstream log(entry.path());
+            std::string first;
+            std::getline(log, first);
+            std::streamoff& read = m_read[first]; // which a file keeps when it is rotated
             log.seekg(read);
             for (std::string line; std::getline(log, line);) {
                 read += static_cast<std::streamoff>(line.size()) + 1;
@@ -79,7 +78,7 @@ public:
 
 private:
     std::string m_directory;
-    std::map<ino_t, std::streamoff> m_read;
+    std::map<std::string, std::streamoff> m_read; ///< How much of each file, by its first line.
     int m_refused = 0;
     int m_received = 0;
 };
