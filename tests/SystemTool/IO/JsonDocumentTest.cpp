@@ -157,7 +157,21 @@ TEST(JsonDocument, MillionsOfOpeningBracketsCostNoStack) {
 TEST(JsonDocument, ANumberBeyondTheRangeOfADoubleIsAnError) {
     EXPECT_NE(ErrorOf("1e400"), "");
     EXPECT_NE(ErrorOf(std::string(5000, '9')), "");
+    for (const std::string text : {"10e308", "-10e308", "123e307", "17976931348623159e292"})
+        EXPECT_EQ(ErrorOf("[" + text), "Number too big to be stored in double. At byte 1.");
     EXPECT_EQ(Parsed("0." + std::string(5000, '3')).ToString(), "0.3333333333333333");
+}
+
+TEST(JsonDocument, ANumberIsTheDoubleNearestToItsText) {
+    const auto number = [](const std::string& text) {
+        return std::strtod(Parsed(text).ToString().c_str(), nullptr);
+    };
+    for (const std::string text :
+         {"184467440737095516155", "18446744073709551615.5", "1.84467440737095516155",
+          "1844674407370955161559999", "-184467440737095516155e-20", "0.0e309", "0e-324", "1e-400", "-1e-400",
+          "5e-324", "2.2250738585072011e-308", "1.7976931348623157e308", "0.000001e310", "9007199254740993",
+          "9007199254740993.0", "-18446744073709551615"})
+        EXPECT_EQ(number(text), std::strtod(text.c_str(), nullptr)) << text;
 }
 
 TEST(JsonDocument, OfMembersWithTheSameKeyTheFirstIsRead) {
