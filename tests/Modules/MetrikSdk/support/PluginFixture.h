@@ -92,7 +92,7 @@ protected:
     }
 
     bool WaitUntilNothingWaits() const {
-        return WaitUntil([this] { return Totals().waiting == 0; }, std::chrono::seconds(30));
+        return WaitUntil([this] { return Totals().waiting == 0; }, std::chrono::seconds(60));
     }
 
     TemporaryDirectory m_directory;
