@@ -14,9 +14,11 @@ endif()
 
 find_program(SSR_CCACHE ccache)
 if(SSR_CCACHE AND NOT CMAKE_CXX_COMPILER_LAUNCHER)
-    # The sloppiness is what ccache asks for before it caches anything that uses a precompiled header.
+    # The sloppiness is what ccache asks for before it caches anything that uses a precompiled header. The base folder
+    # and no hash of the working one: a second clone or work tree finds what the first one compiled.
     set(CMAKE_CXX_COMPILER_LAUNCHER ${CMAKE_COMMAND} -E env
-        CCACHE_SLOPPINESS=pch_defines,time_macros,include_file_mtime,include_file_ctime ${SSR_CCACHE})
+        CCACHE_SLOPPINESS=pch_defines,time_macros,include_file_mtime,include_file_ctime
+        CCACHE_BASEDIR=${PROJECT_SOURCE_DIR} CCACHE_NOHASHDIR=true ${SSR_CCACHE})
 endif()
 
 add_library(ssr_options INTERFACE)
