@@ -96,6 +96,9 @@ inline boost::format ParsedFormat(const std::string& format) {
 /// that no smaller text can have.
 template <typename... Arguments>
 std::string BuildLogText(const std::string& format, const Arguments&... arguments) {
+    if constexpr (sizeof...(arguments) == 0)
+        if (format.size() <= MAX_LOG_TEXT_BYTES && format.find('%') == std::string::npos)
+            return format; // most datagrams are such, and they need not pay for a parse
     CheckNumbersOfDirectives(format);
     boost::format text = ParsedFormat(format);
     (static_cast<void>(text % arguments), ...);
