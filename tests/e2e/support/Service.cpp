@@ -230,3 +230,9 @@ std::int64_t Service::DroppedByKernel() {
     const auto fields = KernelsLineOfThePort();
     return fields.empty() ? -1 : std::stoll(fields.back());
 }
+
+bool Service::TookAllDatagrams() {
+    const auto fields = KernelsLineOfThePort();
+    return !fields.empty() &&
+           fields[4].ends_with(":00000000"); // bytes waiting to be sent, and to be received
+}

@@ -104,6 +104,9 @@ public:
     /// Datagrams that the kernel dropped at the report port, by the socket's own counter.
     static std::int64_t DroppedByKernel();
 
+    /// Whether the program has taken every datagram off its socket.
+    static bool TookAllDatagrams();
+
 private:
     std::vector<std::string> Environment() const;
     pid_t Spawn(const std::string& program, const std::vector<std::string>& arguments) const;

@@ -1,0 +1,139 @@
+#include <filesystem>
+#include <ostream>
+#include <set>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "tests/e2e/support/HostileDatagrams.h"
+#include "tests/e2e/support/HostileFixture.h"
+
+// What anybody on the machine may send: whatever it is, the service lives, keeps to its files and takes the next
+// report.
+
+namespace {
+
+struct Barrage {
+    const char* name;
+    Hostile::Datagrams (*datagrams)();
+    int rows;   ///< That it adds to the store; ALL when each datagram adds one.
+    int events; ///< That it adds to the outbox.
+};
+constexpr int ALL = -1;
+
+void PrintTo(const Barrage& barrage, std::ostream* out) {
+    *out << barrage.name;
+}
+
+// Where a text is put in every field, the products are texts times reports that are sound beside it.
+const Barrage BARRAGES[] = {
+    {"OpeningBrackets", Hostile::Brackets, 0, 0},
+    {"DeepNesting", Hostile::DeepNesting, 0, 0},
+    {"NestingAtTheLimit", Hostile::NestingAtTheLimit, 1, 1},
+    {"InvalidUtf8", Hostile::InvalidUtf8, 0, 0},
+    {"ZeroCharacters", Hostile::ZeroCharacters, 3 * 3, 3 * 9}, // which end a statement, but not JSON in one
+    {"HugeNumbers", Hostile::HugeNumbers, 0, 0},
+    {"NumbersThatVanish", Hostile::NumbersThatVanish, 4 * 4, 4 * 3},
+    {"DuplicateAndEmptyKeys", Hostile::DuplicateAndEmptyKeys, 5, 0},
+    {"LongestDatagrams", Hostile::LongestDatagrams, 0, 0},
+    {"Directives", Hostile::Directives, 0, 0},
+    {"DirectivesInReports", Hostile::DirectivesInReports, ALL, 0},
+    {"ForgedRecords", Hostile::ForgedRecords, 0, 0},
+    {"EscapedForgedRecords", Hostile::EscapedForgedRecords, 4 * 6, 4 * 9},
+    {"TerminalEscapes", Hostile::TerminalEscapes, 8 * 6, 8 * 9},
+    {"Sql", Hostile::Sql, 25 * 2, 25 * 9}, // no statement holds the day mark, or a member that nobody reads
+    {"SqlThatFits", Hostile::SqlThatFits, ALL, 0},
+};
+
+/// One place of eight is the user data directory's.
+constexpr std::size_t OUTBOXES_ELSEWHERE = 7;
+constexpr std::size_t FILES_OF_AN_OUTBOX = 3;
+
+/// The beginnings of database directories; two that may be used come first.
+std::vector<std::string> HostilePaths(const std::string& elsewhere) {
+    return {elsewhere + "/honest",
+            elsewhere + "/a/../b/./c//",
+            elsewhere + "/" + std::string(300, 'n'),
+            elsewhere + std::string(100, '/') + "many",
+            elsewhere + "/control\\u0007\\n",
+            elsewhere + "/directives%s%n%1%",
+            elsewhere + "/zero\\u0000",
+            "",
+            "..",
+            "../../../../../../../../",
+            "relative/",
+            "~/",
+            "file:" + elsewhere + "/uri?mode=memory&",
+            ":memory:",
+            "/proc/self/",
+            "/dev/null/",
+            "/proc/sys/kernel/"};
+}
+
+std::string Announcement(const std::string& module, const std::string& dbPath, const std::string& elsewhere) {
+    return R"({"msgType":"init","exdata":{"moduleID":")" + module + R"(","logPath":")" + elsewhere +
+           R"(/log","dbPath":")" + dbPath + "\"}}";
+}
+
+class HostileModule : public HostileFixture {
+protected:
+    /// There are outboxes and nothing else, not too many, and nothing at the top of the file system.
+    void ExpectOutboxesOnlyBelow(const std::string& elsewhere) {
+        std::size_t outboxes = 0;
+        for (const auto& entry : std::filesystem::recursive_directory_iterator(elsewhere)) {
+            const auto name = entry.path().filename().string();
+            EXPECT_TRUE(entry.is_directory() || name.starts_with("MetrikOutbox.db")) << entry.path();
+            outboxes += name == "MetrikOutbox.db" ? 1 : 0;
+        }
+        EXPECT_GE(outboxes, 2U);
+        EXPECT_LE(outboxes, OUTBOXES_ELSEWHERE);
+        EXPECT_FALSE(std::filesystem::exists(elsewhere + "/log"));
+        EXPECT_EQ(EntriesOfTheRoot(), m_root);
+    }
+
+private:
+    /// Where a relative path of enough upward steps leads.
+    static std::set<std::string> EntriesOfTheRoot() {
+        std::set<std::string> names;
+        for (const auto& entry : std::filesystem::directory_iterator("/"))
+            names.insert(entry.path().filename());
+        return names;
+    }
+
+    const std::set<std::string> m_root = EntriesOfTheRoot();
+};
+
+class HostileDatagram : public HostileFixture, public ::testing::WithParamInterface<Barrage> {};
+
+} // namespace
+
+TEST_P(HostileDatagram, LeavesTheServiceSoundAndTheNextReportIsStored) {
+    const auto datagrams = GetParam().datagrams();
+    for (const auto& datagram : datagrams)
+        Send(datagram);
+    ExpectSoundness(GetParam().rows == ALL ? static_cast<int>(datagrams.size()) : GetParam().rows,
+                    GetParam().events);
+}
+
+INSTANTIATE_TEST_SUITE_P(Of, HostileDatagram, ::testing::ValuesIn(BARRAGES),
+                         [](const auto& barrage) { return std::string(barrage.param.name); });
+
+TEST_F(HostileModule, TenThousandOfThemHaveEightOutboxesAtMost) {
+    const TemporaryDirectory elsewhere;
+    const auto paths = HostilePaths(elsewhere.Path());
+    constexpr std::size_t MODULES = 10'000;
+    for (std::size_t i = 0; i < MODULES; ++i)
+        Send(Announcement("AM" + std::to_string(i), paths[i % paths.size()] + std::to_string(i),
+                          elsewhere.Path()));
+    for (const std::size_t i : {std::size_t{0}, std::size_t{1}, MODULES - 1})
+        Send(R"({"eventID":"AM)" + std::to_string(i) + R"(|1"})");
+    AllowDescriptors(OUTBOXES_ELSEWHERE * FILES_OF_AN_OUTBOX);
+    ExpectSoundness(0, 1); // the last one's, which came too late for an outbox of its own
+    EXPECT_EQ(m_service.LogLines("Metrik/MetrikMgr:41 AddWorker").size(), MODULES + 1)
+        << "with the default one";
+    ExpectOutboxesOnlyBelow(elsewhere.Path());
+    for (const std::string directory : {"/honest0", "/b/c/1"})
+        EXPECT_EQ(
+            m_service.Count(elsewhere.Path() + directory + "/MetrikOutbox.db", "select count(*) from event"),
+            1);
+}
