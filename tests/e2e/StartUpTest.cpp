@@ -5,10 +5,10 @@
 #include <Poco/Net/DatagramSocket.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <sys/stat.h>
 #include <sys/wait.h>
 
 #include "tests/e2e/support/Service.h"
+#include "tests/support/ModeOf.h"
 #include "tests/support/WaitUntil.h"
 
 using ::testing::ContainsRegex;
@@ -33,11 +33,6 @@ std::vector<std::string> MessagesOf(const std::vector<Service::Line>& lines) {
 std::string ContentOfPidFile() {
     std::ifstream file(Service::PID_FILE);
     return {std::istreambuf_iterator<char>(file), {}};
-}
-
-mode_t ModeOf(const std::string& path) {
-    struct stat status {};
-    return ::stat(path.c_str(), &status) == 0 ? status.st_mode & 07777 : 0;
 }
 
 class StartUp : public ::testing::Test {
@@ -274,18 +269,4 @@ TEST_F(StartUp, ATerminationSignalEndsItWithoutARecord) {
     m_service.Signal(SIGTERM);
     EXPECT_EQ(m_service.AwaitEnd(), -SIGTERM);
     EXPECT_EQ(m_service.Log(), before);
-}
-
-TEST_F(StartUp, WhatItMakesIsItsUsersAlone) {
-    m_service.Install();
-    m_service.Start();
-    Service::Send(REPORT);
-    Service::Send(EVENT);
-    m_service.AwaitQuiet();
-    int seen = 0;
-    for (const auto& entry : std::filesystem::recursive_directory_iterator(m_service.DataDirectory())) {
-        ++seen;
-        EXPECT_EQ(ModeOf(entry.path().string()), entry.is_directory() ? 0700U : 0600U) << entry.path();
-    }
-    EXPECT_GE(seen, 8) << "four directories, the log, two databases and what belongs to them";
 }
