@@ -75,7 +75,7 @@ TEST_F(Rights, WhatItMakesIsItsUsersAlone) {
     std::set<std::string> seen;
     for (const auto& entry : std::filesystem::recursive_directory_iterator(m_service.DataDirectory())) {
         seen.insert(entry.path().lexically_relative(m_service.DataDirectory()).string());
-        EXPECT_EQ(ModeOf(entry.path().string()), entry.is_directory() ? 0700U : 0600U) << entry.path();
+        EXPECT_EQ(ModeOf(entry.path()), entry.is_directory() ? 0700U : 0600U) << entry.path();
     }
     EXPECT_THAT(seen,
                 IsSupersetOf({"hublink/log/metrik/Report.log", "hublink/log/metrik/Report_1.log",

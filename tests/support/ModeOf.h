@@ -1,11 +1,11 @@
 #pragma once
 
-#include <string>
+#include <filesystem>
 
 #include <sys/stat.h>
 
 /// The rights of a file or directory, such as 0600; 0 when there is none.
-inline mode_t ModeOf(const std::string& path) {
+inline mode_t ModeOf(const std::filesystem::path& path) {
     struct stat status {};
     return ::stat(path.c_str(), &status) == 0 ? status.st_mode & 07777 : 0;
 }

@@ -7,7 +7,7 @@
 #include <string>
 #include <vector>
 
-#include <sys/stat.h>
+#include "tests/support/ModeOf.h"
 
 inline std::string ReadFile(const std::filesystem::path& path) {
     std::ifstream file(path, std::ios::binary);
@@ -48,9 +48,4 @@ inline std::vector<std::string> ReadLog(const std::filesystem::path& directory) 
         for (auto& line : ReadLines(path))
             lines.push_back(std::move(line));
     return lines;
-}
-
-inline unsigned ModeOf(const std::filesystem::path& path) {
-    struct stat status {};
-    return stat(path.c_str(), &status) == 0 ? status.st_mode & 07777U : 0;
 }

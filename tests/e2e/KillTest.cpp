@@ -1,0 +1,256 @@
+#include <algorithm>
+#include <atomic>
+#include <chrono>
+#include <cstdlib>
+#include <iostream>
+#include <optional>
+#include <random>
+#include <thread>
+
+#include <SQLiteCpp/SQLiteCpp.h>
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "tests/e2e/support/Service.h"
+#include "tests/support/WaitUntil.h"
+
+using ::testing::ElementsAre;
+
+// kill -9 at random moments under load, each time followed by a restart. Ten times, or as often as you say:
+//
+//     SSR_KILLS=100 tests/in-sandbox build/release/tests/e2e_tests/e2e_tests --gtest_filter='Kill.*'
+//
+// SSR_SEED=<the number that a run printed> chooses the same moments again.
+
+namespace {
+
+using namespace std::chrono_literals;
+using Clock = std::chrono::steady_clock;
+using Milliseconds = std::chrono::duration<double, std::milli>;
+
+#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
+constexpr int RATE = 2'000; // reports a second
+constexpr unsigned KILLS = 4;
+constexpr auto READY_WITHIN = 30s;
+#else
+constexpr int RATE = 20'000;
+constexpr unsigned KILLS = 10;
+constexpr auto READY_WITHIN = 1s; // a report that is sent to the restarted service is in the store
+#endif
+
+constexpr std::int64_t EVERY_NTH_EVENT = 20; // goes to analytics
+constexpr unsigned EVERY_NTH_AT_START = 4;   // of the kills hits a service that is starting
+constexpr int LONGEST_LIFE_MS = 400;
+constexpr int LONGEST_START_MS = 60;
+
+unsigned FromEnvironment(const char* name, unsigned otherwise) {
+    const char* text = std::getenv(name);
+    return text != nullptr ? static_cast<unsigned>(std::atol(text)) : otherwise;
+}
+
+std::string ValueOf(std::int64_t number) {
+    return R"({"button":"save","count":)" + std::to_string(number) + "}";
+}
+
+/// Sends numbered reports at the rate, whether or not somebody listens.
+class Load {
+public:
+    Load() : m_thread([this] { Run(); }) {}
+    ~Load() {
+        m_stop = true;
+        m_thread.join();
+    }
+
+    /// No report with a higher number has been sent.
+    std::int64_t Sent() const { return m_sent; }
+
+private:
+    void Run() {
+        const auto begin = Clock::now();
+        while (!m_stop) {
+            const auto due = (Clock::now() - begin) * RATE / std::chrono::seconds(1);
+            for (int burst = 0; m_sent < due && burst < RATE / 200; ++burst) {
+                const auto number = ++m_sent;
+                const bool event = number % EVERY_NTH_EVENT == 0;
+                Service::Send(R"({"eventID":")" + std::string(event ? "A759|" : "B1|") +
+                              std::to_string(number) + R"(","value":)" + ValueOf(number) + "}");
+            }
+            std::this_thread::sleep_for(1ms); // the pace
+        }
+    }
+
+    std::atomic<bool> m_stop = false;
+    std::atomic<std::int64_t> m_sent = 0;
+    std::thread m_thread;
+};
+
+/// What a reader with a connection of its own has seen in the store: the number of each row's report, by the row's id.
+class Reader {
+public:
+    explicit Reader(std::string file) : m_file(std::move(file)) {}
+
+    void Open() { m_database.emplace(m_file, SQLite::OPEN_READWRITE, 10'000); }
+    void Close() { m_database.reset(); }
+
+    /// Notes the rows that have been committed since; the newest one's number.
+    std::int64_t Continue() {
+        ForEachRow(m_numbers.size(), [this](std::int64_t number) { m_numbers.push_back(number); });
+        return m_numbers.empty() ? 0 : m_numbers.back();
+    }
+
+    /// That all rows which were seen are there, as they were. Those before the last call were looked at then.
+    void ExpectWhatWasSeen() {
+        auto at = m_verified;
+        ForEachRow(m_verified, [&](std::int64_t number) {
+            if (at < m_numbers.size()) {
+                ASSERT_EQ(number, m_numbers[at]) << "row " << at + 1;
+            }
+            ++at;
+        });
+        EXPECT_GE(at, m_numbers.size()) << "rows are missing that had been committed";
+        m_verified = m_numbers.size();
+    }
+
+    void VerifyAllAgain() { m_verified = 0; }
+    const std::vector<std::int64_t>& Numbers() const { return m_numbers; }
+
+private:
+    /// Hands on the numbers of the rows behind that one, and looks at their ids and values.
+    template <typename Action>
+    void ForEachRow(std::size_t behind, Action action) {
+        SQLite::Statement query(*m_database, "select id, substr(eventID, 4), value, pType from OperLog "
+                                             "where id > ? order by id");
+        query.bind(1, static_cast<std::int64_t>(behind));
+        for (auto id = static_cast<std::int64_t>(behind) + 1; query.executeStep(); ++id) {
+            const std::int64_t number = query.getColumn(1).getInt64();
+            ASSERT_EQ(query.getColumn(0).getInt64(), id) << "no id is left out";
+            ASSERT_EQ(query.getColumn(2).getString(), ValueOf(number));
+            ASSERT_EQ(query.getColumn(3).getInt(), 0);
+            action(number);
+        }
+    }
+
+    std::string m_file;
+    std::optional<SQLite::Database> m_database;
+    std::vector<std::int64_t> m_numbers;
+    std::size_t m_verified = 0;
+};
+
+std::int64_t ReportsForTheStoreBetween(std::int64_t first, std::int64_t last) {
+    return (last - first - 1) - ((last - 1) / EVERY_NTH_EVENT - first / EVERY_NTH_EVENT);
+}
+
+class Kill : public ::testing::Test {
+protected:
+    Kill() : m_seed(FromEnvironment("SSR_SEED", std::random_device{}())), m_random(m_seed) {
+        std::cout << "SSR_SEED=" << m_seed << std::endl;
+        m_service.Install();
+    }
+
+    /// Starts the service, and waits until a report that was sent after that is in the store.
+    void StartAndTakeReports(const Load& load) {
+        const auto begin = Clock::now();
+        const auto sent = load.Sent();
+        m_service.Launch();
+        ASSERT_TRUE(
+            WaitUntil([] { return Service::Bound(); }, 10s)); // before, the reader would do its repairs
+        m_reader.Open();
+        ASSERT_TRUE(WaitUntil([&] { return m_reader.Continue() > sent; }, READY_WITHIN + 10s));
+        const Milliseconds took = Clock::now() - begin;
+        EXPECT_LT(took, READY_WITHIN);
+        m_longestStart = std::max(m_longestStart, took);
+    }
+
+    /// Lets it live for a random time, up to which the reader looks, and ends it.
+    void KillUnderLoad(const Load& load, bool readerStays) {
+        const auto moment = Clock::now() + Random(LONGEST_LIFE_MS);
+        while (Clock::now() < moment)
+            m_reader.Continue();
+        m_events = EventCount();
+        if (!readerStays) // then the next start finds a log that nobody has open, and recovers it
+            m_reader.Close();
+        End(load);
+    }
+
+    void KillWhileItStarts(const Load& load) {
+        const auto moment = Clock::now() + Random(LONGEST_START_MS);
+        m_service.Launch();
+        WaitUntil([&] { return Clock::now() >= moment; });
+        End(load);
+    }
+
+    void End(const Load& load) {
+        m_dropped += std::max(std::int64_t{0}, Service::DroppedByKernel());
+        m_service.Kill();
+        m_killedAt.push_back(load.Sent());
+    }
+
+    void ExpectSoundDatabases() {
+        for (const auto& file : {m_service.DatabaseFile(), m_service.OutboxFile()})
+            EXPECT_THAT(m_service.Query(file, "pragma integrity_check"), ElementsAre("ok")) << file;
+        EXPECT_GE(EventCount(), m_events) << "what was in the outbox";
+        EXPECT_THAT(m_service.Query(m_service.OutboxFile(),
+                                    "select count(*) = max(sequence), count(*) = max(id) from event"),
+                    ElementsAre("1|1"));
+    }
+
+    /// Rows are in the order in which their reports were sent, and what is missing between two of them was lost by a kill
+    /// or dropped by the kernel.
+    void ExpectOrderWithoutGaps() {
+        const auto& numbers = m_reader.Numbers();
+        std::int64_t missing = 0;
+        for (std::size_t i = 1; i < numbers.size(); ++i) {
+            ASSERT_GT(numbers[i], numbers[i - 1]);
+            const auto kill = std::lower_bound(m_killedAt.begin(), m_killedAt.end(), numbers[i - 1]);
+            if (kill != m_killedAt.end() && *kill <= numbers[i])
+                m_mostLost = std::max(m_mostLost, ReportsForTheStoreBetween(numbers[i - 1], *kill + 1));
+            else
+                missing += ReportsForTheStoreBetween(numbers[i - 1], numbers[i]);
+        }
+        EXPECT_LE(missing, m_dropped);
+    }
+
+    std::int64_t EventCount() const {
+        return m_service.Count(m_service.OutboxFile(), "select count(*) from event");
+    }
+    std::chrono::milliseconds Random(int limitMs) {
+        return std::chrono::milliseconds(std::uniform_int_distribution(0, limitMs)(m_random));
+    }
+
+    Service m_service;
+    Reader m_reader{m_service.DatabaseFile()};
+    const unsigned m_seed;
+    std::mt19937 m_random;
+    std::vector<std::int64_t> m_killedAt; ///< What had been sent when the process was gone.
+    std::int64_t m_dropped = 0;           ///< By the kernel, while the service listened.
+    std::int64_t m_events = 0;            ///< In the outbox before the last kill.
+    std::int64_t m_mostLost = 0;          ///< Reports that were sent, and not in the store when a kill came.
+    Milliseconds m_longestStart{0};
+};
+
+} // namespace
+
+TEST_F(Kill, CostsNoRowThatWasCommittedAndTheNextStartTakesReportsAtOnce) {
+    const unsigned kills = FromEnvironment("SSR_KILLS", KILLS);
+    {
+        const Load load;
+        ASSERT_NO_FATAL_FAILURE(StartAndTakeReports(load));
+        for (unsigned kill = 1; kill <= kills; ++kill) {
+            KillUnderLoad(load, kill % 2 == 0);
+            if (kill < kills && kill % EVERY_NTH_AT_START == 0) {
+                KillWhileItStarts(load);
+                ++kill;
+            }
+            ASSERT_NO_FATAL_FAILURE(StartAndTakeReports(load));
+            m_reader.ExpectWhatWasSeen();
+            ExpectSoundDatabases();
+        }
+    }
+    m_reader.VerifyAllAgain();
+    m_reader.ExpectWhatWasSeen();
+    ASSERT_NO_FATAL_FAILURE(ExpectOrderWithoutGaps());
+    std::cout << kills << " kills, " << m_reader.Numbers().size() << " rows, " << EventCount() << " events, "
+              << m_dropped << " dropped by the kernel; from start to a stored report at most "
+              << m_longestStart.count() << " ms; sent and not stored at a kill at most " << m_mostLost
+              << std::endl;
+}
