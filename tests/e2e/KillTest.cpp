@@ -164,8 +164,10 @@ protected:
     /// Lets it live for a random time, up to which the reader looks, and ends it.
     void KillUnderLoad(const Load& load, bool readerStays) {
         const auto moment = Clock::now() + Random(LONGEST_LIFE_MS);
-        while (Clock::now() < moment)
+        WaitUntil([&] {
             m_reader.Continue();
+            return Clock::now() >= moment;
+        });
         m_events = EventCount();
         if (!readerStays) // then the next start finds a log that nobody has open, and recovers it
             m_reader.Close();
