@@ -196,8 +196,8 @@ protected:
                     ElementsAre("1|1"));
     }
 
-    /// Rows are in the order in which their reports were sent, and what is missing between two of them was lost by a kill
-    /// or dropped by the kernel.
+    /// Rows are in the order in which their reports were sent, and what is missing between two of them was lost by a
+    /// kill or dropped by the kernel.
     void ExpectOrderWithoutGaps() {
         const auto& numbers = m_reader.Numbers();
         std::int64_t missing = 0;
