@@ -19,11 +19,12 @@ namespace {
 using SystemTool::BSErrorText;
 using SystemTool::BSException;
 
-/// Null until configured; then the sink for the rest of the process.
+/// Null until configured; then the sink for the rest of the process. One that could not be opened is in place too, and
+/// opens its log as soon as that can be done; another InitLog replaces it.
 std::atomic<LogSink*> g_sink = nullptr;
 
 std::mutex g_configuring;                ///< Guards g_settings, and lets one InitLog run at a time.
-const LogSettings* g_settings = nullptr; ///< Those of g_sink.
+const LogSettings* g_settings = nullptr; ///< Those of an InitLog that did not throw.
 
 [[noreturn]] void Refuse(const LogSettings& settings, const std::string& reason,
                          const std::string& systemText) {
@@ -46,14 +47,16 @@ void CheckSettings(const LogSettings& settings) {
 /// The sink is leaked on purpose, see LogSink.
 void StartSink(const LogSettings& settings) {
     auto sink = std::make_unique<LogSink>(settings);
-    if (const FileFailure failure = sink->Start())
-        Refuse(
-            settings,
-            failure.Text() + ", " + settings.LivePath() +
-                ". Make sure that this user may write there and that the disk is not full, then start again.",
-            failure.Text());
+    const FileFailure failure = sink->Start();
+    if (LogSink* failed = g_sink.exchange(sink.release(), std::memory_order_acq_rel))
+        failed->Retire();
+    if (failure)
+        Refuse(settings,
+               failure.Text() + ", " + settings.LivePath() +
+                   ". Make sure that this user may write there and that the disk is not full; the log begins "
+                   "then.",
+               failure.Text());
     g_settings = new LogSettings(settings);
-    g_sink.store(sink.release(), std::memory_order_release);
 }
 
 /// The same settings again are no error: whoever asks for the log that there is has it.

@@ -75,19 +75,31 @@ private:
     Console m_toConsole;
 };
 
+namespace {
+
+boost::shared_ptr<logging::sinks::sink> SinkOf(const boost::shared_ptr<LogBackend>& backend,
+                                               const logging::attribute_name& payload) {
+    const auto sink = boost::make_shared<logging::sinks::unlocked_sink<LogBackend>>(backend);
+    sink->set_filter([payload](const logging::attribute_value_set& values) {
+        return values.find(payload) != values.end();
+    });
+    return sink;
+}
+
+} // namespace
+
 LogSink::LogSink(const LogSettings& settings)
     : m_core(logging::core::get()), m_attributeName(PAYLOAD_NAME),
-      m_backend(boost::make_shared<LogBackend>(settings)) {}
+      m_backend(boost::make_shared<LogBackend>(settings)), m_sink(SinkOf(m_backend, m_attributeName)) {}
 
 FileFailure LogSink::Start() {
-    if (const FileFailure failure = m_backend->Writer().Start())
-        return failure;
-    const auto sink = boost::make_shared<logging::sinks::unlocked_sink<LogBackend>>(m_backend);
-    sink->set_filter([name = m_attributeName](const logging::attribute_value_set& values) {
-        return values.find(name) != values.end();
-    });
-    m_core->add_sink(sink);
-    return {};
+    const FileFailure failure = m_backend->Writer().Start();
+    m_core->add_sink(m_sink);
+    return failure;
+}
+
+void LogSink::Retire() {
+    m_core->remove_sink(m_sink);
 }
 
 void LogSink::Write(const LogRecord& record) noexcept {

@@ -224,6 +224,37 @@ TEST_F(BoostLogger, CanBeConfiguredAfterAFailedAttempt) {
     EXPECT_THAT(ReadFile(m_path), HasSubstr("here at last"));
 }
 
+TEST_F(BoostLogger, BeginsTheLogThatCouldNotBeOpenedAsSoonAsItCan) {
+    std::filesystem::create_directories(m_path); // a directory under the file's name
+    RunInChild([&] {
+        LoggerLoader loader(BOOST_LOGGER_PATH);
+        const bool refused = !InitError(loader, {m_directory}).empty();
+        Log(loader, "lost");
+        std::filesystem::remove(m_path);
+        return refused && WaitUntil([&] {
+                   Log(loader, "here at last");
+                   return ReadFile(m_path).find("here at last") != std::string::npos;
+               });
+    });
+    EXPECT_THAT(ReadFile(m_path),
+                HasSubstr(" records could not be written: cannot open the file: Is a directory\n"));
+}
+
+TEST_F(BoostLogger, WritesIntoOneLogOnlyAfterAFailedAttempt) {
+    const std::string first = m_temporary.Path() + "/first";
+    std::filesystem::create_directories(first + "/Report.log");
+    RunInChild([&] {
+        LoggerLoader loader(BOOST_LOGGER_PATH);
+        const bool refused = !InitError(loader, {first}).empty();
+        Init(loader, {m_directory});
+        std::filesystem::remove(first + "/Report.log");
+        Log(loader, "once");
+        return refused;
+    });
+    EXPECT_THAT(ReadFile(m_path), MatchesRegex("[^\n]*once\n"));
+    EXPECT_FALSE(std::filesystem::exists(first + "/Report.log"));
+}
+
 TEST_F(BoostLogger, RefusesSettingsThatMakeNoLog) {
     RunInChild([&] {
         LoggerLoader loader(BOOST_LOGGER_PATH);
