@@ -1,5 +1,7 @@
 #include "Modules/MetrikSdk/FailureReporter.h"
 
+#include <utility>
+
 namespace Metrik {
 
 const char* NameOf(Cause cause) {
@@ -40,8 +42,13 @@ std::optional<std::string> FailureReporter::Report(Cause cause, const std::strin
     auto told = text;
     if (history.keptBack > 0)
         told += " (and " + std::to_string(history.keptBack) + " more of this kind since the last time)";
-    history = {now, 0};
+    history = {now, true, 0};
     return told;
+}
+
+bool FailureReporter::ReportEnd(Cause cause) {
+    const std::lock_guard lock(m_mutex);
+    return std::exchange(m_histories[static_cast<std::size_t>(cause)].endIsDue, false);
 }
 
 } // namespace Metrik

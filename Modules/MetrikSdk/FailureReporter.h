@@ -29,7 +29,8 @@ enum class Cause {
 const char* NameOf(Cause cause);
 
 /// Decides which failures are told: of the same cause at most one in an interval, with the number of those
-/// that were kept back since. All outboxes of a process share one: they end in the same log, and a full disk
+/// that were kept back since. Its end is told once for each that was told: whoever reads of a failure wants to
+/// know whether it lasts. All outboxes of a process share one: they end in the same log, and a full disk
 /// hits them all. The clock is the caller's. Threads: any.
 class FailureReporter {
 public:
@@ -38,9 +39,13 @@ public:
     /// The text to tell now, or nothing.
     std::optional<std::string> Report(Cause cause, const std::string& text, SteadyTime now);
 
+    /// Whether the end of failures of this cause is to be told.
+    bool ReportEnd(Cause cause);
+
 private:
     struct History {
         std::optional<SteadyTime> lastTold;
+        bool endIsDue = false; ///< A failure was told, and no end after it.
         unsigned long keptBack = 0;
     };
 

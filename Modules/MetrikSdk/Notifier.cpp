@@ -32,13 +32,22 @@ void Notifier::Unsubscribe(IMetrikSdk::Callback onFailure, IMetrikSdk::Callback 
     Take(m_onSuccess, onSuccess);
 }
 
-void Notifier::TellFailure(const News& news) noexcept {
+void Notifier::TellFailure(News news) noexcept {
     try {
         const std::lock_guard lock(m_mutex);
-        if (const auto text = m_reporter->Report(news.cause, news.text, std::chrono::steady_clock::now()))
-            Tell(m_onFailure, NameOf(news.cause), *text);
+        if (IsTold(news))
+            Tell(m_onFailure, NameOf(news.cause), news.text);
     } catch (...) { // no memory for the text
     }
+}
+
+/// Whether it is told now, and then in which words.
+bool Notifier::IsTold(News& news) {
+    if (news.kind == News::Kind::End)
+        return m_reporter->ReportEnd(news.cause);
+    const auto text = m_reporter->Report(news.cause, news.text, std::chrono::steady_clock::now());
+    news.text = text.value_or("");
+    return text.has_value();
 }
 
 void Notifier::TellFailures(const std::vector<News>& news) noexcept {

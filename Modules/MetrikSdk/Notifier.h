@@ -12,10 +12,12 @@
 
 namespace Metrik {
 
-/// A failure on its way to whoever wants to know.
+/// A failure, or the end of failures, on its way to whoever wants to know.
 struct News {
+    enum class Kind { Failure, End };
     Cause cause;
     std::string text;
+    Kind kind = Kind::Failure;
 };
 
 /// Tells the callbacks of all modules that share an outbox. Thousands of modules usually bring the same
@@ -23,6 +25,7 @@ struct News {
 ///
 /// Threads: any. A callback runs while the notifier's lock is held, so that after Unsubscribe no call to it
 /// is under way or will come; it may report events, but not initialise or destroy an SDK object.
+/// The end of failures goes to the failure callback too: it is the one whose texts end in a log.
 /// Failure: what a callback throws goes nowhere, and a failure that cannot be told, for want of memory, neither:
 /// whoever tells one is in the middle of handling it.
 class Notifier {
@@ -37,7 +40,7 @@ public:
     void Subscribe(IMetrikSdk::Callback onFailure, IMetrikSdk::Callback onSuccess);
     void Unsubscribe(IMetrikSdk::Callback onFailure, IMetrikSdk::Callback onSuccess);
 
-    void TellFailure(const News& news) noexcept;
+    void TellFailure(News news) noexcept;
     void TellFailures(const std::vector<News>& news) noexcept;
     void TellSuccess(const std::string& what, const std::string& detail);
 
@@ -48,6 +51,7 @@ public:
 private:
     using Subscribers = std::map<IMetrikSdk::Callback, int>;
 
+    bool IsTold(News& news);
     static void Tell(const Subscribers& subscribers, const std::string& what, const std::string& detail);
 
     /// Guards all below. Recursive, because a callback may come back with an event that fails in its turn.

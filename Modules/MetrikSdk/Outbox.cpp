@@ -70,6 +70,7 @@ bool Outbox::Append(const ModuleIdentity& module, std::string eventId, std::stri
         return true;
     } catch (const StoreError& error) {
         m_patienceUsedUp = true;
+        ++m_refused;
         m_notifier.TellFailure({Cause::File, error.what()});
         return false;
     }
@@ -77,13 +78,21 @@ bool Outbox::Append(const ModuleIdentity& module, std::string eventId, std::stri
 
 void Outbox::StoreEvent(OutboxStore& store, const ModuleIdentity& module, const NewEvent& event) {
     m_waitingBytes += static_cast<std::int64_t>(store.Store(module, event));
-    m_patienceUsedUp = false;
     m_bell.Report(++m_waitingEvents);
+    if (m_patienceUsedUp.exchange(false))
+        TellEndOfFailures();
     try {
         KeepWithinCaps(store);
     } catch (const StoreError& error) { // the event itself is safe
         m_news.push_back({Cause::File, error.what()});
     }
+}
+
+void Outbox::TellEndOfFailures() {
+    m_news.push_back(
+        {Cause::File,
+         "Events are stored again; " + std::to_string(m_refused.exchange(0)) + " were refused meanwhile",
+         News::Kind::End});
 }
 
 /// What is to be known of a file that was just opened.

@@ -55,6 +55,7 @@ private:
     auto AttemptTwice(Operation operation);
 
     void StoreEvent(OutboxStore& store, const ModuleIdentity& module, const NewEvent& event);
+    void TellEndOfFailures();
     void LearnAbout(OutboxStore& store);
     void Recount(OutboxStore& store);
     void KeepWithinCaps(OutboxStore& store);
@@ -69,6 +70,7 @@ private:
 
     /// The last event or opening failed, perhaps after all of the patience: the next one has less.
     std::atomic<bool> m_patienceUsedUp = false;
+    std::atomic<unsigned long> m_refused = 0; ///< Events since the last one that was stored.
 
     std::mutex m_mutex; ///< Guards all below.
     FileKeeper m_keeper;

@@ -93,6 +93,8 @@ Pause UploadCycle::Delivered(Batch batch, const HttpResult& result) {
                                                     " of " + std::to_string(count) +
                                                     " events for good: " + partial.message});
     m_notifier.TellSuccess("upload", std::to_string(count - partial.rejected) + " events");
+    m_notifier.TellFailure(
+        {Cause::Upload, m_sender.Destination() + ": events are taken again", News::Kind::End});
     Settle();
     return AT_ONCE;
 }

@@ -26,6 +26,20 @@ TEST(FailureReporter, TellsTheSameCauseOnceAMinuteWithTheNumberKeptBack) {
     EXPECT_EQ(reporter.Report(Cause::Upload, "no route", START + 61s), std::nullopt);
 }
 
+TEST(FailureReporter, TellsTheEndOnceForEachFailureThatItTold) {
+    FailureReporter reporter(1min);
+    EXPECT_FALSE(reporter.ReportEnd(Cause::Upload));
+    reporter.Report(Cause::Upload, "no route", START);
+    EXPECT_FALSE(reporter.ReportEnd(Cause::File));
+    EXPECT_TRUE(reporter.ReportEnd(Cause::Upload));
+    EXPECT_FALSE(reporter.ReportEnd(Cause::Upload));
+    reporter.Report(Cause::Upload, "no route", START + 1s);
+    EXPECT_FALSE(reporter.ReportEnd(Cause::Upload)) << "whose failure was kept back";
+    EXPECT_EQ(reporter.Report(Cause::Upload, "no route", START + 60s),
+              "no route (and 1 more of this kind since the last time)");
+    EXPECT_TRUE(reporter.ReportEnd(Cause::Upload));
+}
+
 TEST(FailureReporter, TellsAnotherCauseWithoutRegardToTheFirst) {
     FailureReporter reporter(1min);
     reporter.Report(Cause::Upload, "no route", START);

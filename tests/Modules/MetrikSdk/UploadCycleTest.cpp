@@ -123,6 +123,7 @@ TEST_F(UploadCycleTest, KeepsTheBatchAndWaitsLongerEachTime) {
     AnswerAlways(Status(200));
     RunUntilPause();
     EXPECT_EQ(m_outbox.Status().delivered, 3);
+    EXPECT_EQ(Told::Failures().All().back(), "upload: http://collector: events are taken again");
     Append(1);
     AnswerAlways(Status(503));
     EXPECT_EQ(RunUntilPause().duration, 500ms) << "a success begins anew";
