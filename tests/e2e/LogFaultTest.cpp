@@ -1,0 +1,172 @@
+#include <algorithm>
+#include <filesystem>
+#include <fstream>
+#include <regex>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "tests/e2e/support/Disk.h"
+#include "tests/e2e/support/Ledger.h"
+#include "tests/support/WaitUntil.h"
+
+using ::testing::EndsWith;
+using ::testing::IsEmpty;
+using ::testing::MatchesRegex;
+
+// A log that cannot be written costs lines of the log and nothing else, and goes on by itself.
+
+namespace {
+
+using namespace std::chrono_literals;
+
+class LogFault : public ::testing::Test {
+protected:
+    void InstallAndStart() {
+        m_service.Install();
+        m_service.Start();
+    }
+
+    /// So many reports, all of them stored.
+    void Store(int count) {
+        m_ledger.Report(count);
+        EXPECT_TRUE(WaitUntil([&] { return m_ledger.Stored() == Ledger::Range(0, m_ledger.Next()); }, 60s));
+    }
+
+    /// A report that comes now is a line of the log, within what the log allows itself.
+    void ExpectToGoOn() {
+        EXPECT_TRUE(WaitUntil([&] {
+            Store(1);
+            return m_service.Log().ends_with(TextOfTheLast() + "\n");
+        }));
+    }
+
+    std::string TextOfTheLast() const {
+        return std::to_string(m_ledger.Next() - 1) + R"(","value":{"text":"as people write it"}})";
+    }
+
+    /// How many reports have a line.
+    int Received() const { return Matches("App/ReportServer:42 Recv\\] .*as people write it\"\\}\\}\n"); }
+
+    int Matches(const std::string& form) const {
+        const std::string log = m_service.Log();
+        const std::regex regex(form);
+        return static_cast<int>(std::distance(std::sregex_iterator(log.begin(), log.end(), regex), {}));
+    }
+
+    /// The log says once how many records it lacks, and it lacks no more.
+    void ExpectOneGap(const std::string& reason) {
+        const std::regex form(
+            "WARN  \\[\\d+:\\d+\\] \\[Modules/BoostLogger:\\d+ ReportLoss\\] (\\d+) records could not "
+            "be written: (.*)");
+        const std::string log = m_service.Log();
+        std::smatch gap;
+        ASSERT_TRUE(std::regex_search(log, gap, form)) << log;
+        EXPECT_THAT(gap[2], MatchesRegex(reason));
+        const int found = std::stoi(gap[1]) + Received();
+        EXPECT_GE(found, m_ledger.Next());
+        EXPECT_LE(found, m_ledger.Next() + 1) << "a line of which the newline alone was lost";
+        EXPECT_EQ(Matches("records could not"), 1);
+    }
+
+    bool HasTheLogOpen() const {
+        const std::filesystem::directory_iterator descriptors("/proc/" + std::to_string(m_service.Process()) +
+                                                              "/fd");
+        return std::ranges::any_of(descriptors, [this](const auto& descriptor) {
+            std::error_code closed;
+            return std::filesystem::read_symlink(descriptor.path(), closed) == m_service.LogFile();
+        });
+    }
+
+    long ResidentKilobytes() const {
+        std::ifstream status("/proc/" + std::to_string(m_service.Process()) + "/status");
+        for (std::string line; std::getline(status, line);)
+            if (line.starts_with("VmRSS:"))
+                return std::stol(line.substr(6));
+        return -1;
+    }
+
+    std::string Directory() const { return m_service.DataDirectory() + "/hublink/log/metrik"; }
+
+    Service m_service;
+    Ledger m_ledger{m_service};
+};
+
+} // namespace
+
+TEST_F(LogFault, AFullDiskCostsLinesWhoseNumberIsLoggedOnce) {
+    const Disk disk(Directory(), 1'000'000);
+    InstallAndStart();
+    Store(20);
+    disk.Fill();
+    Store(2000);
+    EXPECT_LT(Received(), 200);
+    disk.MakeRoom();
+    ExpectToGoOn();
+    ExpectOneGap("cannot write (to|a whole line to) the file: No space left on device");
+}
+
+TEST_F(LogFault, WhatAFullDiskKeepsOutOfTheLogIsNotKeptInMemory) {
+    const Disk disk(Directory(), 1'000'000);
+    InstallAndStart();
+    disk.Fill();
+    const auto send = [&](int portions) {
+        for (int i = 0; i < portions; ++i) {
+            for (int j = 0; j < 20; ++j)
+                Service::Send(R"({"eventID":"B2|1","value":")" + std::string(10'000, 'x') + "\"}");
+            m_service.AwaitQuiet();
+        }
+    };
+    send(10);
+    const auto before = ResidentKilobytes();
+    send(100); // 20 MB of lines
+    EXPECT_LT(ResidentKilobytes() - before, 10'000);
+}
+
+TEST_F(LogFault, ADeletedFileIsMadeAgainWithinATenthOfASecondOfRecords) {
+    InstallAndStart();
+    Store(20);
+    std::filesystem::remove(m_service.LogFile());
+    ExpectToGoOn();
+    EXPECT_EQ(Matches("records could not"), 0);
+}
+
+TEST_F(LogFault, ADeletedDirectoryIsMadeAgain) {
+    InstallAndStart();
+    Store(20);
+    std::filesystem::remove_all(m_service.DataDirectory() + "/hublink/log");
+    ExpectToGoOn();
+    EXPECT_EQ(Matches("records could not"), 0);
+}
+
+TEST_F(LogFault, ADirectoryThatMayOnlyBeReadForATimeCostsLinesWhoseNumberIsLoggedOnce) {
+    InstallAndStart();
+    Store(20);
+    {
+        const Disk other(Directory(), 1'000'000); // is in the log's place, until this block ends
+        other.ForbidWriting();
+        EXPECT_TRUE(WaitUntil([&] {
+            Store(1);
+            return !HasTheLogOpen();
+        }));
+        Store(500);
+        EXPECT_TRUE(std::filesystem::is_empty(Directory()));
+    }
+    ExpectToGoOn();
+    ExpectOneGap("cannot open the file: Read-only file system");
+}
+
+TEST_F(LogFault, ALogThatCannotBeOpenedAtTheStartBeginsWhenItCan) {
+    const Disk disk(Directory(), 1'000'000);
+    m_service.Install();
+    disk.ForbidWriting();
+    const auto before = m_service.Output().size();
+    m_service.Start();
+    Store(200);
+    EXPECT_THAT(m_service.Output().substr(before),
+                MatchesRegex("Error:.*cannot open the file: Read-only file system, .*\n\n"));
+    EXPECT_THAT(m_service.Log(), IsEmpty());
+    disk.AllowWriting();
+    ExpectToGoOn();
+    EXPECT_EQ(Matches("records could not be written: cannot open the file: Read-only file system"), 1);
+}

@@ -1,0 +1,229 @@
+#include <filesystem>
+#include <fstream>
+#include <ostream>
+
+#include <SQLiteCpp/SQLiteCpp.h>
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "tests/e2e/support/Disk.h"
+#include "tests/e2e/support/Ledger.h"
+#include "tests/support/WaitUntil.h"
+
+using ::testing::Each;
+using ::testing::Field;
+using ::testing::IsEmpty;
+using ::testing::IsSupersetOf;
+
+// What the user loses when Report.db cannot be used, and that the service goes on by itself when it can.
+
+namespace {
+
+using namespace std::chrono_literals;
+using Numbers = Ledger::Numbers;
+
+class StoreFault : public ::testing::Test {
+protected:
+    void InstallAndStart() {
+        m_service.Install();
+        m_service.Start();
+    }
+
+    /// So many reports, all of them rows before the fault comes.
+    void StoreSome(int count = 20) {
+        const int first = m_ledger.Next();
+        m_ledger.Report(count);
+        ASSERT_TRUE(WaitUntil([&] { return StoresAll(first); }));
+    }
+
+    bool StoresAll(int first) const {
+        return std::ranges::includes(m_ledger.Stored(), Ledger::Range(first, m_ledger.Next()));
+    }
+
+    /// Reports are stored again, every one, without a restart.
+    void ExpectToGoOn() {
+        EXPECT_TRUE(m_ledger.ReportUntilOneIsStored());
+        StoreSome();
+    }
+
+    /// Nothing is missing from `first` on, and what is no row has its statement in the log, with this error.
+    void ExpectEachStoredOrLogged(const std::string& error, int first = 0) {
+        EXPECT_TRUE(m_ledger.AwaitEachStoredOrLogged(first));
+        EXPECT_THAT(m_ledger.Lost(), Each(Field(&Ledger::LostOne::error, error)));
+        for (const int number : m_ledger.LostNumbers())
+            EXPECT_FALSE(m_ledger.Stored().contains(number));
+    }
+
+    /// The store with the files that belong to it.
+    std::vector<std::string> Files() const {
+        const auto store = m_service.DatabaseFile();
+        return {store, store + "-wal", store + "-shm"};
+    }
+
+    void MoveAway() const {
+        for (const auto& file : Files())
+            if (std::filesystem::exists(file))
+                std::filesystem::rename(file, file + ".away");
+    }
+
+    Service m_service;
+    Ledger m_ledger{m_service};
+};
+
+} // namespace
+
+TEST_F(StoreFault, AFullDiskCostsTheReportsThatTheLogHasAndNoOthers) {
+    const Disk disk(m_service.DataDirectory() + "/hublink/database", 2'000'000);
+    InstallAndStart();
+    StoreSome();
+    disk.Fill();
+    ASSERT_TRUE(m_ledger.ReportUntilOneIsLost());
+    m_ledger.Report(100);
+    disk.MakeRoom();
+    ExpectToGoOn();
+    ExpectEachStoredOrLogged("database or disk is full");
+}
+
+TEST_F(StoreFault, ALockHeldForTenSecondsCostsNothing) {
+    InstallAndStart();
+    StoreSome();
+    SQLite::Database other(m_service.DatabaseFile(), SQLite::OPEN_READWRITE);
+    other.exec("begin immediate");
+    const auto end = std::chrono::steady_clock::now() + 10s;
+    while (std::chrono::steady_clock::now() < end) {
+        const auto before = m_service.LogLines("App/ReportServer:42 Recv").size();
+        m_ledger.Report(10);
+        EXPECT_TRUE(
+            WaitUntil([&] { return m_service.LogLines("App/ReportServer:42 Recv").size() == before + 10; }));
+        WaitUntil([&] { return std::chrono::steady_clock::now() > end; }, 200ms); // the pace
+    }
+    EXPECT_EQ(m_ledger.Stored(), Ledger::Range(0, 20));
+    other.exec("commit");
+    EXPECT_TRUE(WaitUntil([&] { return StoresAll(0); }));
+    EXPECT_THAT(m_ledger.Lost(), IsEmpty());
+}
+
+TEST_F(StoreFault, ADeletedStoreCostsWhatWasInItAndWhatComesUntilSetUpMakesAnother) {
+    InstallAndStart();
+    StoreSome();
+    const int first = m_ledger.Next();
+    for (const auto& file : Files())
+        std::filesystem::remove(file);
+    ASSERT_TRUE(m_ledger.ReportUntilOneIsLost());
+    m_ledger.Report(100);
+    EXPECT_FALSE(std::filesystem::exists(m_service.DatabaseFile())) << "the service makes none";
+    m_service.Install();
+    ExpectToGoOn();
+    ExpectEachStoredOrLogged("unable to open database file", first);
+}
+
+TEST_F(StoreFault, TheStatementsInTheLogBringTheLostReportsBack) {
+    InstallAndStart();
+    MoveAway();
+    m_ledger.Report(100);
+    ASSERT_TRUE(m_ledger.ReportUntilOneIsLost());
+    m_service.Install();
+    EXPECT_TRUE(m_ledger.ReportUntilOneIsStored());
+    SQLite::Database store(m_service.DatabaseFile(), SQLite::OPEN_READWRITE, 10'000);
+    for (const auto& lost : m_ledger.Lost())
+        store.exec(lost.statement);
+    EXPECT_EQ(m_service.Count(m_service.DatabaseFile(), "select count(distinct eventID) from OperLog"),
+              m_ledger.Next());
+}
+
+TEST_F(StoreFault, MissingTablesCostTheReportsThatComeUntilSetUpMakesThem) {
+    m_service.Install();
+    m_service.Query(m_service.DatabaseFile(), "drop table OperLog");
+    m_service.Query(m_service.DatabaseFile(), "drop table BaseInfo");
+    m_service.Start();
+    m_ledger.Report(100);
+    ASSERT_TRUE(m_ledger.ReportUntilOneIsLost());
+    m_service.Install();
+    ExpectToGoOn();
+    ExpectEachStoredOrLogged("no such table: OperLog");
+}
+
+TEST_F(StoreFault, AStoreThatIsReplacedUnderLoadLosesNothing) {
+    InstallAndStart();
+    StoreSome();
+    m_service.Query(m_service.DatabaseFile(), "vacuum into '" + m_service.DataDirectory() + "/new.db'");
+    m_service.Query(m_service.DataDirectory() + "/new.db", "delete from OperLog");
+    m_ledger.Report(500);
+    std::filesystem::rename(m_service.DatabaseFile(), m_service.DatabaseFile() + ".away");
+    std::filesystem::rename(m_service.DataDirectory() + "/new.db", m_service.DatabaseFile());
+    m_ledger.Report(500);
+    ExpectToGoOn();
+    Numbers found = m_ledger.Stored();
+    found.merge(m_ledger.LostNumbers());
+    for (const auto& id :
+         m_service.Query(m_service.DatabaseFile() + ".away", "select substr(eventID, 4) from OperLog"))
+        found.insert(std::stoi(id));
+    EXPECT_EQ(found, Ledger::Range(0, m_ledger.Next()));
+}
+
+TEST_F(StoreFault, AStoreThatMayOnlyBeReadCostsTheReportsThatComeUntilItMayBeWritten) {
+    const Disk disk(m_service.DataDirectory() + "/hublink/database", 2'000'000);
+    m_service.Install();
+    disk.ForbidWriting();
+    m_service.Start();
+    m_ledger.Report(100);
+    ASSERT_TRUE(m_ledger.ReportUntilOneIsLost());
+    EXPECT_TRUE(m_ledger.AwaitEachStoredOrLogged());
+    EXPECT_THAT(m_ledger.Stored(), IsEmpty());
+    disk.AllowWriting();
+    ExpectToGoOn();
+    ExpectEachStoredOrLogged("unable to open database file");
+}
+
+namespace {
+
+/// A way in which the bytes of the file go bad.
+struct Damage {
+    const char* name;
+    bool truncated;           ///< Rather than overwritten.
+    std::uintmax_t keptBytes; ///< Of its beginning; a page has 4096.
+    const char* error;
+};
+
+void PrintTo(const Damage& damage, std::ostream* out) {
+    *out << damage.error;
+}
+
+class DamagedStore : public StoreFault, public ::testing::WithParamInterface<Damage> {
+protected:
+    void DamageTheFile() const {
+        const auto file = m_service.DatabaseFile();
+        const auto size = std::filesystem::file_size(file);
+        ASSERT_GT(size, 4 * 4096U);
+        std::filesystem::resize_file(file, GetParam().keptBytes);
+        if (!GetParam().truncated)
+            std::ofstream(file, std::ios::app) << std::string(size - GetParam().keptBytes, 'x');
+    }
+};
+
+} // namespace
+
+TEST_P(DamagedStore, CostsWhatWasInItAndWhatComesUntilAnotherIsInItsPlace) {
+    InstallAndStart();
+    StoreSome(200);
+    // What is still in the write-ahead log would make up for the damage.
+    m_service.Query(m_service.DatabaseFile(), "pragma wal_checkpoint(truncate)");
+    DamageTheFile();
+    const int first = m_ledger.Next();
+    m_ledger.Report(100);
+    ExpectEachStoredOrLogged(GetParam().error, first);
+    EXPECT_EQ(m_ledger.LostNumbers(), Ledger::Range(first, m_ledger.Next()));
+    MoveAway();
+    m_service.Install();
+    EXPECT_TRUE(m_ledger.ReportUntilOneIsStored());
+    StoreSome();
+}
+
+INSTANTIATE_TEST_SUITE_P(OfAllKinds, DamagedStore,
+                         ::testing::Values(Damage{"Overwritten", false, 0, "file is not a database"},
+                                           Damage{"OverwrittenBehindItsFirstPage", false, 4096,
+                                                  "database disk image is malformed"},
+                                           Damage{"Truncated", true, 4096,
+                                                  "database disk image is malformed"},
+                                           Damage{"Emptied", true, 0, "no such table: OperLog"}),
+                         [](const auto& damage) { return damage.param.name; });
