@@ -10,7 +10,6 @@
 #include "tests/e2e/support/Ledger.h"
 #include "tests/support/WaitUntil.h"
 
-using ::testing::EndsWith;
 using ::testing::IsEmpty;
 using ::testing::MatchesRegex;
 
@@ -107,6 +106,9 @@ TEST_F(LogFault, AFullDiskCostsLinesWhoseNumberIsLoggedOnce) {
 }
 
 TEST_F(LogFault, WhatAFullDiskKeepsOutOfTheLogIsNotKeptInMemory) {
+#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
+    GTEST_SKIP() << "the sanitizers keep memory of their own";
+#endif
     const Disk disk(Directory(), 1'000'000);
     InstallAndStart();
     disk.Fill();
@@ -123,7 +125,7 @@ TEST_F(LogFault, WhatAFullDiskKeepsOutOfTheLogIsNotKeptInMemory) {
     EXPECT_LT(ResidentKilobytes() - before, 10'000);
 }
 
-TEST_F(LogFault, ADeletedFileIsMadeAgainWithinATenthOfASecondOfRecords) {
+TEST_F(LogFault, ADeletedFileIsMadeAgain) {
     InstallAndStart();
     Store(20);
     std::filesystem::remove(m_service.LogFile());
@@ -169,4 +171,23 @@ TEST_F(LogFault, ALogThatCannotBeOpenedAtTheStartBeginsWhenItCan) {
     disk.AllowWriting();
     ExpectToGoOn();
     EXPECT_EQ(Matches("records could not be written: cannot open the file: Read-only file system"), 1);
+}
+
+TEST_F(LogFault, ADiskThatIsFullForLogAndStoreCostsReportsWithoutATrace) {
+    const Disk disk(m_service.DataDirectory() + "/hublink", 4'000'000);
+    InstallAndStart();
+    Store(20);
+    disk.Fill();
+    m_ledger.Report(1000);
+    EXPECT_TRUE(WaitUntil(&Service::TookAllDatagrams));
+    disk.MakeRoom();
+    EXPECT_TRUE(m_ledger.ReportUntilOneIsStored());
+    const int first = m_ledger.Next();
+    m_ledger.Report(20);
+    EXPECT_TRUE(m_ledger.AwaitEachStoredOrLogged(first));
+    const auto stored = m_ledger.Stored();
+    EXPECT_TRUE(std::ranges::includes(stored, Ledger::Range(0, 20)));
+    EXPECT_TRUE(std::ranges::includes(stored, Ledger::Range(first, m_ledger.Next())));
+    EXPECT_LT(stored.size() + m_ledger.Lost().size(), 1000U);
+    EXPECT_EQ(Matches("records could not"), 1);
 }

@@ -31,7 +31,7 @@ bool Ledger::ReportUntilOneIsStored(std::chrono::milliseconds deadline) {
     return WaitUntil(
         [&] {
             Report();
-            WaitUntil([&] { return IsHandled(m_next - 1); }, deadline);
+            WaitUntil([&] { return IsHandled(m_next - 1); }, std::chrono::seconds(1)); // the log may fail too
             return Stored().contains(m_next - 1);
         },
         deadline);

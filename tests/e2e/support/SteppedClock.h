@@ -1,0 +1,35 @@
+#pragma once
+
+#include <chrono>
+#include <cstdint>
+#include <fstream>
+
+#include "tests/e2e/support/Service.h"
+#include "tests/support/TemporaryDirectory.h"
+
+/// The wall clock of a service that is started after this object was made: it runs as the machine's, so much ahead of it.
+class SteppedClock {
+public:
+    explicit SteppedClock(Service& service) {
+        StepTo(std::chrono::seconds(0));
+        service.SetEnvironment("LD_PRELOAD=" SSR_STEPPED_CLOCK);
+        service.SetEnvironment("SSR_STEPPED_CLOCK_FILE=" + File());
+        service.SetEnvironment(
+            "ASAN_OPTIONS=verify_asan_link_order=0"); // the sanitizer wants to be the first otherwise
+    }
+
+    /// From now on.
+    void StepTo(std::chrono::seconds ahead) const {
+        const std::int64_t seconds = ahead.count();
+        std::fstream file(File(),
+                          std::ios::in | std::ios::out | std::ios::app); // never shorter, it is mapped
+        file.close();
+        file.open(File(), std::ios::in | std::ios::out | std::ios::binary);
+        file.write(reinterpret_cast<const char*>(&seconds), sizeof seconds);
+    }
+
+private:
+    std::string File() const { return m_directory.Path() + "/ahead"; }
+
+    TemporaryDirectory m_directory;
+};
