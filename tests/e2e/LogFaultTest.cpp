@@ -97,9 +97,11 @@ TEST_F(LogFault, AFullDiskCostsLinesWhoseNumberIsLoggedOnce) {
     const Disk disk(Directory(), 1'000'000);
     InstallAndStart();
     Store(20);
+    const auto output = m_service.Output();
     disk.Fill();
     Store(2000);
     EXPECT_LT(Received(), 200);
+    EXPECT_EQ(m_service.Output(), output) << "nor are they written anywhere else";
     disk.MakeRoom();
     ExpectToGoOn();
     ExpectOneGap("cannot write (to|a whole line to) the file: No space left on device");

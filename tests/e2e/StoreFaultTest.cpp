@@ -103,6 +103,21 @@ TEST_F(StoreFault, ALockHeldForTenSecondsCostsNothing) {
     EXPECT_THAT(m_ledger.Lost(), IsEmpty());
 }
 
+TEST_F(StoreFault, ALockHeldForLongerCostsAReportForEveryFifteenSeconds) {
+    InstallAndStart();
+    StoreSome();
+    SQLite::Database other(m_service.DatabaseFile(), SQLite::OPEN_READWRITE);
+    other.exec("begin immediate");
+    const auto begin = std::chrono::steady_clock::now();
+    m_ledger.Report(20);
+    ASSERT_TRUE(WaitUntil([&] { return !m_ledger.Lost().empty(); }, 30s));
+    EXPECT_GE(std::chrono::steady_clock::now() - begin, 14s);
+    other.exec("commit");
+    ExpectEachStoredOrLogged("database is locked");
+    EXPECT_EQ(m_ledger.Lost().size(), 1U);
+    ExpectToGoOn();
+}
+
 TEST_F(StoreFault, ADeletedStoreCostsWhatWasInItAndWhatComesUntilSetUpMakesAnother) {
     InstallAndStart();
     StoreSome();
