@@ -55,6 +55,10 @@ protected:
                                "select stored, delivered, dropped from outbox_status");
     }
 
+    std::int64_t Stored() const {
+        return m_service.Count(m_service.OutboxFile(), "select stored from outbox_status");
+    }
+
     Service m_service;
     const SteppedClock m_clock{m_service};
     const LoopbackServer m_collector{[](const Request&) { return Reply(); }};
@@ -87,6 +91,7 @@ TEST_F(ClockFault, EventsThatWaitWhileItStepsAreDeliveredAtOnce) {
         Service::Send(R"({"eventID":"A759|1"})");
         Service::Send(R"({"eventID":"B1"})");
         ++m_sent;
+        EXPECT_TRUE(WaitUntil([&] { return Stored() == m_sent; }));
         m_clock.StepTo(ahead);
         ExpectEverythingToGoOn();
     }

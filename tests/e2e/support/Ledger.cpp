@@ -1,8 +1,9 @@
 #include "tests/e2e/support/Ledger.h"
 
 #include <algorithm>
-#include <regex>
+#include <sstream>
 
+#include <Poco/RegularExpression.h>
 #include <gtest/gtest.h>
 
 #include "tests/support/WaitUntil.h"
@@ -71,12 +72,14 @@ Ledger::Numbers Ledger::Stored() const {
 }
 
 std::vector<Ledger::LostOne> Ledger::Lost() const {
-    static const std::regex FORM(
-        R"(Frame/DBHelper:\d+ ExecSql\] (.*)-(insert into OperLog .* values\('B1\|(\d+)'.*))");
+    static const Poco::RegularExpression FORM(
+        R"(Frame/DBHelper:\d+ ExecSql\] (.*)-(insert into OperLog .* values\('B1\|(\d+)'.*)$)");
     std::vector<LostOne> lost;
-    const std::string log = m_service.Log();
-    for (std::sregex_iterator line(log.begin(), log.end(), FORM), end; line != end; ++line)
-        lost.push_back({std::stoi((*line)[3]), (*line)[1], (*line)[2]});
+    std::istringstream log(m_service.Log());
+    std::vector<std::string> parts;
+    for (std::string line; std::getline(log, line);)
+        if (FORM.split(line, parts) == 4)
+            lost.push_back({std::stoi(parts[3]), parts[1], parts[2]});
     return lost;
 }
 
