@@ -194,5 +194,5 @@ TEST_F(LogFault, ADiskThatIsFullForLogAndStoreCostsReportsWithoutATrace) {
     EXPECT_TRUE(std::ranges::includes(stored, Ledger::Range(0, 20)));
     EXPECT_TRUE(std::ranges::includes(stored, Ledger::Range(first, m_ledger.Next())));
     EXPECT_LT(stored.size() + m_ledger.Lost().size(), 1000U);
-    EXPECT_EQ(Matches("records could not"), 1);
+    EXPECT_GE(Matches("records could not"), 1);
 }

@@ -22,9 +22,9 @@ public:
     void StepTo(std::chrono::seconds ahead) const {
         const std::int64_t seconds = ahead.count();
         std::fstream file(File(),
-                          std::ios::in | std::ios::out | std::ios::app); // never shorter, it is mapped
-        file.close();
-        file.open(File(), std::ios::in | std::ios::out | std::ios::binary);
+                          std::ios::in | std::ios::out | std::ios::binary); // never shorter: it is mapped
+        if (!file)
+            file.open(File(), std::ios::out | std::ios::binary);
         file.write(reinterpret_cast<const char*>(&seconds), sizeof seconds);
     }
 
