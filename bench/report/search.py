@@ -2,7 +2,7 @@
 import runs
 
 FIRST_RATE = 50_000
-EXACTNESS = 1.05   # the last rate without loss and the first with one are so close
+STEP_DOWN = 1.05   # when the long run loses what the short ones did not
 KEPT_UP = 0.97     # a sender that was slower than this part of its pace was the limit itself
 TRIES = 2          # at each rate: a loss is the subject's doing when it happens again
 
@@ -21,11 +21,11 @@ def highest_rate(subject_class, plan, tell):
         return False
 
     low, high = _bracket(lambda rate: is_lossless(rate, plan.probe_seconds), probes)
-    while low and high and high / low > EXACTNESS:
+    while low and high and high / low > plan.exactness:
         middle = (low * high) ** 0.5
         low, high = (middle, high) if is_lossless(middle, plan.probe_seconds) else (low, middle)
     while low and not is_lossless(low, plan.confirm_seconds):
-        low = low / EXACTNESS if low > 1000 else 0
+        low = low / STEP_DOWN if low > 1000 else 0
     confirmed = probes[-1] if low else None
     return {"confirmed": confirmed, "probes": probes, "limited_by_sender": bool(low) and high is None}
 
