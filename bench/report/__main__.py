@@ -1,8 +1,12 @@
-"""The driver of bench/run: measures, and writes the report."""
+"""Measures the service from end to end beside its bounds and another daemon. Prints the report as Markdown, and leaves
+it as JSON, with a chart, in build/bench/."""
 import argparse
 import json
+import pathlib
 
+import machine
 import measures
+import output
 import plan
 import progress
 import subjects
@@ -10,24 +14,38 @@ import subjects
 
 def arguments():
     parser = argparse.ArgumentParser(prog="bench/run", description=__doc__)
-    parser.add_argument("--quick", action="store_true", help="about a minute, with figures to match")
+    parser.add_argument("--quick", action="store_true", help="in about a minute, for a look")
     parser.add_argument("--only", action="append", choices=measures.MEASURES, help="this measure; may be repeated")
-    parser.add_argument("--of", action="append", help="of this subject only; may be repeated")
+    parser.add_argument("--of", action="append", help="of this one only: service, analytics, daemon, bare; may be repeated")
+    parser.add_argument("--update-docs", action="store_true", help="write the figures into docs/Performance.md")
+    parser.add_argument("--from", dest="file", type=pathlib.Path, help="measure nothing: the report of this JSON file")
+    parser.add_argument("--install", action="store_true", help="install the other daemon's packages first")
     return parser.parse_args()
+
+
+def measured(options):
+    chosen = plan.QUICK if options.quick else plan.FULL
+    steps = list(measures.steps(chosen, options.only, options.of))
+    if not subjects.Daemon.is_installed():
+        print("syslog-ng is left out; bench/run --install installs it, as a program and not as a service.\n")
+        steps = [step for step in steps if step[2] != "daemon"]
+    report = {"quick": options.quick, "machine": machine.describe(), "results": {}}
+    bar = progress.Progress({name: seconds for name, _, _, seconds in steps})
+    for name, measure, subject, _ in steps:
+        with bar.step(name):
+            result = measures.MEASURES[measure][2](subject, chosen, bar.tell)
+            report["results"].setdefault(measure, {})[subject] = result
+    bar.finish()
+    return json.loads(json.dumps(report))  # with texts for keys, as it is read again from a file
 
 
 def main():
     options = arguments()
-    chosen = plan.QUICK if options.quick else plan.FULL
-    steps = [step for step in measures.steps(chosen, options.only, options.of)
-             if step[2] != "daemon" or subjects.Daemon.is_installed()]
-    bar = progress.Progress({name: seconds for name, _, _, seconds in steps})
-    results = {}
-    for name, measure, subject, _ in steps:
-        with bar.step(name):
-            results.setdefault(measure, {})[subject] = measures.MEASURES[measure][2](subject, chosen, bar.tell)
-    bar.finish()
-    print(json.dumps(results, indent=1))
+    report = json.loads(options.file.read_text()) if options.file else measured(options)
+    output.write(report)
+    print(output.text(report))
+    if options.update_docs:
+        output.update_page(report)
 
 
 if __name__ == "__main__":

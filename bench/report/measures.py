@@ -1,10 +1,20 @@
-"""Each measure: its name, what it is measured of, about how long one takes, and how."""
+"""Each measure: what it is measured of, about how long one takes, and how."""
+import json
+import statistics
+import subprocess
+import time
+
+import backlog
+import latency
+import procfs
 import runs
 import search
 import subjects
+from subjects import PROGRAMS
 
 SUBJECTS = {subject.name: subject for subject in
             (subjects.Service, subjects.Analytics, subjects.Daemon, subjects.BareReceiver)}
+STORES = ("service", "analytics")
 
 
 def flood(subject, plan, _):
@@ -15,9 +25,71 @@ def rate(subject, plan, tell):
     return search.highest_rate(SUBJECTS[subject], plan, tell)
 
 
-MEASURES = {
+def latencies(subject, plan, tell):
+    result = []
+    for per_second in plan.latency_rates:
+        tell(f"{per_second:,}/s")
+        result.append(latency.measure(SUBJECTS[subject], per_second, plan.latency_seconds))
+    return result
+
+
+def bare_sqlite(_, plan, tell):
+    """Into a store as reportctl makes it, the service's own program being left out."""
+    result = {}
+    for rows_per_commit, rows in plan.baseline_rows:
+        tell(f"{rows_per_commit:,} rows to a commit")
+        with subjects.EmptyStore() as store:
+            command = [PROGRAMS / "bench_inserter", store.database(), "--rows", str(rows),
+                       "--rows-per-commit", str(rows_per_commit)]
+            run = json.loads(subprocess.run(command, capture_output=True, text=True, check=True).stdout)
+        result[rows_per_commit] = {"rows_per_second": run["rows"] / run["seconds"], "cpu_ns": run["cpu_ns"] / run["rows"]}
+    return result
+
+
+def growth(_, plan, tell):
+    """All sizes in turn, several times, so that a disturbance meets all of them; the median counts."""
+    rounds = []
+    for number in range(plan.growth_rounds):
+        for rows in plan.rows_before:
+            tell(f"round {number + 1}, {rows:,} rows before")
+            rounds.append({"rows_before": rows,
+                           **backlog.measure(lambda: subjects.FilledService(rows), plan.growth_reports)})
+    return {rows: _median([run for run in rounds if run["rows_before"] == rows]) for rows in plan.rows_before}
+
+
+def _median(runs_of_a_size):
+    return {name: statistics.median(run[name] for run in runs_of_a_size) for name in runs_of_a_size[0]}
+
+
+def queue(_, plan, tell):
+    """In the real program; then the queue's own part, in a program without sockets and database."""
+    full = backlog.measure(subjects.Service, plan.queued_reports)
+    tell("the queue alone")
+    command = [PROGRAMS / "poco_tasker_bench", "--benchmark_filter=^Item/", "--benchmark_format=json"]
+    report = json.loads(subprocess.run(command, capture_output=True, text=True, check=True).stdout)
+    full["item_ns"] = {run["name"].split("/")[1]: 1e9 / run["items_per_second"] for run in report["benchmarks"]}
+    return full
+
+
+def rest(_, plan, __):
+    """While nobody sends anything."""
+    with subjects.Service() as service:
+        before = sum(procfs.thread_ns(service.process.pid).values())
+        time.sleep(plan.rest_seconds)
+        used = sum(procfs.thread_ns(service.process.pid).values()) - before
+        return {"ready_ms": service.ready_seconds * 1000, "core_part": used / 1e9 / plan.rest_seconds,
+                "resident_bytes": procfs.memory_bytes(service.process.pid, "VmRSS")}
+
+
+MEASURES = {  # name: of what, seconds for one, how
+    "rest": (("service",), lambda plan: plan.rest_seconds, rest),
+    "baselines": (("sqlite",), lambda plan: sum(rows for _, rows in plan.baseline_rows) / 1e5, bare_sqlite),
     "floods": (tuple(SUBJECTS), lambda plan: plan.flood_reports / 60_000 + 2, flood),
-    "rates": (tuple(SUBJECTS), lambda plan: 8 * (plan.probe_seconds + 2) + plan.confirm_seconds, rate),
+    "rates": (tuple(SUBJECTS), lambda plan: 9 * (plan.probe_seconds + 2) + plan.confirm_seconds, rate),
+    "latencies": (STORES, lambda plan: len(plan.latency_rates) * (plan.latency_seconds + 1), latencies),
+    "queue": (("service",), lambda plan: plan.queued_reports / 40_000 + 5, queue),
+    "growth": (("service",), lambda plan: plan.growth_rounds * (sum(plan.rows_before) / 3e5
+               + len(plan.rows_before) * (plan.growth_reports / 40_000 + 2)), growth),
 }
 
 

@@ -37,7 +37,7 @@ def settle(subject):
 
 
 def measure(subject_class, count, rate=0):
-    """A dictionary of plain numbers."""
+    """A dictionary of plain numbers. `subject_class` is whatever makes a subject."""
     os.sync()  # what the run before left to write is no part of this one
     with subject_class() as subject:
         pid = subject.process.pid

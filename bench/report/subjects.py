@@ -13,12 +13,19 @@ ROOT = pathlib.Path(__file__).resolve().parent.parent.parent
 PROGRAMS = ROOT / "build/release/bin"
 START_SECONDS = 20
 
+# Rows as the service makes them of the sender's reports.
+FILL = """with recursive n(i) as (select 0 union all select i + 1 from n limit :rows)
+          insert into OperLog (eventID, value, createTime, pType, extData3, extData4) select 'B100|10001',
+          '{"button":"save","page":"editor","count":3,"ratio":1.5,"text":"a text as people write it"}',
+          1700000000000 + i, 0, '3.0.0.0', 'visitor' from n"""
+
 
 class Subject:
     """Runs in a new directory on the disk of the build, from `with` to its end."""
     name = ""
     title = ""
     event = "B100|10001"
+    watch = "select id, createTime from OperLog where id > ?1 order by id"  # the new rows, for the watcher
 
     def __enter__(self):
         self.directory = pathlib.Path(tempfile.mkdtemp(prefix="bench.", dir=ROOT / "build"))
@@ -36,12 +43,13 @@ class Subject:
     def start(self):
         self.process = subprocess.Popen(self.command(), env=self.environment(),
                                         stdout=subprocess.DEVNULL, stderr=subprocess.PIPE, text=True)
-        deadline = time.monotonic() + START_SECONDS
+        begin = time.monotonic()
         while not procfs.is_bound():
-            if self.process.poll() is not None or time.monotonic() > deadline:
+            if self.process.poll() is not None or time.monotonic() - begin > START_SECONDS:
                 self.process.kill()
                 raise SystemExit(f"{self.title} did not start: {self.process.communicate()[1]}")
-            time.sleep(0.001)
+            time.sleep(0.0005)
+        self.ready_seconds = time.monotonic() - begin
         self.receiver = procfs.receiving_thread(self.process.pid)
 
     def stop(self):
@@ -91,10 +99,39 @@ class Service(Subject):
         return self.directory / "hublink/database/Report.db"
 
 
+class EmptyStore(Service):
+    """The store without a service."""
+
+    def start(self):
+        pass
+
+    def stop(self):
+        pass
+
+
+class FilledService(Service):
+    """With rows in the table before it starts."""
+
+    def __init__(self, rows):
+        self.rows_before = rows
+
+    def prepare(self):
+        super().prepare()
+        connection = sqlite3.connect(self.database(), isolation_level=None)
+        connection.execute(FILL, {"rows": self.rows_before})
+        connection.execute("pragma wal_checkpoint(truncate)")  # what is left to write would be the run's to write
+        connection.close()
+        os.sync()
+
+    def stored(self):
+        return super().stored() - self.rows_before
+
+
 class Analytics(Service):
     name = "analytics"
     title = "the service, events to the outbox"
     event = "A759|10001"
+    watch = "select id, json_extract(payload, '$.extend.createTime') from event where id > ?1 order by id"
 
     def database(self):
         return self.directory / "hublink/database/MetrikOutbox.db"

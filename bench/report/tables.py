@@ -1,0 +1,124 @@
+"""The report as Markdown: a section for each measure that was taken."""
+import targets
+
+TITLES = {"service": "service, reports to the store", "analytics": "service, events to the outbox",
+          "daemon": "syslog-ng, tuned, rows to SQLite", "bare": "bare `recvfrom` loop"}
+
+
+def sections(report):
+    """Name to text. A result that is missing has no section."""
+    results = report["results"]
+    written = {"machine": machine(report), "targets": verdicts(results)}
+    for name, write in SECTIONS.items():
+        if name in results:
+            written[name] = write(results[name])
+    return written
+
+
+def table(head, rows):
+    """All columns but the first are figures."""
+    lines = [head, ["---"] + ["--:"] * (len(head) - 1), *rows]
+    return "\n".join("| " + " | ".join(str(cell) for cell in line) + " |" for line in lines)
+
+
+def machine(report):
+    m = report["machine"]
+    limit = f"{m['receive_buffer_limit']:,} bytes" if m["receive_buffer_limit"] else "not shown"
+    rows = [("processor", f"{m['processor']}, {m['cores']} cores, {m['architecture']}"),
+            ("memory", f"{m['memory_gib']} GiB"), ("system", f"{m['system']}, kernel {m['kernel']}"),
+            ("disk", m["disk"]), ("largest socket buffer that may be asked for", limit),
+            ("compiler, SQLite, daemon", f"{m['compiler']}; {m['sqlite']}; {m['daemon']}"),
+            ("load before the run", f"{m['load']:.2f}"), ("version measured", f"`{m['commit']}`"),
+            ("size of the run", "quick: figures for a look only" if report["quick"] else "full")]
+    return table(["", "what it was measured on"], rows).replace("--:", "---")
+
+
+def verdicts(results):
+    words = {True: "reached", False: "**not reached**", None: "not measured"}
+    rows = [(v.text, v.limit, v.measured, words[v.reached]) for v in targets.verdicts(results)]
+    return table(["target", "wanted", "measured", "verdict"], rows)
+
+
+def floods(runs):
+    head = ["unpaced flood", "sent", "sent/s", "stored", "lost: socket's buffer", "lost: later", "last row after",
+            "rows/s", "peak memory"]
+    return table(head, [_flood(name, run) for name, run in runs.items()]) + "\n\n" + _processor_time(runs)
+
+
+def _flood(name, run):
+    nothing = run["stored"] is None
+    return (TITLES[name], f"{run['sent']:,}", f"{run['offered']:,.0f}",
+            f"{run['received']:,} received" if nothing else f"{run['stored']:,}",
+            f"{run['kernel_lost'] + run['lost_before']:,}", "-" if nothing else f"{run['lost_after']:,}",
+            "-" if nothing else f"{run['last_row']:.1f} s", "-" if nothing else f"{run['rows_per_second']:,.0f}",
+            f"{run['peak_bytes'] / 2**20:,.0f} MiB")
+
+
+def _processor_time(runs):
+    """The daemon hands sockets and tables to its threads as it likes, so only their sum tells something."""
+    rows = []
+    for name, run in runs.items():
+        cpu = run["cpu"]
+        each = ["-", "-"] if name == "daemon" else [_us(cpu["receiving"]), "-" if name == "bare" else _us(cpu["storing"])]
+        rows.append((TITLES[name], *each, _us(sum(cpu.values())), _us(run["sender_cpu_ns"])))
+    return table(["processor time for a datagram", "receiving thread", "storing thread", "whole program", "sender"], rows)
+
+
+def _us(nanoseconds):
+    return f"{nanoseconds / 1000:.2f} µs"
+
+
+def rates(found):
+    rows = []
+    for name, result in found.items():
+        run = result["confirmed"]
+        if not run:
+            rows.append((TITLES[name], "none", "-", "-", "-", "-"))
+            continue
+        lag = max(0.0, run["last_row"] - run["seconds"]) if run["last_row"] else None
+        limit = " (the sender's limit)" if result["limited_by_sender"] else ""
+        rows.append((TITLES[name], f"{run['offered']:,.0f}{limit}", f"{run['seconds']:.0f} s", f"{run['sent']:,}",
+                     "-" if lag is None else f"{lag:.1f} s", f"{run['peak_bytes'] / 2**20:,.0f} MiB"))
+    confirmed = {name: result["confirmed"] for name, result in found.items() if result["confirmed"]}
+    head = ["highest rate without loss", "reports/s", "for", "reports", "last row after the last report", "peak memory"]
+    return table(head, rows) + "\n\n" + _processor_time(confirmed)
+
+
+def latencies(found):
+    rows = [(f"{TITLES[name]}, {run['rate']:,}/s", f"{run['p50_ms']:.2f} ms", f"{run['p99_ms']:.2f} ms",
+             f"{run['max_ms']:.2f} ms", f"{run['seen']:,} of {run['sent']:,}",
+             f"{run['look_ms_p50']:.2f}, {run['look_ms_p99']:.2f} ms") for name, runs in found.items() for run in runs]
+    return table(["from sending to a row that others see", "half within", "99 of 100 within", "longest", "seen",
+                  "time between looks (half, 99 of 100)"], rows)
+
+
+def baselines(found):
+    return table(["bare SQLite", "rows/s", "processor time for a row"],
+                 [(f"{int(size):,} row{'s' if int(size) > 1 else ''} to a commit", f"{run['rows_per_second']:,.0f}",
+                   _us(run["cpu_ns"])) for size, run in found["sqlite"].items()])
+
+
+def growth(found):
+    return table(["rows in the table before", "rows/s", "storing thread's processor time for a row"],
+                 [(f"{int(size):,}", f"{run['rows_per_second']:,.0f}", _us(run["storing_cpu_ns"]))
+                  for size, run in found["service"].items()])
+
+
+def queue(found):
+    full = found["service"]
+    rows = [("reports that waited in the service's queue", f"{full['queued']:,}"),
+            ("memory of each", f"{full['bytes_per_item']:,.0f} bytes"),
+            ("storing thread's processor time for each, all told", _us(full["storing_cpu_ns"]))]
+    rows += [(f"queue alone, in and out, {int(size):,} waiting", _us(ns)) for size, ns in full["item_ns"].items()]
+    return table(["the queue", ""], rows)
+
+
+def rest(found):
+    run = found["service"]
+    return table(["while nobody sends", ""], [("from start to bound socket", f"{run['ready_ms']:.1f} ms"),
+                                              ("processor", f"{run['core_part']:.3%} of a core"),
+                                              ("memory", f"{run['resident_bytes'] / 2**20:.1f} MiB")])
+
+
+SECTIONS = {"rates": rates, "floods": floods, "latencies": latencies, "baselines": baselines, "growth": growth,
+            "queue": queue, "rest": rest}

@@ -1,0 +1,77 @@
+"""What the service is to reach, each against a figure of the same run."""
+from collections.abc import Callable
+from typing import NamedTuple
+
+
+class Target(NamedTuple):
+    text: str
+    limit: float
+    at_least: bool
+    value: Callable  # of the results; None or KeyError when they lack a part of it
+    unit: str = "×"
+
+
+class Verdict(NamedTuple):
+    text: str
+    limit: str
+    measured: str
+    reached: bool | None  # None: not measured
+
+
+def _rate(results, subject):
+    return results["rates"][subject]["confirmed"]["offered"]
+
+
+def _receiving_ratio(results):
+    """Against the cheapest that the bare loop was seen to be: it varies with how often it has to wait."""
+    bare = [results["floods"]["bare"]["cpu"]["receiving"]]
+    confirmed = results.get("rates", {}).get("bare", {}).get("confirmed")
+    bare += [confirmed["cpu"]["receiving"]] if confirmed else []
+    return results["floods"]["service"]["cpu"]["receiving"] / min(bare)
+
+
+def _storing_ratio(results):
+    stored = results["floods"]["service"]
+    per_row = stored["cpu"]["storing"] * stored["received"] / stored["stored"]
+    return per_row / results["baselines"]["sqlite"]["1000"]["cpu_ns"]
+
+
+def _growth_ratio(results):
+    sizes = results["growth"]["service"]
+    return sizes[max(sizes, key=int)]["rows_per_second"] / sizes["0"]["rows_per_second"]
+
+
+def _lone_p99(results):
+    return min(results["latencies"]["service"], key=lambda run: run["rate"])["p99_ms"]
+
+
+TARGETS = (
+    Target("highest rate without loss, against the tuned daemon", 1.5, True,
+           lambda r: _rate(r, "service") / _rate(r, "daemon")),
+    Target("rows a second of a flood, against the tuned daemon", 1.5, True,
+           lambda r: r["floods"]["service"]["rows_per_second"] / r["floods"]["daemon"]["rows_per_second"]),
+    Target("reports of a flood that were lost between socket and table", 0, False,
+           lambda r: r["floods"]["service"]["lost_after"], ""),
+    Target("receiving thread's processor time for a datagram and its log record, against a bare recvfrom loop", 3, False,
+           _receiving_ratio),
+    Target("storing thread's processor time for a row, against bare SQLite with 1,000 rows to a commit", 2, False,
+           _storing_ratio),
+    Target("rows a second into the largest table, against an empty one", 0.9, True, _growth_ratio),
+    Target("memory of a queued report of 180 bytes", 400, False,
+           lambda r: r["queue"]["service"]["bytes_per_item"], " bytes"),
+    Target("latency of a report that comes alone, 99 of 100", 5, False, _lone_p99, " ms"),
+)
+
+
+def verdicts(results):
+    return [_verdict(target, results) for target in TARGETS]
+
+
+def _verdict(target, results):
+    limit = f"{'at least' if target.at_least else 'at most'} {target.limit:g}{target.unit}"
+    try:
+        value = target.value(results)
+    except (KeyError, TypeError):  # a part of it was not measured, or there was no rate without loss
+        return Verdict(target.text, limit, "not measured", None)
+    reached = value >= target.limit if target.at_least else value <= target.limit
+    return Verdict(target.text, limit, f"{value:,.4g}{target.unit}", reached)
