@@ -19,7 +19,8 @@ def arguments():
     parser.add_argument("--of", action="append", help="of this one only: service, analytics, daemon, bare; may be repeated")
     parser.add_argument("--update-docs", action="store_true", help="write the figures into docs/Performance.md")
     parser.add_argument("--from", dest="file", type=pathlib.Path, help="measure nothing: the report of this JSON file")
-    parser.add_argument("--install", action="store_true", help="install the other daemon's packages first")
+    parser.add_argument("--install", action="store_true", help="first install the packages of the other daemon, which "
+                        "Debian then also runs as the system's log daemon; bench/run leaves that one alone")
     return parser.parse_args()
 
 
@@ -27,7 +28,7 @@ def measured(options):
     chosen = plan.QUICK if options.quick else plan.FULL
     steps = list(measures.steps(chosen, options.only, options.of))
     if not subjects.Daemon.is_installed():
-        print("syslog-ng is left out; bench/run --install installs it, as a program and not as a service.\n")
+        print("syslog-ng is left out; bench/run --install installs it.\n")
         steps = [step for step in steps if step[2] != "daemon"]
     report = {"quick": options.quick, "machine": machine.describe(), "results": {}}
     bar = progress.Progress({name: seconds for name, _, _, seconds in steps})

@@ -10,7 +10,7 @@ from subjects import ROOT
 def describe():
     return {"processor": _first("/proc/cpuinfo", r"^model name\s*: (.*)$"), "cores": os.cpu_count(),
             "memory_gib": round(int(_first("/proc/meminfo", r"^MemTotal:\s+(\d+) kB$")) / 2**20, 1),
-            "kernel": os.uname().release, "architecture": os.uname().machine,
+            "kernel": re.match(r"[\d.]*\d", os.uname().release)[0], "architecture": os.uname().machine,
             "system": _first("/etc/os-release", r'^PRETTY_NAME="(.*)"$'), "disk": _disk(),
             "compiler": _line("c++", "--version"), "sqlite": _line("sqlite3", "--version").split()[0],
             "daemon": _line("syslog-ng", "--version"), "receive_buffer_limit": _receive_buffer_limit(),
@@ -35,14 +35,14 @@ def _receive_buffer_limit():
 
 
 def _disk():
-    """The file system that the measured stores are on, and whether its disk turns."""
+    """The file system that the measured stores are on, and the kind of its disk, which the device's name tells."""
     device = os.stat(ROOT).st_dev
+    kinds = {"vd": "a virtual disk", "nvme": "an NVMe disk", "sd": "a disk", "xvd": "a virtual disk"}
     for line in pathlib.Path("/proc/self/mountinfo").read_text().splitlines():
-        fields, kind = line.split(" - ")
-        if fields.split()[2] == f"{os.major(device)}:{os.minor(device)}":
-            turns = pathlib.Path(f"/sys/dev/block/{fields.split()[2]}/queue/rotational")
-            turning = turns.exists() and turns.read_text().strip() == "1"
-            return f"{kind.split()[0]} on {'a turning' if turning else 'a solid-state or virtual'} disk"
+        place, kind = (part.split() for part in line.split(" - "))
+        if place[2] == f"{os.major(device)}:{os.minor(device)}":
+            name = pathlib.Path(kind[1]).name
+            return f"{kind[0]} on {next((text for start, text in kinds.items() if name.startswith(start)), 'another device')}"
     return "unknown"
 
 

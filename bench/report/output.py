@@ -14,19 +14,25 @@ def text(report):
     return "\n\n".join(tables.sections(report).values()) + "\n"
 
 
-def write(report, folder=FOLDER, name="performance"):
+def write(report, folder=FOLDER):
+    """A quick or partial run does not take the place of a full one."""
+    name = "performance" if is_full(report) else "quick" if report["quick"] else "part"
     folder.mkdir(parents=True, exist_ok=True)
     (folder / f"{name}.json").write_text(json.dumps(report, indent=1) + "\n")
     if "rates" in report["results"]:
         (folder / f"{name}.svg").write_text(chart.draw(report["results"]["rates"]))
 
 
+def is_full(report):
+    return not report["quick"] and all(name in report["results"] for name in tables.SECTIONS)
+
+
 def update_page(report):
-    """The text between the page's marks. Every section must be there: a page with figures of two runs would lie."""
+    """The text between the page's marks. All of it or nothing: a page with figures of two runs would lie."""
+    if not is_full(report):
+        raise SystemExit(f"{PAGE.name} takes the figures of a full run only")
     page, written = PAGE.read_text(), tables.sections(report)
     for name in re.findall(r"<!-- figures: (\w+) -->", page):
-        if name not in written:
-            raise SystemExit(f"{PAGE.name} shows '{name}', which this run did not measure")
         page = re.sub(rf"(<!-- figures: {name} -->\n).*?(<!-- end -->)",
                       lambda mark: f"{mark[1]}\n{written[name]}\n\n{mark[2]}", page, flags=re.DOTALL)
     PAGE.write_text(page)

@@ -6,10 +6,13 @@ import dataclasses
 class Plan:
     flood_reports: int = 1_000_000
     probe_seconds: float = 4
+    probes: int = 10             # as many as it takes, about; for the bar
     confirm_seconds: float = 20
+    tries: int = 2               # at each rate: a loss is the subject's doing when it happens again
     exactness: float = 1.05      # the search ends when the last rate without loss and the first with one are so close
+    searched: tuple = ("service", "analytics", "daemon", "bare")
     latency_seconds: float = 20
-    latency_rates: tuple = (100, 1_000, 20_000)
+    latency_rates: tuple = (10, 100, 1_000, 20_000)
     baseline_rows: tuple = ((1, 100_000), (1000, 1_000_000))  # rows to a commit, rows
     rows_before: tuple = (0, 1_000_000, 5_000_000)
     growth_reports: int = 500_000
@@ -20,6 +23,6 @@ class Plan:
 
 FULL = Plan()
 
-QUICK = Plan(flood_reports=100_000, probe_seconds=1, confirm_seconds=2, exactness=1.5, latency_seconds=2,
-             latency_rates=(100, 20_000), baseline_rows=((1, 10_000), (1000, 100_000)), rows_before=(0, 100_000),
-             growth_reports=50_000, growth_rounds=1, queued_reports=100_000, rest_seconds=2)
+QUICK = Plan(flood_reports=50_000, probe_seconds=1, probes=3, tries=1, confirm_seconds=1, exactness=4, searched=("service", "daemon"),
+             latency_seconds=1, latency_rates=(10, 20_000), baseline_rows=((1, 10_000), (1000, 100_000)),
+             rows_before=(0, 100_000), growth_reports=50_000, growth_rounds=1, queued_reports=100_000, rest_seconds=1)

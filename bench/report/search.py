@@ -2,9 +2,9 @@
 import runs
 
 FIRST_RATE = 50_000
+LEAST_RATE = 1_000   # below, nothing is searched
 STEP_DOWN = 1.05   # when the long run loses what the short ones did not
-KEPT_UP = 0.97     # a sender that was slower than this part of its pace was the limit itself
-TRIES = 2          # at each rate: a loss is the subject's doing when it happens again
+WORTH_IT = 1.1     # a sender that doubles its pace and does not get so much faster is the limit itself
 
 
 def highest_rate(subject_class, plan, tell):
@@ -12,7 +12,7 @@ def highest_rate(subject_class, plan, tell):
     probes = []
 
     def is_lossless(rate, seconds):
-        for _ in range(TRIES):
+        for _ in range(plan.tries):
             run = runs.measure(subject_class, int(rate * seconds), rate)
             probes.append(run)
             tell(f"{run['offered']:,.0f}/s for {run['seconds']:.0f} s: {run['lost']:,} lost")
@@ -25,17 +25,24 @@ def highest_rate(subject_class, plan, tell):
         middle = (low * high) ** 0.5
         low, high = (middle, high) if is_lossless(middle, plan.probe_seconds) else (low, middle)
     while low and not is_lossless(low, plan.confirm_seconds):
-        low = low / STEP_DOWN if low > 1000 else 0
+        low = low / STEP_DOWN if low > LEAST_RATE else 0
     confirmed = probes[-1] if low else None
     return {"confirmed": confirmed, "probes": probes, "limited_by_sender": bool(low) and high is None}
 
 
 def _bracket(is_lossless, probes):
-    """A rate without loss and one with; no upper one when the sender could go no faster."""
-    low, rate = 0, FIRST_RATE
-    while True:
+    """A rate without loss (0 when there is none) and one with (None when the sender could go no faster)."""
+    rate = FIRST_RATE
+    if not is_lossless(rate):
+        while rate > LEAST_RATE:
+            rate /= 2
+            if is_lossless(rate):
+                return rate, rate * 2
+        return 0, rate
+    fastest = 0
+    while probes[-1]["offered"] > WORTH_IT * fastest:
+        fastest = max(fastest, probes[-1]["offered"])
+        rate *= 2
         if not is_lossless(rate):
-            return low, rate
-        if probes[-1]["offered"] < KEPT_UP * rate:
-            return probes[-1]["offered"], None
-        low, rate = rate, rate * 2
+            return rate / 2, rate
+    return probes[-1]["offered"], None

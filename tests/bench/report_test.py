@@ -1,0 +1,166 @@
+"""The judging, searching and drawing parts of bench/report, on runs that are made up."""
+import pathlib
+import sys
+import unittest
+import xml.etree.ElementTree
+from unittest import mock
+
+ROOT = pathlib.Path(__file__).resolve().parent.parent.parent
+sys.path.insert(0, str(ROOT / "bench/report"))
+
+import chart
+import latency
+import output
+import plan
+import runs
+import search
+import tables
+import targets
+
+
+def run(rate, lost=0, **more):
+    return {"rate": rate, "sent": 1000, "offered": rate, "seconds": 1.0, "lost": lost, "last_row": 1.5, "stored": 1000 - lost,
+            "received": 1000 - lost, "kernel_lost": lost, "lost_before": 0, "lost_after": 0, "rows_per_second": 600.0,
+            "peak_bytes": 2**20, "sender_cpu_ns": 900, "cpu": {"receiving": 2000, "storing": 6000, "others": 0}, **more}
+
+
+def losing_above(limit, sender_limit=float("inf")):
+    """Stands in for runs.measure."""
+    def measure(_, count, rate):
+        offered = min(rate, sender_limit)
+        return run(rate, int(offered > limit), offered=offered, sent=count, seconds=count / offered)
+    return mock.patch.object(runs, "measure", measure)
+
+
+def searched(**more):
+    return search.highest_rate(None, plan.Plan(**more), lambda _: None)
+
+
+class HighestRate(unittest.TestCase):
+    def test_is_found_to_within_the_plans_exactness(self):
+        for limit in (7_000, 50_000, 123_456, 800_000):
+            with losing_above(limit):
+                found = searched(exactness=1.05)["confirmed"]["offered"]
+            self.assertLessEqual(found, limit)
+            self.assertGreater(found * 1.06, limit)
+
+    def test_is_confirmed_by_a_long_run(self):
+        with losing_above(90_000):
+            self.assertAlmostEqual(searched(confirm_seconds=20)["confirmed"]["seconds"], 20, 3)
+
+    def test_is_the_senders_when_nothing_is_lost_at_its_limit(self):
+        with losing_above(1e9, sender_limit=333_000):
+            found = searched()
+        self.assertTrue(found["limited_by_sender"])
+        self.assertEqual(found["confirmed"]["offered"], 333_000)
+
+    def test_is_not_the_senders_when_the_sender_was_held_up_once(self):
+        slow = iter([0.5])
+        def measure(_, count, rate):
+            return run(rate, int(rate > 200_000), offered=rate * next(slow, 1), sent=count, seconds=count / rate)
+        with mock.patch.object(runs, "measure", measure):
+            found = searched()
+        self.assertFalse(found["limited_by_sender"])
+        self.assertGreater(found["confirmed"]["offered"], 180_000)
+
+    def test_is_none_when_every_run_loses(self):
+        with losing_above(0):
+            self.assertIsNone(searched()["confirmed"])
+
+    def test_steps_down_when_the_long_run_loses_what_short_ones_did_not(self):
+        def measure(_, count, rate):
+            return run(rate, int(rate > (80_000 if count / rate > 5 else 100_000)), sent=count, seconds=count / rate)
+        with mock.patch.object(runs, "measure", measure):
+            found = searched()["confirmed"]
+        self.assertEqual((found["lost"], round(found["seconds"])), (0, 20))
+        self.assertGreater(found["offered"], 76_000)
+
+    def test_survives_a_single_loss_at_a_rate(self):
+        lossy = iter([True])
+        def measure(_, count, rate):
+            lost = rate > 400_000 or (rate == 100_000 and next(lossy, False))
+            return run(rate, int(lost), sent=count, seconds=count / rate)
+        with mock.patch.object(runs, "measure", measure):
+            self.assertGreater(searched(tries=2)["confirmed"]["offered"], 380_000)
+
+
+class Verdict(unittest.TestCase):
+    RESULTS = {"floods": {"service": run(0), "daemon": run(0, rows_per_second=400.0),
+                          "bare": run(0, cpu={"receiving": 1000, "storing": 0, "others": 0})},
+               "rates": {"service": {"confirmed": run(3000)}, "daemon": {"confirmed": run(2001)}},
+               "baselines": {"sqlite": {"1000": {"cpu_ns": 3000}}}}
+
+    def verdict(self, start, results=None):
+        found = [verdict for verdict in targets.verdicts(results or self.RESULTS) if verdict.text.startswith(start)]
+        self.assertEqual(len(found), 1)
+        return found[0]
+
+    def test_is_reached_exactly_at_the_limit(self):
+        self.assertIs(self.verdict("rows a second of a flood").reached, True)
+        self.assertIs(self.verdict("storing thread").reached, True)
+
+    def test_is_not_reached_below_what_is_wanted_at_least(self):
+        self.assertIs(self.verdict("highest rate").reached, False)
+
+    def test_is_not_reached_above_what_is_wanted_at_most(self):
+        slow = {**self.RESULTS, "baselines": {"sqlite": {"1000": {"cpu_ns": 2999}}}}
+        self.assertIs(self.verdict("storing thread", slow).reached, False)
+
+    def test_is_open_for_what_was_not_measured(self):
+        self.assertIsNone(self.verdict("memory of a queued").reached)
+
+    def test_takes_the_bare_loop_at_its_cheapest(self):
+        cheap = {"confirmed": run(0, cpu={"receiving": 500, "storing": 0, "others": 0})}
+        results = {**self.RESULTS, "rates": {**self.RESULTS["rates"], "bare": cheap}}
+        self.assertIs(self.verdict("receiving thread").reached, True)
+        self.assertIs(self.verdict("receiving thread", results).reached, False)
+
+
+class Losses(unittest.TestCase):
+    def test_are_told_apart_by_place(self):
+        places = runs._losses({"sent": 100, "received": 70, "kernel_lost": 29, "stored": 60, "last_row": 2, "seconds": 1})
+        self.assertEqual((places["lost_before"], places["lost_after"], places["lost"]), (1, 10, 40))
+        self.assertEqual(places["rows_per_second"], 30)
+
+
+class Quantile(unittest.TestCase):
+    def test_is_the_smallest_value_that_so_many_are_not_above(self):
+        self.assertEqual(latency.quantile(list(range(1, 101)), 0.99), 99)
+        self.assertEqual(latency.quantile([1, 2, 3], 0.5), 2)
+        self.assertEqual(latency.quantile([7], 0.99), 7)
+
+
+class Chart(unittest.TestCase):
+    def test_has_a_point_for_each_rate_inside_its_axes(self):
+        probes = [run(50_000), run(100_000, 0), run(100_000, 10), run(100_000, 900), run(200_000, 1000)]
+        drawing = xml.etree.ElementTree.fromstring(chart.draw({"service": {"probes": probes}, "daemon": {"probes": probes[:1]}}))
+        points = [(float(dot.get("cx")), float(dot.get("cy"))) for dot in drawing.iter("{http://www.w3.org/2000/svg}circle")]
+        self.assertEqual(len(points), 4)
+        for x, y in points:
+            self.assertTrue(chart.LEFT <= x <= chart.WIDTH - chart.RIGHT and chart.TOP <= y <= chart.HEIGHT - chart.BOTTOM)
+        for (_, y), part in zip(points, (0, 0.01, 1)):  # at 100,000/s the median of three
+            self.assertAlmostEqual(y, chart._y(part), 1)
+
+
+class Page(unittest.TestCase):
+    def updated(self, page, **changes):
+        sections = dict.fromkeys(tables.SECTIONS, "new")
+        report = {"quick": False, "results": sections} | changes
+        with mock.patch.object(output, "PAGE", mock.Mock(read_text=lambda: page)) as file, \
+                mock.patch.object(output, "write"), mock.patch.object(tables, "sections", lambda _: sections):
+            output.update_page(report)
+            return file.write_text.call_args[0][0]
+
+    def test_gets_the_figures_between_its_marks_and_keeps_its_text(self):
+        page = "before\n<!-- figures: rest -->\nold\n<!-- end -->\nbetween\n<!-- figures: floods -->\n<!-- end -->\nafter\n"
+        self.assertEqual(self.updated(page), "before\n<!-- figures: rest -->\n\nnew\n\n<!-- end -->\nbetween\n"
+                                             "<!-- figures: floods -->\n\nnew\n\n<!-- end -->\nafter\n")
+
+    def test_takes_the_figures_of_a_full_run_only(self):
+        for change in ({"quick": True}, {"results": {"rest": {}}}):
+            with self.assertRaises(SystemExit):
+                self.updated("", **change)
+
+
+if __name__ == "__main__":
+    unittest.main()
