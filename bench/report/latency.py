@@ -5,7 +5,7 @@ import math
 import subprocess
 
 import runs
-from subjects import PROGRAMS
+from subject import PROGRAMS
 
 
 def measure(subject_class, rate, seconds):

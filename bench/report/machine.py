@@ -4,7 +4,7 @@ import pathlib
 import re
 import subprocess
 
-from subjects import ROOT
+from subject import ROOT
 
 
 def describe():
@@ -42,7 +42,8 @@ def _disk():
         place, kind = (part.split() for part in line.split(" - "))
         if place[2] == f"{os.major(device)}:{os.minor(device)}":
             name = pathlib.Path(kind[1]).name
-            return f"{kind[0]} on {next((text for start, text in kinds.items() if name.startswith(start)), 'another device')}"
+            disk = next((text for start, text in kinds.items() if name.startswith(start)), "another device")
+            return f"{kind[0]} on {disk}"
     return "unknown"
 
 

@@ -10,7 +10,7 @@ import procfs
 import runs
 import search
 import subjects
-from subjects import PROGRAMS
+from subject import PROGRAMS
 
 SUBJECTS = {subject.name: subject for subject in
             (subjects.Service, subjects.Analytics, subjects.Daemon, subjects.BareReceiver)}
@@ -42,7 +42,8 @@ def bare_sqlite(_, plan, tell):
             command = [PROGRAMS / "bench_inserter", store.database(), "--rows", str(rows),
                        "--rows-per-commit", str(rows_per_commit)]
             run = json.loads(subprocess.run(command, capture_output=True, text=True, check=True).stdout)
-        result[rows_per_commit] = {"rows_per_second": run["rows"] / run["seconds"], "cpu_ns": run["cpu_ns"] / run["rows"]}
+        result[rows_per_commit] = {"rows_per_second": run["rows"] / run["seconds"],
+                                   "cpu_ns": run["cpu_ns"] / run["rows"]}
     return result
 
 

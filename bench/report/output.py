@@ -4,7 +4,7 @@ import re
 
 import chart
 import tables
-from subjects import ROOT
+from subject import ROOT
 
 FOLDER = ROOT / "build/bench"
 PAGE = ROOT / "docs/Performance.md"

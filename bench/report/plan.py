@@ -23,6 +23,7 @@ class Plan:
 
 FULL = Plan()
 
-QUICK = Plan(flood_reports=50_000, probe_seconds=1, probes=3, tries=1, confirm_seconds=1, exactness=4, searched=("service", "daemon"),
-             latency_seconds=1, latency_rates=(10, 20_000), baseline_rows=((1, 10_000), (1000, 100_000)),
-             rows_before=(0, 100_000), growth_reports=50_000, growth_rounds=1, queued_reports=100_000, rest_seconds=1)
+QUICK = Plan(flood_reports=50_000, probe_seconds=1, probes=3, tries=1, confirm_seconds=1, exactness=4,
+             searched=("service", "daemon"), latency_seconds=1, latency_rates=(10, 20_000),
+             baseline_rows=((1, 10_000), (1000, 100_000)), rows_before=(0, 100_000), growth_reports=50_000,
+             growth_rounds=1, queued_reports=100_000, rest_seconds=1)

@@ -5,7 +5,7 @@ import subprocess
 import time
 
 import procfs
-from subjects import PROGRAMS
+from subject import PROGRAMS
 
 SETTLED_SECONDS = 1.0      # without a write, a datagram in the socket, or work
 LONGEST_SETTLING = 600.0   # a million rows at less than 2,000 a second

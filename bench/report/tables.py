@@ -59,9 +59,11 @@ def _processor_time(runs):
     rows = []
     for name, run in runs.items():
         cpu = run["cpu"]
-        each = ["-", "-"] if name == "daemon" else [_us(cpu["receiving"]), "-" if name == "bare" else _us(cpu["storing"])]
-        rows.append((TITLES[name], *each, _us(sum(cpu.values())), _us(run["sender_cpu_ns"])))
-    return table(["processor time for a datagram", "receiving thread", "storing thread", "whole program", "sender"], rows)
+        receiving = "-" if name == "daemon" else _us(cpu["receiving"])
+        storing = "-" if name in ("daemon", "bare") else _us(cpu["storing"])
+        rows.append((TITLES[name], receiving, storing, _us(sum(cpu.values())), _us(run["sender_cpu_ns"])))
+    head = ["processor time for a datagram", "receiving thread", "storing thread", "whole program", "sender"]
+    return table(head, rows)
 
 
 def _us(nanoseconds):

@@ -19,9 +19,9 @@ import targets
 
 
 def run(rate, lost=0, **more):
-    return {"rate": rate, "sent": 1000, "offered": rate, "seconds": 1.0, "lost": lost, "last_row": 1.5, "stored": 1000 - lost,
-            "received": 1000 - lost, "kernel_lost": lost, "lost_before": 0, "lost_after": 0, "rows_per_second": 600.0,
-            "peak_bytes": 2**20, "sender_cpu_ns": 900, "cpu": {"receiving": 2000, "storing": 6000, "others": 0}, **more}
+    return {"rate": rate, "sent": 1000, "offered": rate, "seconds": 1.0, "lost": lost, "stored": 1000 - lost,
+            "received": 1000 - lost, "lost_after": 0, "rows_per_second": 600.0,
+            "cpu": {"receiving": 2000, "storing": 6000, "others": 0}, **more}
 
 
 def losing_above(limit, sender_limit=float("inf")):
@@ -118,7 +118,7 @@ class Verdict(unittest.TestCase):
 
 class Losses(unittest.TestCase):
     def test_are_told_apart_by_place(self):
-        places = runs._losses({"sent": 100, "received": 70, "kernel_lost": 29, "stored": 60, "last_row": 2, "seconds": 1})
+        places = runs._losses({"sent": 100, "received": 70, "kernel_lost": 29, "stored": 60, "last_row": 2})
         self.assertEqual((places["lost_before"], places["lost_after"], places["lost"]), (1, 10, 40))
         self.assertEqual(places["rows_per_second"], 30)
 
@@ -133,11 +133,13 @@ class Quantile(unittest.TestCase):
 class Chart(unittest.TestCase):
     def test_has_a_point_for_each_rate_inside_its_axes(self):
         probes = [run(50_000), run(100_000, 0), run(100_000, 10), run(100_000, 900), run(200_000, 1000)]
-        drawing = xml.etree.ElementTree.fromstring(chart.draw({"service": {"probes": probes}, "daemon": {"probes": probes[:1]}}))
-        points = [(float(dot.get("cx")), float(dot.get("cy"))) for dot in drawing.iter("{http://www.w3.org/2000/svg}circle")]
+        text = chart.draw({"service": {"probes": probes}, "daemon": {"probes": probes[:1]}})
+        dots = xml.etree.ElementTree.fromstring(text).iter("{http://www.w3.org/2000/svg}circle")
+        points = [(float(dot.get("cx")), float(dot.get("cy"))) for dot in dots]
         self.assertEqual(len(points), 4)
         for x, y in points:
-            self.assertTrue(chart.LEFT <= x <= chart.WIDTH - chart.RIGHT and chart.TOP <= y <= chart.HEIGHT - chart.BOTTOM)
+            self.assertTrue(chart.LEFT <= x <= chart.WIDTH - chart.RIGHT, x)
+            self.assertTrue(chart.TOP <= y <= chart.HEIGHT - chart.BOTTOM, y)
         for (_, y), part in zip(points, (0, 0.01, 1)):  # at 100,000/s the median of three
             self.assertAlmostEqual(y, chart._y(part), 1)
 
@@ -152,7 +154,8 @@ class Page(unittest.TestCase):
             return file.write_text.call_args[0][0]
 
     def test_gets_the_figures_between_its_marks_and_keeps_its_text(self):
-        page = "before\n<!-- figures: rest -->\nold\n<!-- end -->\nbetween\n<!-- figures: floods -->\n<!-- end -->\nafter\n"
+        page = ("before\n<!-- figures: rest -->\nold\n<!-- end -->\nbetween\n"
+                "<!-- figures: floods -->\n<!-- end -->\nafter\n")
         self.assertEqual(self.updated(page), "before\n<!-- figures: rest -->\n\nnew\n\n<!-- end -->\nbetween\n"
                                              "<!-- figures: floods -->\n\nnew\n\n<!-- end -->\nafter\n")
 
