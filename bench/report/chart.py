@@ -5,7 +5,7 @@ import statistics
 import tables
 
 WIDTH, HEIGHT = 760, 420
-LEFT, RIGHT, TOP, BOTTOM = 70, 20, 48, 60
+LEFT, RIGHT, TOP, BOTTOM = 70, 40, 48, 60
 COLOURS = {"service": "#2f7ed8", "analytics": "#2aa198", "daemon": "#e07b39", "bare": "#8a8a8a"}
 # Grey that is read on white and on black, and no ground: the page's shows through.
 STYLE = ("text{font:13px sans-serif;fill:#7f7f7f}.grid{stroke:#7f7f7f;stroke-opacity:.25}"
@@ -26,10 +26,10 @@ def draw(rates):
 
 
 def _points(runs):
-    """Rate and part lost, the median of the runs that were asked for the same rate and length, by rate."""
+    """Rate and part lost, the medians of the runs that were asked for the same rate, by rate."""
     same = {}
     for run in runs:
-        same.setdefault((run["rate"], run["sent"]), []).append(run)
+        same.setdefault(run["rate"], []).append(run)
     return sorted((statistics.median(run["offered"] for run in group),
                    statistics.median(run["lost"] / run["sent"] for run in group)) for group in same.values())
 
