@@ -3,6 +3,8 @@ it as JSON, with a chart, in build/bench/."""
 import argparse
 import json
 import pathlib
+import signal
+import sys
 
 import machine
 import measures
@@ -42,6 +44,7 @@ def measured(options):
 
 def main():
     options = arguments()
+    signal.signal(signal.SIGTERM, lambda *_: sys.exit("ended by a signal"))  # and ends what it has started
     report = json.loads(options.file.read_text()) if options.file else measured(options)
     output.write(report)
     print(output.text(report))

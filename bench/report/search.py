@@ -3,8 +3,8 @@ import runs
 
 FIRST_RATE = 50_000
 LEAST_RATE = 1_000   # below, nothing is searched
-STEP_DOWN = 1.05   # when the long run loses what the short ones did not
-WORTH_IT = 1.1     # a sender that doubles its pace and does not get so much faster is the limit itself
+FIRST_STEP = 1.05    # down, when the long run loses what the short ones did not; each further one twice as far
+WORTH_IT = 1.1       # a sender that doubles its pace and does not get so much faster is the limit itself
 
 
 def highest_rate(subject_class, plan, tell):
@@ -24,8 +24,9 @@ def highest_rate(subject_class, plan, tell):
     while low and high and high / low > plan.exactness:
         middle = (low * high) ** 0.5
         low, high = (middle, high) if is_lossless(middle, plan.probe_seconds) else (low, middle)
+    step = FIRST_STEP
     while low and not is_lossless(low, plan.confirm_seconds):
-        low = low / STEP_DOWN if low > LEAST_RATE else 0
+        low, step = low / step if low > LEAST_RATE else 0, step**2
     confirmed = probes[-1] if low else None
     return {"confirmed": confirmed, "probes": probes, "limited_by_sender": bool(low) and high is None}
 
