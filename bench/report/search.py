@@ -3,7 +3,7 @@ import runs
 
 FIRST_RATE = 50_000
 LEAST_RATE = 1_000   # below, nothing is searched
-FIRST_STEP = 1.05    # down, when the long run loses what the short ones did not; each further one twice as far
+STEP_DOWN = 1.05     # at least, when the long run loses what the short ones did not
 WORTH_IT = 1.1       # a sender that doubles its pace and does not get so much faster is the limit itself
 
 
@@ -24,11 +24,15 @@ def highest_rate(subject_class, plan, tell):
     while low and high and high / low > plan.exactness:
         middle = (low * high) ** 0.5
         low, high = (middle, high) if is_lossless(middle, plan.probe_seconds) else (low, middle)
-    step = FIRST_STEP
     while low and not is_lossless(low, plan.confirm_seconds):
-        low, step = low / step if low > LEAST_RATE else 0, step**2
+        low = min(low / STEP_DOWN, _kept_rate(probes[-1])) if low > LEAST_RATE else 0
     confirmed = probes[-1] if low else None
     return {"confirmed": confirmed, "probes": probes, "limited_by_sender": bool(low) and high is None}
+
+
+def _kept_rate(run):
+    """At which what was not lost came: hardly more can be had without loss."""
+    return run["offered"] * (1 - run["lost"] / run["sent"])
 
 
 def _bracket(is_lossless, probes):
