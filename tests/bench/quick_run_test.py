@@ -14,13 +14,13 @@ class QuickRun(unittest.TestCase):
     def setUpClass(cls):
         for file in FOLDER.glob("quick.*"):
             file.unlink()
-        cls.run = subprocess.run([ROOT / "bench/run", "--quick"], capture_output=True, text=True)
-        if cls.run.returncode != 0:
-            raise AssertionError(cls.run.stderr)
+        cls.outcome = subprocess.run([ROOT / "bench/run", "--quick"], capture_output=True, text=True)
+        if cls.outcome.returncode != 0:
+            raise AssertionError(cls.outcome.stderr)
         cls.results = json.loads((FOLDER / "quick.json").read_text())["results"]
 
     def test_leaves_no_target_of_the_service_alone_open(self):
-        verdicts = [line for line in self.run.stdout.splitlines() if line.startswith("| ") and "not measured" in line]
+        verdicts = [line for line in self.outcome.stdout.splitlines() if line.startswith("| ") and "not measured" in line]
         self.assertEqual([line for line in verdicts if "daemon" not in line], [])
 
     def test_finds_each_report_of_a_flood_in_the_table_or_in_the_kernels_count_of_losses(self):
