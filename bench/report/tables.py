@@ -87,11 +87,15 @@ def rates(found):
 
 
 def latencies(found):
-    rows = [(f"{TITLES[name]}, {run['rate']:,}/s", f"{run['p50_ms']:.2f} ms", f"{run['p99_ms']:.2f} ms",
-             f"{run['max_ms']:.2f} ms", f"{run['seen']:,} of {run['sent']:,}",
+    rows = [(f"{TITLES[name]}, {run['rate']:,}/s", *(_ms(run[part]) for part in ("p50_ms", "p99_ms", "max_ms")),
+             f"{run['seen']:,} of {run['sent']:,}",
              f"{run['look_ms_p50']:.2f}, {run['look_ms_p99']:.2f} ms") for name, runs in found.items() for run in runs]
     return table(["from sending to a row that others see", "half within", "99 of 100 within", "longest", "seen",
                   "time between looks (half, 99 of 100)"], rows)
+
+
+def _ms(milliseconds):
+    return "-" if milliseconds is None else f"{milliseconds:.2f} ms"
 
 
 def baselines(found):
