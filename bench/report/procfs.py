@@ -3,6 +3,7 @@ import os
 import pathlib
 import re
 import subprocess
+import time
 
 PORT = ": 0100007F:270D "  # 127.0.0.1:9997, as the kernel's tables have it
 
@@ -12,6 +13,14 @@ def _line_of_the_port():
         if PORT in line:
             return line.split()
     return None
+
+
+def _read(file):
+    """Nothing for a thread that ended meanwhile."""
+    try:
+        return file.read_text()
+    except OSError:
+        return ""
 
 
 def is_bound():
@@ -39,23 +48,13 @@ def udp_counters():
 
 def thread_ns(pid):
     """The processor time of each thread that lives."""
-    times = {}
-    for task in pathlib.Path(f"/proc/{pid}/task").iterdir():
-        try:
-            times[int(task.name)] = int((task / "schedstat").read_text().split()[0])
-        except OSError:
-            pass  # it ended meanwhile
-    return times
+    texts = {task.name: _read(task / "schedstat") for task in pathlib.Path(f"/proc/{pid}/task").iterdir()}
+    return {int(thread): int(text.split()[0]) for thread, text in texts.items() if text}
 
 
 def waits_for_disk(pid):
-    states = []
-    for task in pathlib.Path(f"/proc/{pid}/task").iterdir():
-        try:
-            states.append((task / "stat").read_text().rpartition(")")[2].split()[0])
-        except OSError:
-            pass
-    return "D" in states
+    texts = [_read(task / "stat") for task in pathlib.Path(f"/proc/{pid}/task").iterdir()]
+    return any(text.rpartition(")")[2].split()[0] == "D" for text in texts if text)
 
 
 # Of x86-64 and of arm64: the calls in which a thread waits for a socket.
@@ -64,11 +63,13 @@ _SOCKET_WAITS = {"x86_64": {"7", "23", "45", "47", "232", "270", "271", "281", "
 
 
 def receiving_thread(pid):
-    """The one that waits for a socket while nothing comes."""
-    for _ in range(1000):  # it may be between two waits
+    """The one that waits for a socket while nothing comes. It may be between two waits, or just be starting."""
+    deadline = time.monotonic() + 10
+    while time.monotonic() < deadline:
         for task in pathlib.Path(f"/proc/{pid}/task").iterdir():
-            if (task / "syscall").read_text().split()[0] in _SOCKET_WAITS:
+            if _read(task / "syscall").split(" ")[0] in _SOCKET_WAITS:
                 return int(task.name)
+        time.sleep(0.001)
     raise SystemExit("no thread of the measured program waits for the socket")
 
 
