@@ -26,8 +26,8 @@ struct Plan {
     std::string stampsFile; ///< gets the time before each send; empty for none
 };
 
-/// At least this long between two wake-ups: 4,000 a second cost a hundredth of a core, and the bursts that
-/// they leave at 400,000 reports a second are 100 reports, a hundredth of the socket's buffer.
+/// At least this long between two wake-ups, which cost more than a send does. The bursts that this leaves at
+/// 400,000 reports a second are 100 reports, a hundredth of what the socket's buffer holds at its largest.
 constexpr std::int64_t TICK_NS = 250'000;
 
 /// How much lateness is made up for. More would be a burst that the pace is there to prevent; it makes the

@@ -18,7 +18,7 @@ def arguments():
     parser = argparse.ArgumentParser(prog="bench/run", description=__doc__)
     parser.add_argument("--quick", action="store_true", help="in about a minute, for a look")
     parser.add_argument("--only", action="append", choices=measures.MEASURES, help="this measure; may be repeated")
-    parser.add_argument("--of", action="append", help="of this one: service, analytics, daemon, bare; may be repeated")
+    parser.add_argument("--of", action="append", choices=[*measures.SUBJECTS, "sqlite"], help="of this one only")
     parser.add_argument("--update-docs", action="store_true", help="write the figures into docs/Performance.md")
     parser.add_argument("--from", dest="file", type=pathlib.Path, help="measure nothing: the report of this JSON file")
     parser.add_argument("--install", action="store_true", help="first install the packages of the other daemon, which "
