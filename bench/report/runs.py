@@ -7,7 +7,6 @@ import time
 import procfs
 from subject import PROGRAMS
 
-SETTLED_SECONDS = 1.0      # without a write, a datagram in the socket, or work
 LONGEST_SETTLING = 600.0   # a million rows at less than 2,000 a second
 
 
@@ -20,7 +19,7 @@ def send(subject, count, rate=0, stamps=None):
 
 
 def settle(subject):
-    """Until the subject has nothing to do any more."""
+    """Until the subject has had nothing to do for as long as it may pause: no write, no datagram, no work."""
     pid = subject.process.pid
     calm_since, last, worked = time.monotonic(), None, 0
     deadline = calm_since + LONGEST_SETTLING
@@ -30,7 +29,7 @@ def settle(subject):
         busy = state != last or work - worked > 10e6 or procfs.waiting_bytes() or procfs.waits_for_disk(pid)
         if busy:
             calm_since, last, worked = time.monotonic(), state, work
-        elif time.monotonic() - calm_since >= SETTLED_SECONDS:
+        elif time.monotonic() - calm_since >= subject.longest_pause:
             return
         time.sleep(0.05)
     raise SystemExit(f"{subject.title}: still busy after {LONGEST_SETTLING:.0f} seconds")

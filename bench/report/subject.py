@@ -19,6 +19,7 @@ class Subject:
     name = ""
     title = ""
     event = "B100|10001"
+    longest_pause = 1.0  # in seconds, while it has work
     watch = "select id, createTime from OperLog where id > ?1 order by id"  # the new rows, for the watcher
 
     def __enter__(self):

@@ -76,6 +76,7 @@ class Analytics(Service):
 class Daemon(Subject):
     name = "daemon"
     title = "syslog-ng, rows to SQLite"
+    longest_pause = 3.0  # after a statement that failed it waits for a second before it tries again
 
     @staticmethod
     def is_installed():
