@@ -57,6 +57,7 @@ constexpr int OPEN_FLAGS = SQLITE_OPEN_READWRITE | SQLITE_OPEN_NOMUTEX;
 
 Connection::Connection(const std::string& path, const Settings& settings)
     : m_database(MadePrivate(path), OPEN_FLAGS, static_cast<int>(settings.busyTimeout.count())),
+      m_insert(m_database.getHandle(), m_guard),
       m_others(sqlite3_db_filename(m_database.getHandle(), "main")) {
     auto* connection = m_database.getHandle();
     m_guard.Install(connection, settings.limits);

@@ -6,6 +6,7 @@
 #include <SQLiteCpp/Database.h>
 
 #include "Modules/OrvekSqlite/OtherUsers.h"
+#include "Modules/OrvekSqlite/PreparedInsert.h"
 #include "Modules/OrvekSqlite/Settings.h"
 #include "Modules/OrvekSqlite/Statement.h"
 #include "Modules/OrvekSqlite/StatementGuard.h"
@@ -32,6 +33,12 @@ public:
 
     Statement Prepare(const std::string& sql, Permission permission) {
         return Statement(m_database.getHandle(), m_guard, sql, permission);
+    }
+
+    /// Runs one statement that changes data and returns no row.
+    void Execute(const std::string& sql) {
+        if (!m_insert.Execute(sql))
+            Prepare(sql, Permission::Write).Execute();
     }
 
     /// Takes the write lock at once: a transaction that began by reading could not wait for it.
@@ -70,6 +77,7 @@ private:
 
     StatementGuard m_guard; ///< outlives the connection that calls it
     SQLite::Database m_database;
+    PreparedInsert m_insert;
     OtherUsers m_others;
 };
 

@@ -75,7 +75,7 @@ bool Database::BatExecSql(const std::vector<std::string>& sqls) {
         connection.Begin();
         try {
             for (const auto& sql : sqls)
-                connection.Prepare(sql, Permission::Write).Execute();
+                connection.Execute(sql);
             connection.Commit();
         } catch (...) {
             connection.RollBack();

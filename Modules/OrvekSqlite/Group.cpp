@@ -24,7 +24,7 @@ void Group::ExecuteAlone(const std::string& sql) {
     Commit();
     m_file.Run([&](Connection& connection) {
         connection.RequireInPlace();
-        connection.Prepare(sql, Permission::Write).Execute();
+        connection.Execute(sql);
     });
 }
 
@@ -35,7 +35,7 @@ void Group::ExecuteInGroup(const std::string& sql) {
     try {
         m_file.Run([&](Connection& connection) {
             Open(connection);
-            connection.Prepare(sql, Permission::Write).Execute();
+            connection.Execute(sql);
         });
     } catch (...) {
         if (m_kept.IsEmpty())
@@ -101,7 +101,7 @@ void Group::Open(Connection& connection) {
 void Group::RunAgain(Connection& connection) {
     for (std::size_t i = 0; i < m_kept.Count();) {
         try {
-            connection.Prepare(m_kept[i], Permission::Write).Execute();
+            connection.Execute(m_kept[i]);
             ++i;
         } catch (const SQLite::Exception& error) {
             if (error.getErrorCode() != SQLITE_CONSTRAINT)

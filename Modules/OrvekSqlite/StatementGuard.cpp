@@ -45,7 +45,7 @@ void SetLimits(sqlite3* connection, const Limits& limits) {
     sqlite3_limit(connection, SQLITE_LIMIT_LIKE_PATTERN_LENGTH, limits.likePatternBytes);
     sqlite3_limit(connection, SQLITE_LIMIT_TRIGGER_DEPTH, limits.triggerDepth);
     sqlite3_limit(connection, SQLITE_LIMIT_ATTACHED, 0);
-    sqlite3_limit(connection, SQLITE_LIMIT_VARIABLE_NUMBER, 0); // texts come complete, nothing is ever bound
+    sqlite3_limit(connection, SQLITE_LIMIT_VARIABLE_NUMBER, 0); // a text comes complete
     sqlite3_limit(connection, SQLITE_LIMIT_WORKER_THREADS, 0);
 }
 

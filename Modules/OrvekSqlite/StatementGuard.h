@@ -44,6 +44,9 @@ public:
     /// A statement of this kind is prepared and run from here on.
     void Begin(Permission permission);
 
+    /// After Begin: the statement is an INSERT that was let through when it was prepared.
+    void ExpectInsert() { m_isInsert = true; }
+
     /// The statement is gone; what follows is the plug-in's own.
     void End() { Begin(Permission::Own); }
 
