@@ -67,6 +67,7 @@ bool UDPServer::Start(const std::string& ip, int port) {
             m_socket.setReceiveBufferSize(SOCKET_BUFFER_BYTES);
         } catch (const Poco::Exception&) { // what the kernel grants is enough to run with
         }
+        m_socket.setBlocking(false);
         m_thread.start(*this);
         return true;
     } catch (...) {
@@ -79,27 +80,21 @@ void UDPServer::run() {
     Buffer buffer;
     if (m_bStop)
         return;
+    bool more = false;
     do {
-        if (!WaitForDatagram())
-            continue;
-        try {
-            ReceiveOne(buffer);
-        } catch (...) {
-            PrintCaughtException();
-        }
+        more = (more || WaitForDatagram()) && ReceiveOne(buffer);
     } while (!m_bStop);
 }
 
-/// Whether a datagram came within the poll timeout. Asking for one that is there already is one system call, where a poll
-/// makes, fills, waits for and closes a set of its own.
+/// Whether a datagram came within the poll timeout. A poll makes, fills, waits for and closes a set of its own, so one is
+/// asked for only when the socket was found empty.
 ///
 /// A poll that fails (a closed socket) would fail again at once and for ever: it is printed when it begins, and each one
 /// waits out the timeout that it did not use.
 bool UDPServer::WaitForDatagram() {
     const Poco::Timespan timeout(POLL_TIMEOUT_MS * Poco::Timespan::MILLISECONDS);
     try {
-        const bool readable =
-            m_socket.available() > 0 || m_socket.poll(timeout, Poco::Net::Socket::SELECT_READ);
+        const bool readable = m_socket.poll(timeout, Poco::Net::Socket::SELECT_READ);
         m_pollFailed = false;
         return readable;
     } catch (...) {
@@ -111,11 +106,19 @@ bool UDPServer::WaitForDatagram() {
     }
 }
 
-void UDPServer::ReceiveOne(Buffer& buffer) {
-    buffer.Clear();
-    if (m_socket.receiveFrom(buffer.Data(), RECEIVE_BUFFER_BYTES, buffer.m_sender) < 1)
-        return;
-    Recv(buffer.Text());
+/// Whether there was a datagram, so that there may be another one. The socket does not block: while datagrams come faster
+/// than they are handled, each costs one system call and not two.
+bool UDPServer::ReceiveOne(Buffer& buffer) {
+    try {
+        buffer.Clear();
+        const int bytes = m_socket.receiveFrom(buffer.Data(), RECEIVE_BUFFER_BYTES, buffer.m_sender);
+        if (bytes >= 1)
+            Recv(buffer.Text());
+        return bytes >= 0;
+    } catch (...) {
+        PrintCaughtException();
+        return false;
+    }
 }
 
 void UDPServer::Stop() {

@@ -47,7 +47,7 @@ private:
     class Buffer;
 
     bool WaitForDatagram();
-    void ReceiveOne(Buffer& buffer);
+    bool ReceiveOne(Buffer& buffer);
 
     /// Plain on purpose: the stopping thread writes it once, the loop reads it once a pass, and the join
     /// orders the rest. The worst that the race can cost is one more pass.
