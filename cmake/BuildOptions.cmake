@@ -34,3 +34,8 @@ if(SSR_SANITIZE)
     target_sources(ssr_options INTERFACE
         $<$<STREQUAL:$<TARGET_PROPERTY:TYPE>,EXECUTABLE>:$<TARGET_OBJECTS:ssr_sanitizer_options>>)
 endif()
+
+if(NOT SSR_SANITIZE AND NOT CMAKE_BUILD_TYPE STREQUAL "Debug")
+    set(SSR_HARDENED TRUE)
+    include(Hardening)
+endif()
