@@ -50,7 +50,10 @@ protected:
         EXPECT_EQ(signals[0].level, "ERROR");
         EXPECT_EQ(signals[0].message, "Signal[11]");
         EXPECT_EQ(signals[0].thread, thread);
-        const auto frames = m_service.LogLines("App/MiniDump:252 OnStackCallBack");
+        auto frames = m_service.LogLines("App/MiniDump:252 OnStackCallBack");
+        // A sanitizer's backtrace stands before the C library's, and so does its frame.
+        std::erase_if(frames,
+                      [](const auto& frame) { return frame.message.find("san.so") != std::string::npos; });
         EXPECT_GE(frames.size(), 3U);
         EXPECT_THAT(frames.front().message, HasSubstr("OnStackCallBack"))
             << "innermost first, and with names";

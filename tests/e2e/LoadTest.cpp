@@ -18,13 +18,20 @@ namespace {
 
 using namespace std::chrono_literals;
 
+#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
+constexpr int REPORTS = 10'000; // a sanitized program is many times slower, and a loss there tells nothing
+constexpr int RATE = 1'000;     // reports a second
+#else
+constexpr int REPORTS = 100'000;
+constexpr int RATE = 20'000;
+#endif
+
 /// How many reports; SSR_LOAD_REPORTS in the environment asks for another number.
 int ReportCount() {
     const char* asked = std::getenv("SSR_LOAD_REPORTS");
-    return asked != nullptr ? std::atoi(asked) : 100'000;
+    return asked != nullptr ? std::atoi(asked) : REPORTS;
 }
 
-constexpr int RATE = 20'000;         // reports a second
 constexpr int STRETCH = 200'000;     // of reports, whose lines the log keeps
 constexpr int EVERY_NTH_EVENT = 10;  // goes to analytics
 constexpr int EVERY_NTH_BROKEN = 97; // is no JSON
