@@ -68,16 +68,19 @@ void MiniDump::EnableAutoStack(const std::string& logPath, const std::string& lo
     ::signal(SIGSEGV, OnStackCallBack);
 }
 
+// exit is meant, whatever the other threads do meanwhile, and this library's strerror keeps each thread its own text.
+// NOLINTBEGIN(concurrency-mt-unsafe)
+
 void MiniDump::OnStackCallBack(int signal) {
     ::alarm(CRASH_DEADLINE_SECONDS);
     WriteLog({LogLevel::Error, "OnStackCallBack", 240}, "Signal[%d]", signal);
-    BackTrace trace;
+    BackTrace trace; // NOLINT(cppcoreguidelines-pro-type-member-init): backtrace fills what is read of it
     const int count = ::backtrace(trace.frames, FRAME_BYTES);
     char** symbols = ::backtrace_symbols(trace.frames, count);
     for (int i = 0; symbols != nullptr && i < count; ++i)
         WriteLog({LogLevel::Error, "OnStackCallBack", 252}, "[%s]", symbols[i]);
-    std::free(symbols);
-    std::exit(0); // 0 after a crash, deliberately: other codes mean that the service could not start
+    std::free(symbols); // NOLINT(cppcoreguidelines-no-malloc): backtrace_symbols asks for it
+    std::exit(0);       // 0 after a crash, deliberately: other codes mean that the service could not start
 }
 
 bool MiniDump::IsAlreadyRun() {
@@ -104,3 +107,5 @@ bool MiniDump::IsAlreadyRun() {
     }
     return false; // the file stays open, and with it the lock
 }
+
+// NOLINTEND(concurrency-mt-unsafe)

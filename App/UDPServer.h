@@ -17,6 +17,8 @@
 class UDPServer : public Poco::Runnable {
 public:
     UDPServer() = default;
+    UDPServer(const UDPServer&) = delete;
+    UDPServer& operator=(const UDPServer&) = delete;
 
     /// As Stop. An exception on the way ends the process.
     ~UDPServer() override;

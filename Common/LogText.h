@@ -13,7 +13,7 @@
 namespace SyncServiceReport {
 
 /// A text over this size counts as one that cannot be built.
-inline constexpr std::size_t MAX_LOG_TEXT_BYTES = 1024 * 1024;
+inline constexpr std::size_t MAX_LOG_TEXT_BYTES = std::size_t{1024} * 1024;
 
 /// Throws std::length_error when a directive of `format` has a number of more than nine digits. No text within the size
 /// limit has one, and boost::format would compute with it beyond the range of its integers. Walks the directives step by

@@ -41,6 +41,7 @@ bool DBHelper::QuerySql(const std::string& sql, std::vector<std::vector<std::str
     return m_pSqliteDb->QuerySql(sql, rows) ? !rows.empty() : Report("QuerySql", __LINE__, sql);
 }
 
+// NOLINTNEXTLINE(performance-unnecessary-value-param): the helper's interface takes the list by value
 bool DBHelper::BatExecSql(std::vector<std::string> sqls) {
     if (m_pSqliteDb == nullptr)
         return false;

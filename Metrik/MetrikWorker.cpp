@@ -10,11 +10,15 @@ namespace SyncServiceReport {
 
 using SystemTool::IO::JsonDocument;
 
+// NOLINTBEGIN(performance-unnecessary-value-param): the SDK's callbacks take their texts by value
+
 void FailCallBackFun(std::string a, std::string b) {
     WriteLog({LogLevel::Error, "FailCallBackFun", 21}, "%s-%s", a, b);
 }
 
 void SuccCallBackFun(std::string, std::string) {}
+
+// NOLINTEND(performance-unnecessary-value-param)
 
 MetrikWorker::MetrikWorker(ReportServer* server) : m_pServer(server) {}
 

@@ -13,8 +13,8 @@ struct LogSettings {
         application;    ///< Together with the module: who is named when the log cannot be opened. Not in the
     std::string module; ///< records, since a log directory is one program's.
 
-    std::int64_t maxFileBytes = 10 * 1024 * 1024;   ///< One file that an editor still opens at once.
-    std::int64_t maxTotalBytes = 100 * 1024 * 1024; ///< Live and rotated files together.
+    std::int64_t maxFileBytes = std::int64_t{10} * 1024 * 1024;   ///< What an editor opens at once.
+    std::int64_t maxTotalBytes = std::int64_t{100} * 1024 * 1024; ///< Live and rotated files together.
 
     /// Allows to keep records back when false. Nothing is kept back all the same: a record is one write to
     /// the file, and keeping them would need a thread that writes them out in time, in a library that lives

@@ -9,7 +9,7 @@
 namespace BoostLogger {
 
 /// A longer message is cut. The largest datagram has 10 KiB; whatever is beyond this belongs into no log.
-inline constexpr std::size_t MAX_MESSAGE_BYTES = 64 * 1024;
+inline constexpr std::size_t MAX_MESSAGE_BYTES = std::size_t{64} * 1024;
 
 /// Appends the whole line of `record`, its newline included:
 ///   2026-11-20 10:15:30.123 INFO  [pid:tid] [App/ReportServer:42 Recv] message

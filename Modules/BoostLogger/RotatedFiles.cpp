@@ -74,6 +74,7 @@ std::vector<RotatedFile> RotatedFiles::List() const {
     const std::unique_ptr<DIR, CloseDirectory> directory(opendir(m_directory.c_str()));
     if (!directory)
         return files;
+    // NOLINTNEXTLINE(concurrency-mt-unsafe): unsafe for threads that share a DIR; this one is ours alone
     while (const dirent* entry = readdir(directory.get())) {
         struct stat status {};
         const auto number = NumberOf(entry->d_name);

@@ -27,9 +27,9 @@ std::string Part(const Url& url, CURLUPart part) {
 /// Null when `text` is no http or https URL.
 Url ParseUrl(const std::string& text) {
     Url url(::curl_url(), &::curl_url_cleanup);
-    if (::curl_url_set(url.get(), CURLUPART_URL, text.c_str(), 0) != CURLUE_OK)
-        url.reset();
-    else if (const auto scheme = Part(url, CURLUPART_SCHEME); scheme != "http" && scheme != "https")
+    const bool parsed = ::curl_url_set(url.get(), CURLUPART_URL, text.c_str(), 0) == CURLUE_OK;
+    const auto scheme = parsed ? Part(url, CURLUPART_SCHEME) : std::string();
+    if (scheme != "http" && scheme != "https")
         url.reset();
     return url;
 }

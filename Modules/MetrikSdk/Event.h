@@ -16,7 +16,8 @@ struct ModuleIdentity {
     std::string version;
     std::string name;
 
-    auto operator<=>(const ModuleIdentity&) const = default;
+    // The check takes for a pointer the 0 that the compiler compares with.
+    auto operator<=>(const ModuleIdentity&) const = default; // NOLINT(modernize-use-nullptr)
 };
 
 /// An event on its way into the outbox.

@@ -16,7 +16,7 @@ namespace Metrik {
 namespace {
 
 /// A collector's answer is a short JSON object; more than this is no answer of one.
-constexpr std::size_t MAX_ANSWER_BYTES = 64 * 1024;
+constexpr std::size_t MAX_ANSWER_BYTES = std::size_t{64} * 1024;
 
 /// How soon a request notices that it is to end.
 constexpr int POLL_MS = 50;
@@ -100,7 +100,7 @@ void HttpSender::ConfigureHeaders() {
     AddHeader("Expect:"); // no waiting for a "100 Continue" that many servers never send
     AddHeader(std::string("User-Agent: MetrikSdk/") + SDK_VERSION);
     for (const auto& [name, value] : m_config.headers)
-        AddHeader(value.empty() ? name + ";" : name + ": " + value); // how the library writes an empty one
+        AddHeader(name + (value.empty() ? ";" : ": " + value)); // how the library writes an empty one
 }
 
 void HttpSender::AddHeader(const std::string& line) {

@@ -43,8 +43,8 @@ private:
     bool MustEnd() const;
     HttpResult Finish(CURLcode code, Answer& answer);
 
-    static std::size_t OnBody(char* bytes, std::size_t size, std::size_t count, void* answer);
-    static std::size_t OnHeader(char* bytes, std::size_t size, std::size_t count, void* answer);
+    static std::size_t OnBody(char* bytes, std::size_t size, std::size_t count, void* data);
+    static std::size_t OnHeader(char* bytes, std::size_t size, std::size_t count, void* data);
 
     const EndpointConfig m_config;
     std::atomic<bool> m_abandoned = false;

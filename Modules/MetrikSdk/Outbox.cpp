@@ -29,12 +29,15 @@ auto Outbox::AttemptTwice(Operation operation) {
 /// Locks, runs `operation`, unlocks, and tells what there was to tell.
 template <typename Operation>
 auto Outbox::WithStore(Caller caller, Operation operation) {
+    // Both are filled by braces, which a deleted copy would forbid, and stay in this scope.
+    // NOLINTNEXTLINE(cppcoreguidelines-special-member-functions)
     struct TellAtEnd {
         Notifier& notifier;
         std::vector<News> news;
         ~TellAtEnd() { notifier.TellFailures(news); }
     } tell{m_notifier, {}};
     const std::lock_guard lock(m_mutex);
+    // NOLINTNEXTLINE(cppcoreguidelines-special-member-functions)
     struct CollectNews {
         std::vector<News>& from;
         std::vector<News>& to;

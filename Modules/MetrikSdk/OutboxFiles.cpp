@@ -99,7 +99,7 @@ std::optional<Identity> IdentityOf(const std::string& path) {
 std::string SetAside(const std::string& path, const Identity& identity, WallTime now) {
     if (IdentityOf(path) != identity)
         return {};
-    const auto name = UnusedName(path + ".damaged-" + FileNameTime(now));
+    auto name = UnusedName(path + ".damaged-" + FileNameTime(now));
     // The database goes last: a new one beside the side files of an old one would take them for its own.
     for (const std::string suffix : {"-wal", "-shm", ""})
         if (::rename((path + suffix).c_str(), (name + suffix).c_str()) != 0 && errno != ENOENT)

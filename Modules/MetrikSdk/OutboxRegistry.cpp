@@ -29,6 +29,7 @@ OutboxRegistry::OutboxRegistry(const OutboxSettings& settings, LookUp lookUp)
 
 OutboxRegistry& OutboxRegistry::Instance() {
     static auto& instance =
+        // NOLINTNEXTLINE(concurrency-mt-unsafe): nothing here changes the environment
         *new OutboxRegistry(OutboxSettings{}, [](const char* name) { return std::getenv(name); });
     return instance;
 }

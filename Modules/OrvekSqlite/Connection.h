@@ -30,6 +30,8 @@ public:
     /// has lost its rows.
     Connection(const std::string& path, const Settings& settings);
     ~Connection();
+    Connection(const Connection&) = delete;
+    Connection& operator=(const Connection&) = delete;
 
     Statement Prepare(const std::string& sql, Permission permission) {
         return Statement(m_database.getHandle(), m_guard, sql, permission);

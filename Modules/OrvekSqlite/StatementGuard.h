@@ -35,6 +35,7 @@ enum class Permission {
 class StatementGuard {
 public:
     StatementGuard() = default;
+    ~StatementGuard() = default;
     StatementGuard(const StatementGuard&) = delete;
     StatementGuard& operator=(const StatementGuard&) = delete;
 

@@ -21,7 +21,7 @@ namespace SystemTool::IO {
 /// Threads: one thread at a time for a document and all that were copied or taken from it, since they share a tree.
 ///
 /// Failure: only SetKeyValue throws.
-class JsonDocument {
+class JsonDocument { // NOLINT(cppcoreguidelines-special-member-functions): see its copy constructor
 public:
     /// Arrays and objects within each other; a text that goes deeper is refused.
     static constexpr int MAX_DEPTH = 128;
