@@ -27,6 +27,8 @@ thread_local bool t_isInside = false;
 struct Inside {
     Inside() { t_isInside = true; }
     ~Inside() { t_isInside = false; }
+    Inside(const Inside&) = delete;
+    Inside& operator=(const Inside&) = delete;
 };
 
 } // namespace

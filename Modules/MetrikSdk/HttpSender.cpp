@@ -99,8 +99,11 @@ void HttpSender::ConfigureHeaders() {
         AddHeader("Content-Encoding: gzip");
     AddHeader("Expect:"); // no waiting for a "100 Continue" that many servers never send
     AddHeader(std::string("User-Agent: MetrikSdk/") + SDK_VERSION);
-    for (const auto& [name, value] : m_config.headers)
-        AddHeader(name + (value.empty() ? ";" : ": " + value)); // how the library writes an empty one
+    for (const auto& [name, value] : m_config.headers) {
+        std::string line = name;
+        line += value.empty() ? ";" : ": " + value; // how the library writes an empty one
+        AddHeader(line);
+    }
 }
 
 void HttpSender::AddHeader(const std::string& line) {
