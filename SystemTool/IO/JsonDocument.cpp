@@ -2,6 +2,7 @@
 
 #include <stdexcept>
 #include <string_view>
+#include <utility>
 
 #include <rapidjson/document.h>
 #include <rapidjson/memorystream.h>
@@ -89,14 +90,18 @@ JsonDocument::Value& JsonDocument::Editable() {
 
 void JsonDocument::SetMember(const std::string& key, Value& value) {
     Value& object = m_tree->document;
+    // Of const iterators: comparing the others is ambiguous in C++20, where either side may be the one to convert.
+    const auto isEnd = [&object](Value::ConstMemberIterator member) {
+        return member == std::as_const(object).MemberEnd();
+    };
     const auto first = object.FindMember(Value(rapidjson::StringRef(key.data(), key.size())));
-    if (first == object.MemberEnd()) {
+    if (isEnd(first)) {
         object.AddMember(TextValue(key, m_tree->document.GetAllocator()), value,
                          m_tree->document.GetAllocator());
         return;
     }
     first->value = value;
-    for (auto other = first + 1; other != object.MemberEnd();)
+    for (auto other = first + 1; !isEnd(other);)
         other = other->name == first->name ? object.EraseMember(other) : other + 1;
 }
 
