@@ -39,3 +39,9 @@ if(NOT SSR_SANITIZE AND NOT CMAKE_BUILD_TYPE STREQUAL "Debug")
     set(SSR_HARDENED TRUE)
     include(Hardening)
 endif()
+
+if(SSR_FUZZ)
+    # Every target counts what it runs, the plug-ins too; only a fuzz target gets libFuzzer's main.
+    target_compile_options(ssr_options INTERFACE -fsanitize=fuzzer-no-link
+        -fsanitize-ignorelist=${PROJECT_SOURCE_DIR}/fuzz/ignored-undefined-behaviour)
+endif()

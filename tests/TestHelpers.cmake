@@ -1,5 +1,16 @@
 include(GoogleTest)
 
+# ssr_put_beside(<program> <folder> [<plug-in>...]): builds the program into that folder and puts the plug-ins beside it.
+function(ssr_put_beside program folder)
+    set_target_properties(${program} PROPERTIES RUNTIME_OUTPUT_DIRECTORY ${folder})
+    foreach(plugin IN LISTS ARGN)
+        add_dependencies(${program} ${plugin})
+        add_custom_command(TARGET ${program} PRE_LINK COMMAND ${CMAKE_COMMAND} -E copy_if_different
+            $<TARGET_FILE:${plugin}> ${folder}/$<TARGET_FILE_NAME:${plugin}>)
+        set_property(TARGET ${program} APPEND PROPERTY LINK_DEPENDS $<TARGET_FILE:${plugin}>)
+    endforeach()
+endfunction()
+
 # ssr_add_test(<name> [SANDBOX] [SOURCES <file>...] [LINK <target>...] [FAKES <target>...]
 #     [LABELS <label>...] [SERIAL <filter>])
 #
@@ -12,13 +23,7 @@ function(ssr_add_test name)
     set(folder ${PROJECT_BINARY_DIR}/tests/${name})
     add_executable(${name} ${arg_SOURCES})
     target_link_libraries(${name} PRIVATE ssr_options ${arg_LINK} GTest::gmock_main GTest::gtest)
-    set_target_properties(${name} PROPERTIES RUNTIME_OUTPUT_DIRECTORY ${folder})
-    foreach(fake IN LISTS arg_FAKES)
-        add_dependencies(${name} ${fake})
-        add_custom_command(TARGET ${name} PRE_LINK
-            COMMAND ${CMAKE_COMMAND} -E copy_if_different $<TARGET_FILE:${fake}> ${folder}/$<TARGET_FILE_NAME:${fake}>)
-        set_property(TARGET ${name} APPEND PROPERTY LINK_DEPENDS $<TARGET_FILE:${fake}>)
-    endforeach()
+    ssr_put_beside(${name} ${folder} ${arg_FAKES})
     if(arg_SANDBOX)
         # The launcher of the test's program, in CMake's words.
         set_property(TARGET ${name} PROPERTY CROSSCOMPILING_EMULATOR ${PROJECT_SOURCE_DIR}/tests/in-sandbox)

@@ -1,0 +1,79 @@
+// A text from outside as the log's format string, and on into the log's line: one record whatever the text, within its
+// size, and one line that nobody can break out of.
+
+#include <algorithm>
+#include <chrono>
+
+#include "Common/Logger.h"
+#include "Modules/BoostLogger/RecordLine.h"
+#include "fuzz/support/Input.h"
+#include "fuzz/support/Require.h"
+#include "tests/fakes/FakeLogger.h"
+
+using namespace SyncServiceReport;
+
+namespace {
+
+constexpr LogSite SITE{LogLevel::Info, "LogText", 7};
+constexpr std::string_view ERROR_MARK = "[BoostLogError]";
+
+template <typename... Arguments>
+LogRecord Logged(FakeLoggerState& logger, const std::string& format, const Arguments&... arguments) {
+    logger.Clear();
+    WriteLog(SITE, format, arguments...);
+    const auto records = logger.Records();
+    RequireEqual(records.size(), 1U, "one record for one text");
+    const LogRecord& record = records.front();
+    const bool isError = record.level == static_cast<int>(LogLevel::Error);
+    const int level = static_cast<int>(isError ? LogLevel::Error : LogLevel::Info);
+    RequireEqual(record, (LogRecord{level, "fuzz/LogText", "LogText", 7, record.message}),
+                 "the record's site");
+    if (isError)
+        Require(record.message.starts_with(ERROR_MARK), "a text that cannot be built says so",
+                record.message);
+    Require(record.message.size() <= MAX_LOG_TEXT_BYTES, "a record stays within its size");
+    return record;
+}
+
+bool IsControl(char byte) {
+    return static_cast<unsigned char>(byte) < 0x20 || byte == 0x7f;
+}
+
+/// The plug-in's line for the record: one, which does nothing to a terminal and reads as what it is.
+void RequireOneHarmlessLine(const LogRecord& record) {
+    BoostLogger::LineBuffer buffer;
+    BoostLogger::ComposeLine(buffer,
+                             {.level = record.level,
+                              .tag = record.tag,
+                              .file = record.file,
+                              .function = record.function,
+                              .line = record.line,
+                              .message = record.message},
+                             std::chrono::system_clock::now());
+    const std::string_view line = BoostLogger::TextOf(buffer);
+    Require(line.ends_with('\n'), "a line ends", line);
+    Require(std::ranges::none_of(line.substr(0, line.size() - 1), IsControl),
+            "a line has no control character", line);
+    for (std::size_t at = 0; (at = line.find('\xc2', at)) != std::string::npos; ++at)
+        Require(static_cast<unsigned char>(line[at + 1]) >= 0xa0, "nor one of those beyond ASCII", line);
+    for (const auto* mark : {"\u2028", "\u2029", "\u202a", "\u202e", "\u2066", "\u2069"})
+        Require(line.find(mark) == std::string::npos, "nor one that ends or turns the line", line);
+}
+
+} // namespace
+
+extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
+    static FakeLoggerState& logger = FakeLogger();
+    const std::string text = TextOf(data, size);
+    const LogRecord record = Logged(logger, text);
+    if (text.find('%') == std::string::npos)
+        RequireEqual(record, (LogRecord{2, "fuzz/LogText", "LogText", 7, text}),
+                     "a plain text stays as it is");
+    RequireOneHarmlessLine(record);
+    // As an argument, a text is never a format.
+    const std::string both = text + "-" + text;
+    if (both.size() <= MAX_LOG_TEXT_BYTES)
+        RequireEqual(Logged(logger, "%s-%s", text, text).message, both, "an argument stays as it is");
+    Logged(logger, text, 5, text);
+    return 0;
+}
