@@ -93,7 +93,8 @@ inline boost::format ParsedFormat(const std::string& format) {
 
 /// The text that `format` gives with `arguments`. Throws what boost::format throws for a format that does not
 /// fit, and std::length_error for a text over MAX_LOG_TEXT_BYTES, before that is built, or for a directive with a number
-/// that no smaller text can have.
+/// that no smaller text can have. A format from outside must come without arguments: an argument is built to the format's
+/// width before the text's size is known.
 template <typename... Arguments>
 std::string BuildLogText(const std::string& format, const Arguments&... arguments) {
     if constexpr (sizeof...(arguments) == 0)

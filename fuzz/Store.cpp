@@ -16,8 +16,9 @@
 
 using namespace SyncServiceReport;
 
-// The leak checker of clang 14 does not survive the end of this program: it crashes itself while it looks through the
-// memory of the store's library. The tests of the preset asan look for the store's leaks.
+// The leak checker of clang 14 crashes itself here ("Tracer caught signal 11", before the first input is over) with a
+// corpus of some hundred files, though not with the seeds alone; why is not known. Replayed under the preset asan, the
+// same target is looked through for leaks.
 #ifdef __clang__
 extern "C" __attribute__((visibility("default"))) const char* __lsan_default_options() {
     return "detect_leaks=0";
