@@ -8,6 +8,7 @@ class Plan:
     probe_seconds: float = 4
     probes: int = 10             # as many as it takes, about; for the bar
     confirm_seconds: float = 20
+    lag: float = 0.05            # of a run's time, in which the last row may come after the last report
     tries: int = 2               # at each rate: a loss is the subject's doing when it happens again
     exactness: float = 1.05      # the search ends when the last rate without loss and the first with one are so close
     searched: tuple = ("service", "analytics", "daemon", "bare")

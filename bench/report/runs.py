@@ -54,6 +54,7 @@ def measure(subject_class, count, rate=0):
                "socket_buffer": procfs.socket_buffer_bytes(), "peak_bytes": procfs.memory_bytes(pid)}
         run["stored"] = subject.stored()
         run["last_row"] = (last_write - sender["begin_unix_ns"]) / 1e9 if last_write else None
+        run["lag"] = max(0.0, run["last_row"] - run["seconds"]) if last_write else 0.0
         run["cpu"] = _per_thread(used, subject.receiver, run["received"])
         return run | _losses(run)
 

@@ -77,10 +77,9 @@ def rates(found):
         if not run:
             rows.append((TITLES[name], "none", "-", "-", "-", "-"))
             continue
-        lag = max(0.0, run["last_row"] - run["seconds"]) if run["last_row"] else None
         limit = " (the sender's limit)" if result["limited_by_sender"] else ""
         rows.append((TITLES[name], f"{run['offered']:,.0f}{limit}", f"{run['seconds']:.0f} s", f"{run['sent']:,}",
-                     "-" if lag is None else f"{lag:.1f} s", f"{run['peak_bytes'] / 2**20:,.0f} MiB"))
+                     "-" if name == "bare" else f"{run['lag']:.1f} s", f"{run['peak_bytes'] / 2**20:,.0f} MiB"))
     confirmed = {name: result["confirmed"] for name, result in found.items() if result["confirmed"]}
     head = ["highest rate without loss", "reports/s", "for", "reports", "last row after the last report", "peak memory"]
     return table(head, rows) + "\n\n" + _processor_time(confirmed)
