@@ -29,11 +29,14 @@ public:
     bool IsOpen() const { return m_descriptor >= 0; }
 
     /// Whether `path` is known to be another file by now, or none: it was rotated by another process or
-    /// deleted.
-    bool IsGoneFrom(const std::string& path) const;
+    /// deleted. Looks at the size of the file that is open, too.
+    bool IsGoneFrom(const std::string& path);
 
-    /// The size of the file after this object's last operation, with what other processes appended until
-    /// then.
+    /// How many lines are appended between two looks at the size. So many may each writer go beyond a limit where several
+    /// write at once.
+    static constexpr unsigned LINES_PER_LOOK = 16;
+
+    /// The size of the file, with what other processes appended until the last look.
     std::int64_t SizeBytes() const { return m_sizeBytes; }
 
     /// Appends the line, which ends in a newline, with one system call: it is in the file, as a whole and not
@@ -52,6 +55,7 @@ private:
 
     int m_descriptor = -1;
     std::int64_t m_sizeBytes = 0;
+    unsigned m_lines = 0; ///< Appended; may run over.
     bool m_endsInHalfLine = false;
 };
 

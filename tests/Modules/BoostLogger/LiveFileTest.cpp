@@ -32,13 +32,23 @@ TEST_F(LiveFileTest, AppendsToWhatIsThere) {
     EXPECT_EQ(ReadFile(m_path), "old\nnew\n");
 }
 
-TEST_F(LiveFileTest, SeesHowMuchAnotherWriterAppended) {
+TEST_F(LiveFileTest, SeesWithinSixteenLinesHowMuchAnotherWriterAppended) {
     LiveFile other;
     ASSERT_FALSE(m_file.Open(m_path));
     ASSERT_FALSE(other.Open(m_path));
     ASSERT_FALSE(other.Append("0123456789\n"));
-    ASSERT_FALSE(m_file.Append("x\n"));
-    EXPECT_EQ(m_file.SizeBytes(), 13);
+    for (int i = 0; i < 16; ++i)
+        ASSERT_FALSE(m_file.Append("x\n"));
+    EXPECT_EQ(m_file.SizeBytes(), 11 + 16 * 2);
+}
+
+TEST_F(LiveFileTest, SeesHowMuchAnotherWriterAppendedWhenItLooksAtThePath) {
+    LiveFile other;
+    ASSERT_FALSE(m_file.Open(m_path));
+    ASSERT_FALSE(other.Open(m_path));
+    ASSERT_FALSE(other.Append("0123456789\n"));
+    EXPECT_FALSE(m_file.IsGoneFrom(m_path));
+    EXPECT_EQ(m_file.SizeBytes(), 11);
 }
 
 TEST_F(LiveFileTest, StartsANewLineAfterAHalfLineThatItFinds) {

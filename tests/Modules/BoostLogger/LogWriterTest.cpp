@@ -121,8 +121,7 @@ TEST_F(LogWriterTest, DoesNotRotateAFileThatAnotherProcessHasRotatedAlready) {
     ASSERT_FALSE(other.Start());
     for (int i = 0; i < 10; ++i)
         one.Append(Line(100, 'a'), m_start);
-    other.Append(Line(50, 'b'), m_start); // into the full file: its size is news for this one
-    other.Append(Line(50, 'b'), m_start); // rotates
+    other.Append(Line(50, 'b'), m_start); // looks at the file, which is full, and rotates
     one.Append(Line(50, 'a'), m_start);   // follows
     EXPECT_EQ(LogFilesOf(m_directory).size(), 2U);
     EXPECT_EQ(ReadFile(m_path), Line(50, 'b') + Line(50, 'a'));
