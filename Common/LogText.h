@@ -91,15 +91,17 @@ inline boost::format ParsedFormat(const std::string& format) {
     return parsed;
 }
 
+/// Whether `format` without arguments gives itself. Most datagrams are such, and need neither a parse nor a copy.
+inline bool IsOwnText(const std::string& format) {
+    return format.size() <= MAX_LOG_TEXT_BYTES && format.find('%') == std::string::npos;
+}
+
 /// The text that `format` gives with `arguments`. Throws what boost::format throws for a format that does not
 /// fit, and std::length_error for a text over MAX_LOG_TEXT_BYTES, before that is built, or for a directive with a number
 /// that no smaller text can have. A format from outside must come without arguments: an argument is built to the format's
 /// width before the text's size is known.
 template <typename... Arguments>
 std::string BuildLogText(const std::string& format, const Arguments&... arguments) {
-    if constexpr (sizeof...(arguments) == 0)
-        if (format.size() <= MAX_LOG_TEXT_BYTES && format.find('%') == std::string::npos)
-            return format; // most datagrams are such, and they need not pay for a parse
     CheckNumbersOfDirectives(format);
     boost::format text = ParsedFormat(format);
     (static_cast<void>(text % arguments), ...);

@@ -65,6 +65,8 @@ static void WriteLog(const LogSite& site, const std::string& format, const Argum
     };
     try {
         try {
+            if (sizeof...(arguments) == 0 && IsOwnText(format))
+                return write(site.level, format);
             write(site.level, BuildLogText(format, arguments...));
         } catch (const std::exception& error) {
             write(LogLevel::Error, std::string("[BoostLogError]") + error.what());
