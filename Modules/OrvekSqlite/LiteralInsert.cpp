@@ -1,13 +1,21 @@
 #include "Modules/OrvekSqlite/LiteralInsert.h"
 
+#include <algorithm>
+#include <utility>
+
 namespace OrvekSqlite {
 namespace {
 
 constexpr std::string_view BEGIN = "insert into ";
 constexpr std::string_view VALUES = "values(";
-constexpr std::string_view NAMES = "abcdefghijklmnopqrstuvwxyzABCDEFGHIJKLMNOPQRSTUVWXYZ0123456789_ ,()";
 constexpr std::string_view DIGITS = "0123456789";
 constexpr std::size_t MAX_DIGITS = 18; // any number of so many fits into 64 bits
+
+/// Whether a list of names is made of it.
+bool IsOfNames(char c) {
+    return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9') || c == '_' ||
+           c == ' ' || c == ',' || c == '(' || c == ')';
+}
 
 /// The text in quotes at the start of `rest`, which is moved behind it; nothing when the quotes do not end.
 std::optional<Literal> TakeText(std::string_view& rest) {
@@ -61,7 +69,7 @@ std::optional<LiteralInsert> LiteralInsert::Of(std::string_view sql) {
         sql.find('\0') != std::string_view::npos)
         return std::nullopt;
     const std::string_view head = sql.substr(0, values + VALUES.size());
-    if (head.find_first_not_of(NAMES) != std::string_view::npos)
+    if (!std::all_of(head.begin(), head.end(), IsOfNames))
         return std::nullopt;
     auto literals = TakeLiterals(sql.substr(head.size()));
     if (!literals)
