@@ -16,15 +16,6 @@
 
 using namespace SyncServiceReport;
 
-// The leak checker of clang 14 crashes itself here ("Tracer caught signal 11", before the first input is over) with a
-// corpus of some hundred files, though not with the seeds alone; why is not known. Replayed under the preset asan, the
-// same target is looked through for leaks.
-#ifdef __clang__
-extern "C" __attribute__((visibility("default"))) const char* __lsan_default_options() {
-    return "detect_leaks=0";
-}
-#endif
-
 namespace {
 
 constexpr auto SCHEMA =

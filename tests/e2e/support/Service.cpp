@@ -64,9 +64,10 @@ Service::Service() {
     for (const auto& plugin : PLUGINS)
         std::filesystem::create_symlink(std::filesystem::path(SSR_BIN_DIR) / plugin,
                                         m_program.Path() + "/" + plugin);
-    // A sanitizer looks for leaks at exit, which takes longer than the crash handler's deadline on a busy machine.
+    // A sanitizer looks for leaks at exit, which takes longer than the crash handler's deadline on a busy machine; and it
+    // wants to be the first library otherwise, where a test loads one before the program.
     m_environment = {"XDG_DATA_HOME=" + DataDirectory(), "HOME=" + DataDirectory(), "PATH=/usr/bin:/bin",
-                     "ASAN_OPTIONS=detect_leaks=0"};
+                     "ASAN_OPTIONS=detect_leaks=0:verify_asan_link_order=0"};
 }
 
 Service::~Service() {

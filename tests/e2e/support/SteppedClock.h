@@ -14,8 +14,6 @@ public:
         StepTo(std::chrono::seconds(0));
         service.SetEnvironment("LD_PRELOAD=" SSR_STEPPED_CLOCK);
         service.SetEnvironment("SSR_STEPPED_CLOCK_FILE=" + File());
-        service.SetEnvironment(
-            "ASAN_OPTIONS=verify_asan_link_order=0"); // the sanitizer wants to be the first otherwise
     }
 
     /// From now on.
