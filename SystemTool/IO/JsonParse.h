@@ -2,6 +2,7 @@
 
 #include <charconv>
 #include <cmath>
+#include <cstdint>
 #include <cstdlib>
 #include <cstring>
 #include <optional>
@@ -20,9 +21,23 @@ namespace SystemTool::IO {
 
 // Numbers come as their texts. The parser's own conversion loses some: 1.84467440737095516155 runs over in its 64 bits
 // and comes out as anything, 10e308 as next to nothing, and 17976931348623159e292 as an infinity, which JSON cannot hold.
-inline constexpr unsigned JSON_PARSE_FLAGS = rapidjson::kParseIterativeFlag |
-                                             rapidjson::kParseNumbersAsStringsFlag |
-                                             rapidjson::kParseValidateEncodingFlag;
+inline constexpr unsigned JSON_PARSE_FLAGS =
+    rapidjson::kParseIterativeFlag | rapidjson::kParseNumbersAsStringsFlag;
+
+/// Whether all bytes are ASCII, which is valid UTF-8: eight bytes at a time, where the parser decodes each. A usual report
+/// is, and what this saves was a tenth of the cost of its document.
+inline bool IsAscii(std::string_view text) {
+    constexpr std::uint64_t HIGH_BITS = 0x8080808080808080;
+    std::uint64_t all = 0;
+    for (; text.size() >= sizeof all; text.remove_prefix(sizeof all)) {
+        std::uint64_t eight = 0;
+        std::memcpy(&eight, text.data(), sizeof eight);
+        all |= eight;
+    }
+    for (const char byte : text)
+        all |= static_cast<unsigned char>(byte);
+    return (all & HIGH_BITS) == 0;
+}
 
 /// Whether decoded text holds half a surrogate pair: what an escape such as \udc00 on its own decodes to,
 /// which is no UTF-8 and which the parser lets pass.
@@ -112,7 +127,9 @@ public:
         rapidjson::MemoryStream bytes(m_text.data() + m_start, m_text.size() - m_start);
         JsonGuard guard(document);
         rapidjson::Reader reader;
-        m_result = reader.Parse<JSON_PARSE_FLAGS>(bytes, guard);
+        m_result = IsAscii(m_text)
+                       ? reader.Parse<JSON_PARSE_FLAGS>(bytes, guard)
+                       : reader.Parse<JSON_PARSE_FLAGS | rapidjson::kParseValidateEncodingFlag>(bytes, guard);
         m_refusal = guard.Refusal();
         // The parser takes a zero byte for the end of the text; the text says where it really ends.
         if (!m_result.IsError() && bytes.Tell() != m_text.size() - m_start)

@@ -110,6 +110,16 @@ TEST(JsonDocument, InvalidUtf8IsAnError) {
         EXPECT_NE(ErrorOf("\"" + bytes + "\""), "") << ::testing::PrintToString(bytes);
 }
 
+TEST(JsonDocument, InvalidUtf8IsAnErrorWhereverItStands) {
+    for (std::size_t length = 1; length <= 24; ++length)
+        for (std::size_t place = 0; place < length; ++place) {
+            std::string text(length, 'a');
+            text[place] = '\x80';
+            EXPECT_EQ(ErrorOf("\"" + text + "\""),
+                      "Invalid encoding in string. At byte " + std::to_string(place + 1) + ".");
+        }
+}
+
 TEST(JsonDocument, HalfASurrogatePairIsAnError) {
     for (const std::string text : {R"("\ud800")", R"("\ud800x")", R"({"\udfff":1})", R"("a\udc00b")"})
         EXPECT_NE(ErrorOf(text), "") << text;
