@@ -1,6 +1,5 @@
 #include <algorithm>
 #include <filesystem>
-#include <fstream>
 #include <sstream>
 
 #include <Poco/RegularExpression.h>
@@ -80,14 +79,6 @@ protected:
         });
     }
 
-    long ResidentKilobytes() const {
-        std::ifstream status("/proc/" + std::to_string(m_service.Process()) + "/status");
-        for (std::string line; std::getline(status, line);)
-            if (line.starts_with("VmRSS:"))
-                return std::stol(line.substr(6));
-        return -1;
-    }
-
     std::string Directory() const { return m_service.DataDirectory() + "/hublink/log/metrik"; }
 
     Service m_service;
@@ -125,9 +116,9 @@ TEST_F(LogFault, WhatAFullDiskKeepsOutOfTheLogIsNotKeptInMemory) {
         }
     };
     send(10);
-    const auto before = ResidentKilobytes();
+    const auto before = m_service.ResidentKilobytes();
     send(50); // 10 MB of lines
-    EXPECT_LT(ResidentKilobytes() - before, 5'000);
+    EXPECT_LT(m_service.ResidentKilobytes() - before, 5'000);
 }
 
 TEST_F(LogFault, ADeletedFileIsMadeAgain) {

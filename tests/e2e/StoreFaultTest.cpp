@@ -118,6 +118,34 @@ TEST_F(StoreFault, ALockHeldForLongerCostsAReportForEveryFifteenSeconds) {
     ExpectToGoOn();
 }
 
+TEST_F(StoreFault, TheMemoryOfABacklogIsGivenBackOnceItIsStored) {
+#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
+    GTEST_SKIP() << "the sanitizers keep memory of their own";
+#endif
+    constexpr int REPORTS = 100'000;
+    InstallAndStart();
+    StoreSome();
+    const auto rows = m_service.RowCount();
+    const auto before = m_service.ResidentKilobytes();
+    SQLite::Database other(m_service.DatabaseFile(), SQLite::OPEN_READWRITE);
+    other.exec("begin immediate");
+    for (int i = 0; i < REPORTS; ++i) {
+        Service::Send(R"({"eventID":"B2|1","value":")" + std::string(150, 'x') + "\"}");
+        if (i % 500 == 0) {
+            ASSERT_TRUE(WaitUntil(Service::TookAllDatagrams));
+        }
+    }
+    ASSERT_TRUE(WaitUntil(Service::TookAllDatagrams));
+    EXPECT_GT(m_service.ResidentKilobytes() - before, 15'000) << "they wait in memory";
+    other.exec("commit");
+    ASSERT_TRUE(WaitUntil([&] { return m_service.RowCount() == rows + REPORTS; }, 30s));
+    const auto isGivenBack = [&] {
+        m_service.AwaitQuiet(); // a heap gives back in passing, when it is used
+        return m_service.ResidentKilobytes() - before < 8'000;
+    };
+    EXPECT_TRUE(WaitUntil(isGivenBack, 30s));
+}
+
 TEST_F(StoreFault, ADeletedStoreCostsWhatWasInItAndWhatComesUntilSetUpMakesAnother) {
     InstallAndStart();
     StoreSome();

@@ -229,6 +229,14 @@ std::int64_t Service::Count(const std::string& file, const std::string& sql) con
     return rows.empty() ? -1 : std::stoll(rows.front());
 }
 
+long Service::ResidentKilobytes() const {
+    std::ifstream status("/proc/" + std::to_string(m_process) + "/status");
+    for (std::string line; std::getline(status, line);)
+        if (line.starts_with("VmRSS:"))
+            return std::stol(line.substr(6));
+    return -1;
+}
+
 bool Service::Bound() {
     return !KernelsLineOfThePort().empty();
 }

@@ -99,6 +99,9 @@ public:
     std::int64_t Count(const std::string& file, const std::string& sql) const;
     std::int64_t RowCount() const { return Count(DatabaseFile(), "select count(*) from OperLog"); }
 
+    /// Of its memory, what the machine has in use for it.
+    long ResidentKilobytes() const;
+
     /// Whether the report port is bound in this network.
     static bool Bound();
 
