@@ -122,6 +122,10 @@ FileFailure LogWriter::Rotate() {
     if (const FileFailure failure = m_live.Lock())
         return failure;
     if (!m_live.IsGoneFrom(m_path)) {
+        if (m_live.SizeBytes() == 0) { // somebody has emptied it since the last look
+            m_live.Unlock();
+            return {};
+        }
         if (const FileFailure failure = m_rotated.TakeIn(m_path)) {
             m_live.Unlock();
             return failure;

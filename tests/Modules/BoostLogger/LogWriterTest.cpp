@@ -127,6 +127,17 @@ TEST_F(LogWriterTest, DoesNotRotateAFileThatAnotherProcessHasRotatedAlready) {
     EXPECT_EQ(ReadFile(m_path), Line(50, 'b') + Line(50, 'a'));
 }
 
+TEST_F(LogWriterTest, DoesNotRotateAFileThatSomebodyHasEmptied) {
+    LogWriter writer(Settings());
+    ASSERT_FALSE(writer.Start());
+    for (int i = 0; i < 10; ++i)
+        writer.Append(Line(100), m_start);
+    std::filesystem::resize_file(m_path, 0);
+    writer.Append("next\n", m_start);
+    EXPECT_EQ(ReadFile(m_path), "next\n");
+    EXPECT_FALSE(std::filesystem::exists(m_directory + "/Report_1.log"));
+}
+
 TEST_F(LogWriterTest, FollowsAPathThatBecameAnotherFileWithinATenthOfASecond) {
     LogWriter writer(Settings());
     ASSERT_FALSE(writer.Start());
