@@ -86,21 +86,24 @@ void UDPServer::run() {
     } while (!m_bStop);
 }
 
-/// Whether a datagram came within the poll timeout. A poll makes, fills, waits for and closes a set of its own, so one is
-/// asked for only when the socket was found empty.
+/// Whether a datagram came within the poll timeout. By a set that lasts: the socket's own poll makes, fills, waits for and
+/// closes one each time, which is four system calls instead of one.
 ///
 /// A poll that fails (a closed socket) would fail again at once and for ever: it is printed when it begins, and each one
 /// waits out the timeout that it did not use.
 bool UDPServer::WaitForDatagram() {
     const Poco::Timespan timeout(POLL_TIMEOUT_MS * Poco::Timespan::MILLISECONDS);
     try {
-        const bool readable = m_socket.poll(timeout, Poco::Net::Socket::SELECT_READ);
+        if (!m_poll)
+            m_poll.emplace().add(m_socket, Poco::Net::PollSet::POLL_READ);
+        const bool readable = !m_poll->poll(timeout).empty();
         m_pollFailed = false;
         return readable;
     } catch (...) {
         if (!m_pollFailed)
             PrintCaughtException();
         m_pollFailed = true;
+        m_poll.reset();
         Poco::Thread::sleep(POLL_TIMEOUT_MS);
         return false;
     }
@@ -117,6 +120,7 @@ bool UDPServer::ReceiveOne(Buffer& buffer) {
         return bytes >= 0;
     } catch (...) {
         PrintCaughtException();
+        m_poll.reset();
         return false;
     }
 }

@@ -1,8 +1,10 @@
 #pragma once
 
+#include <optional>
 #include <string>
 
 #include <Poco/Net/DatagramSocket.h>
+#include <Poco/Net/PollSet.h>
 #include <Poco/Runnable.h>
 #include <Poco/Thread.h>
 
@@ -54,6 +56,9 @@ private:
     /// Plain on purpose: the stopping thread writes it once, the loop reads it once a pass, and the join
     /// orders the rest. The worst that the race can cost is one more pass.
     bool m_bStop = false;
+
+    /// Made when it is first needed, and anew after a failure: the kernel says nothing of a socket that is closed.
+    std::optional<Poco::Net::PollSet> m_poll;
 
     /// Whether the last poll failed, so that a socket that stays broken is reported once.
     bool m_pollFailed = false;
