@@ -11,9 +11,13 @@
 /// Failure: an operation that returns false has left its reason for GetLastErrorMsg.
 /// Durability: after ExecSql returned true for a statement that came alone (nothing for 10 ms before it), its
 /// effect survives kill -9. In a burst, statements share a transaction that is committed after at most 10 ms
-/// or 1,000 statements, also when nothing follows, so that kill -9 loses at most the last 10 ms of the burst.
-/// A commit that fails loses nothing: the statements are kept and committed, in order, once the database
-/// takes them, and new ones fail meanwhile. Every other operation commits first.
+/// or 1,000 statements, also when nothing follows, so that kill -9 loses at most the last 10 ms of the burst;
+/// a statement that runs for longer by itself holds its transaction up. A statement's own error is its own
+/// result and leaves the others alone. A commit that fails loses nothing: the statements are kept and
+/// committed, in order, once the database takes them, and new ones fail with the error's text meanwhile; one
+/// that a constraint refuses then, after another program's change, is dropped without a word. Every other
+/// operation commits first.
+/// Other programs: the write lock is free between transactions, and held for one of them at the longest.
 class ISqliteDatabase {
 public:
     /// Opens the SQLite database file at `path` for all later operations.

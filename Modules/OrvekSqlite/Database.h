@@ -78,8 +78,8 @@ public:
 
     /// The end: commits what is kept, without waiting for another process's lock, stops the committer and
     /// closes the file. May be called from an exit handler on any thread, also from within an operation that
-    /// crashed, and takes a fifth of a second at most; when an operation does not end in that time, a crash
-    /// may cost the last 10 ms of a burst.
+    /// crashed. Waits a fifth of a second at most for an operation to end; when it does not, a crash may cost
+    /// the last 10 ms of a burst. The commit and the close take as long as the disk does.
     ///
     /// False: another thread may still be in an operation, or come back with the next. Then the object must
     /// stay where it is, and the code too; operations fail from here on.
