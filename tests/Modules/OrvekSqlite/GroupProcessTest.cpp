@@ -4,7 +4,6 @@
 #include <csignal>
 #include <functional>
 #include <memory>
-#include <optional>
 #include <random>
 #include <thread>
 
@@ -169,15 +168,15 @@ TEST_F(AnotherProgram, IsNeverLockedOutForLongerThanAGroup) {
     SQLite::Database other(Store(), SQLite::OPEN_READWRITE);
     const auto longestStretch = [&] {
         auto longest = Clock::duration::zero();
-        std::optional<Clock::time_point> takenSince;
         const auto begin = Clock::now();
+        auto takenSince = begin;
+        bool wasFree = true;
         for (auto now = begin; now - begin < 50ms; now = Clock::now()) {
             const bool isFree = other.tryExec("begin immediate; rollback") == SQLITE_OK;
-            if (!takenSince)
+            if (wasFree)
                 takenSince = now;
-            longest = std::max(longest, now - *takenSince);
-            if (isFree)
-                takenSince.reset();
+            longest = std::max(longest, now - takenSince);
+            wasFree = isFree;
         }
         return longest;
     };
