@@ -10,6 +10,7 @@ import procfs
 import runs
 import search
 import subjects
+import tables
 from subject import PROGRAMS
 
 SUBJECTS = {subject.name: subject for subject in
@@ -36,14 +37,14 @@ def latencies(subject, plan, tell):
 def bare_sqlite(_, plan, tell):
     """Into a store as reportctl makes it, the service's own program being left out."""
     result = {}
-    for rows_per_commit, rows in plan.baseline_rows:
-        tell(f"{rows_per_commit:,} rows to a commit")
+    for kind, rows in plan.baselines:
+        tell(tables.baseline(kind))
+        rows_per_commit, _, prepared = kind.partition(" ")
         with subjects.EmptyStore() as store:
             command = [PROGRAMS / "bench_inserter", store.database(), "--rows", str(rows),
-                       "--rows-per-commit", str(rows_per_commit)]
+                       "--rows-per-commit", rows_per_commit, *(["--prepared"] if prepared else [])]
             run = json.loads(subprocess.run(command, capture_output=True, text=True, check=True).stdout)
-        result[rows_per_commit] = {"rows_per_second": run["rows"] / run["seconds"],
-                                   "cpu_ns": run["cpu_ns"] / run["rows"]}
+        result[kind] = {"rows_per_second": run["rows"] / run["seconds"], "cpu_ns": run["cpu_ns"] / run["rows"]}
     return result
 
 
@@ -84,7 +85,7 @@ def rest(_, plan, __):
 
 MEASURES = {  # name: of what, seconds for one, how
     "rest": (("service",), lambda plan: plan.rest_seconds, rest),
-    "baselines": (("sqlite",), lambda plan: sum(rows for _, rows in plan.baseline_rows) / 1e5, bare_sqlite),
+    "baselines": (("sqlite",), lambda plan: sum(rows for _, rows in plan.baselines) / 1e5, bare_sqlite),
     "floods": (tuple(SUBJECTS), lambda plan: plan.flood_reports / 60_000 + 2, flood),
     "rates": (tuple(SUBJECTS), lambda plan: plan.probes * (plan.probe_seconds + 2) + plan.confirm_seconds + 2, rate),
     "latencies": (STORES, lambda plan: len(plan.latency_rates) * (plan.latency_seconds + 1), latencies),

@@ -14,7 +14,7 @@ class Plan:
     searched: tuple = ("service", "analytics", "daemon", "bare")
     latency_seconds: float = 20
     latency_rates: tuple = (10, 100, 1_000, 20_000)
-    baseline_rows: tuple = ((1, 100_000), (1000, 1_000_000))  # rows to a commit, rows
+    baselines: tuple = (("1", 100_000), ("1000", 1_000_000), ("1000 prepared", 1_000_000))  # rows to a commit, rows
     rows_before: tuple = (0, 1_000_000, 5_000_000)
     growth_reports: int = 500_000
     growth_rounds: int = 3       # in turn, so that a disturbance meets all sizes; the median counts
@@ -26,5 +26,5 @@ FULL = Plan()
 
 QUICK = Plan(flood_reports=50_000, probe_seconds=1, probes=3, tries=1, confirm_seconds=1, exactness=4,
              searched=("service", "daemon"), latency_seconds=1, latency_rates=(10, 20_000),
-             baseline_rows=((1, 10_000), (1000, 100_000)), rows_before=(0, 100_000), growth_reports=50_000,
-             growth_rounds=1, queued_reports=100_000, rest_seconds=1)
+             baselines=(("1", 10_000), ("1000", 100_000), ("1000 prepared", 100_000)), rows_before=(0, 100_000),
+             growth_reports=50_000, growth_rounds=1, queued_reports=100_000, rest_seconds=1)

@@ -99,8 +99,13 @@ def _ms(milliseconds):
 
 def baselines(found):
     return table(["bare SQLite", "rows/s", "processor time for a row"],
-                 [(f"{int(size):,} row{'s' if int(size) > 1 else ''} to a commit", f"{run['rows_per_second']:,.0f}",
-                   _us(run["cpu_ns"])) for size, run in found["sqlite"].items()])
+                 [(baseline(kind), f"{run['rows_per_second']:,.0f}", _us(run["cpu_ns"]))
+                  for kind, run in found["sqlite"].items()])
+
+
+def baseline(kind):
+    rows, _, prepared = kind.partition(" ")
+    return f"{int(rows):,} row{'s' if int(rows) > 1 else ''} to a commit{', prepared once' if prepared else ''}"
 
 
 def growth(found):
