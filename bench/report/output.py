@@ -3,6 +3,7 @@ import json
 import re
 
 import chart
+import measures
 import tables
 from subject import ROOT
 
@@ -24,7 +25,10 @@ def write(report, folder=FOLDER):
 
 
 def is_full(report):
-    return not report["quick"] and all(name in report["results"] for name in tables.SECTIONS)
+    """Every measure, of every subject."""
+    results = report["results"]
+    return not report["quick"] and all(subject in results.get(name, {})
+                                       for name, (subjects, *_) in measures.MEASURES.items() for subject in subjects)
 
 
 def update_page(report):

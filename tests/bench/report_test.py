@@ -10,6 +10,7 @@ sys.path.insert(0, str(ROOT / "bench/report"))
 
 import chart
 import latency
+import measures
 import output
 import plan
 import runs
@@ -154,10 +155,14 @@ class Chart(unittest.TestCase):
             self.assertAlmostEqual(y, chart._y(part), 1)
 
 
+def full():
+    return {name: dict.fromkeys(subjects) for name, (subjects, *_) in measures.MEASURES.items()}
+
+
 class Page(unittest.TestCase):
     def updated(self, page, **changes):
         sections = dict.fromkeys(tables.SECTIONS, "new")
-        report = {"quick": False, "results": sections} | changes
+        report = {"quick": False, "results": full()} | changes
         with mock.patch.object(output, "PAGE", mock.Mock(read_text=lambda: page)) as file, \
                 mock.patch.object(output, "write"), mock.patch.object(tables, "sections", lambda _: sections):
             output.update_page(report)
@@ -170,9 +175,17 @@ class Page(unittest.TestCase):
                                              "<!-- figures: floods -->\n\nnew\n\n<!-- end -->\nafter\n")
 
     def test_takes_the_figures_of_a_full_run_only(self):
-        for change in ({"quick": True}, {"results": {"rest": {}}}):
+        for change in ({"quick": True}, {"results": {"rest": {}}}, {"results": {}}):
             with self.assertRaises(SystemExit):
                 self.updated("", **change)
+
+    def test_takes_no_figures_of_a_run_that_lacks_a_subject_of_a_measure(self):
+        for measure, of in full().items():
+            for subject in of:
+                results = full()
+                del results[measure][subject]
+                with self.subTest(measure=measure, subject=subject), self.assertRaises(SystemExit):
+                    self.updated("", results=results)
 
 
 if __name__ == "__main__":
