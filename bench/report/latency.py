@@ -14,9 +14,13 @@ def measure(subject_class, rate, seconds):
         sent, seen = subject.directory / "sent", subject.directory / "seen"
         watcher = subprocess.Popen([PROGRAMS / "bench_watcher", subject.database(), "--query", subject.watch,
                                     "--stamps", seen, "--count", str(count)], stdout=subprocess.PIPE, text=True)
-        watcher.stdout.readline()  # it has said that it watches
-        sender = runs.send(subject, count, rate, sent)
-        watched = json.loads(watcher.communicate()[0])
+        try:
+            watcher.stdout.readline()  # it has said that it watches
+            sender = runs.send(subject, count, rate, sent)
+            watched = json.loads(watcher.communicate()[0])
+        finally:
+            watcher.kill()  # unless it has ended
+            watcher.wait()
         return {"rate": rate, "offered": count / sender["seconds"], "sent": count, "seen": watched["found"],
                 "look_ms_p50": watched["gap_ns_p50"] / 1e6, "look_ms_p99": watched["gap_ns_p99"] / 1e6,
                 **_figures(_stamps(sent), _stamps(seen))}

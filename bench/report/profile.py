@@ -30,9 +30,11 @@ def recorded(subject, record, rate):
     """Call stacks of 4 KiB, unwound by the debug information: the frame pointers are left out in what ships."""
     with subprocess.Popen(["perf", "record", "--call-graph", "dwarf,4096", "-F", "997", "-o", record,
                            "-p", str(subject.process.pid)], stderr=subprocess.DEVNULL) as perf:
-        runs.send(subject, int(rate * SECONDS), rate)
-        runs.settle(subject)
-        perf.send_signal(signal.SIGINT)
+        try:
+            runs.send(subject, int(rate * SECONDS), rate)
+            runs.settle(subject)
+        finally:
+            perf.send_signal(signal.SIGINT)
     return samples(record)
 
 

@@ -1,6 +1,5 @@
 """One run: a number of reports at one rate into a subject that was just started, and where each of them ended."""
 import json
-import os
 import subprocess
 import time
 
@@ -37,7 +36,6 @@ def settle(subject):
 
 def measure(subject_class, count, rate=0):
     """A dictionary of plain numbers. `subject_class` is whatever makes a subject."""
-    os.sync()  # what the run before left to write is no part of this one
     with subject_class() as subject:
         pid = subject.process.pid
         udp, cpu = procfs.udp_counters(), procfs.thread_ns(pid)

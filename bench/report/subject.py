@@ -19,6 +19,7 @@ class Subject:
     name = ""
     title = ""
     event = "B100|10001"
+    process = None       # not started yet
     longest_pause = 1.0  # in seconds, while it has work
     watch = "select id, createTime from OperLog where id > ?1 order by id"  # the new rows, for the watcher
 
@@ -26,8 +27,11 @@ class Subject:
         self.directory = pathlib.Path(tempfile.mkdtemp(prefix="bench.", dir=ROOT / "build"))
         try:
             self.prepare()
+            os.sync()  # what this and the run before left to write is no part of the run
             self.start()
         except BaseException:
+            if self.process:
+                self.stop()
             shutil.rmtree(self.directory)
             raise
         return self

@@ -1,5 +1,4 @@
 """What is measured: each takes datagrams on 127.0.0.1:9997 and, but for the bare loop, stores them."""
-import os
 import pathlib
 import shutil
 import sqlite3
@@ -54,7 +53,6 @@ class FilledService(Service):
         connection.execute(FILL, {"rows": self.rows_before})
         connection.execute("pragma wal_checkpoint(truncate)")  # what is left to write would be the run's to write
         connection.close()
-        os.sync()
 
     def stored(self):
         return super().stored() - self.rows_before

@@ -1,6 +1,7 @@
 """The judging, searching and drawing parts of bench/report, on runs that are made up."""
 import pathlib
 import sys
+import tempfile
 import unittest
 import xml.etree.ElementTree
 from unittest import mock
@@ -13,8 +14,10 @@ import latency
 import measures
 import output
 import plan
+import procfs
 import runs
 import search
+import subject
 import tables
 import targets
 
@@ -125,6 +128,21 @@ class Verdict(unittest.TestCase):
         results = {**self.RESULTS, "rates": {**self.RESULTS["rates"], "bare": cheap}}
         self.assertIs(self.verdict("receiving thread").reached, True)
         self.assertIs(self.verdict("receiving thread", results).reached, False)
+
+
+class Started(unittest.TestCase):
+    def test_is_ended_when_the_start_fails_later(self):
+        class Sleeper(subject.Subject):
+            def command(self):
+                return ["sleep", "60"]
+        sleeper = Sleeper()
+        with tempfile.TemporaryDirectory() as root, mock.patch.object(subject, "ROOT", pathlib.Path(root)), \
+                mock.patch("os.sync"), mock.patch.object(procfs, "is_bound", side_effect=KeyboardInterrupt):
+            (pathlib.Path(root) / "build").mkdir()
+            with self.assertRaises(KeyboardInterrupt), sleeper:
+                pass
+            self.assertEqual(list((pathlib.Path(root) / "build").iterdir()), [])
+        self.assertIsNotNone(sleeper.process.returncode)
 
 
 class Losses(unittest.TestCase):
