@@ -51,6 +51,7 @@ def measure(subject_class, count, rate=0):
                "kernel_lost": udp_after["RcvbufErrors"] - udp["RcvbufErrors"],
                "socket_buffer": procfs.socket_buffer_bytes(), "peak_bytes": procfs.memory_bytes(pid)}
         run["stored"] = subject.stored()
+        run["refused"] = subject.refused()
         run["last_row"] = (last_write - sender["begin_unix_ns"]) / 1e9 if last_write else None
         run["lag"] = max(0.0, run["last_row"] - run["seconds"]) if last_write else 0.0
         run["cpu"] = _per_thread(used, subject.receiver, run["received"])
@@ -65,7 +66,8 @@ def _per_thread(used, receiver, received):
 
 
 def _losses(run):
-    """Each report that is no row was lost at one of three places; the namespace has no other datagrams."""
+    """Each report that is no row was lost at one of three places; the namespace has no other datagrams. The first,
+    between the sender and what the kernel counts, should lose none."""
     kept = run["received"] if run["stored"] is None else run["stored"]
     return {"lost_before": run["sent"] - run["received"] - run["kernel_lost"], "lost_after": run["received"] - kept,
             "lost": run["sent"] - kept, "rows_per_second": kept / (run["last_row"] or run["seconds"])}

@@ -81,5 +81,9 @@ class Subject:
         finally:
             connection.close()
 
+    def refused(self):
+        """How many rows the store did not take; None when nothing tells."""
+        return None
+
     def stored(self):
         return self.query("select count(*) from OperLog") if self.last_write_ns() else 0

@@ -30,6 +30,11 @@ class Service(Subject):
     def database(self):
         return self.directory / "hublink/database/Report.db"
 
+    def refused(self):
+        """The errors in the log, which keeps its last 100 MiB: the least, when older files went."""
+        files = (self.directory / "hublink/log/metrik").iterdir()
+        return sum(file.read_bytes().count(b" ExecSql] ") for file in files)
+
 
 class EmptyStore(Service):
     """The store without a service."""
@@ -66,6 +71,9 @@ class Analytics(Service):
 
     def database(self):
         return self.directory / "hublink/database/MetrikOutbox.db"
+
+    def refused(self):
+        return None  # the outbox says why it refuses events, not how many
 
     def stored(self):
         return self.query("select stored from outbox_status") if self.last_write_ns() else 0

@@ -40,18 +40,27 @@ def verdicts(results):
 
 
 def floods(runs):
-    head = ["unpaced flood", "sent", "sent/s", "stored", "lost: socket's buffer", "lost: later", "last row after",
-            "rows/s", "peak memory"]
-    return table(head, [_flood(name, run) for name, run in runs.items()]) + "\n\n" + _processor_time(runs)
+    head = ["unpaced flood", "sent", "sent/s", "stored", "last row after", "rows/s", "peak memory"]
+    return "\n\n".join((table(head, [_flood(name, run) for name, run in runs.items()]), _lost(runs),
+                        _processor_time(runs)))
 
 
 def _flood(name, run):
     nothing = run["stored"] is None
     return (TITLES[name], f"{run['sent']:,}", f"{run['offered']:,.0f}",
             f"{run['received']:,} received" if nothing else f"{run['stored']:,}",
-            f"{run['kernel_lost'] + run['lost_before']:,}", "-" if nothing else f"{run['lost_after']:,}",
             "-" if nothing else f"{run['last_row']:.1f} s", "-" if nothing else f"{run['rows_per_second']:,.0f}",
             f"{run['peak_bytes'] / 2**20:,.0f} MiB")
+
+
+def _lost(runs):
+    """The queue's losses are what is left; only the service tells what its store refused."""
+    rows = []
+    for name, run in runs.items():
+        later = "-" if run["stored"] is None else f"{run['lost_after']:,}"
+        refused = "-" if run["refused"] is None else f"{run['refused']:,}"
+        rows.append((TITLES[name], f"{run['kernel_lost']:,}", f"{run['lost_before']:,}", later, refused))
+    return table(["reports lost", "socket's buffer", "sent, never counted", "queue or store", "of these, store"], rows)
 
 
 def _processor_time(runs):

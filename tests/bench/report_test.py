@@ -18,6 +18,7 @@ import procfs
 import runs
 import search
 import subject
+import subjects
 import tables
 import targets
 
@@ -151,6 +152,25 @@ class Losses(unittest.TestCase):
         self.assertEqual((places["lost_before"], places["lost_after"], places["lost"]), (1, 10, 40))
         self.assertEqual(places["rows_per_second"], 30)
 
+    def test_stand_in_the_table_each_in_its_place(self):
+        lost = {"kernel_lost": 29, "lost_before": 1, "lost_after": 10, "stored": 60}
+        rows = tables._lost({"service": {**lost, "refused": 4}, "daemon": {**lost, "refused": None},
+                             "bare": {**lost, "refused": None, "stored": None}}).splitlines()[2:]
+        self.assertEqual([[cell.strip() for cell in row.split("|")[2:-1]] for row in rows],
+                         [["29", "1", "10", "4"], ["29", "1", "10", "-"], ["29", "1", "-", "-"]])
+
+    def test_of_the_store_are_the_errors_in_the_services_log(self):
+        service = subjects.Service()
+        with tempfile.TemporaryDirectory() as folder:
+            service.directory = pathlib.Path(folder)
+            log = service.directory / "hublink/log/metrik"
+            log.mkdir(parents=True)
+            (log / "old").write_text("ERROR [1:2] [Frame/DBHelper:34 ExecSql] no such table-insert\n" * 2)
+            (log / "new").write_text("ERROR [1:2] [Frame/DBHelper:34 ExecSql] no such table-insert\n"
+                                     "INFO  [1:2] [App/ReportServer:42 Recv] {}\n"
+                                     "ERROR [1:2] [Frame/DBHelper:53 BatExecSql] no such table\n")
+            self.assertEqual(service.refused(), 3)
+
 
 class Quantile(unittest.TestCase):
     def test_is_the_smallest_value_that_so_many_are_not_above(self):
@@ -174,7 +194,7 @@ class Chart(unittest.TestCase):
 
 
 def full():
-    return {name: dict.fromkeys(subjects) for name, (subjects, *_) in measures.MEASURES.items()}
+    return {name: dict.fromkeys(of) for name, (of, *_) in measures.MEASURES.items()}
 
 
 class Page(unittest.TestCase):
@@ -199,10 +219,10 @@ class Page(unittest.TestCase):
 
     def test_takes_no_figures_of_a_run_that_lacks_a_subject_of_a_measure(self):
         for measure, of in full().items():
-            for subject in of:
+            for one in of:
                 results = full()
-                del results[measure][subject]
-                with self.subTest(measure=measure, subject=subject), self.assertRaises(SystemExit):
+                del results[measure][one]
+                with self.subTest(measure=measure, subject=one), self.assertRaises(SystemExit):
                     self.updated("", results=results)
 
 
