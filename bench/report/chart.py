@@ -1,4 +1,4 @@
-"""Rate against loss as SVG: one line for each subject, from all runs of the search for the highest rate."""
+"""Rate against loss as SVG: a line for each subject, from all runs of the search for the highest rate and its flood."""
 import math
 import statistics
 
@@ -12,8 +12,9 @@ STYLE = ("text{font:13px sans-serif;fill:#7f7f7f}.grid{stroke:#7f7f7f;stroke-opa
          ".axis{stroke:#7f7f7f}polyline{fill:none;stroke-width:2}")
 
 
-def draw(rates):
-    points = {name: _points(result["probes"]) for name, result in rates.items()}
+def draw(rates, floods):
+    """`floods` may lack subjects."""
+    points = {name: _points(result["probes"], floods.get(name)) for name, result in rates.items()}
     highest = max(rate for line in points.values() for rate, _ in line)
     step = _round_step(highest / 8)
     end = math.ceil(highest / step) * step
@@ -25,9 +26,9 @@ def draw(rates):
     return "\n".join(parts + ["</svg>"]) + "\n"
 
 
-def _points(runs):
+def _points(runs, flood):
     """Rate and part lost, the medians of the runs that were asked for the same rate, by rate."""
-    same = {}
+    same = {"flood": [flood]} if flood else {}
     for run in runs:
         same.setdefault(run["rate"], []).append(run)
     return sorted((statistics.median(run["offered"] for run in group),

@@ -20,8 +20,9 @@ def write(report, folder=FOLDER):
     name = "performance" if is_full(report) else "quick" if report["quick"] else "part"
     folder.mkdir(parents=True, exist_ok=True)
     (folder / f"{name}.json").write_text(json.dumps(report, indent=1) + "\n")
-    if "rates" in report["results"]:
-        (folder / f"{name}.svg").write_text(chart.draw(report["results"]["rates"]))
+    results = report["results"]
+    if "rates" in results:
+        (folder / f"{name}.svg").write_text(chart.draw(results["rates"], results.get("floods", {})))
 
 
 def is_full(report):

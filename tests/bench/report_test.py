@@ -180,17 +180,28 @@ class Quantile(unittest.TestCase):
 
 
 class Chart(unittest.TestCase):
-    def test_has_a_point_for_each_rate_inside_its_axes(self):
-        probes = [run(50_000), run(100_000, 0), run(100_000, 10), run(100_000, 900), run(200_000, 1000)]
-        text = chart.draw({"service": {"probes": probes}, "daemon": {"probes": probes[:1]}})
+    PROBES = [run(50_000), run(100_000, 0), run(100_000, 10), run(100_000, 900), run(200_000, 1000)]
+
+    def points(self, floods):
+        text = chart.draw({"service": {"probes": self.PROBES}, "daemon": {"probes": self.PROBES[:1]}}, floods)
         dots = xml.etree.ElementTree.fromstring(text).iter("{http://www.w3.org/2000/svg}circle")
-        points = [(float(dot.get("cx")), float(dot.get("cy"))) for dot in dots]
+        return [(float(dot.get("cx")), float(dot.get("cy"))) for dot in dots]
+
+    def test_has_a_point_for_each_rate_inside_its_axes(self):
+        points = self.points({})
         self.assertEqual(len(points), 4)
         for x, y in points:
             self.assertTrue(chart.LEFT <= x <= chart.WIDTH - chart.RIGHT, x)
             self.assertTrue(chart.TOP <= y <= chart.HEIGHT - chart.BOTTOM, y)
         for (_, y), part in zip(points, (0, 0.01, 1)):  # at 100,000/s the median of three
             self.assertAlmostEqual(y, chart._y(part), 1)
+
+    def test_ends_each_line_with_the_subjects_flood(self):
+        points = self.points({"service": run(0, 640, offered=900_000)})
+        self.assertEqual(len(points), 5)
+        x, y = points[3]
+        self.assertAlmostEqual(x, chart._x(900_000, 1_000_000), 1)
+        self.assertAlmostEqual(y, chart._y(0.64), 1)
 
 
 def full():
