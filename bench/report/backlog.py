@@ -24,10 +24,11 @@ def measure(subject_class, reports):
         lock.close()
         begin = _first_write_after(subject, last_write)
         runs.settle(subject)
+        held = procfs.memory_bytes(pid, "VmRSS") - before
         received = procfs.udp_counters()["InDatagrams"] - udp["InDatagrams"]
         stored, seconds = subject.stored(), (subject.last_write_ns() - begin) / 1e9
         return {"sent": sender["sent"], "queued": received, "stored": stored, "bytes_per_item": memory / received,
-                "rows_per_second": stored / seconds, "storing_cpu_ns": _busiest(pid, cpu) / stored}
+                "held_bytes": held, "rows_per_second": stored / seconds, "storing_cpu_ns": _busiest(pid, cpu) / stored}
 
 
 def _first_write_after(subject, last_write):

@@ -127,6 +127,7 @@ def queue(found):
     full = found["service"]
     rows = [("reports that waited in the service's queue", f"{full['queued']:,}"),
             ("memory of each", f"{full['bytes_per_item']:,.0f} bytes"),
+            ("memory still held after they were stored", f"{full['held_bytes'] / 2**20:,.0f} MiB"),
             ("storing thread's processor time for each, all told", _us(full["storing_cpu_ns"]))]
     rows += [(f"queue alone, in and out, {int(size):,} waiting", _us(ns)) for size, ns in full["item_ns"].items()]
     return table(["the queue", ""], rows)
