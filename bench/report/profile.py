@@ -1,12 +1,12 @@
-"""Where the service's threads spend their time while reports come. What bench/profile runs."""
+"""Where the service's threads spend their time while reports come."""
+import argparse
 import collections
 import re
 import signal
 import subprocess
-import sys
 
+import measures
 import runs
-import subjects
 
 SECONDS = 5
 LEAST_PART = 0.03     # of a thread's samples; a function with fewer is not told
@@ -38,11 +38,18 @@ def recorded(subject, record, rate):
     return samples(record)
 
 
+def arguments():
+    parser = argparse.ArgumentParser(prog="bench/profile", description=__doc__)
+    parser.add_argument("rate", nargs="?", type=int, default=100_000, help="reports a second")
+    parser.add_argument("--of", choices=measures.STORES, default="service", help="where the reports go")
+    return parser.parse_args()
+
+
 def main():
-    rate = int(sys.argv[1]) if len(sys.argv) > 1 else 100_000
-    with subjects.Service() as subject:
+    options = arguments()
+    with measures.SUBJECTS[options.of]() as subject:
         total, found = collections.Counter(), collections.Counter()
-        for thread, functions in recorded(subject, subject.directory / "perf.data", rate):
+        for thread, functions in recorded(subject, subject.directory / "perf.data", options.rate):
             total[thread] += 1
             found.update((thread, function) for function in functions if TOLD.match(function))
     for thread, count in total.most_common():
