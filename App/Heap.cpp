@@ -2,9 +2,8 @@
 // finds the name only when the program exports it.
 //
 // Each report is allocated on the receiving thread and freed on the storing one. The C library gives such memory back under
-// a lock that the receiving thread needs for its next report: at 260,000 reports a second the two met there 5,000 times a
-// second, and the storing thread slept for a fifth of its time. It also keeps what a backlog needed until the process ends.
-// jemalloc does neither.
+// a lock that the receiving thread needs for its next report, and at a high rate each waits there for the other. It also
+// keeps what a backlog needed until the process ends. jemalloc does neither.
 
 // Free memory goes back to the system after a second: a backlog may have needed gigabytes, and it is rare.
 extern "C" {
