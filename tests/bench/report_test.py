@@ -172,6 +172,12 @@ class Losses(unittest.TestCase):
             self.assertEqual(service.refused(), 3)
 
 
+class Baseline(unittest.TestCase):
+    def test_says_how_its_rows_are_committed_and_made(self):
+        self.assertEqual([tables.baseline(kind) for kind, _ in plan.FULL.baselines],
+                         ["1 row to a commit", "1,000 rows to a commit", "1,000 rows to a commit, prepared once"])
+
+
 class Quantile(unittest.TestCase):
     def test_is_the_smallest_value_that_so_many_are_not_above(self):
         self.assertEqual(latency.quantile(list(range(1, 101)), 0.99), 99)
