@@ -5,7 +5,8 @@
 // a lock that the receiving thread needs for its next report, and at a high rate each waits there for the other. It also
 // keeps what a backlog needed until the process ends. jemalloc does neither.
 
-// Free memory goes back to the system after a second: a backlog may have needed gigabytes, and it is rare.
+// Memory that has been free for a second goes back to the system, in passing, when the heap is used next: a backlog may
+// have needed gigabytes, and it is rare.
 extern "C" {
 extern __attribute__((visibility("default"))) const char* malloc_conf;
 const char* malloc_conf = "dirty_decay_ms:1000";
