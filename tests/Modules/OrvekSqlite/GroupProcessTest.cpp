@@ -164,29 +164,28 @@ TEST_F(AnotherProgram, FindsTheLockFreeForAboutHalfOfTheTime) {
     EXPECT_GT(free, LOOKS * 3 / 10);
 }
 
-TEST_F(AnotherProgram, IsNeverLockedOutForLongerThanAGroup) {
+TEST_F(AnotherProgram, IsNotLockedOutForLongerThanAGroup) {
     SQLite::Database other(Store(), SQLite::OPEN_READWRITE);
-    const auto longestStretch = [&] {
-        auto longest = Clock::duration::zero();
-        const auto begin = Clock::now();
-        auto takenSince = begin;
-        bool wasFree = true;
-        for (auto now = begin; now - begin < 50ms; now = Clock::now()) {
-            const bool isFree = other.tryExec("begin immediate; rollback") == SQLITE_OK;
-            if (wasFree)
-                takenSince = now;
-            longest = std::max(longest, now - takenSince);
-            wasFree = isFree;
-        }
-        return longest;
-    };
-    auto shortest = Clock::duration::max(); // a busy machine can only lengthen a stretch
-    for (int round = 0; round < 40; ++round)
-        shortest = std::min(shortest, longestStretch());
-    std::printf("the lock was taken for %.1f ms at the longest\n",
-                std::chrono::duration<double, std::milli>(shortest).count());
-    EXPECT_GT(shortest, Clock::duration::zero()) << "nobody else was writing";
-    EXPECT_LE(shortest, 10ms);
+    constexpr std::size_t STRETCHES = 100;
+    std::vector<Clock::duration>
+        taken; // from a look that finds the lock taken to the next that finds it free
+    auto since = Clock::now();
+    for (bool wasFree = true; taken.size() < STRETCHES;) {
+        const auto now = Clock::now();
+        const bool isFree = other.tryExec("begin immediate; rollback") == SQLITE_OK;
+        if (isFree && !wasFree)
+            taken.push_back(now - since);
+        if (!isFree && wasFree)
+            since = now;
+        ASSERT_LT(now - since, 10s) << "nobody else is writing, or nobody else may";
+        wasFree = isFree;
+    }
+    std::sort(taken.begin(), taken.end());
+    const auto ms = [](auto stretch) { return std::chrono::duration<double, std::milli>(stretch).count(); };
+    std::printf("the lock was taken: median %.1f ms, longest %.1f ms\n", ms(taken[STRETCHES / 2]),
+                ms(taken.back()));
+    EXPECT_LE(taken[STRETCHES / 4], 10ms) << "a busy machine may lengthen many, but not each";
+    EXPECT_LT(taken.back(), 10ms + 1s);
 }
 
 /// As anybody writes one: SQLite's own busy timeout, one insert after the other.
