@@ -192,7 +192,9 @@ std::vector<Service::Line> Service::LogLines() const {
     static const Poco::RegularExpression FORM(
         R"(^\d{4}-\d\d-\d\d \d\d:\d\d:\d\d\.\d{3} (\w+) +\[(\d+):(\d+)\] \[([^\]]+)\] (.*)$)");
     std::vector<Line> lines;
-    std::istringstream log(Log());
+    const std::string content = Log();
+    // The size of a file grows page by page, so a line that is being written may be there in part.
+    std::istringstream log(content.substr(0, content.rfind('\n') + 1));
     for (std::string text; std::getline(log, text);) {
         std::vector<std::string> parts;
         if (FORM.split(text, parts) != 6)
