@@ -167,8 +167,7 @@ TEST_F(AnotherProgram, FindsTheLockFreeForAboutHalfOfTheTime) {
 TEST_F(AnotherProgram, IsNotLockedOutForLongerThanAGroup) {
     SQLite::Database other(Store(), SQLite::OPEN_READWRITE);
     constexpr std::size_t STRETCHES = 100;
-    std::vector<Clock::duration>
-        taken; // from a look that finds the lock taken to the next that finds it free
+    std::vector<Clock::duration> taken; // each from a look that finds it so to the next that finds it free
     auto since = Clock::now();
     for (bool wasFree = true; taken.size() < STRETCHES;) {
         const auto now = Clock::now();
