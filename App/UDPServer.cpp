@@ -97,6 +97,8 @@ bool UDPServer::WaitForDatagram() {
         if (!m_poll)
             m_poll.emplace().add(m_socket, Poco::Net::PollSet::POLL_READ);
         const bool readable = !m_poll->poll(timeout).empty();
+        if (!readable)
+            m_poll->add(m_socket, Poco::Net::PollSet::POLL_READ); // throws when it was lost
         m_pollFailed = false;
         return readable;
     } catch (...) {
@@ -111,16 +113,21 @@ bool UDPServer::WaitForDatagram() {
 
 /// Whether there was a datagram, so that there may be another one. The socket does not block: while datagrams come faster
 /// than they are handled, each costs one system call and not two.
+///
+/// Only a receive that fails drops the set: another one takes a descriptor, which what Recv threw may be the lack of.
 bool UDPServer::ReceiveOne(Buffer& buffer) {
+    bool received = false;
     try {
         buffer.Clear();
         const int bytes = m_socket.receiveFrom(buffer.Data(), RECEIVE_BUFFER_BYTES, buffer.m_sender);
+        received = true;
         if (bytes >= 1)
             Recv(buffer.Text());
         return bytes >= 0;
     } catch (...) {
         PrintCaughtException();
-        m_poll.reset();
+        if (!received)
+            m_poll.reset();
         return false;
     }
 }

@@ -57,7 +57,8 @@ private:
     /// orders the rest. The worst that the race can cost is one more pass.
     bool m_bStop = false;
 
-    /// Made when it is first needed, and anew after a failure: the kernel says nothing of a socket that is closed.
+    /// Made when it is first needed, and anew after a failure. The kernel drops a socket that is closed from it, and says
+    /// nothing.
     std::optional<Poco::Net::PollSet> m_poll;
 
     /// Whether the last poll failed, so that a socket that stays broken is reported once.

@@ -5,6 +5,11 @@
 #include <type_traits>
 #include <vector>
 
+#include <fcntl.h>
+#include <sys/resource.h>
+#include <sys/syscall.h>
+#include <unistd.h>
+
 #include <Poco/Net/SocketAddress.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -56,6 +61,14 @@ public:
 
     bool IsRunning() const { return m_thread.isRunning(); }
     void Join() { m_thread.join(); }
+    /// What the socket's descriptor stood for is another file from here on, as after somebody's close too many. By bare
+    /// system calls: a sanitizer takes it for the mistake that it is.
+    void LoseTheSocket() {
+        const int other = ::open("/dev/null", O_RDWR | O_CLOEXEC);
+        ::syscall(SYS_dup3, other, m_socket.impl()->sockfd(), O_CLOEXEC);
+        ::close(other);
+    }
+
     int ReceiveBufferBytes() { return m_socket.getReceiveBufferSize(); }
 
 private:
@@ -160,6 +173,23 @@ TEST_F(UDPServerTest, PrintsAnExceptionOutOfRecvAndGoesOn) {
     EXPECT_EQ(m_output.Flushes(), 3);
 }
 
+TEST_F(UDPServerTest, NeedsNoDescriptorAfterAnExceptionOutOfRecv) {
+    ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
+    Send("before");
+    Await(1);
+    rlimit limit{};
+    ::getrlimit(RLIMIT_NOFILE, &limit);
+    const rlimit none{.rlim_cur = 1, .rlim_max = limit.rlim_max};
+    ::setrlimit(RLIMIT_NOFILE, &none);
+    Send("throw std");
+    Await(2);
+    Send("after");
+    EXPECT_THAT(Await(3), ElementsAre("before", "throw std", "after"));
+    ::setrlimit(RLIMIT_NOFILE, &limit);
+    m_receiver.Stop();
+    EXPECT_EQ(m_output.Text(), "Std exception: scripted\n");
+}
+
 TEST_F(UDPServerTest, TakesDatagramsOfAnyLocalSender) {
     ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
     Poco::Net::DatagramSocket other(SocketAddress("127.0.0.2", 0));
@@ -243,6 +273,16 @@ TEST_F(UDPServerTest, PrintsAPollThatKeepsFailingOnceAndCanStillBeStopped) {
         << "the receive that failed, and the polls, once";
     EXPECT_THAT(Pauses(), ::testing::Each(250)) << "each failure waits out the time that it did not poll";
     EXPECT_FALSE(m_receiver.IsRunning());
+}
+
+TEST_F(UDPServerTest, PrintsASocketThatIsLostWithoutAWordOnce) {
+    ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
+    Send("before");
+    Await(1);
+    m_receiver.LoseTheSocket();
+    EXPECT_TRUE(WaitUntil([] { return Pauses().size() >= 2; }));
+    m_receiver.Stop();
+    EXPECT_EQ(m_output.Text(), "Poco exception: I/O error: 1\n");
 }
 
 TEST_F(UDPServerTest, HasTheLargestReceiveBufferThatTheKernelGrants) {
