@@ -16,7 +16,7 @@
 /// result and leaves the others alone. A commit that fails loses nothing: the statements are kept and
 /// committed, in order, once the database takes them, and new ones fail with the error's text meanwhile; one
 /// that a constraint refuses then, after another program's change, is dropped without a word. Every other
-/// operation commits first.
+/// operation on the database commits first.
 /// Other programs: the write lock is free between transactions, and held for one of them at the longest.
 class ISqliteDatabase {
 public:

@@ -1,7 +1,6 @@
 #include "Modules/OrvekSqlite/Committer.h"
 
 #include <exception>
-#include <system_error>
 
 namespace OrvekSqlite {
 
@@ -20,7 +19,7 @@ void Committer::Notice() {
 void Committer::Start() {
     try {
         m_thread = std::thread(&Committer::Run, this);
-    } catch (const std::system_error&) {
+    } catch (const std::exception&) {
         CommitNow(); // no thread to be had: then a group is one statement, until there is
     }
 }

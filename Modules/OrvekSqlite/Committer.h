@@ -12,7 +12,7 @@ namespace OrvekSqlite {
 /// The thread that commits a group when nothing follows, and tries an owed one again.
 ///
 /// It starts with the first group. It sleeps without a deadline while nothing is kept, and in a burst until
-/// the group's deadline: it wakes once in 8 milliseconds at most, and a statement costs it nothing.
+/// a group's deadline: it wakes some hundred times a second, and a statement costs it nothing.
 ///
 /// It never waits for another process's lock: the thread that brings statements would have to wait with it.
 ///

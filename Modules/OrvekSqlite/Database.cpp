@@ -48,8 +48,10 @@ bool Database::Open(const std::string& path) {
     const Entry entry(*this);
     // What the old file did not take goes to the new one: it was accepted, and this is the store from now on.
     Report([&] { m_group.Commit(); });
-    m_file.Set(path);
-    return Report([&] { m_file.Run([](Connection&) {}); });
+    return Report([&] {
+        m_file.Set(path);
+        m_file.Run([](Connection&) {});
+    });
 }
 
 bool Database::CreateTable(const std::string& sql) {

@@ -17,20 +17,21 @@ namespace OrvekSqlite {
 /// The plug-in's object: one database file, opened when it can be and again when it must be.
 ///
 /// Threads: operations one at a time, as the interface says; a second thread would wait. The object has a
-/// thread of its own, the committer, from the first burst on.
+/// thread of its own, the committer, from the first burst on. The child of a fork, which lacks that thread,
+/// must leave the object alone.
 ///
 /// Durability, of ExecSql: a statement that comes alone (nothing for 10 ms before it) is committed when
 /// ExecSql returns. In a burst, statements share a transaction that is committed after at most 10 ms or 1,000
 /// statements (or 4 MiB of their texts), by the committer when nothing follows. A statement's own error is
-/// its own result, and leaves the others of the transaction alone. Every other operation commits first, and
-/// so does destruction; after CreateTable or BatExecSql returned true, its effect is committed too.
-/// BatExecSql is one transaction: all of its statements or none.
+/// its own result, and leaves the others of the transaction alone. Every other operation on the database
+/// commits first, and so does destruction; after CreateTable or BatExecSql returned true, its effect is
+/// committed too. BatExecSql is one transaction: all of its statements or none.
 ///
 /// What is committed survives the end of the process, kill -9 included, which so loses at most the last 10 ms
 /// of a burst. A commit that fails loses nothing: the group's statements are kept and committed, in order,
 /// once the database takes them, by the committer if nothing follows; new statements fail with the error text
-/// meanwhile, at once but for one in a tenth of a second, which tries. Kept are the group's texts, 5 MiB at
-/// most; they end with the process.
+/// meanwhile, at once but for one in a tenth of a second, which tries; when another program's lock is the
+/// reason, after they waited for it. Kept are the group's texts, 5 MiB at most; they end with the process.
 ///
 /// Other programs: the write lock is free between groups. When another process has the file open, it stays
 /// free for as long as the group held it, so that the other gets its turn. Another program's lock is waited

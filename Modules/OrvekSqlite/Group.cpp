@@ -5,6 +5,14 @@
 #include <SQLiteCpp/Exception.h>
 
 namespace OrvekSqlite {
+namespace {
+
+bool IsALock(const std::exception& error) {
+    const auto* refusal = dynamic_cast<const SQLite::Exception*>(&error);
+    return refusal != nullptr && refusal->getErrorCode() == SQLITE_BUSY;
+}
+
+} // namespace
 
 void Group::Execute(const std::string& sql) {
     const bool isAlone = m_policy.IsAlone(m_last, Clock::now());
@@ -12,12 +20,19 @@ void Group::Execute(const std::string& sql) {
         RefuseWhileOwed();
         isAlone ? ExecuteAlone(sql) : ExecuteInGroup(sql);
     } catch (...) {
-        m_last = Clock::now();
+        EndStatement();
         throw;
     }
+    EndStatement();
+}
+
+/// Commits a group that is complete, whatever became of the statement: a caller whose statements are all
+/// refused takes the mutex again so quickly that the committer would get it too late.
+void Group::EndStatement() noexcept {
     m_last = Clock::now();
-    if (!m_kept.IsEmpty() && m_policy.IsComplete(m_kept.Count(), m_kept.Bytes(), m_began, *m_last))
-        TryToCommit(); // this statement was accepted, whatever becomes of the group
+    if (!m_kept.IsEmpty() && !IsOwed() &&
+        m_policy.IsComplete(m_kept.Count(), m_kept.Bytes(), m_began, *m_last))
+        TryToCommit();
 }
 
 void Group::ExecuteAlone(const std::string& sql) {
@@ -47,10 +62,11 @@ void Group::ExecuteInGroup(const std::string& sql) {
     m_kept.Add(sql);
 }
 
+/// A lock is waited for as ever, though the committer, which does not wait, has met it.
 void Group::RefuseWhileOwed() {
     if (!IsOwed())
         return;
-    if (Clock::now() < m_policy.NextTry(m_lastTry))
+    if (!m_metALock && Clock::now() < m_policy.NextTry(m_lastTry))
         throw SQLite::Exception(m_failure, SQLITE_BUSY);
     Commit();
 }
@@ -67,6 +83,7 @@ void Group::Commit() {
     } catch (const std::exception& error) {
         m_file.RollBack(); // the lock is for those who may be able to do something about it
         m_lastTry = Clock::now();
+        m_metALock = IsALock(error);
         m_failure = error.what();
         throw;
     }
@@ -107,8 +124,10 @@ void Group::RunAgain(Connection& connection) {
             if (error.getErrorCode() != SQLITE_CONSTRAINT)
                 throw;
             m_kept.Remove(i);
-            if (!connection.InTransaction())
-                throw;
+            if (!connection.InTransaction()) { // a trigger rolled back what was before it, too
+                connection.Begin();
+                i = 0;
+            }
         }
     }
 }

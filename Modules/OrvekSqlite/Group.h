@@ -28,7 +28,8 @@ public:
 
     /// Runs one statement. Alone, it is committed when this returns. In a burst it joins a group, and is
     /// committed with it; should that fail, it is run again. Its own error is thrown and leaves the group as
-    /// it was. While a group is owed, this throws the reason, but for one try every GroupSettings::retry.
+    /// it was. While a group is owed, this throws the reason, but for one try every GroupSettings::retry; when
+    /// the reason is another program's lock, it waits for that.
     void Execute(const std::string& sql);
 
     /// Commits what is kept, if anything.
@@ -41,6 +42,7 @@ private:
     void ExecuteAlone(const std::string& sql);
     void ExecuteInGroup(const std::string& sql);
     void RefuseWhileOwed();
+    void EndStatement() noexcept;
     void Open(Connection& connection);
     void RunAgain(Connection& connection);
     void TryToCommit() noexcept;
@@ -55,6 +57,7 @@ private:
     Clock::time_point m_freeUntil;           ///< others may have the lock until then
     Clock::time_point m_lastTry;             ///< to commit, which failed with m_failure
     std::string m_failure;
+    bool m_metALock = false;
 };
 
 } // namespace OrvekSqlite

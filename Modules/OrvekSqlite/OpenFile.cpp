@@ -66,8 +66,11 @@ void OpenFile::Run(const Operation& operation) {
 }
 
 void OpenFile::RollBack() noexcept {
-    if (m_connection)
-        m_connection->RollBack();
+    if (!m_connection)
+        return;
+    m_connection->RollBack();
+    if (m_connection->InTransaction()) // without the memory for a rollback, closing is one
+        m_connection.reset();
 }
 
 void OpenFile::WaitForLocks(std::chrono::milliseconds patience) {

@@ -2,6 +2,7 @@
 #include <csignal>
 #include <filesystem>
 #include <functional>
+#include <thread>
 
 #include <sqlite3.h>
 #include <sys/resource.h>
@@ -66,6 +67,15 @@ protected:
         return WaitUntil([&] { return All(Store()) == AllUpTo(count); });
     }
 
+    /// Makes room while another program has the lock, and lets the committer, which tries ten times a second
+    /// and does not wait, find it taken.
+    void MakeRoomUnderALock(SQLite::Database& other) {
+        other.exec("begin immediate");
+        MakeRoom();
+        const auto start = std::chrono::steady_clock::now();
+        ASSERT_TRUE(WaitUntil([&] { return std::chrono::steady_clock::now() - start > 300ms; }));
+    }
+
     /// A group that could not be committed because the disk was full.
     int OweAGroup() {
         EXPECT_TRUE(Exec(Insert("0"))) << Error();
@@ -124,12 +134,28 @@ TEST_F(OwedGroup, LosesOnlyTheStatementThatAConstraintRefusesWhenItIsRunAgain) {
     SQLite::Database other(Store(), SQLite::OPEN_READWRITE, 5000);
     other.exec("begin immediate; rollback");
     const int accepted = OweAGroup();
-    other.exec("begin immediate");
-    MakeRoom();
+    MakeRoomUnderALock(other);
     other.exec("create trigger t before insert on OperLog when new.eventID = '1' begin"
                " select raise(rollback, 'not that one'); end; commit");
-    EXPECT_TRUE(WaitUntil([&] { return Rows(Store()) == std::to_string(accepted - 1); })) << All(Store());
-    EXPECT_EQ("0,1," + All(Store()).substr(2), AllUpTo(accepted));
+    EXPECT_TRUE(Exec(Insert(std::to_string(accepted)))) << Error();
+    EXPECT_TRUE(WaitUntil([&] { return Rows(Store()) == std::to_string(accepted); })) << All(Store());
+    EXPECT_EQ("0,1," + All(Store()).substr(2), AllUpTo(accepted + 1));
+}
+
+TEST_F(OwedGroup, HasNewStatementsWaitForAnotherProgramsLock) {
+    SQLite::Database other(Store(), SQLite::OPEN_READWRITE);
+    other.exec("begin immediate; rollback");
+    const int accepted = OweAGroup();
+    MakeRoomUnderALock(other);
+    const auto start = std::chrono::steady_clock::now();
+    std::thread release([&] {
+        EXPECT_TRUE(WaitUntil([&] { return std::chrono::steady_clock::now() - start > 200ms; }));
+        other.exec("rollback");
+    });
+    EXPECT_TRUE(Exec(Insert(std::to_string(accepted)))) << Error();
+    EXPECT_GT(std::chrono::steady_clock::now() - start, 200ms);
+    release.join();
+    EXPECT_TRUE(WaitForAllUpTo(accepted + 1)) << All(Store());
 }
 
 TEST_F(OwedGroup, FailsTheOperationsThatWouldCommitIt) {
