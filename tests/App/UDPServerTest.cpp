@@ -174,6 +174,9 @@ TEST_F(UDPServerTest, PrintsAnExceptionOutOfRecvAndGoesOn) {
 }
 
 TEST_F(UDPServerTest, NeedsNoDescriptorAfterAnExceptionOutOfRecv) {
+#if defined(__SANITIZE_ADDRESS__)
+    GTEST_SKIP() << "the sanitizer takes descriptors to look at an exception's type, and finds none without";
+#endif
     ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
     Send("before");
     Await(1);
