@@ -98,7 +98,7 @@ bool UDPServer::WaitForDatagram() {
             m_poll.emplace().add(m_socket, Poco::Net::PollSet::POLL_READ);
         const bool readable = !m_poll->poll(timeout).empty();
         if (!readable)
-            m_poll->add(m_socket, Poco::Net::PollSet::POLL_READ); // throws when it was lost
+            m_poll->add(m_socket, Poco::Net::PollSet::POLL_READ); // throws when the kernel dropped it
         m_pollFailed = false;
         return readable;
     } catch (...) {

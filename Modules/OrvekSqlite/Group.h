@@ -57,7 +57,7 @@ private:
     Clock::time_point m_freeUntil;           ///< others may have the lock until then
     Clock::time_point m_lastTry;             ///< to commit, which failed with m_failure
     std::string m_failure;
-    bool m_metALock = false;
+    bool m_metALock = false; ///< whether m_failure is another program's lock
 };
 
 } // namespace OrvekSqlite

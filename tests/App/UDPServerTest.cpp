@@ -61,6 +61,7 @@ public:
 
     bool IsRunning() const { return m_thread.isRunning(); }
     void Join() { m_thread.join(); }
+
     /// What the socket's descriptor stood for is another file from here on, as after somebody's close too many. By bare
     /// system calls: a sanitizer takes it for the mistake that it is.
     void LoseTheSocket() {
