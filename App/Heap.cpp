@@ -5,9 +5,10 @@
 // a lock that the receiving thread needs for its next report, and at a high rate each waits there for the other. It also
 // keeps what a backlog needed until the process ends. jemalloc does neither.
 
-// Memory that has been free for a second goes back to the system, in passing, when the heap is used next: a backlog may
-// have needed gigabytes, and it is rare.
+// Memory that has been free for a second goes back to the system: a backlog may have needed gigabytes, and it is rare. A
+// thread of the heap's own sees to that, which sleeps while there is nothing to give back. Without it, memory goes back only
+// in passing, when the heap is used much, and a service that nobody sends to would keep a backlog's.
 extern "C" {
 extern __attribute__((visibility("default"))) const char* malloc_conf;
-const char* malloc_conf = "dirty_decay_ms:1000";
+const char* malloc_conf = "dirty_decay_ms:1000,background_thread:true,max_background_threads:1";
 }
