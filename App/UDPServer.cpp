@@ -63,6 +63,10 @@ bool UDPServer::Start(const std::string& ip, int port) {
         const Poco::Net::SocketAddress address(ip, static_cast<std::uint16_t>(port));
         // Both kinds of reuse, so that a service which was just restarted can bind at once.
         m_socket.bind(address, true, true);
+        // And then not of the address any more: with that, a later socket of any user could bind the same address, and the
+        // kernel would hand the datagrams to that one. The port is still reused by sockets of this user alone, so the next
+        // service binds at once.
+        m_socket.setReuseAddress(false);
         try {
             m_socket.setReceiveBufferSize(SOCKET_BUFFER_BYTES);
         } catch (const Poco::Exception&) { // what the kernel grants is enough to run with

@@ -109,6 +109,30 @@ TEST_F(StartUp, RestartsRightAfterAKill) {
     EXPECT_EQ(m_service.RowCount(), 2);
 }
 
+TEST_F(StartUp, RestartsWhileTheOldOneIsBeingKilled) {
+    m_service.Install();
+    pid_t old = m_service.LaunchAnother();
+    const auto runs = [](pid_t process) {
+        return ContentOfPidFile() == std::to_string(process) && Service::Bound();
+    };
+    const auto hasEnded = [](pid_t process) { return ::waitpid(process, nullptr, WNOHANG) == process; };
+    ASSERT_TRUE(WaitUntil([&] { return runs(old); }));
+    for (int i = 0; i < 10; ++i) {
+        ::kill(old, SIGKILL);
+        pid_t next = 0;
+        do { // until the old one's lock is gone, the new one is refused
+            next = m_service.LaunchAnother();
+            ASSERT_TRUE(WaitUntil([&] { return runs(next) || hasEnded(next); }));
+        } while (!runs(next));
+        ::waitpid(old, nullptr, 0);
+        EXPECT_TRUE(WaitUntil([] { return Service::Bound(); })) << "by the new one, the old one being gone";
+        old = next;
+    }
+    EXPECT_EQ(m_service.Output().find("Address already in use"), std::string::npos) << m_service.Output();
+    ::kill(old, SIGKILL);
+    ::waitpid(old, nullptr, 0);
+}
+
 TEST_F(StartUp, WithoutTheLoggerItIsSilentAndWorks) {
     m_service.Install();
     const std::string outputOfInstallation = m_service.Output();
