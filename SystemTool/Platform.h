@@ -18,6 +18,9 @@ std::string OSVersionString();
 /// Absolute path of the running executable; empty when the system does not tell.
 std::string ExecutablePath();
 
+/// A path that opens the running executable's file, on Linux also when another file has taken its place.
+std::string OwnProgramFile();
+
 /// The id that the system's own tools show for the calling thread.
 std::uint64_t CurrentThreadId();
 

@@ -97,6 +97,10 @@ std::string ExecutablePath() {
     }
 }
 
+std::string OwnProgramFile() {
+    return "/proc/self/exe";
+}
+
 std::uint64_t CurrentThreadId() {
     return static_cast<std::uint64_t>(::syscall(SYS_gettid));
 }

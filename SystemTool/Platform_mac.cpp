@@ -42,6 +42,10 @@ std::string ExecutablePath() {
     return ::realpath(path.c_str(), resolved.data()) != nullptr ? resolved.data() : path.c_str();
 }
 
+std::string OwnProgramFile() {
+    return ExecutablePath();
+}
+
 std::uint64_t CurrentThreadId() {
     std::uint64_t id = 0;
     ::pthread_threadid_np(nullptr, &id);

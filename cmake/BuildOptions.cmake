@@ -24,7 +24,16 @@ endif()
 add_library(ssr_options INTERFACE)
 target_include_directories(ssr_options INTERFACE ${PROJECT_SOURCE_DIR})
 target_compile_options(ssr_options INTERFACE -Wall -Wextra -Wpedantic -Wshadow -Wnon-virtual-dtor
-    -Woverloaded-virtual -Wconversion -Werror)
+    -Woverloaded-virtual -Wconversion)
+# Not by default: a compiler newer than ours has warnings that ours has not, and who packages this must be able to build.
+if(SSR_WERROR)
+    target_compile_options(ssr_options INTERFACE -Werror)
+endif()
+
+if(NOT APPLE)
+    # By which debug symbols, crash reports and `reportctl --version` tell builds apart; not every compiler asks for it.
+    target_link_options(ssr_options INTERFACE -Wl,--build-id=sha1)
+endif()
 
 if(SSR_SANITIZE)
     target_compile_options(ssr_options INTERFACE -fsanitize=${SSR_SANITIZE} -fno-sanitize-recover=all

@@ -5,7 +5,7 @@
 # static library never share state by accident and closing one really unloads it.
 function(ssr_add_plugin target name)
     add_library(${target} MODULE ${ARGN})
-    target_link_libraries(${target} PRIVATE ssr_options)
+    target_link_libraries(${target} PRIVATE ssr_options ssr_package_note)
     set_target_properties(${target} PROPERTIES
         OUTPUT_NAME ${name} PREFIX lib SUFFIX .dylib LIBRARY_OUTPUT_DIRECTORY ${SSR_BIN_DIR})
     if(NOT APPLE)
