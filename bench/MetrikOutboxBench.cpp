@@ -8,14 +8,14 @@
 #include <SQLiteCpp/SQLiteCpp.h>
 #include <benchmark/benchmark.h>
 
-#include "Modules/MetrikSdk/OtlpEncoder.h"
-#include "Modules/MetrikSdk/Outbox.h"
-#include "Modules/MetrikSdk/OutboxEngine.h"
+#include "Modules/MetrikSdk/otlp/OtlpEncoder.h"
+#include "Modules/MetrikSdk/outbox/Outbox.h"
+#include "Modules/MetrikSdk/process/OutboxEngine.h"
 #include "tests/Modules/MetrikSdk/support/LoopbackServer.h"
 #include "tests/support/TemporaryDirectory.h"
 #include "tests/support/WaitUntil.h"
 
-using namespace Metrik;
+using namespace MetrikSdk;
 using namespace std::chrono_literals;
 
 namespace {
@@ -27,8 +27,8 @@ const std::string PAYLOAD =
     R"({"extend":{"hublinkVersion":"5.1.0.2","createTime":"1700000000123"},"eventData":{"button":"ok",)"
     R"("count":3,"ratio":1.5,"openid":"visitor","sys_version":"Debian GNU/Linux 12 (bookworm) 6.1.0"}})";
 
-std::shared_ptr<FailureReporter> Reporter() {
-    return std::make_shared<FailureReporter>(1min);
+std::shared_ptr<report::FailureReporter> Reporter() {
+    return std::make_shared<report::FailureReporter>(1min);
 }
 
 constexpr const char* BARE_SCHEMA = "CREATE TABLE event(id INTEGER PRIMARY KEY, event_id TEXT, payload TEXT)";
@@ -79,12 +79,13 @@ void Fill(const std::string& directory, std::int64_t count) {
 }
 
 /// A new outbox with one event and `more` filled in.
-std::unique_ptr<Outbox> MakeOutbox(const std::string& directory, std::int64_t more, Notifier& notifier) {
+std::unique_ptr<outbox::Outbox> MakeOutbox(const std::string& directory, std::int64_t more,
+                                           report::Notifier& notifier) {
     OutboxSettings settings;
     settings.caps.maxWaitingBytes = std::size_t{4} << 30; // the benchmark may fill it well beyond the usual
-    Outbox(directory, settings, notifier).Append(MODULE, "A759|10001", PAYLOAD);
+    outbox::Outbox(directory, settings, notifier).Append(MODULE, "A759|10001", PAYLOAD);
     Fill(directory, more);
-    return std::make_unique<Outbox>(directory, settings, notifier);
+    return std::make_unique<outbox::Outbox>(directory, settings, notifier);
 }
 
 /// With so many events waiting. What has to be written for the longest outbox is written before every run,
@@ -93,7 +94,7 @@ void StoreAnEvent(benchmark::State& state) {
     constexpr std::int64_t MOST = 1'000'000;
     const TemporaryDirectory directory;
     const TemporaryDirectory unused;
-    Notifier notifier(1min);
+    report::Notifier notifier(1min);
     MakeOutbox(unused.Path(), MOST - state.range(0), notifier);
     const auto outbox = MakeOutbox(directory.Path(), state.range(0), notifier);
     outbox->Open();
@@ -110,24 +111,24 @@ void EncodeABatch(benchmark::State& state) {
     for (int i = 0; i < 512; ++i)
         batch.events.push_back({i, batch.outboxId, 1, i, "A759|10001", PAYLOAD, WallNow(), 300});
     for (auto _ : state)
-        benchmark::DoNotOptimize(EncodeOtlp(batch));
+        benchmark::DoNotOptimize(otlp::EncodeOtlp(batch));
     state.SetItemsProcessed(state.iterations() * 512);
 }
 
 /// Until the last of so many waiting events is delivered and deleted.
 void UploadEverything(benchmark::State& state) {
     LoopbackServer collector([](const Request&) { return Reply(); });
-    EndpointConfig endpoint;
+    otlp::EndpointConfig endpoint;
     endpoint.url = collector.Url() + "/v1/logs";
     endpoint.gzip = state.range(1) != 0;
     for (auto _ : state) {
         state.PauseTiming();
         const TemporaryDirectory directory;
-        Notifier notifier(1min);
-        Outbox(directory.Path(), OutboxSettings(), notifier).Append(MODULE, "A759|10001", PAYLOAD);
+        report::Notifier notifier(1min);
+        outbox::Outbox(directory.Path(), OutboxSettings(), notifier).Append(MODULE, "A759|10001", PAYLOAD);
         Fill(directory.Path(), state.range(0));
         state.ResumeTiming();
-        OutboxEngine engine(directory.Path(), OutboxSettings(), endpoint, {}, Reporter());
+        process::OutboxEngine engine(directory.Path(), OutboxSettings(), endpoint, {}, Reporter());
         engine.Open();
         if (!WaitUntil([&] { return engine.Events().Status().waiting == 0; }, 600s))
             state.SkipWithError("not delivered");
@@ -138,10 +139,10 @@ void UploadEverything(benchmark::State& state) {
 /// Storing while the uploader takes its share of the machine and of the outbox's lock.
 void StoreWhileUploading(benchmark::State& state) {
     LoopbackServer collector([](const Request&) { return Reply(); });
-    EndpointConfig endpoint;
+    otlp::EndpointConfig endpoint;
     endpoint.url = collector.Url() + "/v1/logs";
     const TemporaryDirectory directory;
-    OutboxEngine engine(directory.Path(), OutboxSettings(), endpoint, {}, Reporter());
+    process::OutboxEngine engine(directory.Path(), OutboxSettings(), endpoint, {}, Reporter());
     for (auto _ : state)
         if (!engine.Events().Append(MODULE, "A759|10001", PAYLOAD))
             state.SkipWithError("not stored");

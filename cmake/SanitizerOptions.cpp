@@ -26,5 +26,5 @@ OPTIONS const char* __tsan_default_suppressions() {
     // The store looks for SQLite's descriptor of the database by asking of each number which file it is. Other threads
     // open and close theirs meanwhile, which changes the answer and nothing else: the function only asks.
     return "race:UDPServer::StopSelf\n"
-           "race:OrvekSqlite::OtherUsers::IsOurFile\n";
+           "race:OrvekSqlite::file::OtherUsers::IsOurFile\n";
 }

@@ -8,7 +8,7 @@
 
 #include "Modules/MetrikSdk/Time.h"
 
-namespace Metrik {
+namespace MetrikSdk {
 
 /// Who reports. The texts come from outside; they are only ever bound values and JSON strings.
 struct ModuleIdentity {
@@ -47,4 +47,4 @@ struct Batch {
     std::map<std::int64_t, ModuleIdentity> releases;
 };
 
-} // namespace Metrik
+} // namespace MetrikSdk

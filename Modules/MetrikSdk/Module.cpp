@@ -2,7 +2,7 @@
 
 #include <sqlite3.h>
 
-#include "Modules/MetrikSdk/MetrikSdk.h"
+#include "Modules/MetrikSdk/Sdk.h"
 
 // The plug-in's two doors. The second one's misspelling is the suite's.
 
@@ -11,12 +11,12 @@ extern "C" __attribute__((visibility("default"))) IMetrikSdk* CreateModule() {
     // each allocation, and nobody reads them. The local store sets the same, but this plug-in is opened first.
     sqlite3_config(SQLITE_CONFIG_MEMSTATUS, 0);
     try {
-        return new Metrik::MetrikSdk(Metrik::OutboxRegistry::Instance());
+        return new MetrikSdk::Sdk(MetrikSdk::process::OutboxRegistry::Instance());
     } catch (const std::exception&) { // the caller knows what a null object means
         return nullptr;
     }
 }
 
 extern "C" __attribute__((visibility("default"))) void DestoryModule(IMetrikSdk* module) {
-    delete static_cast<Metrik::MetrikSdk*>(module);
+    delete static_cast<MetrikSdk::Sdk*>(module);
 }

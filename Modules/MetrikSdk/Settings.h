@@ -4,7 +4,7 @@
 #include <cstddef>
 
 // What production runs with, and why. Tests hand in their own.
-namespace Metrik {
+namespace MetrikSdk {
 
 /// How much the outbox keeps while nobody takes it.
 struct CapSettings {
@@ -79,4 +79,4 @@ struct OutboxSettings {
     std::chrono::milliseconds stopPatience = std::chrono::milliseconds(900);
 };
 
-} // namespace Metrik
+} // namespace MetrikSdk

@@ -3,7 +3,7 @@
 #include <algorithm>
 #include <chrono>
 
-namespace Metrik {
+namespace MetrikSdk {
 
 /// A point of wall-clock time as the outbox stores it. Decisions take it as an argument named `now`.
 using WallTime = std::chrono::sys_time<std::chrono::milliseconds>;
@@ -23,4 +23,4 @@ inline WallTime WallNow() {
     return std::chrono::time_point_cast<std::chrono::milliseconds>(std::chrono::system_clock::now());
 }
 
-} // namespace Metrik
+} // namespace MetrikSdk

@@ -5,7 +5,7 @@
 
 #include <boost/nowide/utf/convert.hpp>
 
-namespace Metrik {
+namespace MetrikSdk {
 
 /// The text with every byte sequence that is no UTF-8 replaced by U+FFFD. One bad name must not make the
 /// whole request unreadable.
@@ -23,4 +23,4 @@ inline std::string CutUtf8(std::string_view text, std::size_t maxBytes) {
     return std::string(text.substr(0, end));
 }
 
-} // namespace Metrik
+} // namespace MetrikSdk

@@ -8,7 +8,7 @@
 namespace OrvekSqlite {
 namespace {
 
-std::vector<std::string> CellsOf(const Statement& statement) {
+std::vector<std::string> CellsOf(const guard::Statement& statement) {
     std::vector<std::string> cells;
     const int columns = statement.ColumnCount();
     cells.reserve(static_cast<std::size_t>(columns));
@@ -17,7 +17,7 @@ std::vector<std::string> CellsOf(const Statement& statement) {
     return cells;
 }
 
-int NumberIn(Statement& statement) {
+int NumberIn(guard::Statement& statement) {
     if (!statement.NextRow() || sqlite3_column_type(statement.Handle(), 0) != SQLITE_INTEGER)
         throw SQLite::Exception("the counting statement returned no number", SQLITE_MISMATCH);
     const auto number = sqlite3_column_int64(statement.Handle(), 0);
@@ -50,7 +50,7 @@ bool Database::Open(const std::string& path) {
     Report([&] { m_group.Commit(); });
     return Report([&] {
         m_file.Set(path);
-        m_file.Run([](Connection&) {});
+        m_file.Run([](file::Connection&) {});
     });
 }
 
@@ -59,8 +59,9 @@ bool Database::CreateTable(const std::string& sql) {
     // Kept statements go first, but may wait for this very table.
     Report([&] { m_group.Commit(); });
     return Report([&] {
-        m_file.Run(
-            [&](Connection& connection) { connection.Prepare(sql, Permission::CreateTable).Execute(); });
+        m_file.Run([&](file::Connection& connection) {
+            connection.Prepare(sql, guard::Permission::CreateTable).Execute();
+        });
     });
 }
 
@@ -73,7 +74,7 @@ bool Database::ExecSql(const std::string& sql) {
 }
 
 bool Database::BatExecSql(const std::vector<std::string>& sqls) {
-    return RunAfterCommit([&](Connection& connection) {
+    return RunAfterCommit([&](file::Connection& connection) {
         connection.Begin();
         try {
             for (const auto& sql : sqls)
@@ -88,9 +89,9 @@ bool Database::BatExecSql(const std::vector<std::string>& sqls) {
 
 bool Database::QuerySql(const std::string& sql, std::vector<std::vector<std::string>>& rows) {
     const auto before = rows.size();
-    const bool done = RunAfterCommit([&](Connection& connection) {
+    const bool done = RunAfterCommit([&](file::Connection& connection) {
         rows.resize(before);
-        auto statement = connection.Prepare(sql, Permission::Read);
+        auto statement = connection.Prepare(sql, guard::Permission::Read);
         while (statement.NextRow())
             rows.push_back(CellsOf(statement));
     });
@@ -100,8 +101,8 @@ bool Database::QuerySql(const std::string& sql, std::vector<std::vector<std::str
 }
 
 bool Database::GetTotalCount(const std::string& sql, int& count) {
-    return RunAfterCommit([&](Connection& connection) {
-        auto statement = connection.Prepare(sql, Permission::Read);
+    return RunAfterCommit([&](file::Connection& connection) {
+        auto statement = connection.Prepare(sql, guard::Permission::Read);
         count = NumberIn(statement);
     });
 }
@@ -116,7 +117,7 @@ bool Database::Finish() {
         return false; // the thread that crashed in here is not coming back
     const bool isOwnersThread =
         m_lastInside == std::thread::id() || m_lastInside == std::this_thread::get_id();
-    if (!LockBefore(Clock::now() + m_settings.group.farewell))
+    if (!LockBefore(group::Clock::now() + m_settings.group.exitWait))
         return false;
     m_file.WaitForLocks(std::chrono::milliseconds(0));
     Report([&] { m_group.Commit(); });
@@ -126,7 +127,7 @@ bool Database::Finish() {
     m_committer.Stop();
     return isOwnersThread;
 }
-bool Database::RunAfterCommit(const OpenFile::Operation& operation) {
+bool Database::RunAfterCommit(const file::LiveFile::Operation& operation) {
     const Entry entry(*this);
     return Report([&] {
         m_group.Commit();
@@ -152,9 +153,9 @@ bool Database::Report(Action action) {
 
 /// By looking again and again: a mutex that can be waited for with a deadline is a slower one, and this is
 /// once in an object's life.
-bool Database::LockBefore(Clock::time_point deadline) {
+bool Database::LockBefore(group::Clock::time_point deadline) {
     while (!m_mutex.try_lock()) {
-        if (Clock::now() > deadline)
+        if (group::Clock::now() > deadline)
             return false;
         std::this_thread::sleep_for(std::chrono::milliseconds(1));
     }

@@ -6,10 +6,10 @@
 #include <thread>
 #include <vector>
 
-#include "Modules/OrvekSqlite/Committer.h"
-#include "Modules/OrvekSqlite/Group.h"
-#include "Modules/OrvekSqlite/OpenFile.h"
 #include "Modules/OrvekSqlite/Settings.h"
+#include "Modules/OrvekSqlite/file/LiveFile.h"
+#include "Modules/OrvekSqlite/group/Committer.h"
+#include "Modules/OrvekSqlite/group/Group.h"
 #include "Plugin/ISqliteDatabase.h"
 
 namespace OrvekSqlite {
@@ -89,20 +89,20 @@ public:
 private:
     class Entry;
 
-    bool RunAfterCommit(const OpenFile::Operation& operation);
+    bool RunAfterCommit(const file::LiveFile::Operation& operation);
     template <typename Action>
     bool Report(Action action);
-    bool LockBefore(Clock::time_point deadline);
+    bool LockBefore(group::Clock::time_point deadline);
 
     const Settings m_settings;
     std::mutex m_mutex; ///< guards all below but the two thread ids; held throughout an operation
-    OpenFile m_file{m_settings};
-    Group m_group{m_file, m_settings.group};
+    file::LiveFile m_file{m_settings};
+    group::Group m_group{m_file, m_settings.group};
     std::string m_lastError;
     bool m_isFinished = false;
     std::atomic<std::thread::id> m_inside;     ///< the thread in an operation, if one is
     std::atomic<std::thread::id> m_lastInside; ///< the thread of the operation before
-    Committer m_committer{m_mutex, m_group, m_file};
+    group::Committer m_committer{m_mutex, m_group, m_file};
 };
 
 } // namespace OrvekSqlite

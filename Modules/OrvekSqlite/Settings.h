@@ -43,7 +43,7 @@ struct Limits {
 struct GroupSettings {
     /// A statement that comes after this long without one is alone, and committed when it returns. So a
     /// person's click is as safe as ever, and more than a hundred statements a second are a burst.
-    std::chrono::milliseconds quiet{10};
+    std::chrono::milliseconds burstGap{10};
 
     /// How long a group stays open. What a kill may cost is 10 milliseconds; two of them are left for the
     /// committer to wake up and for the commit itself.
@@ -67,7 +67,7 @@ struct GroupSettings {
 
     /// How long the object's end waits for an operation on another thread. A process that exits after a crash
     /// must be gone within a second, and the operation may be one that never ends.
-    std::chrono::milliseconds farewell{200};
+    std::chrono::milliseconds exitWait{200};
 };
 
 /// How the database is opened.

@@ -2,8 +2,7 @@
 
 #include <sys/stat.h>
 
-#include "Tools/reportctl/Send.h"
-#include "Tools/reportctl/Setup.h"
+#include "Tools/reportctl/commands/Commands.h"
 
 int main(int argc, char** argv) {
     // Whatever the caller's mask says: a file or directory is its owner's alone from the moment it exists,
@@ -17,8 +16,8 @@ int main(int argc, char** argv) {
         "to do about it; 100 and above: the command line was not understood.");
 
     int exitCode = 0;
-    reportctl::AddSetup(app, exitCode);
-    reportctl::AddSend(app, exitCode);
+    for (auto* const add : reportctl::commands::ALL)
+        add(app, exitCode);
 
     CLI11_PARSE(app, argc, argv);
     return exitCode;

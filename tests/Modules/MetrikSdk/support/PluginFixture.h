@@ -10,7 +10,7 @@
 
 #include <gtest/gtest.h>
 
-#include "Modules/MetrikSdk/OutboxStore.h"
+#include "Modules/MetrikSdk/outbox/OutboxStore.h"
 #include "Plugin/IMetrikSdk.h"
 #include "Plugin/ModuleLoader.h"
 #include "SystemTool/IO/Directory.h"
@@ -71,8 +71,8 @@ protected:
 
     std::string File() const { return m_directory.Path() + "/MetrikOutbox.db"; }
 
-    Metrik::OutboxStatus Totals() const {
-        return Metrik::OutboxStore(File(), std::chrono::seconds(5)).Status();
+    MetrikSdk::outbox::OutboxStatus Totals() const {
+        return MetrikSdk::outbox::OutboxStore(File(), std::chrono::seconds(5)).Status();
     }
 
     /// In one statement, because an uploader that hangs may still be at work.

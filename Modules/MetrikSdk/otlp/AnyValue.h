@@ -1,0 +1,17 @@
+#pragma once
+
+#include <rapidjson/document.h>
+#include <rapidjson/stringbuffer.h>
+#include <rapidjson/writer.h>
+
+namespace MetrikSdk::otlp {
+
+using JsonWriter = rapidjson::Writer<rapidjson::StringBuffer>;
+
+/// Writes a JSON value as the protocol's AnyValue: an object as a list of keys and values, an integer as a
+/// decimal text, null as the empty value. An integer beyond 64 bits with a sign becomes a double. Of members
+/// with the same key the first counts, as for the service's own reader; the protocol allows only one.
+/// Calls itself for each level: the value's depth must be bounded (Payload::MAX_DEPTH).
+void WriteAnyValue(JsonWriter& writer, const rapidjson::Value& value);
+
+} // namespace MetrikSdk::otlp

@@ -1,0 +1,223 @@
+#include "Modules/MetrikSdk/otlp/EndpointConfig.h"
+
+#include <algorithm>
+#include <charconv>
+#include <cstdint>
+#include <memory>
+
+#include <curl/curl.h>
+
+namespace MetrikSdk::otlp {
+namespace {
+
+constexpr const char* SIGNAL_PREFIX = "OTEL_EXPORTER_OTLP_LOGS_";
+constexpr const char* COMMON_PREFIX = "OTEL_EXPORTER_OTLP_";
+constexpr const char* LOGS_PATH = "v1/logs";
+
+using Url = std::unique_ptr<CURLU, decltype(&::curl_url_cleanup)>;
+
+std::string Part(const Url& url, CURLUPart part) {
+    char* text = nullptr;
+    if (::curl_url_get(url.get(), part, &text, 0) != CURLUE_OK)
+        return {};
+    const std::unique_ptr<char, decltype(&::curl_free)> owner(text, &::curl_free);
+    return text;
+}
+
+/// Null when `text` is no http or https URL.
+Url ParseUrl(const std::string& text) {
+    Url url(::curl_url(), &::curl_url_cleanup);
+    const bool parsed = ::curl_url_set(url.get(), CURLUPART_URL, text.c_str(), 0) == CURLUE_OK;
+    const auto scheme = parsed ? Part(url, CURLUPART_SCHEME) : std::string();
+    if (scheme != "http" && scheme != "https")
+        url.reset();
+    return url;
+}
+
+std::string Trimmed(const std::string& text) {
+    const auto first = text.find_first_not_of(" \t");
+    if (first == std::string::npos)
+        return {};
+    return text.substr(first, text.find_last_not_of(" \t") - first + 1);
+}
+
+std::string LowerCase(std::string text) {
+    std::transform(text.begin(), text.end(), text.begin(),
+                   [](unsigned char c) { return static_cast<char>(c >= 'A' && c <= 'Z' ? c + 32 : c); });
+    return text;
+}
+
+std::string PercentDecoded(const std::string& text) {
+    int length = 0;
+    const std::unique_ptr<char, decltype(&::curl_free)> decoded(
+        ::curl_easy_unescape(nullptr, text.c_str(), static_cast<int>(text.size()), &length), &::curl_free);
+    return decoded ? std::string(decoded.get(), static_cast<std::size_t>(length)) : std::string();
+}
+
+bool IsToken(const std::string& name) {
+    return !name.empty() && name.find_first_not_of("!#$%&'*+-.^_`|~0123456789abcdefghijklmnopqrstuvwxyz"
+                                                   "ABCDEFGHIJKLMNOPQRSTUVWXYZ") == std::string::npos;
+}
+
+/// A line feed in a value would smuggle in a header of its own.
+bool IsHeaderValue(const std::string& value) {
+    return std::none_of(value.begin(), value.end(), [](unsigned char c) { return c < 0x20 && c != '\t'; });
+}
+
+/// What describes the body is ours to say.
+bool IsReserved(const std::string& name) {
+    const auto lower = LowerCase(name);
+    return lower == "content-type" || lower == "content-encoding" || lower == "content-length" ||
+           lower == "transfer-encoding";
+}
+
+class Reader {
+public:
+    Reader(const LookUp& lookUp, std::vector<std::string>& complaints)
+        : m_lookUp(lookUp), m_complaints(complaints) {}
+
+    bool IsDisabled() const { return LowerCase(Value("OTEL_SDK_DISABLED")) == "true"; }
+
+    std::optional<EndpointConfig> Read() {
+        EndpointConfig config;
+        config.url = ReadUrl();
+        if (config.url.empty())
+            return std::nullopt;
+        ReadHeaders(config);
+        ReadTimeout(config);
+        ReadCompression(config);
+        config.certificate = Pair("CERTIFICATE").value;
+        config.clientKey = Pair("CLIENT_KEY").value;
+        config.clientCertificate = Pair("CLIENT_CERTIFICATE").value;
+        return config;
+    }
+
+private:
+    struct Variable {
+        std::string name;
+        std::string value;
+    };
+
+    std::string Value(const std::string& name) const {
+        const char* value = m_lookUp(name.c_str());
+        return value == nullptr ? std::string() : Trimmed(value);
+    }
+
+    /// Of each pair of variables the signal's own wins.
+    Variable Pair(const std::string& name) const {
+        Variable variable{SIGNAL_PREFIX + name, Value(SIGNAL_PREFIX + name)};
+        if (variable.value.empty())
+            variable = {COMMON_PREFIX + name, Value(COMMON_PREFIX + name)};
+        return variable;
+    }
+
+    /// Offers the signal's own variable and then the common one, where they are set, until `accept` says yes.
+    template <typename Accept>
+    void OfferPair(const std::string& name, Accept accept) {
+        for (const char* prefix : {SIGNAL_PREFIX, COMMON_PREFIX}) {
+            const Variable variable{prefix + name, Value(prefix + name)};
+            if (!variable.value.empty() && accept(variable))
+                return;
+        }
+    }
+
+    std::string ReadUrl() {
+        std::string result;
+        OfferPair("ENDPOINT", [&](const Variable& endpoint) {
+            result = UrlOf(endpoint);
+            if (result.empty())
+                m_complaints.push_back(endpoint.name + " is no http or https URL and counts as unset");
+            return !result.empty();
+        });
+        return result;
+    }
+
+    /// Empty when it makes no sense.
+    static std::string UrlOf(const Variable& endpoint) {
+        const auto url = ParseUrl(endpoint.value);
+        if (!url)
+            return {};
+        if (endpoint.name.starts_with(SIGNAL_PREFIX))
+            return endpoint.value;
+        auto path = Part(url, CURLUPART_PATH);
+        path += (path.ends_with('/') ? "" : "/");
+        ::curl_url_set(url.get(), CURLUPART_PATH, (path + LOGS_PATH).c_str(), 0);
+        return Part(url, CURLUPART_URL);
+    }
+
+    void ReadHeaders(EndpointConfig& config) {
+        const auto headers = Pair("HEADERS");
+        for (std::size_t start = 0; start < headers.value.size();) {
+            const auto end = std::min(headers.value.find(',', start), headers.value.size());
+            ReadHeader(headers.name, Trimmed(headers.value.substr(start, end - start)), config);
+            start = end + 1;
+        }
+    }
+
+    void ReadHeader(const std::string& variable, const std::string& text, EndpointConfig& config) {
+        if (text.empty())
+            return;
+        const auto equals = text.find('=');
+        const auto name = Trimmed(text.substr(0, equals));
+        const auto value =
+            equals == std::string::npos ? std::string() : PercentDecoded(Trimmed(text.substr(equals + 1)));
+        if (equals == std::string::npos || !IsToken(name) || !IsHeaderValue(value) || IsReserved(name))
+            m_complaints.push_back(variable + ": one header is ill-formed or not allowed, and is not sent");
+        else
+            config.headers.emplace_back(name, value);
+    }
+
+    void ReadTimeout(EndpointConfig& config) {
+        OfferPair("TIMEOUT", [&](const Variable& timeout) {
+            const bool valid = ParseTimeout(timeout.value, config.timeout);
+            if (!valid)
+                m_complaints.push_back(timeout.name +
+                                       " is no positive number of milliseconds and counts as unset");
+            return valid;
+        });
+    }
+
+    static bool ParseTimeout(const std::string& text, std::chrono::milliseconds& timeout) {
+        constexpr std::int64_t MAX_MS = 600'000; // a request that takes longer than ten minutes never ends
+        std::int64_t milliseconds = 0;
+        const auto end = text.data() + text.size();
+        const auto parsed = std::from_chars(text.data(), end, milliseconds);
+        if (parsed.ec != std::errc() || parsed.ptr != end || milliseconds <= 0)
+            return false;
+        timeout = std::chrono::milliseconds(std::min(milliseconds, MAX_MS));
+        return true;
+    }
+
+    void ReadCompression(EndpointConfig& config) {
+        OfferPair("COMPRESSION", [&](const Variable& compression) {
+            config.gzip = compression.value == "gzip";
+            const bool valid = config.gzip || compression.value == "none";
+            if (!valid)
+                m_complaints.push_back(compression.name + " is neither gzip nor none and counts as unset");
+            return valid;
+        });
+    }
+
+    const LookUp& m_lookUp;
+    std::vector<std::string>& m_complaints;
+};
+
+} // namespace
+
+std::optional<EndpointConfig> ReadEndpoint(const LookUp& lookUp, std::vector<std::string>& complaints) {
+    Reader reader(lookUp, complaints);
+    if (reader.IsDisabled())
+        return std::nullopt;
+    return reader.Read();
+}
+
+std::string WithoutSecrets(const std::string& url) {
+    const auto parsed = ParseUrl(url);
+    if (!parsed)
+        return "(no URL)";
+    for (const auto part : {CURLUPART_USER, CURLUPART_PASSWORD, CURLUPART_QUERY, CURLUPART_FRAGMENT})
+        ::curl_url_set(parsed.get(), part, nullptr, 0);
+    return Part(parsed, CURLUPART_URL);
+}
+
+} // namespace MetrikSdk::otlp

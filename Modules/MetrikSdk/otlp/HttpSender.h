@@ -1,0 +1,57 @@
+#pragma once
+
+#include <atomic>
+#include <memory>
+#include <string>
+
+#include <curl/curl.h>
+
+#include "Modules/MetrikSdk/otlp/EndpointConfig.h"
+#include "Modules/MetrikSdk/otlp/Sender.h"
+
+namespace MetrikSdk::otlp {
+
+/// Posts over HTTP. The connection is kept between requests. TLS is verified; redirects are not followed;
+/// only http and https are spoken; the proxies of the standard variables are used. Of an answer's body no
+/// more than 64 KiB is read.
+///
+/// Threads: Abandon by any; all else by one at a time.
+class HttpSender : public Sender {
+public:
+    explicit HttpSender(EndpointConfig config);
+
+    HttpResult Post(const std::string& body) override;
+    void Abandon() override { m_abandoned = true; }
+    std::string Destination() const override { return WithoutSecrets(m_config.url); }
+
+    /// Ends every request of the process, waits until none is under way, at most `patience`, and lets no new
+    /// one begin. For exit(): the TLS library is about to clean itself up, and must not be in use then.
+    /// (Called by a thread that crashed within a request, it waits in vain.)
+    static void AbandonAll(std::chrono::milliseconds patience);
+
+private:
+    struct Answer {
+        HttpResult result;
+        bool cut = false; ///< The body was longer than what is read of it.
+    };
+
+    void Configure();
+    void ConfigureTls();
+    void ConfigureHeaders();
+    void AddHeader(const std::string& line);
+    CURLcode Perform();
+    bool MustEnd() const;
+    HttpResult Finish(CURLcode code, Answer& answer);
+
+    static std::size_t OnBody(char* bytes, std::size_t size, std::size_t count, void* data);
+    static std::size_t OnHeader(char* bytes, std::size_t size, std::size_t count, void* data);
+
+    const EndpointConfig m_config;
+    std::atomic<bool> m_abandoned = false;
+    std::unique_ptr<curl_slist, decltype(&::curl_slist_free_all)> m_headers;
+    std::unique_ptr<CURLM, decltype(&::curl_multi_cleanup)> m_multi; ///< Holds the connection.
+    std::unique_ptr<CURL, decltype(&::curl_easy_cleanup)> m_easy;
+    char m_error[CURL_ERROR_SIZE] = "";
+};
+
+} // namespace MetrikSdk::otlp

@@ -1,0 +1,35 @@
+#pragma once
+
+#include <memory>
+#include <optional>
+#include <string>
+
+#include <rapidjson/document.h>
+
+#include "Modules/MetrikSdk/Time.h"
+
+namespace MetrikSdk::otlp {
+
+/// An event's payload, read once for everything that an upload needs of it.
+class Payload {
+public:
+    /// Objects and arrays within each other. A level of JSON is three levels of the protocol's messages, and
+    /// readers of those give up at a hundred.
+    static constexpr int MAX_DEPTH = 24;
+
+    explicit Payload(const std::string& text);
+
+    /// The payload as a JSON object; null when it is none, or one that is not sent as one: deeper than
+    /// MAX_DEPTH, or not UTF-8.
+    const rapidjson::Value* Object() const { return m_isObject ? &m_document : nullptr; }
+
+    /// When the event happened, by the module's word: extend.createTime, decimal milliseconds as a text.
+    /// Nothing when there is none or it makes no sense.
+    std::optional<WallTime> CreateTime() const;
+
+private:
+    rapidjson::Document m_document;
+    bool m_isObject = false;
+};
+
+} // namespace MetrikSdk::otlp

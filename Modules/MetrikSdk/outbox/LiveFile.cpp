@@ -1,0 +1,89 @@
+#include "Modules/MetrikSdk/outbox/LiveFile.h"
+
+#include <utility>
+
+namespace MetrikSdk::outbox {
+namespace {
+
+constexpr const char* FILE_NAME = "/MetrikOutbox.db";
+
+} // namespace
+
+LiveFile::LiveFile(std::string directory, const FileSettings& settings)
+    : m_directory(std::move(directory)), m_path(m_directory + FILE_NAME), m_settings(settings) {}
+
+OutboxStore& LiveFile::Ready(SteadyTime now, std::chrono::milliseconds patience,
+                             std::vector<report::News>& news) {
+    // Looked at for every event: one that went into a deleted file would be lost after we said yes to it.
+    if (m_store && OutboxFiles::IdentityOf(m_path) != m_identity) {
+        m_store.reset(); // SQLite leaves the files at the path alone once the path names another
+        news.push_back({report::Cause::Vanished,
+                        m_path + " was deleted or replaced, with all events that waited in it"});
+    }
+    if (m_store) {
+        m_store->SetLockPatience(patience);
+        return *m_store;
+    }
+    if (m_failedAt && now - *m_failedAt < m_settings.reopenInterval)
+        throw StoreError(StoreFault::TryLater, m_lastError);
+    try {
+        OpenOrBegin(patience, news);
+    } catch (const StoreError& error) {
+        if (error.fault != StoreFault::TryLater)
+            CloseUntilLater(error.what(), now);
+        throw;
+    }
+    m_failedAt.reset();
+    return *m_store;
+}
+
+void LiveFile::OpenOrBegin(std::chrono::milliseconds patience, std::vector<report::News>& news) {
+    try {
+        Open(patience);
+    } catch (const StoreError& error) {
+        if (error.fault != StoreFault::SetAside)
+            throw;
+        SetAside(error.what(), news);
+        Open(patience);
+    }
+}
+
+void LiveFile::Open(std::chrono::milliseconds patience) {
+    OutboxFiles::MakeDirectory(m_directory);
+    m_identity = OutboxFiles::Prepare(m_path);
+    m_store = std::make_unique<OutboxStore>(m_path, patience);
+    ++m_generation;
+}
+
+bool LiveFile::Failed(const StoreError& error, bool firstAttempt, SteadyTime now,
+                      std::vector<report::News>& news) {
+    if (error.fault == StoreFault::TryLater || !m_store)
+        return false;
+    if (error.fault == StoreFault::SetAside)
+        m_store->KeepLogOnClose(true);
+    m_store.reset();
+    try {
+        if (error.fault == StoreFault::SetAside)
+            SetAside(error.what(), news);
+    } catch (const StoreError& worse) {
+        CloseUntilLater(worse.what(), now);
+        return false;
+    }
+    if (!firstAttempt)
+        CloseUntilLater(error.what(), now);
+    return firstAttempt;
+}
+
+void LiveFile::CloseUntilLater(const std::string& reason, SteadyTime now) {
+    m_store.reset();
+    m_failedAt = now;
+    m_lastError = reason;
+}
+
+void LiveFile::SetAside(const std::string& reason, std::vector<report::News>& news) {
+    const auto name = OutboxFiles::SetAside(m_path, m_identity, WallNow());
+    if (!name.empty())
+        news.push_back({report::Cause::Damage, reason + "; the file was set aside as " + name});
+}
+
+} // namespace MetrikSdk::outbox

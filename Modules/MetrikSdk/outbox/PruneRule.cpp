@@ -1,0 +1,38 @@
+#include "Modules/MetrikSdk/outbox/PruneRule.h"
+
+#include <algorithm>
+
+namespace MetrikSdk::outbox::PruneRule {
+
+std::int64_t ExcessBytes(std::int64_t waitingBytes, const CapSettings& caps) {
+    const auto cap = static_cast<std::int64_t>(caps.maxWaitingBytes);
+    return waitingBytes <= cap ? 0 : waitingBytes - cap + cap / 100;
+}
+
+WallTime OldestAllowed(WallTime now, WallTime openedAt, std::chrono::milliseconds elapsed,
+                       const CapSettings& caps) {
+    return std::min(now, openedAt + elapsed) - caps.maxAge;
+}
+
+ClockWatch BeginWatch(WallTime wall, SteadyTime steady) {
+    return {wall, steady, steady};
+}
+
+ClockWatch LookAgain(const ClockWatch& watch, WallTime wall, SteadyTime steady) {
+    constexpr std::chrono::milliseconds TOLERANCE = std::chrono::minutes(1);
+    constexpr int MAX_SLEW = 1000; // a time daemon corrects by half of a thousandth at most
+    const auto elapsed = std::chrono::floor<std::chrono::milliseconds>(steady - watch.lastSteady);
+    const auto apart = std::chrono::abs((wall - watch.lastWall) - elapsed);
+    const bool agree = apart <= TOLERANCE + elapsed / MAX_SLEW;
+    return {wall, steady, agree ? watch.agreeingSince : steady};
+}
+
+bool MayDropByAge(const ClockWatch& watch, const CapSettings& caps) {
+    return watch.lastSteady - watch.agreeingSince >= caps.clockAgreement;
+}
+
+bool BeginsRun(std::optional<SteadyTime> lastDrop, SteadyTime now, const CapSettings& caps) {
+    return !lastDrop || now - *lastDrop > caps.dropRunEnds;
+}
+
+} // namespace MetrikSdk::outbox::PruneRule

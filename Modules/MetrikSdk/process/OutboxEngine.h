@@ -1,0 +1,37 @@
+#pragma once
+
+#include <memory>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "Modules/MetrikSdk/otlp/EndpointConfig.h"
+#include "Modules/MetrikSdk/process/OutboxCore.h"
+#include "Modules/MetrikSdk/upload/Uploader.h"
+
+namespace MetrikSdk::process {
+
+/// Everything of one database directory in this process: the outbox, whom to tell, and the uploader when
+/// there is an endpoint. Destruction stops the uploader: within a second, see there. Threads: any.
+class OutboxEngine {
+public:
+    OutboxEngine(const std::string& directory, const OutboxSettings& settings,
+                 const std::optional<otlp::EndpointConfig>& endpoint, std::vector<std::string> complaints,
+                 std::shared_ptr<report::FailureReporter> reporter);
+
+    /// Opens the outbox file, and tells what was wrong with the configuration, which nobody could be told
+    /// earlier.
+    bool Open();
+
+    outbox::Outbox& Events() { return m_core->outbox; }
+    report::Notifier& Listeners() { return m_core->notifier; }
+
+private:
+    void StartUploader(const otlp::EndpointConfig& endpoint);
+
+    std::shared_ptr<OutboxCore> m_core;
+    std::vector<std::string> m_complaints; ///< Constant after construction; the notifier knows what was told.
+    std::unique_ptr<upload::Uploader> m_uploader; ///< Null: events stay in the outbox.
+};
+
+} // namespace MetrikSdk::process

@@ -1,0 +1,56 @@
+#pragma once
+
+#include <cstddef>
+#include <map>
+#include <memory>
+#include <mutex>
+#include <string>
+
+#include "Modules/MetrikSdk/otlp/EndpointConfig.h"
+#include "Modules/MetrikSdk/process/OutboxEngine.h"
+#include "Modules/MetrikSdk/report/FailureReporter.h"
+
+namespace MetrikSdk::process {
+
+/// The outboxes of this process: one for each database directory, however many modules announce themselves.
+///
+/// Directories come from outside, in datagrams. Empty and relative ones mean the one that the process gave
+/// first. So does every new one once MAX_OUTBOXES are in use: an outbox costs a file and a thread.
+///
+/// Threads: any.
+class OutboxRegistry {
+public:
+    /// The suite uses one directory, a test installation a second one; the rest is room for the unforeseen.
+    static constexpr std::size_t MAX_OUTBOXES = 8;
+
+    OutboxRegistry(const OutboxSettings& settings, otlp::LookUp lookUp);
+
+    /// The process's own, with production's settings. Never destroyed: SDK objects may outlive static ones.
+    static OutboxRegistry& Instance();
+
+    /// The outbox for `directory`; null when there is no directory to use at all. To be given back by
+    /// Release.
+    std::shared_ptr<OutboxEngine> Acquire(const std::string& directory);
+
+    /// Gives `engine` up. The last user's call stops its uploader before it returns; nobody can open the same
+    /// file meanwhile.
+    void Release(std::shared_ptr<OutboxEngine>& engine);
+
+    /// What to tell a module that got no outbox, if it is time to tell: the limit on what is told holds for the
+    /// process. It begins anew when the last outbox in use was released, whose users have heard it all.
+    std::optional<std::string> ReportNoDirectory();
+    std::optional<std::string> Report(report::Cause cause, const std::string& text);
+
+private:
+    std::string Choose(const std::string& directory);
+    void ForgetReleased();
+
+    const OutboxSettings m_settings;
+    const otlp::LookUp m_lookUp;
+    std::mutex m_mutex;                                  ///< Guards all below.
+    std::shared_ptr<report::FailureReporter> m_reporter; ///< Shared by all outboxes.
+    std::string m_firstDirectory;
+    std::map<std::string, std::weak_ptr<OutboxEngine>> m_engines; ///< By canonical directory.
+};
+
+} // namespace MetrikSdk::process

@@ -1,0 +1,40 @@
+#pragma once
+
+#include <array>
+#include <chrono>
+#include <mutex>
+#include <optional>
+#include <string>
+
+#include "Modules/MetrikSdk/Time.h"
+#include "Modules/MetrikSdk/report/News.h"
+
+namespace MetrikSdk::report {
+
+/// Decides which failures are told: of the same cause at most one in an interval, with the number of those
+/// that were kept back since. Its end is told once for each that was told: whoever reads of a failure wants to
+/// know whether it lasts. All outboxes of a process share one: they end in the same log, and a full disk
+/// hits them all. The clock is the caller's. Threads: any.
+class FailureReporter {
+public:
+    explicit FailureReporter(std::chrono::milliseconds interval) : m_interval(interval) {}
+
+    /// The text to tell now, or nothing.
+    std::optional<std::string> Report(Cause cause, const std::string& text, SteadyTime now);
+
+    /// Whether the end of failures of this cause is to be told.
+    bool ReportEnd(Cause cause);
+
+private:
+    struct History {
+        std::optional<SteadyTime> lastTold;
+        bool endIsDue = false; ///< A failure was told, and no end after it.
+        unsigned long keptBack = 0;
+    };
+
+    const std::chrono::milliseconds m_interval;
+    std::mutex m_mutex; ///< Guards the histories.
+    std::array<History, static_cast<std::size_t>(Cause::Count)> m_histories{};
+};
+
+} // namespace MetrikSdk::report

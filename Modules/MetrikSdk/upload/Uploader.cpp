@@ -1,0 +1,93 @@
+#include "Modules/MetrikSdk/upload/Uploader.h"
+
+#include <random>
+#include <utility>
+
+#include <csignal>
+
+#include <pthread.h>
+
+#include "Modules/MetrikSdk/process/OutboxCore.h"
+#include "Modules/MetrikSdk/upload/UploadCycle.h"
+
+namespace MetrikSdk::upload {
+namespace {
+
+/// The signals that a thread must not get: all but those of its own faults, which the service's crash handler
+/// wants. Among the blocked is SIGPIPE, which a TLS connection that the collector closed would raise.
+sigset_t SignalsToBlock() {
+    sigset_t signals;
+    ::sigfillset(&signals);
+    for (const int fault : {SIGSEGV, SIGBUS, SIGFPE, SIGILL, SIGABRT, SIGTRAP, SIGSYS})
+        ::sigdelset(&signals, fault);
+    return signals;
+}
+
+/// A new thread begins with its maker's mask, so that there is no moment in which it could be hit.
+class BlockedSignals {
+public:
+    BlockedSignals() {
+        const auto signals = SignalsToBlock();
+        ::pthread_sigmask(SIG_BLOCK, &signals, &m_before);
+    }
+    ~BlockedSignals() { ::pthread_sigmask(SIG_SETMASK, &m_before, nullptr); }
+    BlockedSignals(const BlockedSignals&) = delete;
+    BlockedSignals& operator=(const BlockedSignals&) = delete;
+
+private:
+    sigset_t m_before{};
+};
+
+void RunUploads(process::OutboxCore& core, otlp::Sender& sender) {
+    std::mt19937_64 generator{std::random_device{}()};
+    std::uniform_real_distribution<double> uniform(0.0, 1.0);
+    UploadCycle cycle(core.outbox, sender, core.notifier, core.settings, [&] { return uniform(generator); });
+    auto& waiting = core.outbox.WaitingCount();
+    while (!waiting.Stopped()) {
+        const auto pause = cycle.Pass(WallNow());
+        if (pause.duration > std::chrono::milliseconds(0))
+            waiting.Await(pause.untilWaiting, std::chrono::steady_clock::now() + pause.duration);
+    }
+}
+
+/// An exception that nobody foresaw, such as a lack of memory, must not end the service.
+void RunUntilStopped(process::OutboxCore& core, otlp::Sender& sender) noexcept {
+    constexpr std::chrono::seconds RECOVERY(10);
+    auto& waiting = core.outbox.WaitingCount();
+    while (!waiting.Stopped()) {
+        try {
+            RunUploads(core, sender);
+        } catch (const std::exception& error) {
+            core.notifier.TellFailure({report::Cause::Upload, error.what()});
+            waiting.Await(outbox::CountWaiter::NEVER, std::chrono::steady_clock::now() + RECOVERY);
+        }
+    }
+}
+
+} // namespace
+
+Uploader::Uploader(std::shared_ptr<process::OutboxCore> core, std::shared_ptr<otlp::Sender> sender)
+    : m_core(std::move(core)), m_sender(std::move(sender)) {
+    std::promise<void> finished;
+    m_finished = finished.get_future();
+    const BlockedSignals blocked;
+    m_thread =
+        std::thread([sharedCore = m_core, sharedSender = m_sender, done = std::move(finished)]() mutable {
+            RunUntilStopped(*sharedCore, *sharedSender);
+            sharedSender.reset();
+            sharedCore.reset();
+            done.set_value();
+        });
+}
+
+Uploader::~Uploader() {
+    m_core->outbox.WaitingCount().Stop();
+    m_sender->Abandon();
+    const bool itself = m_thread.get_id() == std::this_thread::get_id();
+    if (!itself && m_finished.wait_for(m_core->settings.stopPatience) == std::future_status::ready)
+        m_thread.join();
+    else
+        m_thread.detach();
+}
+
+} // namespace MetrikSdk::upload

@@ -1,0 +1,91 @@
+#include "Modules/OrvekSqlite/file/LiveFile.h"
+
+#include <filesystem>
+
+#include <SQLiteCpp/Exception.h>
+
+namespace OrvekSqlite::file {
+namespace {
+
+/// Errors that are the open file's rather than the statement's: another look at the path may be the remedy.
+bool IsAboutTheFile(int code) {
+    switch (code & 0xff) {
+    case SQLITE_READONLY:
+    case SQLITE_IOERR:
+    case SQLITE_CORRUPT:
+    case SQLITE_CANTOPEN:
+    case SQLITE_PROTOCOL:
+    case SQLITE_NOTADB:
+        return true;
+    default:
+        return false;
+    }
+}
+
+/// A file that is replaced again while it is opened anew is somebody's busy script; one that is replaced each
+/// time is no store.
+constexpr int MAX_ATTEMPTS = 3;
+
+/// A later change of the working directory must not lead to another file, and no name is special to SQLite
+/// (":memory:") once it starts with a slash. An empty path stays empty.
+std::string AsAbsolute(const std::string& path) {
+    std::error_code error;
+    const auto absolute = std::filesystem::absolute(path, error);
+    return error ? path : absolute.string();
+}
+
+} // namespace
+
+void LiveFile::Set(const std::string& path) {
+    m_connection.reset();
+    m_path = AsAbsolute(path);
+}
+
+/// A connection that was opened for this very operation and fails has nothing newer to offer.
+void LiveFile::Run(const Operation& operation) {
+    for (int attempt = 0; attempt < MAX_ATTEMPTS; ++attempt) {
+        const bool isNew = !m_connection;
+        if (isNew)
+            Connect();
+        try {
+            const bool wasInTransaction = m_connection->InTransaction();
+            operation(*m_connection);
+            if ((wasInTransaction && m_connection->InTransaction()) || m_connection->IsInPlace())
+                return;
+        } catch (const SQLite::Exception& error) {
+            if (!IsAboutTheFile(error.getErrorCode()) && m_connection->IsInPlace())
+                throw;
+            if (isNew) {
+                m_connection.reset();
+                throw;
+            }
+        }
+        m_connection.reset();
+    }
+    throw SQLite::Exception("the database file is being replaced again and again", SQLITE_CANTOPEN);
+}
+
+void LiveFile::RollBack() noexcept {
+    if (!m_connection)
+        return;
+    m_connection->RollBack();
+    if (m_connection->InTransaction()) // without the memory for a rollback, closing is one
+        m_connection.reset();
+}
+
+void LiveFile::WaitForLocks(std::chrono::milliseconds patience) {
+    m_patience = patience;
+    if (m_connection)
+        m_connection->WaitForLocks(patience);
+}
+
+void LiveFile::Connect() {
+    // SQLite would take an empty name for a database in memory, and a zero byte for the end of the name.
+    if (m_path.empty() || m_path.find('\0') != std::string::npos)
+        throw SQLite::Exception(sqlite3_errstr(SQLITE_CANTOPEN), SQLITE_CANTOPEN);
+    auto settings = m_settings;
+    settings.busyTimeout = m_patience;
+    m_connection = std::make_unique<Connection>(m_path, settings);
+}
+
+} // namespace OrvekSqlite::file

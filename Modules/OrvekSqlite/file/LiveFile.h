@@ -1,0 +1,56 @@
+#pragma once
+
+#include <chrono>
+#include <functional>
+#include <memory>
+#include <string>
+
+#include "Modules/OrvekSqlite/Settings.h"
+#include "Modules/OrvekSqlite/file/Connection.h"
+
+namespace OrvekSqlite::file {
+
+/// A path and the connection to the database that is there now: opened when it can be, and again when the
+/// file was replaced.
+///
+/// Threads: one at a time.
+/// Failure: throws SQLite::Exception.
+class LiveFile {
+public:
+    using Operation = std::function<void(Connection&)>;
+
+    explicit LiveFile(const Settings& settings) : m_settings(settings) {}
+
+    /// Lets go of the file that is open, and leads all later operations to `path`.
+    void Set(const std::string& path);
+
+    /// Runs the operation, and once more on a new connection when the old one turns out to have lost its
+    /// file: then the first run had no effect that counts. A transaction that was open on the old connection
+    /// is gone; the operation finds out by Connection::InTransaction.
+    ///
+    /// Within a transaction that was open before and is so afterwards, the file is not looked for: that takes
+    /// a microsecond, and who commits will look.
+    void Run(const Operation& operation);
+
+    bool InTransaction() const { return m_connection && m_connection->InTransaction(); }
+    bool IsShared() { return m_connection && m_connection->IsShared(); }
+    void RollBack() noexcept;
+
+    /// How long statements wait for the lock of another connection from here on.
+    void WaitForLocks(std::chrono::milliseconds patience);
+
+    /// The patience of the settings again.
+    void WaitForLocks() { WaitForLocks(m_settings.busyTimeout); }
+
+    void Close() { m_connection.reset(); }
+
+private:
+    void Connect();
+
+    const Settings m_settings;
+    std::string m_path;
+    std::chrono::milliseconds m_patience = m_settings.busyTimeout;
+    std::unique_ptr<Connection> m_connection; ///< null: to be opened by the next operation
+};
+
+} // namespace OrvekSqlite::file

@@ -1,0 +1,61 @@
+#include "Modules/OrvekSqlite/group/Committer.h"
+
+#include <exception>
+
+namespace OrvekSqlite::group {
+
+thread_local const Committer* Committer::s_self = nullptr;
+
+void Committer::Notice() {
+    if (!m_isResting || !m_group.Due())
+        return;
+    if (m_thread.joinable())
+        m_wake.notify_one();
+    else
+        Start();
+    m_isResting = !m_thread.joinable();
+}
+
+void Committer::Start() {
+    try {
+        m_thread = std::thread(&Committer::Run, this);
+    } catch (const std::exception&) {
+        CommitNow(); // no thread to be had: then a group is one statement, until there is
+    }
+}
+
+void Committer::Stop() {
+    {
+        const std::lock_guard lock(m_mutex);
+        m_stop = true;
+    }
+    m_wake.notify_one();
+    if (m_thread.joinable())
+        m_thread.join();
+}
+
+void Committer::Run() {
+    s_self = this;
+    std::unique_lock lock(m_mutex);
+    while (!m_stop) {
+        const auto due = m_group.Due();
+        m_isResting = !due;
+        if (!due)
+            m_wake.wait(lock);
+        else if (Clock::now() < *due)
+            m_wake.wait_until(lock, *due);
+        else
+            CommitNow();
+    }
+}
+
+void Committer::CommitNow() {
+    m_file.WaitForLocks(std::chrono::milliseconds(0));
+    try {
+        m_group.Commit();
+    } catch (const std::exception&) { // the group keeps the reason, and its statements
+    }
+    m_file.WaitForLocks();
+}
+
+} // namespace OrvekSqlite::group

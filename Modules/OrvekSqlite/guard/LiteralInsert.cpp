@@ -1,0 +1,80 @@
+#include "Modules/OrvekSqlite/guard/LiteralInsert.h"
+
+#include <algorithm>
+#include <utility>
+
+namespace OrvekSqlite::guard {
+namespace {
+
+constexpr std::string_view BEGIN = "insert into ";
+constexpr std::string_view VALUES = "values(";
+constexpr std::string_view DIGITS = "0123456789";
+constexpr std::size_t MAX_DIGITS = 18; // any number of so many fits into 64 bits
+
+/// Whether a list of names is made of it.
+bool IsOfNames(char c) {
+    return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9') || c == '_' ||
+           c == ' ' || c == ',' || c == '(' || c == ')';
+}
+
+/// The text in quotes at the start of `rest`, which is moved behind it; nothing when the quotes do not end.
+std::optional<Literal> TakeText(std::string_view& rest) {
+    bool hasDoubledQuotes = false;
+    std::size_t end = rest.find('\'', 1);
+    while (end != std::string_view::npos && rest.substr(end + 1).starts_with('\'')) {
+        hasDoubledQuotes = true;
+        end = rest.find('\'', end + 2);
+    }
+    if (end == std::string_view::npos)
+        return std::nullopt;
+    const Literal literal{true, hasDoubledQuotes, rest.substr(1, end - 1)};
+    rest.remove_prefix(end + 1);
+    return literal;
+}
+
+std::optional<Literal> TakeInteger(std::string_view& rest) {
+    const std::size_t length = rest.find_first_not_of(DIGITS);
+    if (length == 0 || length == std::string_view::npos || length > MAX_DIGITS)
+        return std::nullopt;
+    const Literal literal{false, false, rest.substr(0, length)};
+    rest.remove_prefix(length);
+    return literal;
+}
+
+/// The literals up to the parenthesis that ends `rest`; nothing when there is anything else.
+std::optional<std::vector<Literal>> TakeLiterals(std::string_view rest) {
+    std::vector<Literal> literals;
+    literals.reserve(LiteralInsert::MAX_LITERALS / 4);
+    while (literals.size() < LiteralInsert::MAX_LITERALS) {
+        while (rest.starts_with(' '))
+            rest.remove_prefix(1);
+        const auto literal = rest.starts_with('\'') ? TakeText(rest) : TakeInteger(rest);
+        if (!literal)
+            return std::nullopt;
+        literals.push_back(*literal);
+        if (rest == ")")
+            return literals;
+        if (!rest.starts_with(','))
+            return std::nullopt;
+        rest.remove_prefix(1);
+    }
+    return std::nullopt;
+}
+
+} // namespace
+
+std::optional<LiteralInsert> LiteralInsert::Of(std::string_view sql) {
+    const std::size_t values = sql.find(VALUES);
+    if (!sql.starts_with(BEGIN) || values == std::string_view::npos ||
+        sql.find('\0') != std::string_view::npos)
+        return std::nullopt;
+    const std::string_view head = sql.substr(0, values + VALUES.size());
+    if (!std::all_of(head.begin(), head.end(), IsOfNames))
+        return std::nullopt;
+    auto literals = TakeLiterals(sql.substr(head.size()));
+    if (!literals)
+        return std::nullopt;
+    return LiteralInsert{head, std::move(*literals)};
+}
+
+} // namespace OrvekSqlite::guard

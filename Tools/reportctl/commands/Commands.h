@@ -1,0 +1,23 @@
+#pragma once
+
+#include <array>
+
+namespace CLI {
+class App;
+}
+
+/// The commands of reportctl. Each has one file in this folder, with its flags and its words; what it does is in the
+/// other rooms. A new command is a file, its line in CMakeLists.txt, and two lines here.
+namespace reportctl::commands {
+
+/// Adds one command to the command line. If the user gave this command, parsing runs it and puts the exit code of the
+/// program into `exitCode`, which must outlive the parsing.
+using Add = void(CLI::App& app, int& exitCode);
+
+Add AddSetup; ///< `setup` makes what the service needs.
+Add AddSend;  ///< `send` sends the running service a report or a control message, from flags or line by line.
+
+/// In the order of the help.
+inline constexpr std::array ALL{&AddSetup, &AddSend};
+
+} // namespace reportctl::commands

@@ -1,0 +1,162 @@
+#include "Tools/reportctl/send/Delivery.h"
+
+#include <cstdio>
+#include <thread>
+
+#include <Poco/Exception.h>
+#include <fmt/format.h>
+
+#include "Tools/reportctl/send/Judgement.h"
+#include "Tools/reportctl/send/Sender.h"
+
+namespace reportctl::send {
+namespace {
+
+constexpr auto BLANK = " \t\r\n";
+
+/// Where a message came from, as it stands before what is said about it: empty, or "line 3: ".
+using Origin = std::string;
+
+void TellError(const Origin& origin, const std::string& text) {
+    std::fflush(stdout); // where both go to one place, in the order of events
+    fmt::print(stderr, "error: {}{}\n", origin, text);
+}
+
+void TellNobodyListens(const Origin& origin) {
+    TellError(origin, fmt::format("nobody listens on {}; is the service running?", Sender::Address()));
+}
+
+void TellWarning(const Origin& origin, const std::string& text) {
+    std::fflush(stdout);
+    fmt::print(stderr, "warning: {}{}\n", origin, text);
+}
+
+/// Tells what is wrong with a message. True when it is to be sent.
+bool MaySend(const Origin& origin, const Judgement& judgement, bool anyway) {
+    for (const auto& warning : judgement.warnings)
+        TellWarning(origin, warning);
+    for (const auto& error : judgement.errors)
+        anyway ? TellWarning(origin, error) : TellError(origin, error);
+    return anyway || judgement.errors.empty();
+}
+
+/// The text alone on standard output, so that it can be piped into a file or another program.
+void PrintText(const std::string& text) {
+    std::fwrite(text.data(), 1, text.size(), stdout);
+    std::fputc('\n', stdout);
+}
+
+std::string Count(std::size_t count, const std::string& thing) {
+    return fmt::format("{} {}{}", count, thing, count == 1 ? "" : "s");
+}
+
+/// Sends the lines that are handed to it, at its pace, and counts.
+class LineDelivery {
+public:
+    explicit LineDelivery(const DeliverySettings& settings) : m_settings(settings) {}
+
+    /// False when there is no use in going on.
+    bool Deliver(std::size_t number, const std::string& line) {
+        const auto origin = fmt::format("line {}: ", number);
+        if (!MaySend(origin, Judge(line), m_settings.anyway)) {
+            ++m_bad;
+            return true;
+        }
+        try {
+            return CountSent(number, line);
+        } catch (const Poco::Exception& error) { // too long even for the system
+            TellError(origin, error.displayText());
+            ++m_bad;
+            return true;
+        }
+    }
+
+    /// What was sent last may still turn out to have had no listener.
+    void AwaitRefusal() {
+        if (m_settings.dryRun || m_sent == 0 || !m_stop.empty() || m_sender.IsHeard())
+            return;
+        TellNobodyListens("");
+        m_stop = "; the last of them were lost";
+    }
+
+    /// Says the last word and returns the exit code.
+    int Close() const {
+        std::fflush(stdout);
+        fmt::print(m_settings.dryRun ? stderr : stdout, "{} {} ({}){}{}\n",
+                   m_settings.dryRun ? "dry run: would send" : "sent", Count(m_sent, "message"),
+                   Count(m_bytes, "byte"),
+                   m_bad == 0 ? "" : fmt::format("; left out {}", Count(m_bad, "line")), m_stop);
+        return m_bad == 0 && m_stop.empty() ? 0 : 1;
+    }
+
+private:
+    bool CountSent(std::size_t number, const std::string& line) {
+        if (Send(line)) {
+            ++m_sent;
+            m_bytes += line.size();
+            return true;
+        }
+        TellNobodyListens(fmt::format("line {}: ", number));
+        m_stop = fmt::format("; stopped at line {}", number);
+        return false;
+    }
+
+    bool Send(const std::string& line) {
+        if (m_settings.dryRun) {
+            PrintText(line);
+            return true;
+        }
+        const auto now = std::chrono::steady_clock::now();
+        m_due = NextDue(m_due, now, m_settings.pace);
+        std::this_thread::sleep_until(m_due);
+        return m_sender.Send(line);
+    }
+
+    const DeliverySettings& m_settings;
+    Sender m_sender;
+    std::chrono::steady_clock::time_point m_due;
+    std::size_t m_sent = 0;
+    std::size_t m_bytes = 0;
+    std::size_t m_bad = 0;
+    std::string m_stop; ///< why it ended early, for the last word
+};
+
+} // namespace
+
+int DeliverOne(const std::string& text, const DeliverySettings& settings) {
+    const auto judgement = Judge(text);
+    if (!MaySend("", judgement, settings.anyway)) {
+        TellError("", "nothing was sent. With --anyway it is sent as it is");
+        return 1;
+    }
+    if (settings.dryRun) {
+        PrintText(text);
+        std::fflush(stdout);
+        fmt::print(stderr, "dry run: would send {} ({})\n", judgement.what, Count(text.size(), "byte"));
+        return 0;
+    }
+    Sender sender;
+    if (!sender.Send(text) || !sender.IsHeard()) {
+        TellNobodyListens("");
+        return 1;
+    }
+    fmt::print("sent {} ({})\n", judgement.what, Count(text.size(), "byte"));
+    return 0;
+}
+
+int DeliverLines(std::istream& lines, const DeliverySettings& settings) {
+    LineDelivery delivery(settings);
+    std::string line;
+    for (std::size_t number = 1; std::getline(lines, line); ++number)
+        if (line.find_first_not_of(BLANK) != std::string::npos && !delivery.Deliver(number, line))
+            break;
+    delivery.AwaitRefusal();
+    if (lines.bad()) {
+        TellError("", "what was to be sent could not be read to its end");
+        delivery.Close();
+        return 1;
+    }
+    return delivery.Close();
+}
+
+} // namespace reportctl::send

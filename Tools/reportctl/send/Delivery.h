@@ -1,0 +1,25 @@
+#pragma once
+
+#include <istream>
+#include <string>
+
+#include "Tools/reportctl/send/Pace.h"
+
+namespace reportctl::send {
+
+struct DeliverySettings {
+    bool dryRun = false; ///< print what would be sent, and send nothing
+    bool anyway = false; ///< send also what the service would not use
+    PaceSettings pace;   ///< of many messages
+};
+
+/// Judges `text`, sends it, and tells the person what came of it. Returns the exit code: 0, or 1 when it was
+/// not sent or nobody listens. Throws Poco::Exception for what the system refuses to send.
+int DeliverOne(const std::string& text, const DeliverySettings& settings);
+
+/// The same for each line that is not blank, as it stands, without its line feed. A line that is judged bad
+/// is told with its number and left out; the first that nobody hears is the last. Each line goes out as soon
+/// as it is read, so that `lines` may be a pipe that is still being written.
+int DeliverLines(std::istream& lines, const DeliverySettings& settings);
+
+} // namespace reportctl::send

@@ -1,0 +1,209 @@
+#include "Tools/reportctl/send/Judgement.h"
+
+#include <algorithm>
+
+#include <fmt/format.h>
+
+#include "Common/ServiceConstants.h"
+#include "SystemTool/IO/JsonDocument.h"
+
+namespace reportctl::send {
+namespace {
+
+using SyncServiceReport::ORVEK_REPORT_MODULEINIT;
+using SyncServiceReport::ORVEK_REPORT_UPDATEOPENID;
+using SystemTool::IO::JsonDocument;
+
+constexpr std::size_t MAX_BYTES = 10240; // the service's receive buffer
+constexpr std::size_t DIGITS_OF_SECONDS = 10;
+constexpr std::size_t DIGITS_OF_MILLISECONDS = 13;
+
+bool Contains(const std::string& text, const std::string& part) {
+    return text.find(part) != std::string::npos;
+}
+
+/// Within an SQL literal two quotes stand for one; what is left over ends the literal.
+bool HasLoneQuote(const std::string& text) {
+    for (auto quote = text.find('\''); quote != std::string::npos; quote = text.find('\'', quote)) {
+        const auto end = std::min(text.find_first_not_of('\'', quote), text.size());
+        if ((end - quote) % 2 != 0)
+            return true;
+        quote = end;
+    }
+    return false;
+}
+
+/// What the store is told, the service puts into its SQL as it is. `consequence`: what is lost.
+void JudgeForStore(Judgement& judgement, const std::string& name, const std::string& text,
+                   const std::string& consequence) {
+    if (HasLoneQuote(text))
+        judgement.errors.push_back(fmt::format("its {} holds a single quote. The service puts the text into "
+                                               "its SQL as it is, and {}. Write the quote twice: ''",
+                                               name, consequence));
+    if (text.find('\0') != std::string::npos)
+        judgement.errors.push_back(
+            fmt::format("its {} holds a zero character (\\u0000). The service puts the "
+                        "text into its SQL as it is, and {}",
+                        name, consequence));
+}
+
+/// As the service reads it, but for the zeros that it appends to seconds.
+std::string ValueText(const JsonDocument& value) {
+    return value.IsObject() ? value.ToJson() : value.ToString();
+}
+
+void JudgeTime(Judgement& judgement, const std::string& time) {
+    if (time.empty())
+        judgement.warnings.emplace_back("it has no createTime; the service keeps an empty one");
+    else if (!std::all_of(time.begin(), time.end(), [](char c) { return c >= '0' && c <= '9'; }) ||
+             (time.size() != DIGITS_OF_SECONDS && time.size() != DIGITS_OF_MILLISECONDS))
+        judgement.warnings.emplace_back("its createTime has neither ten digits (seconds since 1970) nor "
+                                        "thirteen (milliseconds); the service keeps it as it is");
+}
+
+void JudgeAnalyticsValue(Judgement& judgement, const std::string& value) {
+    if (value.empty())
+        return;
+    std::string error;
+    const JsonDocument parsed = JsonDocument().FromJson(value, error);
+    if (!error.empty())
+        judgement.errors.push_back(fmt::format("its value must be empty or a JSON object for analytics, or "
+                                               "the event is dropped; this one is not JSON: {}",
+                                               error));
+    else if (!parsed.IsObject() && parsed.ToJson() != "null") // null passes, like an empty value
+        judgement.errors.emplace_back(
+            "its value must be empty or a JSON object for analytics, or the event is "
+            "dropped; this one is JSON of another kind");
+}
+
+void JudgeForAnalytics(Judgement& judgement, const std::string& eventID, const std::string& value) {
+    if (!Contains(eventID, "|"))
+        judgement.errors.emplace_back("its event id begins with \"A\", so it goes to analytics, which drops "
+                                      "it: there is no bar in it to tell the module from the event. Write it "
+                                      "like A100|10001");
+    JudgeAnalyticsValue(judgement, value);
+}
+
+void JudgeReport(Judgement& judgement, const JsonDocument& report) {
+    const auto eventID = report.GetKeyValue("eventID").ToString();
+    const auto value = ValueText(report.GetKeyValue("value"));
+    const auto time = report.GetKeyValue("createTime").ToString();
+    const bool isForAnalytics = eventID.starts_with("A");
+    judgement.what = fmt::format("event {}, for {}", report.GetKeyValue("eventID").ToJson(),
+                                 isForAnalytics ? "analytics" : "the store");
+    if (eventID.empty())
+        judgement.errors.emplace_back(
+            "it has no event id (no \"eventID\" at the top level, or an empty one): "
+            "the service would store a report that belongs to no event");
+    JudgeTime(judgement, time);
+    if (isForAnalytics) {
+        JudgeForAnalytics(judgement, eventID, value);
+        return;
+    }
+    for (const auto& [name, text] : {std::pair{"event id", eventID}, {"value", value}, {"createTime", time}})
+        JudgeForStore(judgement, name, text, "the database would reject the report");
+}
+
+void JudgeUser(Judgement& judgement, const JsonDocument& exdata) {
+    const auto openID = exdata.GetKeyValue("openID").ToString();
+    const auto version = exdata.GetKeyValue("hublinkVersion").ToString();
+    if (openID.empty() && !version.empty())
+        judgement.warnings.emplace_back("its hublinkVersion has no effect: the service takes a version over "
+                                        "only together with an openID");
+    if (openID.empty())
+        return;
+    constexpr auto CONSEQUENCE = "the database would reject every report while it is set";
+    JudgeForStore(judgement, "openID", openID, CONSEQUENCE);
+    JudgeForStore(judgement, "hublinkVersion", version, CONSEQUENCE);
+}
+
+void JudgeInit(Judgement& judgement, const JsonDocument& exdata) {
+    const auto module = exdata.GetKeyValue("moduleID");
+    const auto moduleID = module.ToString();
+    judgement.what = fmt::format("init of module {}", module.ToJson());
+    if (moduleID.empty())
+        judgement.errors.emplace_back(
+            "it has no moduleID in its exdata: no event could belong to the module");
+    else if (!moduleID.starts_with("A") || Contains(moduleID, "|"))
+        judgement.warnings.emplace_back(
+            "no event will reach this module: only event ids that begin with \"A\" "
+            "go to analytics, and their module is what stands before the bar");
+    JudgeUser(judgement, exdata);
+}
+
+void JudgeOpenIdUpdate(Judgement& judgement, const JsonDocument& exdata) {
+    const auto openID = exdata.GetKeyValue("openID");
+    judgement.what = fmt::format("updateOpenID to {}", openID.ToJson());
+    if (openID.ToString().empty())
+        judgement.errors.emplace_back("it has no openID in its exdata: the service would do nothing");
+    else
+        JudgeUser(judgement, exdata);
+}
+
+void JudgeControl(Judgement& judgement, const JsonDocument& message) {
+    const auto msgType = message.GetKeyValue("msgType");
+    if (msgType.ToString() == ORVEK_REPORT_MODULEINIT)
+        JudgeInit(judgement, message.GetKeyValue("exdata"));
+    else if (msgType.ToString() == ORVEK_REPORT_UPDATEOPENID)
+        JudgeOpenIdUpdate(judgement, message.GetKeyValue("exdata"));
+    else
+        judgement.errors.push_back(
+            fmt::format("it is no report (there is no \"eventID\" in it) and no control message that the "
+                        "service knows (its msgType is {}, and must be \"{}\" or \"{}\" to the letter): the "
+                        "service would ignore it",
+                        msgType.ToJson(), ORVEK_REPORT_MODULEINIT, ORVEK_REPORT_UPDATEOPENID));
+}
+
+bool IsControl(const JsonDocument& message) {
+    const auto msgType = message.GetKeyValue("msgType").ToString();
+    return msgType == ORVEK_REPORT_MODULEINIT || msgType == ORVEK_REPORT_UPDATEOPENID;
+}
+
+void JudgeMessage(Judgement& judgement, const std::string& text, const JsonDocument& message) {
+    // The service searches the raw text, before it parses anything.
+    if (!Contains(text, "eventID"))
+        JudgeControl(judgement, message);
+    else if (IsControl(message))
+        judgement.errors.emplace_back(
+            "it is a control message with the text \"eventID\" somewhere in it, and "
+            "the service takes every such text for a report. Where the text must "
+            "be, spell it event\\u0049D");
+    else
+        JudgeReport(judgement, message);
+}
+
+/// Why nothing of the text can be used; empty when it can be.
+std::string ReasonAgainstText(const std::string& text, JsonDocument& message) {
+    if (text.size() > MAX_BYTES)
+        return fmt::format("it has {} bytes, and the service cuts a text off after {}", text.size(),
+                           MAX_BYTES);
+    if (const auto zero = text.find('\0'); zero != std::string::npos)
+        return fmt::format("it holds a zero byte, and the service cuts a text off there: byte {}", zero);
+    std::string error;
+    message.FromJson(text, error);
+    if (!error.empty())
+        return fmt::format("it is not JSON: {}", error);
+    if (!message.IsObject())
+        return "it is JSON but no object: the service would find nothing in it";
+    return {};
+}
+
+} // namespace
+
+Judgement Judge(const std::string& text) {
+    Judgement judgement;
+    judgement.what = "a text";
+    JsonDocument message;
+    if (const auto reason = ReasonAgainstText(text, message); !reason.empty()) {
+        judgement.errors.push_back(reason);
+        return judgement;
+    }
+    if (Contains(text, "%"))
+        judgement.warnings.emplace_back(
+            "it holds a percent sign: the log may show a line with \"[BoostLogError]\" in "
+            "place of it. It is processed all the same");
+    JudgeMessage(judgement, text, message);
+    return judgement;
+}
+
+} // namespace reportctl::send

@@ -1,0 +1,51 @@
+#include "Tools/reportctl/send/Sender.h"
+
+#include <cerrno>
+#include <cstdint>
+
+#include <Poco/Net/NetException.h>
+#include <Poco/Net/SocketAddress.h>
+#include <Poco/Net/SocketImpl.h>
+
+#include "Common/ServiceConstants.h"
+
+namespace reportctl::send {
+namespace {
+
+constexpr std::uint16_t PORT = 9997;
+
+/// How long the system may take to tell that nobody listens. Linux tells before the send over loopback
+/// returns, but nothing promises that, there or elsewhere. Nobody notices the wait at the end of a command.
+constexpr long REFUSAL_WAIT_MS = 20;
+
+} // namespace
+
+Sender::Sender() {
+    m_socket.connect(Poco::Net::SocketAddress(SyncServiceReport::UDP_SERVER_IP, PORT));
+}
+
+bool Sender::Send(const std::string& text) {
+    try {
+        m_socket.sendBytes(text.data(), static_cast<int>(text.size()));
+    } catch (const Poco::Net::ConnectionRefusedException&) { // about the datagram before
+        return false;
+    }
+    return !IsRefused();
+}
+
+bool Sender::IsHeard() {
+    const Poco::Timespan wait(REFUSAL_WAIT_MS * Poco::Timespan::MILLISECONDS);
+    m_socket.poll(wait, Poco::Net::Socket::SELECT_READ | Poco::Net::Socket::SELECT_ERROR);
+    return !IsRefused();
+}
+
+/// Asking takes the report from the socket.
+bool Sender::IsRefused() const {
+    return m_socket.impl()->socketError() == ECONNREFUSED;
+}
+
+std::string Sender::Address() {
+    return Poco::Net::SocketAddress(SyncServiceReport::UDP_SERVER_IP, PORT).toString();
+}
+
+} // namespace reportctl::send

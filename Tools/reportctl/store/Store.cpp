@@ -1,0 +1,187 @@
+#include "Tools/reportctl/store/Store.h"
+
+#include <algorithm>
+#include <array>
+#include <cerrno>
+#include <cstdlib>
+#include <filesystem>
+#include <iterator>
+#include <stdexcept>
+#include <system_error>
+
+#include <SQLiteCpp/Exception.h>
+#include <fmt/format.h>
+#include <sqlite3.h>
+#include <unistd.h>
+
+#include "Modules/Sqlite/SideFiles.h"
+#include "Tools/reportctl/store/Schema.h"
+
+namespace reportctl::store {
+namespace {
+
+namespace fs = std::filesystem;
+
+constexpr auto PRIVATE_FILE = fs::perms::owner_read | fs::perms::owner_write;
+
+/// A running service holds the write lock for moments; a person can wait for five seconds, not for ever.
+constexpr int BUSY_TIMEOUT_MS = 5000;
+
+/// A new, private, empty file beside the one that it is for. Gone, with SQLite's files beside it, at the end.
+class DraftFile {
+public:
+    explicit DraftFile(const std::string& path) : m_path(path + ".new-XXXXXX") {
+        const int file = ::mkstemp(m_path.data());
+        if (file < 0)
+            throw std::runtime_error(std::generic_category().message(errno));
+        ::close(file);
+    }
+
+    ~DraftFile() {
+        std::error_code ignored;
+        fs::remove(m_path, ignored);
+        for (const auto* suffix : Sqlite::SIDE_FILE_SUFFIXES)
+            fs::remove(m_path + suffix, ignored);
+    }
+
+    DraftFile(const DraftFile&) = delete;
+    DraftFile& operator=(const DraftFile&) = delete;
+
+    const std::string& Path() const { return m_path; }
+
+private:
+    std::string m_path;
+};
+
+/// A path beside the store's at which there is nothing, nor anything that would be taken for its side file.
+std::string FreeName(const std::string& path) {
+    const auto isTaken = [](const std::string& name) {
+        return fs::exists(name) ||
+               std::any_of(std::begin(Sqlite::SIDE_FILE_SUFFIXES), std::end(Sqlite::SIDE_FILE_SUFFIXES),
+                           [&](const char* suffix) { return fs::exists(name + suffix); });
+    };
+    for (int number = 1;; ++number)
+        if (auto name = fmt::format("{}.left-{}", path, number); !isTaken(name))
+            return name;
+}
+
+/// Side files without their database: what a lost one left behind, or what a service that still has the deleted one
+/// open goes on writing. SQLite would read the new database through them and damage it. They may hold the newest rows,
+/// so they are kept, all under one new name: with their database beside them under that name, SQLite reads them again.
+bool MoveOrphanedSideFilesAway(terminal::Worklog& log, const std::string& path) {
+    const auto name = FreeName(path);
+    bool areAway = true;
+    for (const auto* suffix : Sqlite::SIDE_FILE_SUFFIXES)
+        if (const auto file = path + suffix; fs::exists(file))
+            areAway &= log.Run(
+                terminal::RENAME,
+                fmt::format("{}, which belonged to a store that is gone, to {}{}", file, name, suffix),
+                [&] { fs::rename(file, name + suffix); }, "Move it away and run this again.");
+    return areAway;
+}
+
+void CreateStore(const std::string& path) {
+    const DraftFile draft(path);
+    {
+        auto database = OpenStore(draft.Path());
+        database.exec("pragma journal_mode = wal");
+        RunInTransaction(database, StatementsToCurrentSchema(database));
+    }
+    fs::create_hard_link(draft.Path(), path); // fails rather than replacing one that has appeared
+}
+
+bool EnsureNewStore(terminal::Worklog& log, const std::string& path) {
+    if (!MoveOrphanedSideFilesAway(log, path))
+        return false;
+    return log.Run(
+        terminal::MAKE, fmt::format("store {} (mode 0600, schema version {})", path, SCHEMA_VERSION),
+        [&] { CreateStore(path); }, "Run this again once that is remedied.");
+}
+
+bool EnsureSchema(terminal::Worklog& log, const std::string& path) {
+    auto database = OpenStoreToLook(path);
+    const int version = SchemaVersionOf(database);
+    if (version > SCHEMA_VERSION) {
+        log.Fail(fmt::format("{} has schema version {}, this program knows {}: it was left as it is. Use the "
+                             "reportctl of the newer installation.",
+                             path, version, SCHEMA_VERSION));
+        return false;
+    }
+    const auto statements = StatementsToCurrentSchema(database);
+    const auto thing = fmt::format("store {} (schema version {})", path, SCHEMA_VERSION);
+    if (statements.empty()) {
+        log.AlreadyDone(thing);
+        return true;
+    }
+    return log.Run(
+        terminal::MIGRATE, fmt::format("{} from version {}, keeping its rows", thing, version),
+        [&] {
+            auto store = OpenStore(path);
+            RunInTransaction(store, statements);
+        },
+        "The store was left as it is.");
+}
+
+bool IsPrivate(const std::string& file) {
+    return !fs::exists(file) || fs::status(file).permissions() == PRIVATE_FILE;
+}
+
+void EnsurePrivateFiles(terminal::Worklog& log, const std::string& path) {
+    for (const auto* suffix : {"", "-wal", "-shm", "-journal"})
+        if (const auto file = path + suffix; !IsPrivate(file))
+            log.Run(
+                terminal::CHANGE, fmt::format("mode of {} to 0600", file),
+                [&] { fs::permissions(file, PRIVATE_FILE); }, "The file's owner must do that.");
+}
+
+void EnsureWriteAheadLog(terminal::Worklog& log, const std::string& path) {
+    if (OpenStoreToLook(path).execAndGet("pragma journal_mode").getString() != "wal")
+        log.Run(
+            terminal::CHANGE, fmt::format("journal of {} to a write-ahead log", path),
+            [&] { OpenStore(path).exec("pragma journal_mode = wal"); },
+            "Stop who uses it and run this again.");
+}
+
+/// The modes are looked at while the store is closed: opening it makes side files of the mode that is about
+/// to be changed.
+bool EnsureExistingStore(terminal::Worklog& log, const std::string& path) {
+    if (!EnsureSchema(log, path))
+        return false;
+    EnsurePrivateFiles(log, path);
+    EnsureWriteAheadLog(log, path);
+    return true;
+}
+
+} // namespace
+
+SQLite::Database OpenStore(const std::string& path) {
+    return SQLite::Database(path, SQLite::OPEN_READWRITE, BUSY_TIMEOUT_MS);
+}
+
+SQLite::Database OpenStoreToLook(const std::string& path) {
+    const auto log = path + "-wal";
+    const bool hasRows = fs::exists(log) && fs::file_size(log) > 0;
+    auto database = OpenStore(path);
+    // Without rows in it the side files go away at the end, as they should: they were made by this opening.
+    if (hasRows)
+        sqlite3_db_config(database.getHandle(), SQLITE_DBCONFIG_NO_CKPT_ON_CLOSE, 1, nullptr);
+    return database;
+}
+
+bool EnsureStore(terminal::Worklog& log, const std::string& path) {
+    try {
+        if (!fs::exists(path))
+            return EnsureNewStore(log, path);
+        return EnsureExistingStore(log, path);
+    } catch (const SQLite::Exception& error) {
+        const bool isDatabase =
+            error.getErrorCode() != SQLITE_NOTADB && error.getErrorCode() != SQLITE_CORRUPT;
+        log.Fail(fmt::format("{}: {}. It was left as it is.{}", path, error.what(),
+                             isDatabase ? "" : " Move it away and run this again to get a new store."));
+    } catch (const std::exception& error) {
+        log.Fail(fmt::format("{}: {}. It was left as it is.", path, error.what()));
+    }
+    return false;
+}
+
+} // namespace reportctl::store

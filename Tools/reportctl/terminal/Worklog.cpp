@@ -1,0 +1,47 @@
+#include "Tools/reportctl/terminal/Worklog.h"
+
+#include <cstdio>
+#include <exception>
+
+#include <fmt/format.h>
+
+namespace reportctl::terminal {
+
+void Worklog::AlreadyDone(const std::string& thing) {
+    fmt::print("already there: {}\n", thing);
+}
+
+bool Worklog::Run(const Verb& verb, const std::string& thing, const std::function<void()>& action,
+                  const std::string& advice) {
+    try {
+        if (!m_isDryRun)
+            action();
+    } catch (const std::exception& error) {
+        Fail(fmt::format("Not {}: {}: {}. {}", verb.done, thing, error.what(), advice));
+        return false;
+    }
+    m_hasChanged = true;
+    fmt::print("{} {}\n", m_isDryRun ? verb.planned : verb.done, thing);
+    return true;
+}
+
+void Worklog::Fail(const std::string& text) {
+    m_hasFailed = true;
+    fmt::print(stderr, "error: {}\n", text);
+}
+
+void Worklog::Warn(const std::string& text) const {
+    fmt::print(stderr, "warning: {}\n", text);
+}
+
+bool Worklog::Summarise() const {
+    if (m_hasFailed)
+        fmt::print("not everything is set up: see the errors\n");
+    else if (!m_hasChanged)
+        fmt::print("nothing to do: everything was set up before\n");
+    else if (m_isDryRun)
+        fmt::print("dry run: nothing was changed\n");
+    return !m_hasFailed;
+}
+
+} // namespace reportctl::terminal

@@ -1,0 +1,53 @@
+#pragma once
+
+#include <functional>
+#include <string>
+
+namespace reportctl::terminal {
+
+/// What is done to a thing: the word for having done it, and for what a dry run would do.
+struct Verb {
+    const char* done;
+    const char* planned;
+};
+
+inline constexpr Verb MAKE{"made", "would make"};
+inline constexpr Verb CHANGE{"changed", "would change"};
+inline constexpr Verb SET{"set", "would set"};
+inline constexpr Verb MIGRATE{"migrated", "would migrate"};
+inline constexpr Verb RENAME{"renamed", "would rename"};
+
+/// Does things and tells the person, one line each: results on standard output, failures and warnings on
+/// standard error. In a dry run nothing is done, only told.
+///
+/// One thread.
+class Worklog {
+public:
+    explicit Worklog(bool isDryRun) : m_isDryRun(isDryRun) {}
+
+    /// `thing` needs nothing.
+    void AlreadyDone(const std::string& thing);
+
+    /// Does `action` to `thing` unless this is a dry run. An exception from it is told as a failure, followed
+    /// by `advice`. Returns false after a failure.
+    bool Run(const Verb& verb, const std::string& thing, const std::function<void()>& action,
+             const std::string& advice = {});
+
+    /// Something could not be done; `text` says what, and what to do about it.
+    void Fail(const std::string& text);
+
+    /// Something was done as asked, but will not do what the person wants.
+    void Warn(const std::string& text) const;
+
+    bool IsDryRun() const { return m_isDryRun; }
+
+    /// Says the last word. True when nothing failed.
+    bool Summarise() const;
+
+private:
+    bool m_isDryRun;
+    bool m_hasChanged = false;
+    bool m_hasFailed = false;
+};
+
+} // namespace reportctl::terminal

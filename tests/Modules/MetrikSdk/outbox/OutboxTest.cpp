@@ -1,0 +1,376 @@
+#include "Modules/MetrikSdk/outbox/Outbox.h"
+
+#include <algorithm>
+#include <filesystem>
+#include <fstream>
+#include <thread>
+
+#include <gtest/gtest.h>
+#include <sys/mount.h>
+#include <sys/stat.h>
+
+#include "Modules/MetrikSdk/outbox/StoreError.h"
+#include "tests/Modules/MetrikSdk/support/SmallDisk.h"
+#include "tests/Modules/MetrikSdk/support/Told.h"
+#include "tests/support/TemporaryDirectory.h"
+#include "tests/support/WaitUntil.h"
+
+using namespace MetrikSdk;
+using namespace std::chrono_literals;
+
+namespace {
+
+const ModuleIdentity A759{"A759", "1", "default"};
+
+class OutboxTest : public testing::Test {
+protected:
+    OutboxTest() {
+        Told::Forget();
+        m_notifier.Subscribe(&Told::OnFailure, &Told::OnSuccess);
+        m_settings.file.reopenInterval = 0ms;
+        m_settings.file.lockPatience = 100ms;
+        m_settings.file.shortLockPatience = 1ms;
+    }
+
+    outbox::Outbox& Open() {
+        m_outbox = std::make_unique<outbox::Outbox>(m_path, m_settings, m_notifier);
+        m_outbox->Open();
+        return *m_outbox;
+    }
+
+    bool Append(const std::string& payload = "{}") { return m_outbox->Append(A759, "A759|1", payload); }
+
+    std::string File() const { return m_path + "/MetrikOutbox.db"; }
+
+    std::vector<std::string> SetAsideFiles() const {
+        std::vector<std::string> names;
+        for (const auto& entry : std::filesystem::directory_iterator(m_path))
+            if (entry.path().filename().string().starts_with("MetrikOutbox.db.damaged-"))
+                names.push_back(entry.path().filename());
+        return names;
+    }
+
+    TemporaryDirectory m_directory;
+    std::string m_path = m_directory.Path() + "/deep/database";
+    OutboxSettings m_settings;
+    report::Notifier m_notifier{1min};
+    std::unique_ptr<outbox::Outbox> m_outbox;
+};
+
+TEST_F(OutboxTest, MakesTheDirectoryAndPrivateFilesWhateverTheUmask) {
+    const auto before = ::umask(0);
+    Open();
+    Append();
+    ::umask(before);
+    const auto mode = [](const std::string& path) {
+        struct stat status {};
+        return ::stat(path.c_str(), &status) == 0 ? status.st_mode & 07777 : 0U;
+    };
+    EXPECT_EQ(mode(m_directory.Path() + "/deep"), 0700U);
+    EXPECT_EQ(mode(m_path), 0700U);
+    for (const std::string suffix : {"", "-wal", "-shm"})
+        EXPECT_EQ(mode(File() + suffix), 0600U) << suffix;
+}
+
+TEST_F(OutboxTest, NarrowsAFileThatOthersCouldRead) {
+    std::filesystem::create_directories(m_path);
+    std::ofstream(File()).close();
+    ::chmod(File().c_str(), 0666);
+    Open();
+    struct stat status {};
+    ASSERT_EQ(::stat(File().c_str(), &status), 0);
+    EXPECT_EQ(status.st_mode & 07777, 0600U);
+}
+
+TEST_F(OutboxTest, DoesNotFollowALinkInTheFilesPlace) {
+    std::filesystem::create_directories(m_path);
+    const auto target = m_directory.Path() + "/victim";
+    std::ofstream(target) << "precious";
+    std::filesystem::create_symlink(target, File());
+    Open();
+    EXPECT_FALSE(Append());
+    std::ifstream file(target);
+    EXPECT_EQ(std::string(std::istreambuf_iterator<char>(file), {}), "precious");
+}
+
+TEST_F(OutboxTest, KeepsEventsAcrossRestarts) {
+    Open();
+    EXPECT_TRUE(Append());
+    EXPECT_TRUE(Append());
+    EXPECT_EQ(Open().Status().waiting, 2);
+}
+
+TEST_F(OutboxTest, RefusesAnEventOverTheBoundAndTellsIt) {
+    m_settings.caps.maxEventBytes = 1000;
+    Open();
+    EXPECT_FALSE(Append(std::string(1000, 'x')));
+    EXPECT_TRUE(Append(std::string(900, 'x')));
+    EXPECT_EQ(Told::Failures().Count("event: "), 1);
+}
+
+TEST_F(OutboxTest, StaysWithinItsCapTellsARunOfDropsOnceAndCountsEveryOne) {
+    m_settings.caps.maxWaitingBytes = 100'000;
+    Open();
+    for (int i = 0; i < 1000; ++i)
+        ASSERT_TRUE(Append(std::string(500, 'x')));
+    const auto status = m_outbox->Status();
+    EXPECT_LE(status.waitingBytes, 100'000);
+    EXPECT_GT(status.waitingBytes, 95'000);
+    EXPECT_EQ(status.dropped + status.waiting, 1000);
+    EXPECT_EQ(m_outbox->Take(1).events.at(0).sequence, status.dropped + 1) << "the oldest went first";
+    EXPECT_EQ(Told::Failures().Count("events dropped: "), 1);
+}
+
+TEST_F(OutboxTest, DropsNothingByAgeBeforeItsClockHasProvedItself) {
+    Open();
+    Append();
+    SQLite::Database(File(), SQLite::OPEN_READWRITE).exec("UPDATE event SET stored_ms = 1000");
+    Open();
+    Append();
+    EXPECT_EQ(m_outbox->Status().waiting, 2);
+}
+
+TEST_F(OutboxTest, DropsEventsThatAreTooOld) {
+    m_settings.caps.clockAgreement = 0ms;
+    Open();
+    Append();
+    Append();
+    m_outbox.reset();
+    SQLite::Database(File(), SQLite::OPEN_READWRITE).exec("UPDATE event SET stored_ms = 1000 WHERE id = 1");
+    Open();
+    Append();
+    const auto status = m_outbox->Status();
+    EXPECT_EQ(status.dropped, 1);
+    EXPECT_EQ(status.waiting, 2);
+}
+
+TEST_F(OutboxTest, KeepsWhatIsUnderWayWhenACapDrops) {
+    m_settings.caps.maxWaitingBytes = 10'000;
+    Open();
+    for (int i = 0; i < 10; ++i)
+        Append(std::string(500, 'x'));
+    const auto underWay = m_outbox->Take(5);
+    for (int i = 0; i < 100; ++i)
+        Append(std::string(500, 'x'));
+    m_outbox->RemoveDelivered(underWay, 0);
+    EXPECT_EQ(m_outbox->Status().delivered, 5);
+}
+
+TEST_F(OutboxTest, SetsADamagedFileAsideBeginsANewOneAndTells) {
+    std::filesystem::create_directories(m_path);
+    std::ofstream(File()) << std::string(10'000, 'x');
+    std::ofstream(File() + "-wal") << "its log";
+    Open();
+    EXPECT_TRUE(Append());
+    const auto files = SetAsideFiles();
+    EXPECT_EQ(std::count_if(files.begin(), files.end(), [](const auto& f) { return f.ends_with("Z"); }), 1);
+    EXPECT_EQ(std::count_if(files.begin(), files.end(), [](const auto& f) { return f.ends_with("Z-wal"); }),
+              1)
+        << "its log goes with it";
+    EXPECT_EQ(Told::Failures().Count("outbox damaged: "), 1);
+    EXPECT_EQ(m_outbox->Status().waiting, 1);
+}
+
+TEST_F(OutboxTest, SetsAFileAsideThatIsDamagedWhileInUse) {
+    Open();
+    for (int i = 0; i < 200; ++i)
+        Append(std::string(1000, 'x'));
+    SQLite::Database(File(), SQLite::OPEN_READWRITE).exec("PRAGMA wal_checkpoint(TRUNCATE)");
+    {
+        std::fstream file(File(), std::ios::in | std::ios::out);
+        file.seekp(4096);
+        const std::string rubbish(static_cast<std::size_t>(std::filesystem::file_size(File())) - 4096,
+                                  '\x7f');
+        file.write(rubbish.data(), static_cast<std::streamsize>(rubbish.size()));
+    }
+    // The cache may hide the damage for a while; a connection that looks at the file does not.
+    EXPECT_TRUE(WaitUntil([&] {
+        EXPECT_TRUE(Append(std::string(1000, 'y')))
+            << "an event that meets the damage goes into the new file";
+        try {
+            m_outbox->Take(512);
+        } catch (const outbox::StoreError&) {
+        }
+        return !SetAsideFiles().empty();
+    }));
+    EXPECT_EQ(Told::Failures().Count("outbox damaged: "), 1);
+    EXPECT_GE(m_outbox->Status().waiting, 1);
+}
+
+TEST_F(OutboxTest, BeginsAnewWhenTheFileIsDeletedAndTells) {
+    Open();
+    Append();
+    for (const std::string suffix : {"", "-wal", "-shm"})
+        std::filesystem::remove(File() + suffix);
+    EXPECT_TRUE(Append());
+    EXPECT_EQ(Told::Failures().Count("outbox vanished: "), 1);
+    EXPECT_EQ(Open().Status().waiting, 1) << "the event is in the new file";
+}
+
+TEST_F(OutboxTest, WritesNoEventIntoADeletedFileHoweverSoonItComes) {
+    m_settings.file.reopenInterval = OutboxSettings().file.reopenInterval;
+    Open();
+    for (int i = 0; i < 20; ++i) {
+        Append();
+        for (const std::string suffix : {"", "-wal", "-shm"})
+            std::filesystem::remove(File() + suffix);
+        ASSERT_TRUE(Append());
+        ASSERT_EQ(MetrikSdk::outbox::OutboxStore(File(), 1s).Status().stored, 1) << "round " << i;
+    }
+}
+
+TEST_F(OutboxTest, BeginsAnewWhenTheWholeDirectoryIsDeleted) {
+    Open();
+    Append();
+    std::filesystem::remove_all(m_path);
+    EXPECT_TRUE(Append());
+    EXPECT_EQ(Open().Status().waiting, 1);
+}
+
+TEST_F(OutboxTest, GoesOnWithTheFileThatWasPutInItsPlace) {
+    Open();
+    Append();
+    const auto first = m_outbox->Status().outboxId;
+    std::filesystem::rename(File(), File() + ".backup");
+    std::ofstream(File()).close();
+    for (const std::string suffix : {"-wal", "-shm"})
+        std::filesystem::remove(File() + suffix);
+    EXPECT_TRUE(Append());
+    EXPECT_NE(m_outbox->Status().outboxId, first);
+}
+
+TEST_F(OutboxTest, StoresAgainOnceADirectoryThatWasInTheWayIsGone) {
+    std::filesystem::create_directories(File());
+    EXPECT_FALSE(Open().Open());
+    for (int i = 0; i < 10'000; ++i)
+        EXPECT_FALSE(Append());
+    EXPECT_EQ(Told::Failures().Count("outbox file: "), 1) << "told once, not ten thousand times";
+    std::filesystem::remove(File());
+    EXPECT_TRUE(Append());
+}
+
+TEST_F(OutboxTest, DoesNotLookAtAFailingFileMoreOftenThanItsInterval) {
+    m_settings.file.reopenInterval = 1h;
+    std::filesystem::create_directories(File());
+    Open();
+    std::filesystem::remove(File());
+    EXPECT_FALSE(Append());
+}
+
+TEST_F(OutboxTest, WaitsForALockOnceAndNotForEveryEvent) {
+    Open();
+    Append();
+    SQLite::Database other(File(), SQLite::OPEN_READWRITE);
+    other.exec("BEGIN IMMEDIATE");
+    const auto start = std::chrono::steady_clock::now();
+    for (int i = 0; i < 10; ++i)
+        EXPECT_FALSE(Append());
+    const auto took = std::chrono::steady_clock::now() - start;
+    EXPECT_GE(took, 100ms);
+    EXPECT_LT(took, 900ms) << "ten times the patience";
+    other.exec("COMMIT");
+    EXPECT_TRUE(Append());
+    EXPECT_EQ(Told::Failures().Count("outbox file: "), 2) << "its beginning and its end";
+}
+
+TEST_F(OutboxTest, OpensAnExistingFileWhileAnotherProcessHoldsTheLock) {
+    Open();
+    Append();
+    SQLite::Database other(File(), SQLite::OPEN_READWRITE);
+    other.exec("BEGIN IMMEDIATE");
+    EXPECT_TRUE(Open().Open());
+    other.exec("COMMIT");
+}
+
+TEST_F(OutboxTest, WaitsForALockOnceAndNotForEveryOpening) {
+    std::filesystem::create_directories(m_path);
+    SQLite::Database other(File(), SQLite::OPEN_READWRITE | SQLite::OPEN_CREATE);
+    other.exec("PRAGMA journal_mode = WAL"); // empty, so that opening has to write
+    other.exec("BEGIN IMMEDIATE");
+    m_settings.file.lockPatience = 1s;
+    m_outbox = std::make_unique<outbox::Outbox>(m_path, m_settings, m_notifier);
+    const auto start = std::chrono::steady_clock::now();
+    EXPECT_FALSE(m_outbox->Open());
+    EXPECT_FALSE(m_outbox->Open());
+    const auto took = std::chrono::steady_clock::now() - start;
+    EXPECT_GE(took, 900ms);
+    EXPECT_LT(took, 1500ms);
+    other.exec("COMMIT");
+    EXPECT_TRUE(m_outbox->Open());
+}
+
+TEST_F(OutboxTest, StoresAnEventOnceTheLockIsReleasedWithinThePatience) {
+    m_settings.file.lockPatience = 20s;
+    Open();
+    SQLite::Database other(File(), SQLite::OPEN_READWRITE);
+    other.exec("BEGIN IMMEDIATE");
+    std::thread releaser([&] {
+        // Released when the event below has been waiting for a moment: the wait cannot be seen from outside.
+        const auto soon = std::chrono::steady_clock::now() + 50ms;
+        WaitUntil([&] { return std::chrono::steady_clock::now() > soon; });
+        other.exec("COMMIT");
+    });
+    EXPECT_TRUE(Append());
+    releaser.join();
+}
+
+TEST_F(OutboxTest, SurvivesAFullDiskWithoutCallingItDamageAndGoesOnWhenThereIsSpace) {
+    std::filesystem::create_directories(m_path);
+    const auto result = RunOnSmallDisk(m_path, 400'000, [this] {
+        Open();
+        int stored = 0;
+        while (Append(std::string(2000, 'x')) && stored < 1000)
+            ++stored;
+        EXPECT_GT(stored, 10);
+        EXPECT_LT(stored, 1000) << "the disk never became full";
+        for (int i = 0; i < 1000; ++i)
+            EXPECT_FALSE(Append(std::string(2000, 'x')));
+        EXPECT_EQ(Told::Failures().Count("outbox file: "), 1);
+        EXPECT_TRUE(SetAsideFiles().empty());
+        EXPECT_EQ(m_outbox->Status().waiting, stored) << "what was accepted is still there";
+
+        ASSERT_EQ(::mount("tmpfs", m_path.c_str(), "tmpfs", MS_REMOUNT, "size=4000000"), 0);
+        EXPECT_TRUE(Append(std::string(2000, 'x')));
+        EXPECT_EQ(m_outbox->Status().waiting, stored + 1);
+        EXPECT_EQ(Told::Failures().Count("outbox file: Events are stored again; 1001 were refused meanwhile"),
+                  1);
+        EXPECT_TRUE(Append());
+        EXPECT_EQ(Told::Failures().Count("outbox file: "), 2) << "its beginning and its end, once each";
+        m_outbox.reset();
+    });
+    if (result == SmallDiskResult::Unavailable)
+        GTEST_SKIP() << "no right to mount a file system here";
+    EXPECT_EQ(result, SmallDiskResult::Passed);
+}
+
+TEST_F(OutboxTest, OpensLaterOnADiskThatIsFullAtFirst) {
+    std::filesystem::create_directories(m_path);
+    const auto result = RunOnSmallDisk(m_path, 64'000, [this] {
+        std::ofstream(m_path + "/filler") << std::string(100'000, 'x');
+        EXPECT_FALSE(Open().Open());
+        EXPECT_FALSE(Append());
+        EXPECT_TRUE(SetAsideFiles().empty());
+        std::filesystem::remove(m_path + "/filler");
+        ASSERT_EQ(::mount("tmpfs", m_path.c_str(), "tmpfs", MS_REMOUNT, "size=4000000"), 0);
+        EXPECT_TRUE(Append());
+        m_outbox.reset();
+    });
+    if (result == SmallDiskResult::Unavailable)
+        GTEST_SKIP() << "no right to mount a file system here";
+    EXPECT_EQ(result, SmallDiskResult::Passed);
+}
+
+TEST_F(OutboxTest, TakesEventsFromSeveralThreads) {
+    Open();
+    std::vector<std::thread> threads;
+    for (int i = 0; i < 4; ++i)
+        threads.emplace_back([this] {
+            for (int j = 0; j < 100; ++j)
+                EXPECT_TRUE(Append());
+        });
+    for (auto& thread : threads)
+        thread.join();
+    EXPECT_EQ(m_outbox->Status().waiting, 400);
+}
+
+} // namespace

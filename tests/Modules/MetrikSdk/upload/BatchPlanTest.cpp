@@ -1,0 +1,117 @@
+#include "Modules/MetrikSdk/upload/BatchPlan.h"
+#include "Modules/MetrikSdk/upload/BatchSplitter.h"
+
+#include <set>
+
+#include <gtest/gtest.h>
+
+using namespace MetrikSdk;
+using namespace std::chrono_literals;
+
+namespace {
+
+const WallTime NOW{1'700'000'000s};
+
+Batch Waiting(std::size_t count, std::size_t bytesEach, WallTime storedAt) {
+    Batch batch;
+    for (std::size_t i = 0; i < count; ++i) {
+        StoredEvent event;
+        event.bytes = bytesEach;
+        event.storedAt = storedAt;
+        batch.events.push_back(event);
+    }
+    return batch;
+}
+
+upload::BatchPlan Plan(const Batch& waiting) {
+    BatchSettings settings;
+    settings.maxEvents = 10;
+    settings.maxBytes = 1000;
+    settings.linger = 1s;
+    return upload::PlanBatch(waiting, settings.maxEvents, NOW, settings);
+}
+
+TEST(BatchPlan, HasNothingToSendFromAnEmptyOutbox) {
+    EXPECT_EQ(Plan({}).count, 0U);
+}
+
+TEST(BatchPlan, SendsAFullCountAtOnce) {
+    const auto plan = Plan(Waiting(10, 1, NOW));
+    EXPECT_EQ(plan.count, 10U);
+    EXPECT_EQ(plan.wait, 0ms);
+}
+
+TEST(BatchPlan, SendsWhatFillsTheBytesAtOnce) {
+    const auto plan = Plan(Waiting(3, 400, NOW));
+    EXPECT_EQ(plan.count, 2U);
+    EXPECT_EQ(plan.wait, 0ms);
+}
+
+TEST(BatchPlan, SendsOneEventHoweverLarge) {
+    const auto plan = Plan(Waiting(2, 5000, NOW));
+    EXPECT_EQ(plan.count, 1U);
+    EXPECT_EQ(plan.wait, 0ms);
+}
+
+TEST(BatchPlan, WaitsForCompanyUntilTheOldestIsOldEnough) {
+    EXPECT_EQ(Plan(Waiting(3, 1, NOW - 400ms)).wait, 600ms);
+    EXPECT_EQ(Plan(Waiting(3, 1, NOW - 1s)).wait, 0ms);
+    EXPECT_EQ(Plan(Waiting(3, 1, NOW - 1s)).count, 3U);
+}
+
+TEST(BatchPlan, DoesNotHoldEventsFromTheFuture) {
+    EXPECT_EQ(Plan(Waiting(3, 1, NOW + 24h)).wait, 0ms);
+    EXPECT_EQ(Plan(Waiting(3, 1, NOW + 2ms)).wait, 1002ms) << "stored while the plan was made";
+}
+
+TEST(BatchPlan, DoesNotHoldEventsOfAnImpossibleTime) {
+    for (const auto time : {WallTime::min(), WallTime::max()})
+        EXPECT_EQ(Plan(Waiting(3, 1, time)).wait, 0ms);
+}
+
+/// Lets a splitter work off `events` events of which `bad` are refused; the number of requests it took.
+int WorkOff(std::size_t events, const std::set<std::size_t>& bad, std::set<std::size_t>& found) {
+    upload::BatchSplitter splitter(512);
+    std::size_t next = 0;
+    int requests = 0;
+    while (next < events && requests < 10'000) {
+        ++requests;
+        const auto count = std::min(splitter.Limit(), events - next);
+        const auto firstBad = bad.lower_bound(next);
+        if (firstBad == bad.end() || *firstBad >= next + count) {
+            splitter.Gone(count);
+            next += count;
+        } else if (splitter.Refused(count)) {
+            found.insert(next++);
+            splitter.Found();
+        }
+    }
+    return requests;
+}
+
+TEST(BatchSplitter, FindsTheOneBadEventOfABatchWhereverItIs) {
+    for (std::size_t bad = 0; bad < 500; ++bad) {
+        std::set<std::size_t> found;
+        EXPECT_LE(WorkOff(500, {bad}, found), 20) << bad;
+        EXPECT_EQ(found, std::set<std::size_t>{bad});
+    }
+}
+
+TEST(BatchSplitter, FindsEveryBadEvent) {
+    const std::set<std::size_t> bad{0, 1, 250, 499};
+    std::set<std::size_t> found;
+    WorkOff(500, bad, found);
+    EXPECT_EQ(found, bad);
+}
+
+TEST(BatchSplitter, SendsFullBatchesAgainWhenTheRefusalWasAPassingOne) {
+    upload::BatchSplitter splitter(512);
+    EXPECT_FALSE(splitter.Refused(500));
+    EXPECT_EQ(splitter.Limit(), 250U);
+    splitter.Gone(250);
+    EXPECT_EQ(splitter.Limit(), 250U);
+    splitter.Gone(250);
+    EXPECT_EQ(splitter.Limit(), 512U);
+}
+
+} // namespace

@@ -1,0 +1,117 @@
+#include "Modules/MetrikSdk/upload/RetryPolicy.h"
+
+#include <gtest/gtest.h>
+
+using namespace MetrikSdk;
+using namespace std::chrono_literals;
+using upload::RetryPolicy::Judge;
+
+namespace {
+
+/// Tue, 21 Nov 2023 08:00:00 GMT
+const WallTime NOW{1'700'553'600s};
+
+otlp::HttpResult Answer(long status, const std::string& body = {}) {
+    otlp::HttpResult result;
+    result.status = status;
+    result.body = body;
+    return result;
+}
+
+TEST(RetryPolicy, DeletesWhatWasTaken) {
+    for (const long status : {200, 202, 204})
+        EXPECT_EQ(Judge(Answer(status)), upload::Verdict::Delete) << status;
+}
+
+TEST(RetryPolicy, KeepsTheBatchWhereTheCollectorAsksToWait) {
+    for (const long status : {429, 502, 503, 504})
+        EXPECT_EQ(Judge(Answer(status)), upload::Verdict::Wait) << status;
+}
+
+TEST(RetryPolicy, HalvesOnEveryOtherError) {
+    for (const long status : {400, 401, 404, 408, 413, 422, 499, 500, 501, 505, 599})
+        EXPECT_EQ(Judge(Answer(status)), upload::Verdict::Halve) << status;
+}
+
+TEST(RetryPolicy, KeepsTheBatchOnARedirect) {
+    for (const long status : {301, 302, 307, 308})
+        EXPECT_EQ(Judge(Answer(status)), upload::Verdict::Wait) << status;
+}
+
+TEST(RetryPolicy, KeepsTheBatchWhenTheAnswerIsNotComplete) {
+    auto cut = Answer(200);
+    cut.fault = "transfer closed";
+    EXPECT_EQ(Judge(cut), upload::Verdict::Wait);
+}
+
+TEST(RetryPolicy, TakesAWebPageForALogInPage) {
+    auto page = Answer(200, "<html>Welcome to the hotel</html>");
+    for (const auto* type : {"text/html; charset=utf-8", "Text/HTML"}) {
+        page.contentType = type;
+        EXPECT_EQ(Judge(page), upload::Verdict::Wait) << type;
+    }
+}
+
+TEST(RetryPolicy, JudgesAnErrorByItsStatusAlsoWhenItsTextIsAPage) {
+    const auto judge = [](long status) {
+        auto page = Answer(status, "<html>Error</html>");
+        page.contentType = "text/html";
+        return Judge(page);
+    };
+    for (const long status : {400, 401, 413, 500})
+        EXPECT_EQ(judge(status), upload::Verdict::Halve) << status;
+    for (const long status : {302, 429, 502, 503, 504})
+        EXPECT_EQ(judge(status), upload::Verdict::Wait) << status;
+}
+
+TEST(RetryPolicy, TakesAnAnswerThatIsNoJsonForAnAcceptance) {
+    EXPECT_EQ(Judge(Answer(200, "ok")), upload::Verdict::Delete);
+}
+
+TEST(RetryPolicy, ReadsThePartialSuccess) {
+    const auto read = [](const std::string& body) {
+        return upload::RetryPolicy::ReadPartialSuccess(Answer(200, body), 10);
+    };
+    EXPECT_EQ(read(R"({"partialSuccess":{"rejectedLogRecords":"3","errorMessage":"too old"}})").rejected, 3U);
+    EXPECT_EQ(read(R"({"partialSuccess":{"rejectedLogRecords":"3","errorMessage":"too\nold"}})").message,
+              "too old");
+    EXPECT_EQ(read(R"({"partialSuccess":{"rejectedLogRecords":4}})").rejected, 4U);
+    EXPECT_EQ(read(R"({"partialSuccess":{"rejectedLogRecords":"9999999999999999999"}})").rejected, 10U);
+    for (const auto* nothing : {"", "{}", "ok", "[]", R"({"partialSuccess":{}})", R"({"partialSuccess":7})",
+                                R"({"partialSuccess":{"rejectedLogRecords":-1}})"})
+        EXPECT_EQ(read(nothing).rejected, 0U) << nothing;
+}
+
+TEST(RetryPolicy, WaitsExponentiallyWithFullJitterUpToTheBound) {
+    const RetrySettings settings;
+    const auto wait = [&](int failures, double random) {
+        return upload::RetryPolicy::WaitBefore(Answer(503), failures, random, NOW, settings);
+    };
+    EXPECT_EQ(wait(1, 0.0), 0ms);
+    EXPECT_EQ(wait(1, 0.5), 500ms);
+    EXPECT_EQ(wait(4, 0.5), 4s);
+    EXPECT_EQ(wait(9, 1.0), 256s);
+    EXPECT_EQ(wait(10, 1.0), 5min);
+    EXPECT_EQ(wait(1'000'000, 1.0), 5min);
+}
+
+TEST(RetryPolicy, HonoursRetryAfterUpToADayAndNeverWaitsLessForIt) {
+    const auto wait = [](const std::string& header, double random) {
+        auto result = Answer(503);
+        result.retryAfter = header;
+        return upload::RetryPolicy::WaitBefore(result, 1, random, NOW, RetrySettings());
+    };
+    EXPECT_EQ(wait("30", 0.9), 30s);
+    EXPECT_EQ(wait("Tue, 21 Nov 2023 08:00:40 GMT", 0.9), 40s);
+    EXPECT_EQ(wait("99999999", 0.9), 24h);
+    EXPECT_EQ(wait("0", 0.9), 900ms);
+}
+
+TEST(RetryPolicy, DescribesAnAnswerInOneShortLine) {
+    EXPECT_EQ(upload::RetryPolicy::Describe(Answer(400, R"({"code":3,"message":"bad\nbody"})")),
+              "HTTP status 400: bad body");
+    EXPECT_EQ(upload::RetryPolicy::Describe(Answer(500)), "HTTP status 500");
+    EXPECT_LT(upload::RetryPolicy::Describe(Answer(500, std::string(100'000, '\n'))).size(), 400U);
+}
+
+} // namespace

@@ -1,0 +1,248 @@
+#include "Modules/MetrikSdk/upload/UploadCycle.h"
+
+#include <deque>
+#include <filesystem>
+#include <functional>
+#include <set>
+
+#include <gtest/gtest.h>
+
+#include "tests/Modules/MetrikSdk/support/ReceivedEvents.h"
+#include "tests/Modules/MetrikSdk/support/Told.h"
+#include "tests/support/TemporaryDirectory.h"
+
+using namespace MetrikSdk;
+using namespace std::chrono_literals;
+
+namespace {
+
+/// Answers as told, and remembers what it was given.
+class FakeSender : public otlp::Sender {
+public:
+    otlp::HttpResult Post(const std::string& body) override {
+        bodies.push_back(body);
+        return answer(EventsOf(body));
+    }
+    void Abandon() override {}
+    std::string Destination() const override { return "http://collector"; }
+
+    std::function<otlp::HttpResult(const std::vector<ReceivedEvent>&)> answer;
+    std::deque<std::string> bodies;
+};
+
+otlp::HttpResult Status(long status) {
+    otlp::HttpResult result;
+    result.status = status;
+    return result;
+}
+
+class UploadCycleTest : public testing::Test {
+protected:
+    UploadCycleTest() {
+        Told::Forget();
+        m_notifier.Subscribe(&Told::OnFailure, &Told::OnSuccess);
+        AnswerAlways(Status(200));
+    }
+
+    void AnswerAlways(const otlp::HttpResult& result) {
+        m_sender.answer = [result](const auto&) { return result; };
+    }
+
+    /// Refuses every request that holds one of the numbers.
+    void Refuse(const std::set<int>& numbers) {
+        m_sender.answer = [numbers](const std::vector<ReceivedEvent>& events) {
+            for (const auto& event : events)
+                if (numbers.contains(event.number))
+                    return Status(400);
+            return Status(200);
+        };
+    }
+
+    void Append(int count) {
+        for (int i = 0; i < count; ++i)
+            ASSERT_TRUE(m_outbox.Append({"A759", "1", "default"}, "A759|1", NumberedPayload(m_next++)));
+    }
+
+    /// Passes at a time when every event is old enough, until the cycle wants to wait.
+    upload::Pause RunUntilPause(int maxPasses = 1000) {
+        for (int i = 0; i < maxPasses; ++i)
+            if (const auto pause = m_cycle.Pass(WallNow() + 1h); pause.duration > 0ms)
+                return pause;
+        ADD_FAILURE() << "the cycle does not come to rest";
+        return {};
+    }
+
+    TemporaryDirectory m_directory;
+    OutboxSettings m_settings;
+    report::Notifier m_notifier{0ms};
+    outbox::Outbox m_outbox{m_directory.Path(), m_settings, m_notifier};
+    FakeSender m_sender;
+    upload::UploadCycle m_cycle{m_outbox, m_sender, m_notifier, m_settings, [] { return 0.5; }};
+    int m_next = 0;
+};
+
+TEST_F(UploadCycleTest, SleepsUntilAnEventComesWhenTheOutboxIsEmpty) {
+    const auto pause = m_cycle.Pass(WallNow());
+    EXPECT_EQ(pause.untilWaiting, 1);
+    EXPECT_GE(pause.duration, 1s);
+    EXPECT_TRUE(m_sender.bodies.empty());
+}
+
+TEST_F(UploadCycleTest, GivesAnEventCompanyForASecondUnlessTheBatchIsFull) {
+    Append(1);
+    const auto pause = m_cycle.Pass(WallNow());
+    EXPECT_GT(pause.duration, 0ms);
+    EXPECT_LE(pause.duration, 1s);
+    EXPECT_EQ(pause.untilWaiting, 512);
+    EXPECT_TRUE(m_sender.bodies.empty());
+    Append(511);
+    m_cycle.Pass(WallNow());
+    EXPECT_EQ(m_sender.bodies.size(), 1U);
+}
+
+TEST_F(UploadCycleTest, DeletesWhatWasTakenAndTellsTheSuccess) {
+    Append(600);
+    RunUntilPause();
+    EXPECT_EQ(m_sender.bodies.size(), 2U);
+    EXPECT_EQ(m_outbox.Status().delivered, 600);
+    EXPECT_EQ(m_outbox.Status().waiting, 0);
+    EXPECT_EQ(Told::Successes().All(), (std::vector<std::string>{"upload: 512 events", "upload: 88 events"}));
+    EXPECT_TRUE(Told::Failures().All().empty());
+}
+
+TEST_F(UploadCycleTest, KeepsTheBatchAndWaitsLongerEachTime) {
+    Append(3);
+    AnswerAlways(Status(503));
+    EXPECT_EQ(RunUntilPause().duration, 500ms);
+    EXPECT_EQ(RunUntilPause().duration, 1s);
+    const auto third = RunUntilPause();
+    EXPECT_EQ(third.duration, 2s);
+    EXPECT_EQ(third.untilWaiting, outbox::CountWaiter::NEVER) << "new events do not shorten the wait";
+    EXPECT_EQ(m_outbox.Status().waiting, 3);
+    EXPECT_EQ(Told::Failures().Count("upload: http://collector: HTTP status 503"), 3);
+    AnswerAlways(Status(200));
+    RunUntilPause();
+    EXPECT_EQ(m_outbox.Status().delivered, 3);
+    EXPECT_EQ(Told::Failures().All().back(), "upload: http://collector: events are taken again");
+    Append(1);
+    AnswerAlways(Status(503));
+    EXPECT_EQ(RunUntilPause().duration, 500ms) << "a success begins anew";
+}
+
+TEST_F(UploadCycleTest, SendsTheSameEventsWithTheSameIdsAgain) {
+    Append(3);
+    AnswerAlways(Status(429));
+    RunUntilPause();
+    RunUntilPause();
+    EXPECT_EQ(m_sender.bodies.at(0), m_sender.bodies.at(1));
+}
+
+TEST_F(UploadCycleTest, DeletesAPartialSuccessAndReportsTheRefusedCount) {
+    Append(10);
+    auto partial = Status(200);
+    partial.body = R"({"partialSuccess":{"rejectedLogRecords":"4","errorMessage":"too old"}})";
+    AnswerAlways(partial);
+    RunUntilPause();
+    const auto status = m_outbox.Status();
+    EXPECT_EQ(status.delivered, 6);
+    EXPECT_EQ(status.refused, 4);
+    EXPECT_EQ(status.waiting, 0);
+    EXPECT_EQ(
+        Told::Failures().Count("events refused: The collector rejected 4 of 10 events for good: too old"), 1);
+}
+
+TEST_F(UploadCycleTest, MovesTheOnePoisonousEventToTheDeadLettersAndDeliversTheOthers) {
+    Append(500);
+    Refuse({321});
+    RunUntilPause();
+    const auto status = m_outbox.Status();
+    EXPECT_EQ(status.delivered, 499);
+    EXPECT_EQ(status.deadLettered, 1);
+    EXPECT_EQ(status.waiting, 0);
+    EXPECT_LE(m_sender.bodies.size(), 20U);
+}
+
+TEST_F(UploadCycleTest, FindsSeveralPoisonousEvents) {
+    Append(500);
+    Refuse({0, 1, 250, 499});
+    RunUntilPause();
+    EXPECT_EQ(m_outbox.Status().delivered, 496);
+    EXPECT_EQ(m_outbox.Status().deadLettered, 4);
+}
+
+TEST_F(UploadCycleTest, SlowsDownWhenEverythingIsRefused) {
+    Append(500);
+    AnswerAlways(Status(401));
+    EXPECT_EQ(RunUntilPause().duration, 500ms);
+    EXPECT_EQ(m_outbox.Status().deadLettered, m_settings.retry.refusalsBeforeWaiting);
+    EXPECT_EQ(RunUntilPause().duration, 1s);
+    EXPECT_EQ(m_outbox.Status().deadLettered, m_settings.retry.refusalsBeforeWaiting + 1);
+    AnswerAlways(Status(200));
+    RunUntilPause();
+    EXPECT_EQ(m_outbox.Status().waiting, 0);
+}
+
+TEST_F(UploadCycleTest, WaitsInTheMiddleOfASearchWithoutLosingIt) {
+    Append(8);
+    Refuse({5});
+    m_cycle.Pass(WallNow() + 1h);
+    AnswerAlways(Status(503));
+    RunUntilPause();
+    Refuse({5});
+    RunUntilPause();
+    EXPECT_EQ(m_outbox.Status().delivered, 7);
+    EXPECT_EQ(m_outbox.Status().deadLettered, 1);
+}
+
+TEST_F(UploadCycleTest, DeletesWhatWasDeliveredBeforeItSendsAnythingElse) {
+    Append(2);
+    SQLite::Database other(m_directory.Path() + "/MetrikOutbox.db", SQLite::OPEN_READWRITE);
+    m_sender.answer = [&](const auto&) {
+        other.exec("BEGIN IMMEDIATE"); // taken, and now the outbox cannot be written
+        return Status(200);
+    };
+    EXPECT_GT(RunUntilPause().duration, 0ms);
+    EXPECT_GT(RunUntilPause().duration, 0ms);
+    EXPECT_EQ(m_sender.bodies.size(), 1U) << "sent once";
+    other.exec("COMMIT");
+    RunUntilPause();
+    EXPECT_EQ(m_sender.bodies.size(), 1U);
+    EXPECT_EQ(m_outbox.Status().delivered, 2);
+}
+
+TEST_F(UploadCycleTest, DoesNotDropForACapWhatWasDeliveredAndIsNotDeletedYet) {
+    const TemporaryDirectory directory;
+    m_settings.caps.maxWaitingBytes = 10'000;
+    outbox::Outbox outbox(directory.Path(), m_settings, m_notifier);
+    upload::UploadCycle cycle(outbox, m_sender, m_notifier, m_settings, [] { return 0.5; });
+    const auto append = [&](int count) {
+        for (int i = 0; i < count; ++i)
+            ASSERT_TRUE(outbox.Append({"A759", "1", "default"}, "A759|1", NumberedPayload(i)));
+    };
+    append(5);
+    SQLite::Database other(directory.Path() + "/MetrikOutbox.db", SQLite::OPEN_READWRITE);
+    m_sender.answer = [&](const auto&) {
+        other.exec("BEGIN IMMEDIATE");
+        return Status(200);
+    };
+    EXPECT_GT(cycle.Pass(WallNow() + 1h).duration, 0ms) << "taken, and cannot be deleted";
+    other.exec("COMMIT");
+    append(200);
+    EXPECT_GT(outbox.Status().dropped, 0) << "the cap dropped others";
+    AnswerAlways(Status(503));
+    cycle.Pass(WallNow() + 1h);
+    EXPECT_EQ(outbox.Status().delivered, 5);
+}
+
+TEST_F(UploadCycleTest, SaysNothingWhenARequestEndsBecauseItIsToStop) {
+    Append(1);
+    otlp::HttpResult abandoned;
+    abandoned.fault = "stopped";
+    abandoned.abandoned = true;
+    AnswerAlways(abandoned);
+    RunUntilPause();
+    EXPECT_TRUE(Told::Failures().All().empty());
+    EXPECT_EQ(m_outbox.Status().waiting, 1);
+}
+
+} // namespace

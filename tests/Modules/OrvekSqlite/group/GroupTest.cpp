@@ -1,0 +1,63 @@
+#include "Modules/OrvekSqlite/group/Group.h"
+
+#include <chrono>
+#include <filesystem>
+
+#include <SQLiteCpp/Exception.h>
+
+#include "tests/Modules/OrvekSqlite/SqliteFixture.h"
+#include "tests/support/WaitUntil.h"
+
+// Groups without their committer.
+namespace {
+
+using OrvekSqlite::group::Clock;
+
+class GroupTest : public SqliteFixture {
+protected:
+    void SetUp() override {
+        SqliteFixture::SetUp();
+        MakeStore(Store());
+        m_file.Set(Store());
+    }
+
+    /// Runs statements until two have come so close together that they share a transaction, and waits until that is
+    /// to be committed.
+    void OpenDueGroup() {
+        ASSERT_TRUE(WaitUntil([&] {
+            m_group.Execute(Insert("x"));
+            return m_group.Due().has_value();
+        }));
+        const auto due = *m_group.Due();
+        ASSERT_TRUE(WaitUntil([&] { return Clock::now() >= due; }));
+    }
+
+    static OrvekSqlite::GroupSettings SeldomTriedAgain() {
+        OrvekSqlite::GroupSettings settings;
+        settings.retry = std::chrono::hours(1);
+        return settings;
+    }
+
+    OrvekSqlite::file::LiveFile m_file{OrvekSqlite::Settings()};
+    OrvekSqlite::group::Group m_group{m_file, SeldomTriedAgain()};
+};
+
+TEST_F(GroupTest, IsCommittedByTheNextStatementOnceItIsDueAlsoByOneThatIsRefused) {
+    OpenDueGroup();
+    EXPECT_THROW(m_group.Execute("nonsense"), SQLite::Exception);
+    EXPECT_FALSE(m_group.Due());
+}
+
+TEST_F(GroupTest, ThatIsOwedIsNotTriedAgainByAStatementBeforeItsTime) {
+    OpenDueGroup();
+    const auto aside = Store() + ".aside";
+    std::filesystem::rename(Store(), aside);
+    EXPECT_THROW(m_group.Commit(), SQLite::Exception);
+    std::filesystem::rename(aside, Store());
+    EXPECT_THROW(m_group.Execute(Insert("refused")), SQLite::Exception);
+    EXPECT_TRUE(m_group.Due());
+    EXPECT_NO_THROW(m_group.Commit());
+    EXPECT_FALSE(m_group.Due());
+}
+
+} // namespace

@@ -1,0 +1,340 @@
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include "tests/Tools/reportctl/support/ReportctlFixture.h"
+
+namespace {
+
+namespace fs = std::filesystem;
+
+class Setup : public ReportctlFixture {
+protected:
+    void ExpectEverythingMade() const {
+        EXPECT_EQ(ModeOf(Preferences()), 01777u);
+        EXPECT_EQ(ModeOf(PidFile()), 0666u);
+        EXPECT_EQ(OwnerOf(PidFile()), OwnerOf(Preferences()));
+        for (const auto* directory : {"", "/database", "/log", "/log/metrik"})
+            EXPECT_EQ(ModeOf(Data() + "/hublink" + directory), 0700u) << directory;
+        EXPECT_EQ(ModeOf(Store()), 0600u);
+        EXPECT_EQ(ColumnsOf("OperLog"), OPER_LOG_COLUMNS);
+        EXPECT_EQ(ColumnsOf("BaseInfo"), "key TEXT0,value TEXT0");
+        EXPECT_EQ(Ask("pragma user_version"), "1");
+        EXPECT_EQ(Ask("pragma journal_mode"), "wal");
+        EXPECT_EQ(Ask("pragma integrity_check"), "ok");
+    }
+
+    std::string PidFile() const { return Preferences() + "/Report.pid"; }
+
+    static uid_t OwnerOf(const std::string& path) {
+        struct stat status {};
+        return ::lstat(path.c_str(), &status) == 0 ? status.st_uid : static_cast<uid_t>(-1);
+    }
+
+    std::string Files() const {
+        std::string names;
+        for (const auto& entry : fs::directory_iterator(Database()))
+            names += entry.path().filename().string() + " ";
+        return names;
+    }
+};
+
+TEST_F(Setup, MakesEverythingThatIsMissing) {
+    const auto outcome = RunSetup();
+    EXPECT_EQ(outcome.exitCode, 0) << outcome.output;
+    EXPECT_TRUE(outcome.Says("made directory " + Preferences() + " (mode 1777)\n")) << outcome.output;
+    EXPECT_TRUE(outcome.Says("made pid file " + PidFile() + " (mode 0666)\n")) << outcome.output;
+    EXPECT_EQ(ContentOf(PidFile()), "");
+    EXPECT_TRUE(outcome.Says("made store " + Store() + " (mode 0600, schema version 1)\n"));
+    ExpectEverythingMade();
+    EXPECT_EQ(Files(), "Report.db ");
+}
+
+TEST_F(Setup, GivesTheSameModesWhateverTheUmask) {
+    for (const auto* umask : {"umask 0 &&", "umask 0777 &&"}) {
+        EXPECT_EQ(RunSetup("", umask).exitCode, 0);
+        ExpectEverythingMade();
+        EXPECT_EQ(ModeOf(Data()), 0700u);
+        EXPECT_EQ(ModeOf(fs::path(Preferences()).parent_path()), 0755u);
+        fs::remove_all(Data());
+        fs::remove_all(fs::path(Preferences()).parent_path());
+    }
+}
+
+TEST_F(Setup, ChangesNothingTheSecondTimeAndSaysSo) {
+    ASSERT_EQ(RunSetup("--open-id u1").exitCode, 0);
+    const auto before = Everything();
+    const auto outcome = RunSetup("--open-id u1");
+    EXPECT_EQ(outcome.exitCode, 0);
+    EXPECT_TRUE(outcome.Says("already there: store " + Store())) << outcome.output;
+    EXPECT_TRUE(outcome.Says("nothing to do")) << outcome.output;
+    EXPECT_FALSE(outcome.Says("made")) << outcome.output;
+    EXPECT_TRUE(Everything() == before);
+}
+
+TEST_F(Setup, SaysWhatItWouldMakeAndMakesNothing) {
+    const auto before = Everything();
+    const auto outcome = RunSetup("--dry-run --open-id u1");
+    EXPECT_EQ(outcome.exitCode, 0) << outcome.output;
+    EXPECT_TRUE(outcome.Says("would make directory " + Preferences())) << outcome.output;
+    EXPECT_TRUE(outcome.Says("would make pid file " + PidFile())) << outcome.output;
+    EXPECT_TRUE(outcome.Says("would make store " + Store()));
+    EXPECT_TRUE(outcome.Says("would set OpenID to \"u1\""));
+    EXPECT_TRUE(Everything() == before);
+}
+
+TEST_F(Setup, StoresTheOpenIdAndTheVersion) {
+    EXPECT_EQ(RunSetup("--open-id u1 --suite-version 5.1.0.2").exitCode, 0);
+    EXPECT_EQ(Ask("select group_concat(key || '=' || value) from BaseInfo"),
+              "OpenID=u1,HubLinkVersion=5.1.0.2");
+}
+
+TEST_F(Setup, ReplacesTheOpenIdAndKeepsTheRest) {
+    EXPECT_EQ(RunSetup("--open-id u1 --suite-version 5.1.0.2").exitCode, 0);
+    EXPECT_EQ(RunSetup("--open-id u2").exitCode, 0);
+    EXPECT_EQ(Ask("select group_concat(key || '=' || value) from BaseInfo"),
+              "OpenID=u2,HubLinkVersion=5.1.0.2");
+}
+
+TEST_F(Setup, ReplacesEveryRowOfAKeyThatOthersStoredTwice) {
+    ASSERT_EQ(RunSetup("--open-id u1").exitCode, 0);
+    SQLite::Database(Store(), SQLite::OPEN_READWRITE)
+        .exec("insert into BaseInfo values ('OpenID', 'u2'), ('openid', 'other')");
+    EXPECT_EQ(RunSetup("--open-id u1").exitCode, 0);
+    EXPECT_EQ(Ask("select group_concat(key || '=' || value) from BaseInfo"),
+              "OpenID=u1,OpenID=u1,openid=other");
+}
+
+TEST_F(Setup, StoresATextThatLooksLikeSqlAsItIsAndWarnsOfTheQuote) {
+    const auto outcome = RunSetup("--open-id \"x'); drop table OperLog; --\"");
+    EXPECT_EQ(outcome.exitCode, 0) << outcome.output;
+    EXPECT_TRUE(outcome.Says("warning: ")) << outcome.output;
+    EXPECT_EQ(Ask("select value from BaseInfo"), "x'); drop table OperLog; --");
+    EXPECT_EQ(ColumnsOf("OperLog"), OPER_LOG_COLUMNS);
+}
+
+TEST_F(Setup, RefusesAnEmptyOpenId) {
+    const auto outcome = RunSetup("--open-id ''");
+    EXPECT_GE(outcome.exitCode, 100);
+    EXPECT_TRUE(outcome.Says("an empty text would have no effect")) << outcome.output;
+    EXPECT_FALSE(fs::exists(Data()));
+}
+
+TEST_F(Setup, TellsHowToGetTheRightToThePreferencesDirectoryAndDoesTheRest) {
+    // Nobody, not even root, can make a directory there.
+    const auto outcome = Reportctl("setup --preferences-dir /sys/reportctl-test/hublink");
+    EXPECT_EQ(outcome.exitCode, 1);
+    EXPECT_TRUE(outcome.Says("Run: sudo install -d -m 1777 /sys/reportctl-test/hublink && "
+                             "sudo install -m 0666 /dev/null /sys/reportctl-test/hublink/Report.pid\n"))
+        << outcome.output;
+    EXPECT_EQ(ModeOf(Store()), 0600u);
+}
+
+TEST_F(Setup, QuotesThePathInTheCommandThatItTells) {
+    const auto outcome = Reportctl("setup --preferences-dir \"/sys/it's here\"");
+    EXPECT_TRUE(outcome.Says("sudo install -d -m 1777 '/sys/it'\\''s here' && "
+                             "sudo install -m 0666 /dev/null '/sys/it'\\''s here/Report.pid'\n"))
+        << outcome.output;
+}
+
+TEST_F(Setup, CorrectsTheModeOfThePreferencesDirectory) {
+    fs::create_directories(Preferences());
+    fs::permissions(Preferences(), fs::perms{0777});
+    const auto outcome = RunSetup();
+    EXPECT_EQ(outcome.exitCode, 0);
+    EXPECT_TRUE(outcome.Says("changed directory " + Preferences() + " (mode 1777)")) << outcome.output;
+    EXPECT_EQ(ModeOf(Preferences()), 01777u);
+}
+
+TEST_F(Setup, DoesNotOpenToAllWhatALinkPointsTo) {
+    const auto target = fs::path(Preferences()).parent_path() / "target";
+    fs::create_directories(target);
+    fs::permissions(target, fs::perms{0700});
+    fs::create_symlink(target, Preferences());
+    const auto outcome = RunSetup();
+    EXPECT_EQ(outcome.exitCode, 1);
+    EXPECT_TRUE(outcome.Says(Preferences() + " is not a directory")) << outcome.output;
+    EXPECT_EQ(ModeOf(target), 0700u);
+    EXPECT_TRUE(fs::exists(Store()));
+}
+
+TEST_F(Setup, LeavesThePidFileOfARunningServiceAlone) {
+    ASSERT_EQ(RunSetup().exitCode, 0);
+    std::ofstream(PidFile()) << "4711";
+    struct stat before {};
+    ASSERT_EQ(::lstat(PidFile().c_str(), &before), 0);
+    EXPECT_EQ(RunSetup().exitCode, 0);
+    struct stat after {};
+    ASSERT_EQ(::lstat(PidFile().c_str(), &after), 0);
+    EXPECT_EQ(after.st_ino, before.st_ino);
+    EXPECT_EQ(ContentOf(PidFile()), "4711");
+}
+
+TEST_F(Setup, RefusesALinkInThePlaceOfThePidFile) {
+    ASSERT_EQ(RunSetup().exitCode, 0);
+    fs::remove(PidFile());
+    fs::create_symlink(Preferences() + "/target", PidFile());
+    const auto outcome = RunSetup();
+    EXPECT_EQ(outcome.exitCode, 1);
+    EXPECT_TRUE(outcome.Says(PidFile() + " is no regular file. Remove it")) << outcome.output;
+    EXPECT_FALSE(fs::exists(Preferences() + "/target"));
+}
+
+TEST_F(Setup, TellsHowAPidFileBecomesWritableForAll) {
+    ASSERT_EQ(RunSetup().exitCode, 0);
+    fs::permissions(PidFile(), fs::perms{0644});
+    EXPECT_TRUE(RunSetup().Says("Run: sudo chmod 0666 " + PidFile() + "\n"));
+    EXPECT_EQ(ModeOf(PidFile()), 0644u);
+}
+
+/// A directory for pid files that is another's, and a user who runs set-up: where the test runs as root, that must be
+/// made.
+class SetupInAnothersDirectory : public Setup {
+protected:
+    static constexpr uid_t NOBODY = 65534;
+
+    void SetUp() override {
+        if (::geteuid() != 0)
+            GTEST_SKIP() << "only root can give a directory to another user";
+        ASSERT_EQ(RunSetup().exitCode, 0);
+        fs::remove(PidFile());
+    }
+
+    /// The program where the other user can reach it, run on data of that user's own.
+    Outcome RunSetupAsNobody() const {
+        const auto root = fs::path(Data()).parent_path();
+        fs::permissions(root, fs::perms{0755});
+        fs::copy_file(REPORTCTL, root / "program", fs::copy_options::overwrite_existing);
+        fs::create_directories(root / "nobody");
+        if (::chown((root / "nobody").c_str(), NOBODY, NOBODY) != 0)
+            return {};
+        return Run("setpriv --reuid 65534 --regid 65534 --clear-groups env XDG_DATA_HOME='" +
+                   (root / "nobody").string() + "' '" + (root / "program").string() +
+                   "' setup --preferences-dir '" + Preferences() + "'");
+    }
+};
+
+TEST_F(SetupInAnothersDirectory, GivesThePidFileToItsOwnerAsRoot) {
+    ASSERT_EQ(::chown(Preferences().c_str(), NOBODY, NOBODY), 0);
+    const auto outcome = RunSetup();
+    EXPECT_EQ(outcome.exitCode, 0) << outcome.output;
+    EXPECT_EQ(OwnerOf(PidFile()), NOBODY);
+    EXPECT_EQ(ModeOf(PidFile()), 0666u);
+}
+
+TEST_F(SetupInAnothersDirectory, MakesNoPidFileThatWouldKeepOthersOutAndTellsTheCommand) {
+    const auto outcome = RunSetupAsNobody();
+    EXPECT_EQ(outcome.exitCode, 1) << outcome.output;
+    EXPECT_TRUE(outcome.Says("Run: sudo install -m 0666 /dev/null " + PidFile() + "\n")) << outcome.output;
+    EXPECT_FALSE(fs::exists(PidFile()));
+}
+
+TEST_F(SetupInAnothersDirectory, AsksNothingOfAUserWhenThePidFileIsThere) {
+    ASSERT_EQ(RunSetup().exitCode, 0);
+    const auto outcome = RunSetupAsNobody();
+    EXPECT_EQ(outcome.exitCode, 0) << outcome.output;
+    EXPECT_FALSE(outcome.Says("warning")) << outcome.output;
+}
+
+TEST_F(SetupInAnothersDirectory, WarnsOfAPidFileThatKeepsOthersOut) {
+    ASSERT_EQ(RunSetup().exitCode, 0);
+    ASSERT_EQ(::chown(PidFile().c_str(), NOBODY, NOBODY), 0);
+    EXPECT_TRUE(RunSetup().Says("Run: sudo chown --no-dereference 0 " + PidFile() + "\n"));
+}
+
+TEST_F(Setup, MakesTheUsersOwnDirectoriesPrivate) {
+    fs::create_directories(Database());
+    fs::permissions(Database(), fs::perms{0755});
+    const auto outcome = RunSetup();
+    EXPECT_EQ(outcome.exitCode, 0);
+    EXPECT_TRUE(outcome.Says("changed directory " + Database() + " (mode 0700)")) << outcome.output;
+    EXPECT_EQ(ModeOf(Database()), 0700u);
+}
+
+TEST_F(Setup, LetsTheUserKeepTheDataBehindALink) {
+    const auto elsewhere = Data() + "/elsewhere";
+    fs::create_directories(elsewhere);
+    fs::create_symlink(elsewhere, Data() + "/hublink");
+    EXPECT_EQ(RunSetup().exitCode, 0);
+    EXPECT_EQ(ModeOf(elsewhere), 0700u);
+    EXPECT_TRUE(fs::exists(elsewhere + "/database/Report.db"));
+}
+
+TEST_F(Setup, FailsOverAFileInTheWayOfADirectory) {
+    fs::create_directories(Data());
+    std::ofstream(Data() + "/hublink") << "in the way";
+    const auto outcome = RunSetup();
+    EXPECT_EQ(outcome.exitCode, 1);
+    EXPECT_TRUE(outcome.Says(Data() + "/hublink is not a directory. Move it away")) << outcome.output;
+    EXPECT_EQ(ContentOf(Data() + "/hublink"), "in the way");
+}
+
+TEST_F(Setup, KeepsUnderAnotherNameWhatALostStoreLeftBehind) {
+    fs::create_directories(Database());
+    for (const auto* suffix : {"-wal", "-shm", "-journal", ".left-1-wal"})
+        std::ofstream(Store() + suffix) << "rows of " << suffix;
+    const auto outcome = RunSetup();
+    EXPECT_EQ(outcome.exitCode, 0) << outcome.output;
+    EXPECT_TRUE(outcome.Says("renamed " + Store() + "-wal, which belonged to a store that is gone, to " +
+                             Store() + ".left-2-wal\n"))
+        << outcome.output;
+    ExpectEverythingMade();
+    EXPECT_EQ(ContentOf(Store() + ".left-1-wal"), "rows of .left-1-wal");
+    for (const std::string suffix : {"-wal", "-shm", "-journal"})
+        EXPECT_EQ(ContentOf(Store() + ".left-2" + suffix), "rows of " + suffix);
+}
+
+TEST_F(Setup, RenamesNothingInADryRun) {
+    fs::create_directories(Database());
+    std::ofstream(Store() + "-wal") << "rows";
+    const auto before = Everything();
+    EXPECT_TRUE(RunSetup("--dry-run").Says("would rename " + Store() + "-wal"));
+    EXPECT_TRUE(Everything() == before);
+}
+
+TEST_F(Setup, MakesNoStoreBesideALeftOverLogThatItCannotRename) {
+    // What something is mounted on cannot be renamed, not even by root.
+    const std::string withMounts = "unshare --user --map-root-user --mount ";
+    if (Run(withMounts + "true").exitCode != 0)
+        GTEST_SKIP() << "this machine does not allow user namespaces";
+    const auto log = Store() + "-wal";
+    fs::create_directories(log);
+    const auto outcome =
+        RunSetup("", withMounts + "sh -c 'mount -t tmpfs none \"$0\" && exec env \"$@\"' '" + log + "'");
+    EXPECT_EQ(outcome.exitCode, 1) << outcome.output;
+    EXPECT_TRUE(outcome.Says("Not renamed: " + log)) << outcome.output;
+    EXPECT_FALSE(fs::exists(Store()));
+}
+
+TEST_F(Setup, MakesTheStorePrivateThatOthersCouldRead) {
+    ASSERT_EQ(RunSetup().exitCode, 0);
+    fs::permissions(Store(), fs::perms{0644});
+    EXPECT_TRUE(RunSetup("--dry-run").Says("would change mode of " + Store() + " to 0600\ndry run"));
+    EXPECT_EQ(ModeOf(Store()), 0644u);
+    EXPECT_TRUE(RunSetup().Says("changed mode of " + Store() + " to 0600\n"));
+    EXPECT_EQ(ModeOf(Store()), 0600u);
+}
+
+TEST_F(Setup, WorksWhileTheStoreIsInUse) {
+    ASSERT_EQ(RunSetup().exitCode, 0);
+    SQLite::Database service(Store(), SQLite::OPEN_READWRITE);
+    service.exec("insert into OperLog (eventID) values ('x')");
+    EXPECT_EQ(RunSetup("--open-id u1").exitCode, 0);
+    service.exec("insert into OperLog (eventID) values ('y')");
+    EXPECT_EQ(Ask("select (select count(*) from OperLog) || value from BaseInfo"), "2u1");
+}
+
+TEST_F(Setup, ExplainsItsExitCodes) {
+    for (const auto* arguments : {"--help", "setup --help"}) {
+        const auto outcome = Reportctl(arguments);
+        EXPECT_EQ(outcome.exitCode, 0);
+        EXPECT_TRUE(outcome.Says("Exit codes: 0 done")) << outcome.output;
+    }
+}
+
+TEST_F(Setup, DoesNothingForACommandLineThatItDoesNotUnderstand) {
+    for (const auto* arguments : {"", "nonsense", "setup --nonsense"})
+        EXPECT_GE(Reportctl(arguments).exitCode, 100) << arguments;
+    EXPECT_FALSE(fs::exists(Data()));
+}
+
+} // namespace
