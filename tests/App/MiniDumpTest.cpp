@@ -4,6 +4,7 @@
 #include <cstdarg>
 #include <filesystem>
 #include <fstream>
+#include <map>
 #include <sstream>
 #include <thread>
 
@@ -135,6 +136,12 @@ protected:
 #define RECORD_240 "4 \\[App/MiniDump:240 OnStackCallBack\\] tag= Signal\\[11\\] reserved=0"
 #define RECORD_252 "4 \\[App/MiniDump:252 OnStackCallBack\\] tag= \\[.+\\] reserved=0"
 
+sighandler_t HandlerOf(int signal) {
+    struct sigaction action {};
+    ::sigaction(signal, nullptr, &action);
+    return action.sa_handler;
+}
+
 /// Goes `depth` calls deeper and crashes there. The result is used after the call, so that it stays one.
 [[gnu::noinline]] int CrashAt(int depth) {
     volatile int result = depth == 0 ? ::raise(SIGSEGV) : CrashAt(depth - 1);
@@ -258,6 +265,18 @@ TEST_F(InstanceGuard, AFileThatCannotBeWrittenEndsTheProcess) {
 
 // --- the crash handler
 
+TEST(CrashHandler, IsInstalledForASegmentationFaultAndNoOtherSignal) {
+    std::vector<int> changed;
+    std::map<int, sighandler_t> before;
+    for (int signal = 1; signal < SIGRTMIN; ++signal)
+        before[signal] = HandlerOf(signal);
+    MiniDump::EnableAutoStack("/logs", "Report");
+    for (const auto& [signal, handler] : before)
+        if (HandlerOf(signal) != handler)
+            changed.push_back(signal);
+    EXPECT_THAT(changed, ElementsAre(SIGSEGV));
+}
+
 TEST_F(CrashHandlerDeathTest, LogsTheSignalAndTheFramesAndExitsWithZero) {
     EXPECT_EXIT(::raise(SIGSEGV), ExitedWithCode(0), "^" RECORD_240 "\n(" RECORD_252 "\n)+$");
 }
@@ -275,6 +294,14 @@ TEST_F(CrashHandlerDeathTest, TracesStacksDeeperThanItsArrayWithoutHarm) {
 TEST_F(CrashHandlerDeathTest, LeavesOtherSignalsAlone) {
     EXPECT_EXIT(::raise(SIGABRT), KilledBySignal(SIGABRT), "^$");
     EXPECT_EXIT(::raise(SIGTERM), KilledBySignal(SIGTERM), "^$");
+}
+
+TEST_F(CrashHandlerDeathTest, RunsWhatTheProcessDoesAtItsExit) {
+    const auto crash = [] {
+        std::atexit([] { std::cerr << "at exit" << std::endl; });
+        ::raise(SIGSEGV);
+    };
+    EXPECT_EXIT(crash(), ExitedWithCode(0), RECORD_252 "\nat exit\n$");
 }
 
 TEST_F(CrashHandlerDeathTest, EndsAHandlerThatHangs) {

@@ -1,6 +1,7 @@
 #include "App/ReportServer.h"
 
 #include <filesystem>
+#include <memory>
 #include <thread>
 
 #include <Poco/Event.h>
@@ -16,6 +17,7 @@
 #include "tests/fakes/FakeSdk.h"
 #include "tests/fakes/FakeSqlite.h"
 #include "tests/support/CapturedOutput.h"
+#include "tests/support/OtherThread.h"
 #include "tests/support/WaitUntil.h"
 
 using namespace SyncServiceReport;
@@ -168,6 +170,27 @@ TEST_F(ReportServerTest, StopEndsTheInputBeforeTheQueue) {
     server.m_release.set();
     stopper.join();
     EXPECT_TRUE(WaitUntil([&] { return ThreadCount() == before; }));
+}
+
+TEST_F(ReportServerTest, DestructionKeepsTheDestinationsUntilTheReportUnderWayIsStored) {
+    auto server = std::make_unique<ReportServer>();
+    const auto before = ThreadCount();
+    ASSERT_TRUE(server->Start());
+    Poco::Event entered;
+    Poco::Event release;
+    m_db.onExec = [&] {
+        entered.set();
+        release.wait();
+    };
+    server->Recv(R"({"eventID":"B1"})");
+    entered.wait();
+    OtherThread destroyer([&] { server.reset(); });
+    // Consumer and destroyer are left when the receiver is gone.
+    EXPECT_TRUE(WaitUntil([&] { return ThreadCount() == before + 2; }, std::chrono::seconds(5)));
+    EXPECT_TRUE(destroyer.Waits());
+    EXPECT_EQ(m_db.destroyed, 0);
+    EXPECT_EQ(m_sdk.destroyed, 0);
+    release.set();
 }
 
 TEST_F(ReportServerTest, TheStoreIsReleasedBeforeAnalytics) {

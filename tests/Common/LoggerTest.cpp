@@ -6,6 +6,8 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "App/ReportServer.h"
+#include "Metrik/MetrikMgr.h"
 #include "tests/fakes/FakeLogger.h"
 
 using namespace SyncServiceReport;
@@ -174,6 +176,19 @@ TEST(PerFileLogger, IsAnInstanceOfItsOwnInEachSourceFile) {
     EXPECT_EQ(pSysLog, g_LoggerLoader.GetModule());
     EXPECT_EQ(g_LoggerLoader.GetModuleName(), "libBoostLogger.dylib");
     EXPECT_GT(FakeLogger().created, 5) << "the core's source files have theirs too";
+}
+
+TEST(PerFileLogger, OfOneFileIsNotThatOfAnother) {
+    WriteLog(SITE, "text");
+    ReportServer server;
+    server.Recv("text");
+    MetrikMgr manager(&server);
+    manager.Update("no JSON");
+    const auto instances = FakeLogger().InstanceOfFile();
+    EXPECT_EQ(instances.at("Common/LoggerTest"), pSysLog);
+    EXPECT_NE(instances.at("App/ReportServer"), pSysLog);
+    EXPECT_NE(instances.at("Metrik/MetrikMgr"), pSysLog);
+    EXPECT_NE(instances.at("App/ReportServer"), instances.at("Metrik/MetrikMgr"));
 }
 
 TEST(Constants, HaveTheirValues) {

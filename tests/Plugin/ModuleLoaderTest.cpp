@@ -1,12 +1,14 @@
 #include "Plugin/ModuleLoader.h"
 
 #include <fstream>
+#include <optional>
 #include <type_traits>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include "tests/fakes/FakeModule.h"
+#include "tests/support/OtherThread.h"
 #include "tests/support/TemporaryDirectory.h"
 
 using ::testing::HasSubstr;
@@ -143,6 +145,42 @@ TEST(ModuleLoader, UnloadGivesTheObjectBackAndKeepsThePointer) {
     EXPECT_EQ(loader.GetModule(), object);
     EXPECT_TRUE(loader.Unload()) << "nothing is open any more";
     EXPECT_EQ(state.destroyed, 1);
+}
+
+TEST(ModuleLoader, ANullObjectIsGivenBackToo) {
+    FakeModuleState& state = StateOf(NULL_MODULE);
+    { Loader loader(PathOf(NULL_MODULE)); }
+    EXPECT_EQ(state.destroyed, 1) << "the plug-in may have more to release than an object";
+    EXPECT_EQ(state.lastDestroyed, nullptr);
+}
+
+TEST(ModuleLoader, LoadAndUnloadWaitForALoadOnAnotherThread) {
+    FakeModuleState& state = StateOf(MODULE);
+    Loader loader(PathOf(MODULE));
+    loader.Unload();
+    std::optional<OtherThread> load;
+    std::optional<OtherThread> unload;
+    state.onCreate = [&] {
+        load.emplace([&] { EXPECT_TRUE(loader.Load()); });
+        EXPECT_TRUE(load->Waits());
+        unload.emplace([&] { EXPECT_TRUE(loader.Unload()); });
+        EXPECT_TRUE(unload->Waits());
+    };
+    EXPECT_TRUE(loader.Load());
+}
+
+TEST(ModuleLoader, LoadAndUnloadWaitForAnUnloadOnAnotherThread) {
+    FakeModuleState& state = StateOf(MODULE);
+    Loader loader(PathOf(MODULE));
+    std::optional<OtherThread> load;
+    std::optional<OtherThread> unload;
+    state.onDestroy = [&] {
+        load.emplace([&] { EXPECT_TRUE(loader.Load()); });
+        EXPECT_TRUE(load->Waits());
+        unload.emplace([&] { EXPECT_TRUE(loader.Unload()); });
+        EXPECT_TRUE(unload->Waits());
+    };
+    EXPECT_TRUE(loader.Unload());
 }
 
 TEST(ModuleLoader, UnloadClosesTheLibrary) {

@@ -35,6 +35,15 @@ std::string ContentOfPidFile() {
     return {std::istreambuf_iterator<char>(file), {}};
 }
 
+/// One bit for each signal that the process has a handler for, the lowest for signal 1.
+std::uint64_t CaughtSignals(pid_t process) {
+    std::ifstream status("/proc/" + std::to_string(process) + "/status");
+    for (std::string line; std::getline(status, line);)
+        if (line.starts_with("SigCgt:"))
+            return std::stoull(line.substr(7), nullptr, 16);
+    return 0;
+}
+
 class StartUp : public ::testing::Test {
 protected:
     /// A report is received and logged by the program.
@@ -66,6 +75,18 @@ TEST_F(StartUp, HoldsThePidFileAndAUmaskOfZero) {
     std::ifstream status("/proc/" + std::to_string(m_service.Process()) + "/status");
     const std::string text{std::istreambuf_iterator<char>(status), {}};
     EXPECT_THAT(text, HasSubstr("Umask:\t0000\n"));
+}
+
+TEST_F(StartUp, HandlesASegmentationFaultAndNoOtherSignal) {
+#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
+    GTEST_SKIP() << "the sanitizers' runtimes handle signals themselves";
+#endif
+    m_service.Install();
+    m_service.Start();
+    Service::Send(EVENT);
+    m_service.AwaitQuiet(); // after which every plug-in has done something
+    constexpr std::uint64_t C_LIBRARY = std::uint64_t{3} << 31U; // the two that it keeps for its threads
+    EXPECT_EQ(CaughtSignals(m_service.Process()) & ~C_LIBRARY, std::uint64_t{1} << (SIGSEGV - 1U));
 }
 
 TEST_F(StartUp, ASecondInstanceIsRefusedAndTheFirstGoesOn) {

@@ -33,7 +33,7 @@ public:
 
     void WriteLog(int level, const std::string& tag, const std::string& file, const std::string& function,
                   int line, const std::string& message, int reserved) override {
-        State().Write({level, file, function, line, message, tag, reserved});
+        State().Write({level, file, function, line, message, tag, reserved}, this);
     }
 };
 

@@ -2,6 +2,7 @@
 
 #include <functional>
 #include <iostream>
+#include <map>
 #include <mutex>
 #include <ostream>
 #include <string>
@@ -31,7 +32,7 @@ struct LogRecord {
 
 /// What the fake logger recorded, over all of its instances, and what it is told to do.
 struct FakeLoggerState {
-    void Write(LogRecord record) {
+    void Write(LogRecord record, const void* instance) {
         ThrowIf(throws);
         if (echoes)
             std::cerr << record << std::endl;
@@ -40,6 +41,7 @@ struct FakeLoggerState {
         if (onWrite)
             onWrite(record);
         const std::lock_guard lock(mutex);
+        instanceOfFile[record.file] = instance;
         records.push_back(std::move(record));
     }
     std::vector<LogRecord> Records() {
@@ -51,6 +53,11 @@ struct FakeLoggerState {
         auto all = Records();
         std::erase_if(all, [&function](const LogRecord& record) { return record.function != function; });
         return all;
+    }
+    /// The logger that wrote the last record of each source file.
+    std::map<std::string, const void*> InstanceOfFile() {
+        const std::lock_guard lock(mutex);
+        return instanceOfFile;
     }
     void Clear() {
         const std::lock_guard lock(mutex);
@@ -65,8 +72,9 @@ struct FakeLoggerState {
     bool hangs = false; ///< Never returns from a write.
 
 private:
-    std::mutex mutex; ///< Guards the records.
+    std::mutex mutex; ///< Guards the records and the instances.
     std::vector<LogRecord> records;
+    std::map<std::string, const void*> instanceOfFile;
 };
 
 inline FakeLoggerState& FakeLogger() {

@@ -26,6 +26,7 @@ FAKE_EXPORT FakeModuleState* FakeState() {
 #ifndef WITHOUT_CREATE
 FAKE_EXPORT IFakeModule* CreateModule() {
     ++g_state.created;
+    FakeModuleState::CallOnce(g_state.onCreate);
 #if defined(CREATE_THROWS)
     throw OwnError();
 #elif defined(CREATES_NULL)
@@ -39,6 +40,7 @@ FAKE_EXPORT IFakeModule* CreateModule() {
 #ifndef WITHOUT_DESTORY
 FAKE_EXPORT void DestoryModule(IFakeModule* module) {
     ++g_state.destroyed;
+    FakeModuleState::CallOnce(g_state.onDestroy);
     g_state.lastDestroyed = module;
     delete static_cast<Module*>(module);
 }

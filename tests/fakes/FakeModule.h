@@ -1,5 +1,8 @@
 #pragma once
 
+#include <functional>
+#include <utility>
+
 #include "tests/fakes/FakePlugin.h"
 
 /// The interface of the loader's test plug-ins.
@@ -16,4 +19,12 @@ struct FakeModuleState {
     int created = 0;
     int destroyed = 0;
     IFakeModule* lastDestroyed = nullptr;
+
+    std::function<void()> onCreate;  ///< Called by the next "CreateModule", and no other.
+    std::function<void()> onDestroy; ///< The same for "DestoryModule".
+
+    static void CallOnce(std::function<void()>& hook) {
+        if (const auto call = std::exchange(hook, nullptr))
+            call();
+    }
 };

@@ -20,7 +20,11 @@ class Database final : public ISqliteDatabase {
 public:
     bool Open(const std::string& path) override { return Record("Open", path); }
     bool CreateTable(const std::string& sql) override { return Record("CreateTable", sql); }
-    bool ExecSql(const std::string& sql) override { return Record("ExecSql", sql); }
+    bool ExecSql(const std::string& sql) override {
+        if (State().onExec)
+            State().onExec();
+        return Record("ExecSql", sql);
+    }
 
     bool BatExecSql(const std::vector<std::string>& sqls) override {
         const auto join = [](const std::string& all, const std::string& sql) {

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <deque>
+#include <functional>
 #include <string>
 #include <vector>
 
@@ -27,6 +28,7 @@ struct FakeSqliteState : FakeFactory {
     }
 
     std::vector<Call> calls;
+    std::function<void()> onExec; ///< Called by ExecSql before it answers.
     std::deque<bool> answers;
     bool answer = true;
     Throws throws = Throws::Nothing;
