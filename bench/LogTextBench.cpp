@@ -9,16 +9,36 @@
 // The text of a datagram's log record. The datagram is its own format.
 namespace {
 
+/// What the text costs, or the exception when it cannot be built.
+template <typename MakeText>
+void Measure(benchmark::State& state, MakeText makeText) {
+    for (auto _ : state) {
+        try {
+            benchmark::DoNotOptimize(makeText());
+        } catch (const std::exception& error) {
+            benchmark::DoNotOptimize(error.what());
+        }
+    }
+}
+
 void Build(benchmark::State& state, const std::string& datagram) {
-    for (auto _ : state)
-        benchmark::DoNotOptimize(SyncServiceReport::IsOwnText(datagram)
-                                     ? datagram.size()
-                                     : SyncServiceReport::BuildLogText(datagram).size());
+    Measure(state, [&] {
+        return SyncServiceReport::IsOwnText(datagram) ? datagram.size()
+                                                      : SyncServiceReport::BuildLogText(datagram).size();
+    });
 }
 
 void BareFormat(benchmark::State& state, const std::string& datagram) {
-    for (auto _ : state)
-        benchmark::DoNotOptimize(boost::format(datagram).str());
+    Measure(state, [&] { return boost::format(datagram).str().size(); });
+}
+
+/// As much of `directive` as a datagram has room for.
+std::string DatagramOf(const std::string& directive) {
+    constexpr std::size_t DATAGRAM_BYTES = 10240;
+    std::string datagram;
+    while (datagram.size() + directive.size() <= DATAGRAM_BYTES)
+        datagram += directive;
+    return datagram;
 }
 
 } // namespace
@@ -27,3 +47,12 @@ BENCHMARK_CAPTURE(BareFormat, PlainText, ReportOf180Bytes());
 BENCHMARK_CAPTURE(Build, PlainText, ReportOf180Bytes());
 BENCHMARK_CAPTURE(BareFormat, WithAPercentSign, ReportOf180Bytes() + "%%");
 BENCHMARK_CAPTURE(Build, WithAPercentSign, ReportOf180Bytes() + "%%");
+BENCHMARK_CAPTURE(BareFormat, DoubledPercentSigns, DatagramOf("%%"));
+BENCHMARK_CAPTURE(Build, DoubledPercentSigns, DatagramOf("%%"));
+BENCHMARK_CAPTURE(BareFormat, Tabulations, DatagramOf("%t"));
+BENCHMARK_CAPTURE(Build, Tabulations, DatagramOf("%t"));
+BENCHMARK_CAPTURE(BareFormat, Arguments, DatagramOf("%s"));
+BENCHMARK_CAPTURE(Build, Arguments, DatagramOf("%s"));
+BENCHMARK_CAPTURE(BareFormat, NumberedArguments, DatagramOf("%1%"));
+BENCHMARK_CAPTURE(Build, NumberedArguments, DatagramOf("%1%"));
+BENCHMARK_CAPTURE(Build, TabulationsFilledWithPercentSigns, DatagramOf("%1T%"));

@@ -1,5 +1,5 @@
-// A text from outside as the log's format string, and on into the log's line: one record whatever the text, within its
-// size, and one line that nobody can break out of.
+// A text from outside as the log's format string, and on into the log's line: one record whatever the text, what
+// boost::format makes of it, within its size, and one line that nobody can break out of.
 
 #include <algorithm>
 #include <chrono>
@@ -60,6 +60,38 @@ void RequireOneHarmlessLine(const LogRecord& record) {
         Require(line.find(mark) == std::string::npos, "nor one that ends or turns the line", line);
 }
 
+/// Whether a number is so long that boost::format would compute with it beyond the range of its integers.
+bool HasALongNumber(std::string_view text) {
+    const auto isDigit = [](char byte) { return byte >= '0' && byte <= '9'; };
+    return std::ranges::search_n(text, 10, true, {}, isDigit).size() == 10;
+}
+
+/// boost::format makes room for the directives that it counts, and counts a tabulation whose fill is a percent sign as one
+/// too few. One that has parsed as many directives as there are percent signs before keeps the room for them.
+boost::format WithRoom(const std::string& text) {
+    std::string roomy;
+    for (auto count = std::ranges::count(text, '%'); count > 0; --count)
+        roomy += "%1%";
+    boost::format format(roomy);
+    format.parse(text);
+    return format;
+}
+
+/// What boost::format itself makes of the text, as the record's message.
+std::string FormattedByBoost(const std::string& text) {
+    try {
+        const boost::format format = WithRoom(text);
+        const auto bytes = format.size();
+        if (format.remaining_args() == 0 &&
+            bytes > std::min(text.size() + MAX_LOG_TEXT_GROWTH_BYTES, MAX_LOG_TEXT_BYTES))
+            throw std::length_error("the text would grow from " + std::to_string(text.size()) + " to " +
+                                    std::to_string(bytes) + " bytes, too many for a log record");
+        return format.str();
+    } catch (const std::exception& error) {
+        return std::string(ERROR_MARK) + error.what();
+    }
+}
+
 } // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
@@ -69,6 +101,9 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     if (text.find('%') == std::string::npos)
         RequireEqual(record, (LogRecord{2, "fuzz/LogText", "LogText", 7, text}),
                      "a plain text stays as it is");
+    else if (!HasALongNumber(text))
+        RequireEqual(record.message, FormattedByBoost(text), "the text is what boost::format makes of it");
+    Require(record.message.size() <= text.size() + MAX_LOG_TEXT_GROWTH_BYTES, "a text hardly grows");
     RequireOneHarmlessLine(record);
     // As an argument, a text is never a format. (A text from outside that is the format has no arguments anywhere.)
     const std::string both = text + "-" + text;

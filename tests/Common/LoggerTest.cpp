@@ -1,5 +1,6 @@
 #include "Common/Common.h"
 
+#include <algorithm>
 #include <chrono>
 #include <utility>
 
@@ -38,6 +39,27 @@ LogRecord BoostLogError(const std::string& why) {
 
 bool IsBoostLogError(const LogRecord& record) {
     return record == BoostLogError(record.message.substr(std::min<std::size_t>(record.message.size(), 15)));
+}
+
+/// The text, or why it could not be built.
+template <typename MakeText>
+std::string TextOrReason(MakeText makeText) {
+    try {
+        return makeText();
+    } catch (const std::exception& error) {
+        return std::string("cannot be built: ") + error.what();
+    }
+}
+
+template <typename Action>
+std::chrono::steady_clock::duration BestOfTwenty(Action action) {
+    auto best = std::chrono::steady_clock::duration::max();
+    for (int i = 0; i < 20; ++i) {
+        const auto begin = std::chrono::steady_clock::now();
+        action();
+        best = std::min(best, std::chrono::steady_clock::now() - begin);
+    }
+    return best;
 }
 
 } // namespace
@@ -80,10 +102,24 @@ TEST(WriteLog, ReportsATextThatCannotBeBuilt) {
         BoostLogError("boost::too_many_args: format-string referred to fewer arguments than were passed"));
 }
 
+TEST(WriteLog, LetsATextFromOutsideGrowByFourKibibytesAndNoMore) {
+    EXPECT_EQ(Logged("a%|4105t|"), Plain("a" + std::string(4104, ' '))) << "from 9 bytes";
+    EXPECT_EQ(Logged("a%|4106t|"),
+              BoostLogError("the text would grow from 9 to 4106 bytes, too many for a log record"));
+    EXPECT_EQ(Logged("%|65000t|"),
+              BoostLogError("the text would grow from 9 to 65000 bytes, too many for a log record"));
+    const std::string long10k(10'000, 'x');
+    EXPECT_EQ(Logged(long10k + "%|14000t|"), Plain(long10k + std::string(4000, ' ')));
+}
+
 TEST(WriteLog, CountsATextOfMoreThanOneMebibyteAsOneThatCannotBeBuilt) {
-    EXPECT_EQ(Logged("a%|1048576t|").message.size(), 1048576U);
-    EXPECT_EQ(Logged("a%|1048577t|"),
+    const std::string mebibyte(1048576, 'x');
+    EXPECT_EQ(Logged("%s", mebibyte), Plain(mebibyte));
+    EXPECT_EQ(Logged("%s", mebibyte + "x"),
               BoostLogError("the text would have 1048577 bytes, more than the 1048576 of a log record"));
+    EXPECT_EQ(Logged(mebibyte), Plain(mebibyte));
+    EXPECT_TRUE(IsBoostLogError(Logged(mebibyte + "x")));
+    EXPECT_TRUE(IsBoostLogError(Logged(mebibyte + "x%%")));
 }
 
 TEST(WriteLog, BuildsNoGigabytesFromATabulationInAnySpelling) {
@@ -125,11 +161,50 @@ TEST(WriteLog, FormatsADirectiveThatBoostIgnores) {
     EXPECT_TRUE(IsBoostLogError(Logged("%0n%-hxo2"))) << "and no assertion ends the program";
 }
 
+TEST(WriteLog, GoesOnWithWhatAnIgnoredDirectiveSet) {
+    EXPECT_EQ(Logged("a%5n%tb"), Plain("a    b"));
+    EXPECT_EQ(Logged("a%05n%|7t|b"), Plain("a000000b"));
+}
+
+TEST(WriteLog, ReportsDirectivesThatDoNotMix) {
+    EXPECT_EQ(Logged("%1% %s"), BoostLogError("boost::bad_format_string: format-string is ill-formed"));
+}
+
+TEST(WriteLog, RefusesAPercentSignAtTheEndAlsoAsAFill) {
+    EXPECT_EQ(Logged("%9T%"), BoostLogError("boost::bad_format_string: format-string is ill-formed"));
+}
+
 TEST(WriteLog, BoundsATextOfManyTabulations) {
-    std::string format;
-    for (int column = 1; column <= 200; ++column)
-        format += "%|" + std::to_string(column * 1000) + "t|x";
-    EXPECT_EQ(Logged(format).message.size(), 200'000U + 1);
+    const auto withColumns = [](int step) {
+        std::string format;
+        for (int column = 1; column <= 200; ++column)
+            format += "%|" + std::to_string(column * step) + "t|x";
+        return format;
+    };
+    EXPECT_EQ(Logged(withColumns(20)).message.size(), 200U * 20 + 1);
+    EXPECT_TRUE(IsBoostLogError(Logged(withColumns(100))));
+}
+
+TEST(WriteLog, GivesWhatBoostFormatGives) {
+    for (const std::string text :
+         {"",      "plain", "%%",   "100%% of %%s", "a%|9t|b",  "a%9tb", "a%|5T-|b", "a%05tb",  "a%-05tb",
+          "50%no", "%",     "%|",   "%|1",          "%1",       "%1%",   "%1% %2%",  "%2$s",    "%s%1%",
+          "%|1%",  "%|s",   "%|s|", "%|s",          "%y",       "%I64d", "%I3d",     "%Id",     "%hhd",
+          "%.*f",  "%*d",   "%.3s", "%+5n%t|",      "%c%n%t%%", "%5T",   "%5T%",     "%|5T%|x", "%5T%x"})
+        EXPECT_EQ(TextOrReason([&] { return BuildLogText(text); }),
+                  TextOrReason([&] { return boost::format(text).str(); }))
+            << text;
+}
+
+TEST(WriteLog, TakesLittleTimeForADatagramOfPercentSigns) {
+    for (const std::string directive : {"%%", "%s", "%t", "%1%", "%n"}) {
+        std::string datagram;
+        while (datagram.size() + directive.size() <= 10240)
+            datagram += directive;
+        const auto format = [&] { TextOrReason([&] { return BuildLogText(datagram); }); };
+        const auto bare = [&] { TextOrReason([&] { return boost::format(datagram).str(); }); };
+        EXPECT_LT(BestOfTwenty(format), 2 * BestOfTwenty(bare)) << directive;
+    }
 }
 
 TEST(WriteLog, ReportsAWriteThatThrows) {
