@@ -15,9 +15,10 @@ namespace reportctl::commands {
 using Add = void(CLI::App& app, int& exitCode);
 
 Add AddSetup; ///< `setup` makes what the service needs.
+Add AddRun;   ///< `run` becomes the service as soon as no other one runs.
 Add AddSend;  ///< `send` sends the running service a report or a control message, from flags or line by line.
 
 /// In the order of the help.
-inline constexpr std::array ALL{&AddSetup, &AddSend};
+inline constexpr std::array ALL{&AddSetup, &AddRun, &AddSend};
 
 } // namespace reportctl::commands

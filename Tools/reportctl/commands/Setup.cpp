@@ -16,7 +16,8 @@ void AddSetup(CLI::App& app, int& exitCode) {
         "setup",
         "Make what the service needs: its directories, and the store Report.db with its tables. Run as "
         "the user whose reports are to be stored. Running it again changes nothing.");
-    setup->add_flag("--dry-run", options->dryRun, "Say what would be done and change nothing");
+    auto* dryRun = setup->add_flag("--dry-run", options->dryRun, "Say what would be done and change nothing");
+    setup->add_flag("--quiet", options->quiet, "Say only what goes wrong")->excludes(dryRun);
     const CLI::Validator notEmpty(
         [](const std::string& text) { return text.empty() ? "an empty text would have no effect" : ""; },
         "TEXT");

@@ -36,7 +36,7 @@ void SetUpUserData(terminal::Worklog& log, const SetupOptions& options) {
 } // namespace
 
 int RunSetup(const SetupOptions& options) {
-    terminal::Worklog log(options.dryRun);
+    terminal::Worklog log(options.dryRun, options.quiet);
     const auto preferences = std::filesystem::absolute(options.preferencesDir).string();
     if (EnsureSharedDirectory(log, preferences))
         EnsurePidFile(log, preferences);

@@ -8,7 +8,7 @@
 namespace reportctl::terminal {
 
 void Worklog::AlreadyDone(const std::string& thing) {
-    fmt::print("already there: {}\n", thing);
+    Say("already there: " + thing);
 }
 
 bool Worklog::Run(const Verb& verb, const std::string& thing, const std::function<void()>& action,
@@ -21,7 +21,7 @@ bool Worklog::Run(const Verb& verb, const std::string& thing, const std::functio
         return false;
     }
     m_hasChanged = true;
-    fmt::print("{} {}\n", m_isDryRun ? verb.planned : verb.done, thing);
+    Say(fmt::format("{} {}", m_isDryRun ? verb.planned : verb.done, thing));
     return true;
 }
 
@@ -36,12 +36,17 @@ void Worklog::Warn(const std::string& text) const {
 
 bool Worklog::Summarise() const {
     if (m_hasFailed)
-        fmt::print("not everything is set up: see the errors\n");
+        Say("not everything is set up: see the errors");
     else if (!m_hasChanged)
-        fmt::print("nothing to do: everything was set up before\n");
+        Say("nothing to do: everything was set up before");
     else if (m_isDryRun)
-        fmt::print("dry run: nothing was changed\n");
+        Say("dry run: nothing was changed");
     return !m_hasFailed;
+}
+
+void Worklog::Say(const std::string& line) const {
+    if (!m_isQuiet)
+        fmt::print("{}\n", line);
 }
 
 } // namespace reportctl::terminal

@@ -18,12 +18,12 @@ inline constexpr Verb MIGRATE{"migrated", "would migrate"};
 inline constexpr Verb RENAME{"renamed", "would rename"};
 
 /// Does things and tells the person, one line each: results on standard output, failures and warnings on
-/// standard error. In a dry run nothing is done, only told.
+/// standard error. In a dry run nothing is done, only told. A quiet one tells failures and warnings only.
 ///
 /// One thread.
 class Worklog {
 public:
-    explicit Worklog(bool isDryRun) : m_isDryRun(isDryRun) {}
+    explicit Worklog(bool isDryRun, bool isQuiet = false) : m_isDryRun(isDryRun), m_isQuiet(isQuiet) {}
 
     /// `thing` needs nothing.
     void AlreadyDone(const std::string& thing);
@@ -45,7 +45,10 @@ public:
     bool Summarise() const;
 
 private:
+    void Say(const std::string& line) const;
+
     bool m_isDryRun;
+    bool m_isQuiet;
     bool m_hasChanged = false;
     bool m_hasFailed = false;
 };

@@ -323,6 +323,24 @@ TEST_F(Setup, WorksWhileTheStoreIsInUse) {
     EXPECT_EQ(Ask("select (select count(*) from OperLog) || value from BaseInfo"), "2u1");
 }
 
+TEST_F(Setup, SaysNothingWhenItIsToBeQuietAndAllGoesWell) {
+    for (const auto* when : {"the first time", "again"}) {
+        const auto outcome = RunSetup("--quiet");
+        EXPECT_EQ(outcome.exitCode, 0) << when;
+        EXPECT_EQ(outcome.output, "") << when;
+    }
+    ExpectEverythingMade();
+}
+
+TEST_F(Setup, TellsWhatGoesWrongAlsoWhenItIsToBeQuiet) {
+    fs::create_directories(Data() + "/hublink");
+    std::ofstream(Data() + "/hublink/database") << "in the way";
+    const auto outcome = RunSetup("--quiet");
+    EXPECT_EQ(outcome.exitCode, 1);
+    EXPECT_TRUE(outcome.output.starts_with("error: " + Database() + " is not a directory."))
+        << outcome.output;
+}
+
 TEST_F(Setup, ExplainsItsExitCodes) {
     for (const auto* arguments : {"--help", "setup --help"}) {
         const auto outcome = Reportctl(arguments);

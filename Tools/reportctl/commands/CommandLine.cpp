@@ -1,0 +1,24 @@
+#include "Tools/reportctl/commands/CommandLine.h"
+
+#include <CLI/CLI.hpp>
+
+#include "Tools/reportctl/commands/Commands.h"
+#include "Tools/reportctl/service/Program.h"
+
+namespace reportctl::commands {
+
+std::unique_ptr<CLI::App> MakeCommandLine(int& exitCode) {
+    auto app = std::make_unique<CLI::App>(
+        "Looks after SyncServiceReport, the service that stores usage reports.", "reportctl");
+    app->require_subcommand(1);
+    app->footer(
+        "Exit codes: 0 done, or nothing to do; 1 something could not be done, and the message says what\n"
+        "to do about it; 100 and above: the command line was not understood.");
+    app->set_version_flag("--version", service::VersionText,
+                          "Print the version and build of reportctl and of the service, and exit");
+    for (auto* const add : ALL)
+        add(*app, exitCode);
+    return app;
+}
+
+} // namespace reportctl::commands

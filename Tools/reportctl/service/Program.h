@@ -1,0 +1,15 @@
+#pragma once
+
+#include <string>
+
+/// The service's program, as it is installed with this reportctl.
+namespace reportctl::service {
+
+/// Its path: beside reportctl, as in a build, or where the installation puts it. Empty when it is at neither place.
+std::string ProgramPath();
+
+/// For --version: a line for reportctl and one for the service, whose version is read from its file. Running it would
+/// start it: it takes no arguments.
+std::string VersionText();
+
+} // namespace reportctl::service

@@ -1,0 +1,44 @@
+#include "Tools/reportctl/service/Turn.h"
+
+#include <cerrno>
+#include <system_error>
+
+#include <fcntl.h>
+#include <fmt/format.h>
+#include <unistd.h>
+
+#include "Common/Constants.h"
+#include "Tools/reportctl/service/Program.h"
+
+namespace reportctl::service {
+namespace {
+
+/// The lock is taken only to learn that it is free. It goes when the program is replaced, because that closes the file,
+/// and the service takes it anew. When another one is faster, the service refuses to start, and the caller tries again.
+void AwaitLock() {
+    const int file = ::open((MAC_REG_PATH + "/Report.pid").c_str(), O_RDWR | O_CLOEXEC | O_NOFOLLOW);
+    if (file < 0)
+        return;
+    struct flock whole {};
+    whole.l_type = F_WRLCK;
+    whole.l_whence = SEEK_SET;
+    while (::fcntl(file, F_SETLKW, &whole) != 0 && errno == EINTR) {
+    }
+}
+
+} // namespace
+
+int TakeTurn() {
+    auto program = ProgramPath();
+    if (program.empty()) {
+        fmt::print(stderr, "error: SyncServiceReport is not installed beside reportctl. Install it again.\n");
+        return 1;
+    }
+    AwaitLock();
+    char* const arguments[] = {program.data(), nullptr};
+    ::execv(program.c_str(), arguments);
+    fmt::print(stderr, "error: cannot run {}: {}\n", program, std::generic_category().message(errno));
+    return 1;
+}
+
+} // namespace reportctl::service
