@@ -1,6 +1,5 @@
 #pragma once
 
-#include <cstddef>
 #include <string_view>
 
 #include "Modules/BoostLogger/LineBuffer.h"
@@ -13,8 +12,5 @@ namespace BoostLogger {
 ///   other control characters, C1 controls, bytes that are no UTF-8,
 ///   line separators and text direction overrides       each byte as \x and two hexadecimal digits
 void AppendEscaped(LineBuffer& line, std::string_view text);
-
-/// The longest beginning of `text` that has at most `maxBytes` and does not end within a UTF-8 character.
-std::string_view CutAtCharacter(std::string_view text, std::size_t maxBytes);
 
 } // namespace BoostLogger

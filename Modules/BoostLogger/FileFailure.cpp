@@ -1,11 +1,11 @@
 #include "Modules/BoostLogger/FileFailure.h"
 
-#include <system_error>
+#include "SystemTool/Errno.h"
 
 namespace BoostLogger {
 
 std::string FileFailure::Text() const {
-    return std::string("cannot ") + step + ": " + std::generic_category().message(error);
+    return std::string("cannot ") + step + ": " + SystemTool::ErrnoText(error);
 }
 
 } // namespace BoostLogger

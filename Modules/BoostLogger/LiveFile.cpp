@@ -10,11 +10,12 @@
 #include <sys/uio.h>
 #include <unistd.h>
 
+#include "SystemTool/IO/MakeDirectories.h"
+
 namespace BoostLogger {
 
 namespace {
 
-constexpr mode_t DIRECTORY_MODE = 0700;
 constexpr mode_t FILE_MODE = 0600;
 
 /// The other process holds the lock for one rename and a few unlinks; where it takes longer it is stopped or
@@ -25,18 +26,7 @@ constexpr std::chrono::milliseconds LOCK_PAUSE{1};
 } // namespace
 
 FileFailure MakeDirectory(const std::string& path) {
-    for (std::size_t end = path.find('/', 1);; end = path.find('/', end + 1)) {
-        const std::string part = path.substr(0, end);
-        const int refusal = mkdir(part.c_str(), DIRECTORY_MODE) == 0 ? 0 : errno;
-        if (refusal == 0)
-            chmod(part.c_str(), DIRECTORY_MODE); // for a umask that takes the owner's own rights away
-        else if (struct stat status{}; stat(part.c_str(), &status) != 0)
-            return {refusal, "make the directory"}; // that it is not there either explains nothing
-        else if (!S_ISDIR(status.st_mode))
-            return {ENOTDIR, "make the directory"};
-        if (end == std::string::npos)
-            return {};
-    }
+    return {SystemTool::IO::MakeDirectories(path).error, "make the directory"};
 }
 
 FileFailure LiveFile::Open(const std::string& path) {

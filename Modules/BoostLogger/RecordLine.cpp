@@ -10,6 +10,7 @@
 
 #include "Modules/BoostLogger/EscapedText.h"
 #include "SystemTool/Platform.h"
+#include "SystemTool/Text/Utf8.h"
 
 namespace BoostLogger {
 
@@ -99,7 +100,7 @@ void AppendSite(LineBuffer& line, const LogRecord& record) {
 }
 
 void AppendMessage(LineBuffer& line, std::string_view message) {
-    AppendEscaped(line, CutAtCharacter(message, MAX_MESSAGE_BYTES));
+    AppendEscaped(line, SystemTool::Text::CutUtf8(message, MAX_MESSAGE_BYTES));
     if (message.size() <= MAX_MESSAGE_BYTES)
         return;
     Append(line, "... [cut, the message had ");

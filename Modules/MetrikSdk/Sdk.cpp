@@ -2,9 +2,9 @@
 
 #include <utility>
 
-#include "Modules/MetrikSdk/Utf8.h"
 #include "Modules/MetrikSdk/Version.h"
 #include "Modules/MetrikSdk/outbox/StoreError.h"
+#include "SystemTool/Text/Utf8.h"
 
 namespace MetrikSdk {
 namespace {
@@ -12,6 +12,10 @@ namespace {
 /// A module's texts come from datagrams of 10 KiB, and every module's stay in memory. Longer ones are cut; no
 /// honest module has one.
 constexpr std::size_t MAX_IDENTITY_BYTES = 256;
+
+std::string Cut(const std::string& identity) {
+    return std::string(SystemTool::Text::CutUtf8(identity, MAX_IDENTITY_BYTES));
+}
 
 void Call(IMetrikSdk::Callback callback, const std::string& what, const std::string& detail) {
     try {
@@ -39,8 +43,7 @@ bool Sdk::InitSdk(std::string moduleId, std::string moduleVersion, std::string m
                   std::string /*logDir*/, std::string dbDir, Callback onFailure, Callback onSuccess) {
     try {
         Detach();
-        m_module = {CutUtf8(moduleId, MAX_IDENTITY_BYTES), CutUtf8(moduleVersion, MAX_IDENTITY_BYTES),
-                    CutUtf8(moduleName, MAX_IDENTITY_BYTES)};
+        m_module = {Cut(moduleId), Cut(moduleVersion), Cut(moduleName)};
         m_onFailure = onFailure;
         m_onSuccess = onSuccess;
         return Attach(dbDir);

@@ -2,41 +2,23 @@
 
 #include <cstddef>
 #include <stdexcept>
-#include <string_view>
 #include <utility>
 
 #include <rapidjson/document.h>
-#include <rapidjson/memorystream.h>
 #include <rapidjson/stringbuffer.h>
 #include <rapidjson/writer.h>
 
 #include "SystemTool/IO/JsonParse.h"
 #include "SystemTool/IO/JsonWalk.h"
+#include "SystemTool/Text/Utf8.h"
 
 namespace SystemTool::IO {
 namespace {
 
 using Value = rapidjson::Value;
 
-/// `text` with each byte that is no part of valid UTF-8 replaced by U+FFFD.
-std::string ValidUtf8(const std::string& text) {
-    rapidjson::MemoryStream bytes(text.data(), text.size());
-    rapidjson::StringBuffer valid;
-    while (bytes.Tell() < text.size()) {
-        const char* const begin = bytes.src_;
-        const auto length = valid.GetSize();
-        if (!rapidjson::UTF8<>::Validate(bytes, valid)) {
-            valid.Pop(valid.GetSize() - length);
-            for (const char byte : std::string_view("\xef\xbf\xbd"))
-                valid.Put(byte);
-            bytes.src_ = begin + 1;
-        }
-    }
-    return {valid.GetString(), valid.GetSize()};
-}
-
 Value TextValue(const std::string& text, rapidjson::Document::AllocatorType& allocator) {
-    const std::string valid = ValidUtf8(text);
+    const std::string valid = Text::ValidUtf8(text);
     return Value(valid.data(), static_cast<rapidjson::SizeType>(valid.size()), allocator);
 }
 

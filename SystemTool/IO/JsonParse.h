@@ -15,29 +15,15 @@
 #include <rapidjson/reader.h>
 
 #include "SystemTool/IO/JsonDocument.h"
+#include "SystemTool/Text/Utf8.h"
 
-// How JsonDocument reads a text; of no use to anybody else.
+// How a JSON text is read: JsonDocument and the encoder of analytics events use it, so that both read numbers alike.
 namespace SystemTool::IO {
 
 // Numbers come as their texts. The parser's own conversion loses some: 1.84467440737095516155 runs over in its 64 bits
 // and comes out as anything, 10e308 as next to nothing, and 17976931348623159e292 as an infinity, which JSON cannot hold.
 inline constexpr unsigned JSON_PARSE_FLAGS =
     rapidjson::kParseIterativeFlag | rapidjson::kParseNumbersAsStringsFlag;
-
-/// Whether all bytes are ASCII, which is valid UTF-8: eight bytes at a time, where the parser decodes each. A usual report
-/// is, and what this saves was a tenth of the cost of its document.
-inline bool IsAscii(std::string_view text) {
-    constexpr std::uint64_t HIGH_BITS = 0x8080808080808080;
-    std::uint64_t all = 0;
-    for (; text.size() >= sizeof all; text.remove_prefix(sizeof all)) {
-        std::uint64_t eight = 0;
-        std::memcpy(&eight, text.data(), sizeof eight);
-        all |= eight;
-    }
-    for (const char byte : text)
-        all |= static_cast<unsigned char>(byte);
-    return (all & HIGH_BITS) == 0;
-}
 
 /// Whether decoded text holds half a surrogate pair: what an escape such as \udc00 on its own decodes to,
 /// which is no UTF-8 and which the parser lets pass.
@@ -65,7 +51,7 @@ class JsonGuard {
 public:
     using Ch = char;
 
-    explicit JsonGuard(rapidjson::Document& document) : m_document(document) {}
+    JsonGuard(rapidjson::Document& document, int maxDepth) : m_document(document), m_maxDepth(maxDepth) {}
 
     bool Null() { return m_document.Null(); }
     bool Bool(bool value) { return m_document.Bool(value); }
@@ -101,7 +87,7 @@ public:
     const char* Refusal() const { return m_refusal; }
 
 private:
-    bool Enter() { return ++m_depth <= JsonDocument::MAX_DEPTH || Refuse("Nested deeper than 128 levels."); }
+    bool Enter() { return ++m_depth <= m_maxDepth || Refuse("Nested deeper than 128 levels."); }
     bool IsText(const Ch* text, rapidjson::SizeType length) {
         return !HasLoneSurrogate(text, length) || Refuse("Half a surrogate pair in string.");
     }
@@ -113,6 +99,7 @@ private:
     static_assert(JsonDocument::MAX_DEPTH == 128, "the refusal's text names the limit");
 
     rapidjson::Document& m_document;
+    const int m_maxDepth;
     int m_depth = 0;
     const char* m_refusal = "";
 };
@@ -120,14 +107,15 @@ private:
 /// One parse, in the shape that rapidjson::Document::Populate wants: it calls this with itself as the handler.
 class JsonParse {
 public:
-    explicit JsonParse(const std::string& text)
-        : m_text(text), m_start(text.starts_with(BYTE_ORDER_MARK) ? BYTE_ORDER_MARK.size() : 0) {}
+    explicit JsonParse(const std::string& text, int maxDepth = JsonDocument::MAX_DEPTH)
+        : m_text(text), m_maxDepth(maxDepth),
+          m_start(text.starts_with(BYTE_ORDER_MARK) ? BYTE_ORDER_MARK.size() : 0) {}
 
     bool operator()(rapidjson::Document& document) {
         rapidjson::MemoryStream bytes(m_text.data() + m_start, m_text.size() - m_start);
-        JsonGuard guard(document);
+        JsonGuard guard(document, m_maxDepth);
         rapidjson::Reader reader;
-        m_result = IsAscii(m_text)
+        m_result = Text::IsAscii(m_text)
                        ? reader.Parse<JSON_PARSE_FLAGS>(bytes, guard)
                        : reader.Parse<JSON_PARSE_FLAGS | rapidjson::kParseValidateEncodingFlag>(bytes, guard);
         m_refusal = guard.Refusal();
@@ -149,6 +137,7 @@ private:
     static constexpr std::string_view BYTE_ORDER_MARK = "\xef\xbb\xbf";
 
     const std::string& m_text;
+    const int m_maxDepth;
     const std::size_t m_start; ///< Behind a byte order mark.
     rapidjson::ParseResult m_result;
     const char* m_refusal = "";

@@ -6,10 +6,10 @@
 #include <rapidjson/stringbuffer.h>
 #include <rapidjson/writer.h>
 
-#include "Modules/MetrikSdk/Utf8.h"
 #include "Modules/MetrikSdk/Version.h"
 #include "Modules/MetrikSdk/otlp/AnyValue.h"
 #include "Modules/MetrikSdk/otlp/Payload.h"
+#include "SystemTool/Text/Utf8.h"
 
 namespace MetrikSdk::otlp {
 namespace {
@@ -80,7 +80,7 @@ private:
         m_writer.StartObject();
         TextMember("timeUnixNano", Nanoseconds(payload.CreateTime().value_or(event.storedAt)));
         TextMember("observedTimeUnixNano", Nanoseconds(event.storedAt));
-        TextMember("eventName", ValidUtf8(event.eventId));
+        TextMember("eventName", SystemTool::Text::ValidUtf8(event.eventId));
         m_writer.Key("body");
         if (payload.Object() != nullptr)
             WriteAnyValue(m_writer, *payload.Object());
@@ -107,12 +107,12 @@ private:
 
     void TextValue(const std::string& text) {
         m_writer.StartObject();
-        TextMember("stringValue", ValidUtf8(text));
+        TextMember("stringValue", SystemTool::Text::ValidUtf8(text));
         m_writer.EndObject();
     }
 
     void TextAttribute(const char* key, const std::string& text) {
-        Attribute(key, "stringValue", ValidUtf8(text));
+        Attribute(key, "stringValue", SystemTool::Text::ValidUtf8(text));
     }
 
     void Attribute(const char* key, const char* type, const std::string& value) {

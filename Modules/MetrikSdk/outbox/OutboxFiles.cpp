@@ -4,39 +4,24 @@
 #include <cerrno>
 #include <cstdio>
 #include <ctime>
-#include <system_error>
 
 #include <fcntl.h>
 #include <sys/stat.h>
-#include <unistd.h>
 
 #include "Modules/MetrikSdk/outbox/StoreError.h"
+#include "Modules/Sqlite/SideFiles.h"
+#include "SystemTool/Errno.h"
+#include "SystemTool/IO/Descriptor.h"
+#include "SystemTool/IO/MakeDirectories.h"
 
 namespace MetrikSdk::outbox::OutboxFiles {
 namespace {
 
-constexpr mode_t DIRECTORY_MODE = 0700;
 constexpr mode_t FILE_MODE = 0600;
 
 [[noreturn]] void Fail(const std::string& what, const std::string& path, int error = errno) {
-    const auto reason = std::generic_category().message(error);
-    throw StoreError(StoreFault::Reopen, what + " " + path + ": " + reason);
+    throw StoreError(StoreFault::Reopen, what + " " + path + ": " + SystemTool::ErrnoText(error));
 }
-
-class Descriptor {
-public:
-    explicit Descriptor(int number) : m_number(number) {}
-    ~Descriptor() {
-        if (m_number >= 0)
-            ::close(m_number);
-    }
-    Descriptor(const Descriptor&) = delete;
-    Descriptor& operator=(const Descriptor&) = delete;
-    int Number() const { return m_number; }
-
-private:
-    int m_number;
-};
 
 bool Exists(const std::string& path) {
     struct stat status {};
@@ -56,6 +41,11 @@ std::string FileNameTime(WallTime now) {
     return text.data();
 }
 
+void Rename(const std::string& from, const std::string& to) {
+    if (::rename(from.c_str(), to.c_str()) != 0 && errno != ENOENT)
+        Fail("Cannot set aside", from);
+}
+
 std::string UnusedName(const std::string& wanted) {
     auto name = wanted;
     for (int count = 2; Exists(name); ++count)
@@ -66,21 +56,15 @@ std::string UnusedName(const std::string& wanted) {
 } // namespace
 
 void MakeDirectory(const std::string& directory) {
-    for (auto end = directory.find('/', 1);; end = directory.find('/', end + 1)) {
-        const auto level = directory.substr(0, end);
-        // The umask can only take rights away from a mode given to mkdir.
-        const int error = ::mkdir(level.c_str(), DIRECTORY_MODE) == 0 ? 0 : errno;
-        if (error != 0 && error != EEXIST && !Exists(level)) // which has an errno of its own
-            Fail("Cannot make the directory", level, error);
-        if (end == std::string::npos)
-            return;
-    }
+    if (const auto failure = SystemTool::IO::MakeDirectories(directory))
+        Fail("Cannot make the directory", failure.path, failure.error);
 }
 
 Identity Prepare(const std::string& path) {
-    const Descriptor file(::open(path.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW, FILE_MODE));
+    const SystemTool::IO::Descriptor file(
+        ::open(path.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW, FILE_MODE));
     struct stat status {};
-    if (file.Number() < 0 || ::fstat(file.Number(), &status) != 0)
+    if (!file.IsOpen() || ::fstat(file.Number(), &status) != 0)
         Fail("Cannot open", path);
     if (!S_ISREG(status.st_mode))
         throw StoreError(StoreFault::Reopen, "Not a regular file: " + path);
@@ -101,9 +85,9 @@ std::string SetAside(const std::string& path, const Identity& identity, WallTime
         return {};
     auto name = UnusedName(path + ".damaged-" + FileNameTime(now));
     // The database goes last: a new one beside the side files of an old one would take them for its own.
-    for (const std::string suffix : {"-wal", "-shm", ""})
-        if (::rename((path + suffix).c_str(), (name + suffix).c_str()) != 0 && errno != ENOENT)
-            Fail("Cannot set aside", path + suffix);
+    for (const auto* suffix : Sqlite::SIDE_FILE_SUFFIXES)
+        Rename(path + suffix, name + suffix);
+    Rename(path, name);
     return name;
 }
 

@@ -7,9 +7,9 @@
 
 #include <strings.h>
 
-#include "Modules/MetrikSdk/Utf8.h"
 #include "Modules/MetrikSdk/otlp/RetryAfter.h"
 #include "SystemTool/IO/JsonDocument.h"
+#include "SystemTool/Text/Utf8.h"
 
 namespace MetrikSdk::upload::RetryPolicy {
 namespace {
@@ -33,7 +33,7 @@ bool AsksToWait(long status) {
 }
 
 std::string OneLine(const std::string& text) {
-    auto line = ValidUtf8(CutUtf8(text, MAX_QUOTED_BYTES));
+    auto line = SystemTool::Text::ValidUtf8(SystemTool::Text::CutUtf8(text, MAX_QUOTED_BYTES));
     std::replace_if(
         line.begin(), line.end(), [](char c) { return static_cast<unsigned char>(c) < 0x20; }, ' ');
     return line;

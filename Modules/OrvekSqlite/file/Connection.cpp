@@ -5,6 +5,8 @@
 #include <filesystem>
 #include <string_view>
 
+#include "Modules/Sqlite/SideFiles.h"
+
 namespace OrvekSqlite::file {
 namespace {
 
@@ -37,7 +39,7 @@ const std::string& MadePrivate(const std::string& path) {
 /// write it. Named by SQLite, which resolved symbolic links first.
 void AlignSideFiles(sqlite3* connection) {
     const std::string file = sqlite3_db_filename(connection, "main");
-    for (const auto* suffix : {"-wal", "-shm", "-journal"})
+    for (const auto* suffix : Sqlite::SIDE_FILE_SUFFIXES)
         SetMode(file + suffix, ModeOf(file));
 }
 

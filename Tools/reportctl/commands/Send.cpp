@@ -6,13 +6,13 @@
 #include <iostream>
 #include <memory>
 #include <optional>
-#include <system_error>
 
 #include <CLI/CLI.hpp>
 #include <Poco/Exception.h>
 #include <fmt/format.h>
 
 #include "Common/Records.h"
+#include "SystemTool/Errno.h"
 #include "Tools/reportctl/send/Delivery.h"
 #include "Tools/reportctl/send/Messages.h"
 
@@ -68,7 +68,7 @@ int SendLines(const std::string& path, const send::DeliverySettings& settings) {
     std::ifstream file(path, std::ios::binary);
     if (file)
         return send::DeliverLines(file, settings);
-    fmt::print(stderr, "error: cannot open {}: {}\n", path, std::generic_category().message(errno));
+    fmt::print(stderr, "error: cannot open {}: {}\n", path, SystemTool::ErrnoText(errno));
     return 1;
 }
 

@@ -2,14 +2,15 @@
 
 #include <cerrno>
 #include <filesystem>
-#include <stdexcept>
 #include <system_error>
 
 #include <fcntl.h>
 #include <fmt/format.h>
 #include <sys/stat.h>
-#include <unistd.h>
 
+#include "SystemTool/Errno.h"
+#include "SystemTool/IO/Descriptor.h"
+#include "SystemTool/IO/MakeDirectories.h"
 #include "Tools/reportctl/setup/PidFile.h"
 #include "Tools/reportctl/terminal/ShellQuoted.h"
 
@@ -32,36 +33,18 @@ struct Kind {
 constexpr Kind PRIVATE{PRIVATE_MODE, PRIVATE_MODE, O_DIRECTORY | O_RDONLY | O_CLOEXEC};
 constexpr Kind SHARED{SHARED_MODE, READABLE_MODE, O_DIRECTORY | O_RDONLY | O_CLOEXEC | O_NOFOLLOW};
 
-[[noreturn]] void ThrowErrno(int code) {
-    throw std::runtime_error(std::generic_category().message(code));
-}
-
 /// Through a descriptor, so that what is changed is the directory that was made or looked at.
 void SetMode(const std::string& path, mode_t mode, int openFlags) {
-    const int directory = ::open(path.c_str(), openFlags);
-    if (directory < 0)
-        ThrowErrno(errno);
-    const int code = ::fchmod(directory, mode) == 0 ? 0 : errno;
-    ::close(directory);
-    if (code != 0)
-        ThrowErrno(code);
+    const SystemTool::IO::Descriptor directory(::open(path.c_str(), openFlags));
+    if (!directory.IsOpen() || ::fchmod(directory.Number(), mode) != 0)
+        SystemTool::ThrowErrno(errno);
 }
 
-/// Private at first, then opened as wide as it is to be. One that appeared meanwhile is as good.
-void MakeOne(const std::string& path, mode_t mode, int openFlags) {
-    if (::mkdir(path.c_str(), PRIVATE_MODE) != 0 && errno != EEXIST)
-        ThrowErrno(errno);
-    SetMode(path, mode, openFlags);
-}
-
-void Make(const fs::path& path, const Kind& kind) {
-    fs::path parents;
-    for (const auto& name : path.parent_path()) {
-        parents /= name;
-        if (!fs::exists(parents))
-            MakeOne(parents.string(), kind.parentMode, kind.openFlags);
-    }
-    MakeOne(path.string(), kind.mode, kind.openFlags);
+/// The mode is set again at the end: a directory that appeared meanwhile is as good, but may have another one.
+void Make(const std::string& path, const Kind& kind) {
+    if (const auto failure = SystemTool::IO::MakeDirectories(path, kind.mode, kind.parentMode))
+        SystemTool::ThrowErrno(failure.error);
+    SetMode(path, kind.mode, kind.openFlags);
 }
 
 bool Ensure(terminal::Worklog& log, const std::string& path, const Kind& kind, const std::string& makeAdvice,

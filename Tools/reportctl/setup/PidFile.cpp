@@ -1,42 +1,29 @@
 #include "Tools/reportctl/setup/PidFile.h"
 
 #include <cerrno>
-#include <stdexcept>
-#include <system_error>
 
 #include <fcntl.h>
 #include <fmt/format.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include "SystemTool/Errno.h"
+#include "SystemTool/IO/Descriptor.h"
 #include "Tools/reportctl/terminal/ShellQuoted.h"
 
 namespace reportctl::setup {
 namespace {
 
+using SystemTool::IO::Descriptor;
+
 constexpr auto NAME = "Report.pid";
 constexpr mode_t MODE = 0666;
 
-[[noreturn]] void ThrowErrno(int code) {
-    throw std::runtime_error(std::generic_category().message(code));
+Descriptor Opened(int number) {
+    if (number < 0)
+        SystemTool::ThrowErrno(errno);
+    return Descriptor(number);
 }
-
-/// A descriptor that is closed at the end.
-class Descriptor {
-public:
-    explicit Descriptor(int descriptor) : m_descriptor(descriptor) {
-        if (descriptor < 0)
-            ThrowErrno(errno);
-    }
-    ~Descriptor() { ::close(m_descriptor); }
-    Descriptor(const Descriptor&) = delete;
-    Descriptor& operator=(const Descriptor&) = delete;
-
-    int Get() const { return m_descriptor; }
-
-private:
-    int m_descriptor;
-};
 
 /// With its whole mode from the first moment on, whatever the umask; never one that is there already.
 int CreateIn(int directory) {
@@ -49,16 +36,16 @@ int CreateIn(int directory) {
 }
 
 void Make(const std::string& path) {
-    const Descriptor directory(::open(path.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC | O_NOFOLLOW));
+    const auto directory = Opened(::open(path.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC | O_NOFOLLOW));
     struct stat status {};
-    if (::fstat(directory.Get(), &status) != 0)
-        ThrowErrno(errno);
+    if (::fstat(directory.Number(), &status) != 0)
+        SystemTool::ThrowErrno(errno);
     // Checked before: a file of this user's own is what keeps the other users out.
     if (const uid_t self = ::geteuid(); self != 0 && self != status.st_uid)
-        ThrowErrno(EPERM);
-    const Descriptor file(CreateIn(directory.Get()));
-    if (::geteuid() != status.st_uid && ::fchown(file.Get(), status.st_uid, status.st_gid) != 0)
-        ThrowErrno(errno);
+        SystemTool::ThrowErrno(EPERM);
+    const auto file = Opened(CreateIn(directory.Number()));
+    if (::geteuid() != status.st_uid && ::fchown(file.Number(), status.st_uid, status.st_gid) != 0)
+        SystemTool::ThrowErrno(errno);
 }
 
 void LookAt(terminal::Worklog& log, const std::string& file, const struct stat& status,

@@ -12,9 +12,10 @@
 #include <SQLiteCpp/Exception.h>
 #include <fmt/format.h>
 #include <sqlite3.h>
-#include <unistd.h>
 
 #include "Modules/Sqlite/SideFiles.h"
+#include "SystemTool/Errno.h"
+#include "SystemTool/IO/Descriptor.h"
 #include "Tools/reportctl/store/Schema.h"
 
 namespace reportctl::store {
@@ -31,10 +32,9 @@ constexpr int BUSY_TIMEOUT_MS = 5000;
 class DraftFile {
 public:
     explicit DraftFile(const std::string& path) : m_path(path + ".new-XXXXXX") {
-        const int file = ::mkstemp(m_path.data());
-        if (file < 0)
-            throw std::runtime_error(std::generic_category().message(errno));
-        ::close(file);
+        const SystemTool::IO::Descriptor file(::mkstemp(m_path.data()));
+        if (!file.IsOpen())
+            SystemTool::ThrowErrno(errno);
     }
 
     ~DraftFile() {

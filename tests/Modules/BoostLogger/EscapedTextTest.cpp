@@ -4,8 +4,6 @@
 
 #include <gtest/gtest.h>
 
-using BoostLogger::CutAtCharacter;
-
 namespace {
 
 std::string Escaped(std::string_view text) {
@@ -102,18 +100,4 @@ TEST(EscapedText, CanBeTurnedBackIntoTheSameBytesAndEscapingItAgainChangesOnlyBa
             again.erase(at, 1);
         EXPECT_EQ(again, escaped);
     }
-}
-
-TEST(CutAtCharacter, NeverCutsWithinACharacter) {
-    EXPECT_EQ(CutAtCharacter("abc", 3), "abc");
-    EXPECT_EQ(CutAtCharacter("abcd", 3), "abc");
-    EXPECT_EQ(CutAtCharacter("ab\u62a5", 4), "ab");
-    EXPECT_EQ(CutAtCharacter("ab\u62a5", 3), "ab");
-    EXPECT_EQ(CutAtCharacter("ab\u62a5", 2), "ab");
-    EXPECT_EQ(CutAtCharacter("a\U0001F600", 4), "a");
-    EXPECT_EQ(CutAtCharacter("\U0001F600", 2), "");
-}
-
-TEST(CutAtCharacter, CutsWhatIsNoUtf8AnywhereAtTheLimit) {
-    EXPECT_EQ(CutAtCharacter("\x80\x80\x80\x80\x80\x80\x80\x80", 6).size(), 6U);
 }

@@ -166,6 +166,12 @@ TEST(OtlpEncoder, ReplacesWhatIsNotUtf8) {
     EXPECT_EQ(Record(batch, "eventName"), "\"A\xef\xbf\xbd\"");
 }
 
+TEST(OtlpEncoder, ReadsNumbersAsTheServiceDoes) {
+    EXPECT_EQ(Body(R"({"a":1.84467440737095516155})"),
+              R"({"kvlistValue":{"values":[{"key":"a","value":{"doubleValue":1.8446744073709552}}]}})");
+    EXPECT_EQ(Body(R"({"a":17976931348623159e292})").substr(0, 15), R"({"stringValue":)");
+}
+
 TEST(OtlpEncoder, SendsALoneSurrogateAsText) {
     EXPECT_EQ(Body(R"({"a":"\ud800"})").substr(0, 15), R"({"stringValue":)");
 }
