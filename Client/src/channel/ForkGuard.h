@@ -1,0 +1,34 @@
+#pragma once
+
+#include <mutex>
+
+namespace hublink {
+
+/// A lock that is whole in the child of a fork, whatever other threads did at that moment: each fork takes the locks of all
+/// guards first and gives them back on both sides.
+///
+/// Threads: any. Destroy it when no thread uses it any more.
+class ForkGuard {
+public:
+    ForkGuard() noexcept;
+    ForkGuard(const ForkGuard&) = delete;
+    ForkGuard& operator=(const ForkGuard&) = delete;
+
+protected:
+    ~ForkGuard();
+
+    std::mutex m_mutex; ///< Guards what the derived class says.
+
+private:
+    /// In the child, with the lock held and before anything else of the program runs there. No memory may be allocated.
+    virtual void BeginInChild() noexcept = 0;
+
+    static void BeforeFork() noexcept;
+    static void AfterForkInParent() noexcept;
+    static void AfterForkInChild() noexcept;
+
+    ForkGuard* m_next = nullptr; ///< Guarded by the lock of the list.
+    ForkGuard* m_previous = nullptr;
+};
+
+} // namespace hublink

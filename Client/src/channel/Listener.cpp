@@ -1,0 +1,140 @@
+#include "channel/Listener.h"
+
+#include <array>
+#include <cerrno>
+#include <charconv>
+#include <cstddef>
+#include <cstdio>
+#include <cstring>
+#include <string_view>
+
+#include <arpa/inet.h>
+#include <fcntl.h>
+#include <netinet/in.h>
+#include <unistd.h>
+
+namespace hublink {
+namespace {
+
+constexpr auto TABLE = "/proc/net/udp"; // Linux
+constexpr std::size_t LINE_BYTES = 128;
+
+/// An address and a port as the table writes them: the address's bytes as one number of this machine.
+class PrintedAddress {
+public:
+    explicit PrintedAddress(in_addr_t host) {
+        const int length =
+            std::snprintf(m_text.data(), m_text.size(), "%08X:%04X", htonl(host), unsigned{SERVICE_PORT});
+        m_length = static_cast<std::size_t>(length);
+    }
+    std::string_view Text() const { return {m_text.data(), m_length}; }
+
+private:
+    std::array<char, 32> m_text{};
+    std::size_t m_length = 0;
+};
+
+/// The next word of a line, which is moved behind it.
+std::string_view TakeWord(std::string_view& line) {
+    const auto begin = line.find_first_not_of(' ');
+    if (begin == std::string_view::npos)
+        return line = {};
+    line.remove_prefix(begin);
+    const auto word = line.substr(0, line.find(' '));
+    line.remove_prefix(word.size());
+    return word;
+}
+
+template <typename Number>
+Number NumberOf(std::string_view word) {
+    Number number = 0;
+    std::from_chars(word.data(), word.data() + word.size(), number);
+    return number;
+}
+
+/// Finds the listener in the table's lines, one after the other.
+class Search {
+public:
+    void TakeLine(std::string_view line) {
+        TakeWord(line); // number
+        const std::string_view address = TakeWord(line);
+        const bool isExact = address == m_loopback.Text();
+        if (!isExact && (address != m_anyAddress.Text() || m_isExact))
+            return;
+        for (int other = 0; other < 5; ++other) // remote address, state, queues, timer, retransmissions
+            TakeWord(line);
+        const auto owner = NumberOf<uid_t>(TakeWord(line));
+        TakeWord(line); // timeout
+        const auto socket = NumberOf<std::uint64_t>(TakeWord(line));
+        if (isExact && m_isExact && owner == ::geteuid()) // of several sockets, one of another user's counts
+            return;
+        m_isExact = isExact;
+        m_listener = {true, owner, socket};
+    }
+
+    Listener Found() const { return m_listener; }
+
+private:
+    const PrintedAddress m_loopback{INADDR_LOOPBACK};
+    const PrintedAddress m_anyAddress{INADDR_ANY};
+    bool m_isExact = false; ///< What was found is bound to this very address, and so gets what is sent there.
+    Listener m_listener;
+};
+
+/// A descriptor that is closed at the end.
+class File {
+public:
+    explicit File(const char* path) : m_descriptor(::open(path, O_RDONLY | O_CLOEXEC)) {}
+    ~File() {
+        if (IsOpen())
+            ::close(m_descriptor);
+    }
+    File(const File&) = delete;
+    File& operator=(const File&) = delete;
+
+    bool IsOpen() const { return m_descriptor >= 0; }
+    ssize_t Read(char* to, std::size_t bytes) const {
+        ssize_t count = 0;
+        do
+            count = ::read(m_descriptor, to, bytes);
+        while (count < 0 && errno == EINTR);
+        return count;
+    }
+
+private:
+    const int m_descriptor;
+};
+
+/// Hands over the complete lines in the first `bytes` of the buffer and moves what is left to its begin.
+std::size_t TakeLines(char* buffer, std::size_t bytes, Search& search) {
+    std::string_view rest(buffer, bytes);
+    for (auto end = rest.find('\n'); end != std::string_view::npos; end = rest.find('\n')) {
+        search.TakeLine(rest.substr(0, end));
+        rest.remove_prefix(end + 1);
+    }
+    std::memmove(buffer, rest.data(), rest.size());
+    return rest.size();
+}
+
+} // namespace
+
+std::optional<Listener> FindListener() noexcept {
+    const File table(TABLE);
+    if (!table.IsOpen())
+        return std::nullopt;
+    std::array<char, 32 * LINE_BYTES> buffer; // NOLINT(*-member-init): written before it is read
+    std::size_t kept = 0;
+    Search search;
+    for (;;) {
+        const ssize_t count = table.Read(buffer.data() + kept, buffer.size() - kept);
+        if (count < 0)
+            return std::nullopt;
+        if (count == 0)
+            return search.Found();
+        kept = TakeLines(buffer.data(), kept + static_cast<std::size_t>(count), search);
+        if (kept == buffer.size()) // a line of 4 KiB is none of this table
+            return std::nullopt;
+    }
+}
+
+} // namespace hublink

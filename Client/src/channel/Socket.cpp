@@ -1,0 +1,133 @@
+#include "channel/Socket.h"
+
+#include <cerrno>
+
+#include <arpa/inet.h>
+#include <fcntl.h>
+#include <netinet/in.h>
+#include <sys/socket.h>
+#include <unistd.h>
+
+#include "channel/Listener.h"
+
+namespace hublink {
+namespace {
+
+#ifdef MSG_NOSIGNAL
+constexpr int SEND_FLAGS = MSG_NOSIGNAL | MSG_DONTWAIT;
+#else
+constexpr int SEND_FLAGS = MSG_DONTWAIT;
+#endif
+
+/// Four of the longest reports and some. The default of macOS, 9216 bytes, is less than one.
+constexpr int LEAST_SEND_BUFFER_BYTES = 65536;
+
+int NewSocket() {
+#ifdef SOCK_CLOEXEC
+    return ::socket(AF_INET, SOCK_DGRAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0);
+#else
+    const int descriptor = ::socket(AF_INET, SOCK_DGRAM, 0);
+    if (descriptor >= 0) {
+        ::fcntl(descriptor, F_SETFD, FD_CLOEXEC);
+        ::fcntl(descriptor, F_SETFL, O_NONBLOCK);
+    }
+    return descriptor;
+#endif
+}
+
+bool Connect(int descriptor) {
+    sockaddr_in service{};
+    service.sin_family = AF_INET;
+    service.sin_port = htons(SERVICE_PORT);
+    service.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
+    return ::connect(descriptor, reinterpret_cast<const sockaddr*>(&service), sizeof service) == 0;
+}
+
+/// What an open socket that is ours answers to no call: the program closed the descriptor, and may use it for another file.
+bool IsNotOurs(int error) {
+    return error == EBADF || error == ENOTSOCK || error == EDESTADDRREQ || error == ENOTCONN;
+}
+
+} // namespace
+
+bool Socket::Open() noexcept {
+    if (m_descriptor >= 0)
+        return true;
+    m_descriptor = NewSocket();
+    if (m_descriptor < 0)
+        return false;
+    EnlargeSendBuffer();
+    if (Connect(m_descriptor))
+        return true;
+    Close();
+    return false;
+}
+
+void Socket::EnlargeSendBuffer() const noexcept {
+    int bytes = 0;
+    socklen_t length = sizeof bytes;
+    if (::getsockopt(m_descriptor, SOL_SOCKET, SO_SNDBUF, &bytes, &length) == 0 &&
+        bytes >= LEAST_SEND_BUFFER_BYTES)
+        return;
+    bytes = LEAST_SEND_BUFFER_BYTES;
+    ::setsockopt(m_descriptor, SOL_SOCKET, SO_SNDBUF, &bytes, sizeof bytes);
+}
+
+void Socket::Close() noexcept {
+    if (m_descriptor >= 0)
+        ::close(m_descriptor);
+    m_descriptor = -1;
+}
+
+/// Asking takes the error from the socket.
+int Socket::TakeError() const noexcept {
+    int error = 0;
+    socklen_t length = sizeof error;
+    return ::getsockopt(m_descriptor, SOL_SOCKET, SO_ERROR, &error, &length) == 0 ? error : errno;
+}
+
+/// 0, or the error.
+int Socket::SendOnce(std::string_view datagram) const noexcept {
+    while (::send(m_descriptor, datagram.data(), datagram.size(), SEND_FLAGS) < 0)
+        if (errno != EINTR)
+            return errno;
+    return 0;
+}
+
+Socket::Outcome Socket::Send(std::string_view datagram) noexcept {
+    if (!Open())
+        return Outcome::Failed;
+    int error = SendOnce(datagram);
+    if (IsNotOurs(error)) {
+        m_descriptor = -1; // not closed: it may be another file of the program by now
+        if (!Open())
+            return Outcome::Failed;
+        error = SendOnce(datagram);
+    }
+    if (error != 0)
+        return OutcomeOf(error);
+    switch (TakeError()) { // over loopback, Linux has told of a refusal by now
+    case 0:
+        return Outcome::Sent;
+    case ECONNREFUSED:
+        return Outcome::Refused;
+    default:
+        return Outcome::Failed;
+    }
+}
+
+Socket::Outcome Socket::OutcomeOf(int error) noexcept {
+    switch (error) {
+    case EAGAIN:
+    case ENOBUFS:
+        return Outcome::Full;
+    case ECONNREFUSED:
+        return Outcome::RefusedEarlier;
+    case EMSGSIZE:
+        return Outcome::TooLong;
+    default:
+        return Outcome::Failed;
+    }
+}
+
+} // namespace hublink

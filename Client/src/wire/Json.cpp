@@ -1,0 +1,213 @@
+#include "wire/Json.h"
+
+#include <algorithm>
+#include <bitset>
+
+namespace hublink::wire {
+namespace {
+
+constexpr std::string_view WHITE_SPACE = " \t\r\n";
+constexpr std::string_view ESCAPED_QUOTE = "\\u0027";
+constexpr std::size_t UNIT_LENGTH = ESCAPED_QUOTE.size();
+
+bool IsSpace(char c) {
+    return c == ' ' || c == '\t' || c == '\r' || c == '\n';
+}
+
+int HexDigit(char c) {
+    if (c >= '0' && c <= '9')
+        return c - '0';
+    const char lower = static_cast<char>(c | 0x20);
+    return lower >= 'a' && lower <= 'f' ? lower - 'a' + 10 : -1;
+}
+
+/// The number of an escape such as \u00e4 at the start of the text; -1 when there is none.
+int UnitAt(std::string_view text) {
+    if (text.size() < UNIT_LENGTH || text[0] != '\\' || text[1] != 'u')
+        return -1;
+    int unit = 0;
+    for (const char c : text.substr(2, 4)) {
+        const int digit = HexDigit(c);
+        if (digit < 0)
+            return -1;
+        unit = unit * 16 + digit;
+    }
+    return unit;
+}
+
+/// The length of the escape at the start of the text, of both halves of a surrogate pair; 0 when there is none.
+std::size_t EscapeLength(std::string_view text) {
+    constexpr std::string_view SIMPLE = "\"\\/bfnrt";
+    if (text.size() > 1 && SIMPLE.find(text[1]) != std::string_view::npos)
+        return 2;
+    const int unit = UnitAt(text);
+    if (unit < 0 || (unit >= 0xdc00 && unit <= 0xdfff))
+        return 0;
+    if (unit < 0xd800 || unit > 0xdbff)
+        return UNIT_LENGTH;
+    const int second = UnitAt(text.substr(UNIT_LENGTH));
+    return second >= 0xdc00 && second <= 0xdfff ? 2 * UNIT_LENGTH : 0;
+}
+
+/// The length of the string at the start of the text, quotes included; 0 when there is none.
+std::size_t StringLength(std::string_view text) {
+    for (std::size_t at = 1; at < text.size();) {
+        if (text[at] == '"')
+            return at + 1;
+        if (static_cast<unsigned char>(text[at]) < 0x20)
+            return 0;
+        const std::size_t length = text[at] == '\\' ? EscapeLength(text.substr(at)) : 1;
+        if (length == 0)
+            return 0;
+        at += length;
+    }
+    return 0;
+}
+
+/// One pass over a text. Which kind each open level is stands in a bit, so that depth costs no stack.
+class Reader {
+public:
+    explicit Reader(std::string_view text) : m_rest(text) {}
+
+    JsonFacts Read() {
+        SkipSpace();
+        m_facts.isObject = Next() == '{';
+        m_facts.isJson = TakeValue();
+        while (m_facts.isJson && m_open > 0)
+            m_facts.isJson = Continue();
+        m_facts.isJson = m_facts.isJson && m_rest.empty();
+        return m_facts;
+    }
+
+private:
+    char Next() const { return m_rest.empty() ? '\0' : m_rest.front(); }
+
+    void SkipSpace() { m_rest.remove_prefix(std::min(m_rest.find_first_not_of(WHITE_SPACE), m_rest.size())); }
+
+    bool Take(std::size_t length) {
+        m_rest.remove_prefix(length);
+        SkipSpace();
+        return length > 0;
+    }
+
+    bool TakeIf(char c) { return Next() == c && Take(1); }
+
+    bool TakeWord(std::string_view word) {
+        return m_rest.substr(0, word.size()) == word && Take(word.size());
+    }
+
+    bool TakeNumber() {
+        const std::size_t length = NumberLength(m_rest);
+        if (length > 0)
+            m_facts.fate = std::max(m_facts.fate, FateOf(m_rest.substr(0, length)));
+        return Take(length);
+    }
+
+    bool TakeKey() { return Next() == '"' && Take(StringLength(m_rest)) && TakeIf(':'); }
+
+    /// A scalar, or the beginning of an object or array with its first key.
+    bool TakeValue() {
+        switch (Next()) {
+        case '{':
+            return Open(true);
+        case '[':
+            return Open(false);
+        case '"':
+            return Take(StringLength(m_rest));
+        case 't':
+            return TakeWord("true");
+        case 'f':
+            return TakeWord("false");
+        case 'n':
+            return TakeWord("null");
+        default:
+            return TakeNumber();
+        }
+    }
+
+    bool Open(bool isObject) {
+        if (m_open == MAX_LEVELS)
+            return false;
+        m_isObject[m_open++] = isObject;
+        m_facts.levels = std::max(m_facts.levels, m_open);
+        m_isBegun = true;
+        return Take(1);
+    }
+
+    bool Close() {
+        --m_open;
+        return Take(1);
+    }
+
+    /// In the innermost level: its end, or its next value.
+    bool Continue() {
+        const bool isObject = m_isObject[m_open - 1];
+        const bool isFirst = m_isBegun;
+        m_isBegun = false;
+        if (Next() == (isObject ? '}' : ']'))
+            return Close();
+        if (!isFirst && !TakeIf(','))
+            return false;
+        return (!isObject || TakeKey()) && TakeValue();
+    }
+
+    std::string_view m_rest;
+    JsonFacts m_facts;
+    std::bitset<MAX_LEVELS> m_isObject;
+    std::size_t m_open = 0;
+    bool m_isBegun = false; ///< The innermost level has no value yet.
+};
+
+/// Hands the parts of a JSON text to `take`, without white space: each string, quotes included, and what stands between.
+template <typename Take>
+void ForEachPart(std::string_view json, Take take) {
+    while (!json.empty()) {
+        std::size_t length = 1;
+        if (json.front() == '"')
+            length = StringLength(json);
+        else
+            while (length < json.size() && json[length] != '"' && !IsSpace(json[length]))
+                ++length;
+        if (!IsSpace(json.front()))
+            take(json.substr(0, length));
+        else
+            length = std::max<std::size_t>(1, std::min(json.find_first_not_of(WHITE_SPACE), json.size()));
+        json.remove_prefix(length);
+    }
+}
+
+/// A part with each quote written twice, whether it stands there as itself or as an escape.
+void AppendQuotesDoubled(Buffer& buffer, std::string_view part) {
+    while (!part.empty()) {
+        const auto at = std::min(part.find_first_of("'\\"), part.size());
+        buffer.Append(part.substr(0, at));
+        part.remove_prefix(at);
+        if (part.empty())
+            return;
+        const bool isEscaped = part.substr(0, ESCAPED_QUOTE.size()) == ESCAPED_QUOTE;
+        const std::size_t length = isEscaped ? ESCAPED_QUOTE.size() : part.front() == '\\' ? 2 : 1;
+        buffer.Append(isEscaped || part.front() == '\'' ? "''" : part.substr(0, length));
+        part.remove_prefix(length);
+    }
+}
+
+} // namespace
+
+JsonFacts ReadJson(std::string_view text) {
+    return Reader(text).Read();
+}
+
+void AppendJson(Buffer& buffer, std::string_view json, Quotes quotes) {
+    ForEachPart(json, [&](std::string_view part) {
+        if (quotes == Quotes::Doubled)
+            AppendQuotesDoubled(buffer, part);
+        else
+            buffer.Append(part);
+    });
+}
+
+void AppendJsonEscaped(Buffer& buffer, std::string_view json, Quotes quotes) {
+    ForEachPart(json, [&](std::string_view part) { AppendEscaped(buffer, part, quotes); });
+}
+
+} // namespace hublink::wire

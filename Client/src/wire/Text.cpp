@@ -1,0 +1,116 @@
+#include "wire/Text.h"
+
+#include <array>
+#include <cstddef>
+#include <cstdint>
+#include <cstring>
+
+namespace hublink::wire {
+namespace {
+
+constexpr unsigned char Byte(char c) {
+    return static_cast<unsigned char>(c);
+}
+
+/// How many of the first bytes are ASCII without a zero byte; counts eight at a time.
+std::size_t PlainLength(std::string_view text) {
+    constexpr std::uint64_t HIGH_BITS = 0x8080808080808080;
+    constexpr std::uint64_t LOW_BITS = 0x0101010101010101;
+    std::size_t length = 0;
+    for (std::uint64_t eight = 0; text.size() - length >= sizeof eight; length += sizeof eight) {
+        std::memcpy(&eight, text.data() + length, sizeof eight);
+        if (((eight - LOW_BITS) & ~eight & HIGH_BITS) != 0 || (eight & HIGH_BITS) != 0)
+            break;
+    }
+    while (length < text.size() && Byte(text[length]) < 0x80 && text[length] != '\0')
+        ++length;
+    return length;
+}
+
+bool IsContinuation(std::string_view text, std::size_t at) {
+    return at < text.size() && (Byte(text[at]) & 0xc0) == 0x80;
+}
+
+/// The length of the character of several bytes at the start; 0 when there is none.
+std::size_t CharacterLength(std::string_view text) {
+    const unsigned lead = Byte(text[0]);
+    if (!IsContinuation(text, 1))
+        return 0;
+    const unsigned second = Byte(text[1]);
+    if (lead >= 0xc2 && lead <= 0xdf)
+        return 2;
+    if (!IsContinuation(text, 2))
+        return 0;
+    if (lead >= 0xe0 && lead <= 0xef) // not overlong, no surrogate
+        return (lead == 0xe0 && second < 0xa0) || (lead == 0xed && second >= 0xa0) ? 0 : 3;
+    if (lead >= 0xf0 && lead <= 0xf4 && IsContinuation(text, 3)) // not overlong, not beyond U+10FFFF
+        return (lead == 0xf0 && second < 0x90) || (lead == 0xf4 && second >= 0x90) ? 0 : 4;
+    return 0;
+}
+
+/// Which bytes stand in a JSON string of ours as something else.
+constexpr std::array<bool, 256> SpecialBytes() {
+    std::array<bool, 256> special{};
+    for (std::size_t control = 0; control < 0x20; ++control)
+        special[control] = true;
+    special['"'] = special['\\'] = special['\''] = true;
+    return special;
+}
+constexpr auto SPECIAL = SpecialBytes();
+
+void AppendControl(Buffer& buffer, char c) {
+    constexpr std::string_view DIGITS = "0123456789abcdef";
+    switch (c) {
+    case '\n':
+        return buffer.Append("\\n");
+    case '\r':
+        return buffer.Append("\\r");
+    case '\t':
+        return buffer.Append("\\t");
+    default:
+        buffer.Append("\\u00");
+        buffer.Append(DIGITS[Byte(c) >> 4U]);
+        buffer.Append(DIGITS[Byte(c) & 0x0fU]);
+    }
+}
+
+void AppendSpecial(Buffer& buffer, char c, Quotes quotes) {
+    switch (c) {
+    case '"':
+        return buffer.Append("\\\"");
+    case '\\':
+        return buffer.Append("\\\\");
+    case '\'':
+        return buffer.Append(quotes == Quotes::Doubled ? "''" : "'");
+    default:
+        AppendControl(buffer, c);
+    }
+}
+
+} // namespace
+
+bool IsText(std::string_view text) {
+    for (;;) {
+        text.remove_prefix(PlainLength(text));
+        if (text.empty())
+            return true;
+        const std::size_t length = CharacterLength(text);
+        if (length == 0)
+            return false;
+        text.remove_prefix(length);
+    }
+}
+
+void AppendEscaped(Buffer& buffer, std::string_view text, Quotes quotes) {
+    std::size_t begin = 0; // of a run of bytes that stand for themselves
+    for (std::size_t at = 0; at < text.size(); ++at) {
+        if (!SPECIAL[Byte(text[at])])
+            continue;
+        buffer.Append(text.substr(begin, at - begin));
+        AppendSpecial(buffer, text[at], quotes);
+        begin = at + 1;
+    }
+    buffer.Append(text.substr(begin));
+}
+
+} // namespace hublink::wire
