@@ -86,8 +86,9 @@ void MiniDump::OnStackCallBack(int signal) {
 bool MiniDump::IsAlreadyRun() {
     ::umask(0);
     const std::string path = Poco::format("/Library/Preferences/hublink/%s.pid", m_strLogName);
-    // Not truncated: an instance that loses must not wipe the winner's id.
-    const int file = ::open(path.c_str(), O_RDWR | O_CREAT, PID_FILE_MODE);
+    // Not truncated: an instance that loses must not wipe the winner's id. Not through a link: every user may put one
+    // into that directory, and the file that it names would be emptied.
+    const int file = ::open(path.c_str(), O_RDWR | O_CREAT | O_NOFOLLOW, PID_FILE_MODE);
     if (file < 0) {
         WriteLog({LogLevel::Info, "IsAlreadyRun", 304}, "Open file failed, error : %s", std::strerror(errno));
         std::exit(1);

@@ -7,6 +7,7 @@
 #include "App/ReportServer.h"
 #include "Common/Common.h"
 #include "SystemTool/BSException.h"
+#include "SystemTool/IO/StandardDescriptors.h"
 
 using namespace SyncServiceReport;
 
@@ -32,6 +33,7 @@ void ConfigureLog() {
 } // namespace
 
 int main() {
+    SystemTool::IO::OpenClosedStandardDescriptors();
     // The log comes before the instance check, so that a refused second instance leaves its line in the
     // shared log.
     ConfigureLog();

@@ -16,6 +16,8 @@
 #include <unistd.h>
 
 #include "tests/fakes/FakeLogger.h"
+#include "tests/support/MountedOver.h"
+#include "tests/support/TemporaryDirectory.h"
 #include "tests/support/WaitUntil.h"
 
 using ::testing::ElementsAre;
@@ -255,9 +257,23 @@ TEST_F(InstanceGuard, AFileThatCannotBeOpenedEndsTheProcess) {
     std::filesystem::create_directory(DIRECTORY);
 }
 
+TEST_F(InstanceGuard, ALinkInThePlaceOfTheFileIsNotFollowed) {
+    FakeLogger().echoes = true;
+    const TemporaryDirectory elsewhere;
+    const std::string another = elsewhere.Path() + "/another users file";
+    std::ofstream(another) << "content";
+    std::filesystem::create_symlink(another, PID_FILE);
+    EXPECT_EXIT(MiniDump::IsAlreadyRun(), ExitedWithCode(1),
+                "2 \\[App/MiniDump:304 IsAlreadyRun\\] tag= Open file failed, error : Too many levels of "
+                "symbolic links reserved=0");
+    std::string content;
+    std::getline(std::ifstream(another), content);
+    EXPECT_EQ(content, "content");
+}
+
 TEST_F(InstanceGuard, AFileThatCannotBeWrittenEndsTheProcess) {
     FakeLogger().echoes = true;
-    std::filesystem::create_symlink("/dev/full", PID_FILE);
+    const MountedOver full("/dev/full", PID_FILE);
     EXPECT_EXIT(MiniDump::IsAlreadyRun(), ExitedWithCode(1),
                 "2 \\[App/MiniDump:330 IsAlreadyRun\\] tag= Write file failed, file: "
                 "/Library/Preferences/hublink/Report.pid, error: No space left on device reserved=0");

@@ -9,6 +9,7 @@
 
 #include "tests/e2e/support/Service.h"
 #include "tests/support/ModeOf.h"
+#include "tests/support/MountedOver.h"
 #include "tests/support/WaitUntil.h"
 
 using ::testing::ContainsRegex;
@@ -87,6 +88,17 @@ TEST_F(StartUp, HandlesASegmentationFaultAndNoOtherSignal) {
     m_service.AwaitQuiet(); // after which every plug-in has done something
     constexpr std::uint64_t C_LIBRARY = std::uint64_t{3} << 31U; // the two that it keeps for its threads
     EXPECT_EQ(CaughtSignals(m_service.Process()) & ~C_LIBRARY, std::uint64_t{1} << (SIGSEGV - 1U));
+}
+
+TEST_F(StartUp, WithoutStandardDescriptorsNoFileOfItsOwnTakesTheirPlaces) {
+    m_service.Install();
+    m_service.CloseStandardDescriptors();
+    m_service.Start();
+    for (const std::string descriptor : {"0", "1", "2"})
+        EXPECT_EQ(std::filesystem::read_symlink("/proc/" + std::to_string(m_service.Process()) + "/fd/" +
+                                                descriptor),
+                  "/dev/null");
+    EXPECT_EQ(ContentOfPidFile(), std::to_string(m_service.Process()));
 }
 
 TEST_F(StartUp, ASecondInstanceIsRefusedAndTheFirstGoesOn) {
@@ -234,8 +246,7 @@ TEST_F(StartUp, WithoutThePreferencesDirectoryItEndsWithOne) {
 
 TEST_F(StartUp, WithAPidFileThatCannotBeWrittenItEndsWithOne) {
     m_service.Install();
-    std::filesystem::remove(Service::PID_FILE);
-    std::filesystem::create_symlink("/dev/full", Service::PID_FILE);
+    const MountedOver full("/dev/full", Service::PID_FILE);
     m_service.Launch();
     EXPECT_EQ(m_service.AwaitEnd(), 1);
     EXPECT_THAT(

@@ -93,6 +93,9 @@ pid_t Service::Spawn(const std::string& program, const std::vector<std::string>&
     if (process == 0) {
         ::dup2(output, STDOUT_FILENO);
         ::dup2(output, STDERR_FILENO);
+        if (m_closesStandardDescriptors && program.ends_with("/" + PROGRAM))
+            for (const int descriptor : {STDIN_FILENO, STDOUT_FILENO, STDERR_FILENO})
+                ::close(descriptor);
         ::execve(program.c_str(), argv.data(), envp.data());
         ::_exit(127);
     }

@@ -35,6 +35,9 @@ public:
     /// Adds to the environment, from the next start on.
     void SetEnvironment(const std::string& nameAndValue) { m_environment.push_back(nameAndValue); }
 
+    /// Starts the program with descriptors 0 to 2 closed, from the next start on.
+    void CloseStandardDescriptors() { m_closesStandardDescriptors = true; }
+
     /// Runs `reportctl` with these arguments in the service's data directory; its exit code. Output goes to
     /// Output().
     int Reportctl(const std::vector<std::string>& arguments) const;
@@ -118,6 +121,7 @@ private:
     TemporaryDirectory m_data;    ///< The user data directory.
     TemporaryDirectory m_program; ///< The program and its plug-ins.
     std::vector<std::string> m_environment;
+    bool m_closesStandardDescriptors = false;
     pid_t m_process = -1;
     int m_markers = 0;
 };
