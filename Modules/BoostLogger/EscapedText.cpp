@@ -34,11 +34,24 @@ std::size_t PlainLength(std::string_view text) {
     return length;
 }
 
-/// U+2028 and U+2029 end a line in some editors; U+202A to U+202E and U+2066 to U+2069 turn the direction of
-/// what follows, so that a line reads as what it is not.
-bool ChangesTheLine(Byte lead, Byte second, Byte third) {
-    return lead == 0xe2 && ((second == 0x80 && third >= 0xa8 && third <= 0xae) ||
-                            (second == 0x81 && third >= 0xa6 && third <= 0xa9));
+/// Characters that make a line read as what it is not. U+2028 and U+2029 end a line in some editors; U+061C, U+200E,
+/// U+200F, U+202A to U+202E and U+2066 to U+2069 turn the direction of text; U+200B to U+200D, U+2060 to U+2064, U+FEFF
+/// and the tags U+E0000 to U+E007F are there and not seen. `character` is one whole character in UTF-8.
+bool ChangesTheLine(std::string_view character) {
+    const auto isBetween = [character](std::string_view first, std::string_view last) {
+        return character >= first && character <= last; // UTF-8 sorts as the characters' numbers do
+    };
+    switch (character.size()) {
+    case 2:
+        return character == "\u061c";
+    case 3:
+        if (character.front() != '\xe2') // the usual case, for this is asked of each character
+            return character == "\ufeff";
+        return isBetween("\u200b", "\u200f") || isBetween("\u2028", "\u202e") ||
+               isBetween("\u2060", "\u2064") || isBetween("\u2066", "\u2069");
+    default:
+        return isBetween("\U000E0000", "\U000E007F");
+    }
 }
 
 /// The length of the readable character of more than one byte at the start of `text`; 0 when there is none.
@@ -46,8 +59,7 @@ std::size_t ReadableLength(std::string_view text) {
     const auto at = [text](std::size_t i) { return static_cast<Byte>(text[i]); };
     const auto length = SystemTool::Text::CharacterLength(text);
     const bool isControl = length == 2 && at(0) == 0xc2 && at(1) < 0xa0; // U+0080 to U+009F
-    const bool isOdd = isControl || (length == 3 && ChangesTheLine(at(0), at(1), at(2)));
-    return length == 1 || isOdd ? 0 : length;
+    return length <= 1 || isControl || ChangesTheLine(text.substr(0, length)) ? 0 : length;
 }
 
 void AppendEscapedByte(LineBuffer& line, Byte byte) {

@@ -10,7 +10,8 @@ namespace BoostLogger {
 /// exactly the same bytes. Readable text in UTF-8 stays as it is, but for:
 ///   backslash, newline, carriage return, tabulation    a backslash twice, \n, \r, \t
 ///   other control characters, C1 controls, bytes that are no UTF-8,
-///   line separators and text direction overrides       each byte as \x and two hexadecimal digits
+///   line separators, characters that turn the
+///   direction of text, characters that are not seen    each byte as \x and two hexadecimal digits
 void AppendEscaped(LineBuffer& line, std::string_view text);
 
 } // namespace BoostLogger

@@ -59,6 +59,16 @@ TEST(EscapedText, KeepsATextFromDrivingATerminal) {
     EXPECT_EQ(Escaped("\u202e \u2066"), "\\xe2\\x80\\xae \\xe2\\x81\\xa6");
 }
 
+TEST(EscapedText, ShowsWhatHides) {
+    EXPECT_EQ(Escaped("\u200a\u200b\u200f\u2010"), "\u200a\\xe2\\x80\\x8b\\xe2\\x80\\x8f\u2010");
+    EXPECT_EQ(Escaped("\u061b\u061c\u061d"), "\u061b\\xd8\\x9c\u061d");
+    EXPECT_EQ(Escaped("\u205f\u2060\u2064\u2065"), "\u205f\\xe2\\x81\\xa0\\xe2\\x81\\xa4\u2065");
+    EXPECT_EQ(Escaped("a\ufeffb\ufefe"), "a\\xef\\xbb\\xbfb\ufefe");
+    EXPECT_EQ(Escaped("\U000E0000\U000E007F\U000E0080"),
+              "\\xf3\\xa0\\x80\\x80\\xf3\\xa0\\x81\\xbf\U000E0080");
+    EXPECT_EQ(Escaped("\U000DFFFF"), "\U000DFFFF");
+}
+
 TEST(EscapedText, EscapesAZeroByte) {
     EXPECT_EQ(Escaped(std::string_view("a\0b", 3)), "a\\x00b");
 }
