@@ -82,6 +82,11 @@ bool LiveFile::IsGoneFrom(const std::string& path) {
     return ours.st_ino != there.st_ino || ours.st_dev != there.st_dev;
 }
 
+void LiveFile::LookAtSize() {
+    if (struct stat status{}; fstat(m_descriptor, &status) == 0)
+        m_sizeBytes = status.st_size;
+}
+
 FileFailure LiveFile::Append(std::string_view line) {
     char newline = '\n';
     // writev takes its texts through pointers to non-const and does not change them.

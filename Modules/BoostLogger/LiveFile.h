@@ -39,6 +39,9 @@ public:
     /// The size of the file, with what other processes appended until the last look.
     std::int64_t SizeBytes() const { return m_sizeBytes; }
 
+    /// Looks at the size now.
+    void LookAtSize();
+
     /// Appends the line, which ends in a newline, with one system call: it is in the file, as a whole and not
     /// torn by other writers, when this returns. Where only a part of it could be written, the next line
     /// starts with a newline, so that the two are not glued together.

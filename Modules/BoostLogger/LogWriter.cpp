@@ -1,6 +1,10 @@
 #include "Modules/BoostLogger/LogWriter.h"
 
+#include <algorithm>
+#include <cerrno>
 #include <string>
+
+#include <sys/resource.h>
 
 #include "Modules/BoostLogger/RecordLine.h"
 
@@ -91,7 +95,17 @@ FileFailure LogWriter::Reopen() {
     m_live.Close();
     if (const FileFailure failure = MakeDirectory(m_settings.directory))
         return failure;
+    m_systemLimit = FileSizeLimit();
     return m_live.Open(m_path);
+}
+
+/// The size from which on the system ends a process that writes on, by SIGXFSZ (`ulimit -f`). A log must not be what ends
+/// its program, and a plug-in must not change what the program does on a signal.
+std::int64_t LogWriter::FileSizeLimit() {
+    rlimit limit{};
+    if (::getrlimit(RLIMIT_FSIZE, &limit) != 0 || limit.rlim_cur > static_cast<rlim_t>(NO_LIMIT))
+        return NO_LIMIT;
+    return static_cast<std::int64_t>(limit.rlim_cur);
 }
 
 FileFailure LogWriter::ReportLoss() {
@@ -110,9 +124,14 @@ FileFailure LogWriter::ReportLoss() {
 
 FileFailure LogWriter::Put(std::string_view line) {
     const auto size = static_cast<std::int64_t>(line.size());
-    if (m_live.SizeBytes() > 0 && m_live.SizeBytes() + size > m_settings.maxFileBytes)
+    if (m_systemLimit != NO_LIMIT)
+        m_live.LookAtSize(); // before each line: what another process appended counts, too
+    if (m_live.SizeBytes() > 0 &&
+        m_live.SizeBytes() + size > std::min(m_settings.maxFileBytes, m_systemLimit))
         if (const FileFailure failure = Rotate())
             return failure;
+    if (size > m_systemLimit)
+        return {EFBIG, "write to the file"};
     return m_live.Append(line);
 }
 

@@ -3,6 +3,7 @@
 #include <atomic>
 #include <chrono>
 #include <cstdint>
+#include <limits>
 #include <mutex>
 #include <string_view>
 
@@ -38,6 +39,9 @@ public:
     void CountLost() noexcept { m_lost.fetch_add(1, std::memory_order_relaxed); }
 
 private:
+    static constexpr std::int64_t NO_LIMIT = std::numeric_limits<std::int64_t>::max();
+
+    static std::int64_t FileSizeLimit();
     void AppendLocked(std::string_view line, TimePoint now);
     FileFailure Deliver(std::string_view line, TimePoint now);
     FileFailure FollowPath(TimePoint now);
@@ -54,9 +58,10 @@ private:
     std::mutex m_mutex; ///< Guards everything below, and the order of lines in the file.
     LiveFile m_live;
     RotatedFiles m_rotated;
-    TimePoint m_nextLook;    ///< When to see next whether the path still is our file.
-    TimePoint m_nextAttempt; ///< After a failure; before that everything is dropped.
-    FileFailure m_failure;   ///< The last one; kept after it for the record that reports the loss.
+    std::int64_t m_systemLimit = NO_LIMIT; ///< When the live file was opened; see FileSizeLimit.
+    TimePoint m_nextLook;                  ///< When to see next whether the path still is our file.
+    TimePoint m_nextAttempt;               ///< After a failure; before that everything is dropped.
+    FileFailure m_failure; ///< The last one; kept after it for the record that reports the loss.
     bool m_losing = false;
 };
 

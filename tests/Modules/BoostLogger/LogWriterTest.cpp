@@ -63,6 +63,55 @@ TEST_F(LogWriterTest, RotatesBeforeAFileWouldBecomeTooLarge) {
     EXPECT_EQ(std::filesystem::file_size(m_path), 500U);
 }
 
+TEST_F(LogWriterTest, RotatesBeforeASizeAtWhichTheSystemWouldEndTheProcess) {
+    Child child([this] {
+        LimitFileSize(1050);
+        LogWriter writer(Settings(100'000, 1'000'000));
+        const bool started = !writer.Start();
+        for (int i = 0; i < 25; ++i)
+            writer.Append(Line(100), m_start);
+        return started;
+    });
+    EXPECT_EQ(child.Wait(), 0);
+    EXPECT_EQ(std::filesystem::file_size(m_directory + "/Report_1.log"), 1000U);
+    EXPECT_EQ(std::filesystem::file_size(m_directory + "/Report_2.log"), 1000U);
+    EXPECT_EQ(std::filesystem::file_size(m_path), 500U);
+}
+
+TEST_F(LogWriterTest, SeesWhatAnotherProcessWroteWhereTheSystemEndsTheProcessAtASize) {
+    Child child([this] {
+        LimitFileSize(1050);
+        LogWriter writer(Settings(100'000, 1'000'000));
+        LogWriter other(Settings(100'000, 1'000'000));
+        const bool started = !writer.Start() && !other.Start();
+        for (int i = 0; i < 10; ++i)
+            other.Append(Line(100), m_start);
+        writer.Append(Line(100), m_start);
+        return started;
+    });
+    EXPECT_EQ(child.Wait(), 0);
+    EXPECT_EQ(std::filesystem::file_size(m_directory + "/Report_1.log"), 1000U);
+    EXPECT_EQ(std::filesystem::file_size(m_path), 100U);
+}
+
+TEST_F(LogWriterTest, LosesALineThatIsLargerThanTheSystemLetsAFileBecome) {
+    Child child([this] {
+        LimitFileSize(1050);
+        LogWriter writer(Settings(100'000, 1'000'000));
+        const bool started = !writer.Start();
+        writer.Append(Line(1100), m_start);
+        writer.Append(Line(100), m_start + 1s);
+        return started;
+    });
+    EXPECT_EQ(child.Wait(), 0);
+    const auto lines = ReadLog(m_directory);
+    ASSERT_EQ(lines.size(), 2U);
+    EXPECT_TRUE(
+        lines[0].ends_with("1 records could not be written: cannot write to the file: File too large"))
+        << lines[0];
+    EXPECT_EQ(lines[1] + "\n", Line(100));
+}
+
 TEST_F(LogWriterTest, GivesALineThatIsTooLargeForAnyFileAFileOfItsOwn) {
     LogWriter writer(Settings());
     ASSERT_FALSE(writer.Start());
