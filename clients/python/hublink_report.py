@@ -1,0 +1,644 @@
+"""Sends usage reports to the report service of the HubLink suite, which listens on 127.0.0.1:9997.
+
+    from hublink_report import Module, Reporter, Result
+
+    reporter = Reporter(Module("A100", "2.1", "Painter"))
+    reporter.event("A100|10001", {"page": "start"})  # begins with A: to analytics
+    reporter.event("B100|10001", "it's open")        # any other: to the local store
+
+Purpose: a text arrives exactly as it was given, or the result says why it was not sent. The module doubles quotes for the
+store, escapes JSON, announces its own module, tells the signed-in user, and does both again when the service was
+restarted.
+
+Threads: every operation may be called from any thread, and in a child after a fork, which has a socket of its own.
+The module starts no thread.
+
+Failure: `event` and `set_user` never raise, whatever they are given, never wait, and write nothing to the terminal. An
+argument of a wrong type counts as one that cannot be sent. Only KeyboardInterrupt and the like pass through.
+
+What `Result.SENT` promises: the system took the datagram, and a program listens. Linux drops without a word what does not
+fit into the listener's buffer, so some of a long burst that comes faster than the service takes it are lost. A busy system
+may tell a moment late that no program listens; then it is the next event that learns of it.
+
+Standard library only; Python 3.9 and later.
+"""
+
+from __future__ import annotations
+
+import enum
+import errno
+import json
+import logging
+import os
+import re
+import socket
+import sys
+import threading
+import time
+import weakref
+from dataclasses import dataclass
+from pathlib import Path
+from types import TracebackType
+from typing import Any, Callable, Dict, List, NamedTuple, Optional, Type, Union
+
+__all__ = ["Json", "Module", "ReportHandler", "Reporter", "Result", "Value"]
+
+_HOST, _PORT = "127.0.0.1", 9997
+_MAX_BYTES = 10240  # the service cuts a datagram off there
+_MAX_DEPTH = 127  # of a value: the service reads 128 levels, and the report around the value is one
+_SEND_BUFFER_BYTES = 65536  # macOS grants 9216 unasked, less than a report may have
+_LOOK_SECONDS = 1.0  # between two looks at the system's table of sockets, which cost some 50 microseconds each
+_REPEAT_SECONDS = 180.0  # between two announcements where there is no such table
+_DEFAULT_MODULE = "A759"  # the service knows it from its start
+
+
+class Result(enum.Enum):
+    """What became of an event, or of a user."""
+
+    SENT = 0
+    NOBODY_LISTENS = 1
+    TOO_LONG = 2  #: more than 10240 bytes as a datagram
+    INVALID_TEXT = 3  #: half a surrogate pair, which UTF-8 cannot hold, or a zero character; an empty open id
+    #: No JSON. For analytics, a value that is neither nothing nor an object which the service can read: at most 127 levels,
+    #: integers of at most 64 bits, numbers within the range of a double.
+    INVALID_JSON = 4
+    #: Empty, no text as above; or for analytics, without the reporter's module or A759 before a bar.
+    INVALID_EVENT_ID = 5
+    QUOTE_IN_USER = 6  #: no spelling of a quote in a user is right for both store and analytics
+    OTHER_USERS_SERVICE = 7  #: the report would end in another user's database
+    WOULD_BLOCK = 8  #: this process's send buffer is full
+    SYSTEM_ERROR = 9
+
+
+class Module(NamedTuple):
+    """The module of the suite that reports: its id as it stands before the bar of its event ids, which begins with A."""
+
+    id: str
+    version: str = ""
+    name: str = ""
+
+
+@dataclass(frozen=True)
+class Json:
+    """A value that is given as JSON text. It is checked when it is sent."""
+
+    text: str
+
+
+#: What an event may say: nothing, a text, or JSON.
+Value = Union[None, str, Json, Dict[str, Any], List[Any]]
+
+
+class _Refusal(Exception):
+    def __init__(self, result: Result) -> None:
+        super().__init__(result)
+        self.result = result
+
+
+# --- Writing messages ---------------------------------------------------------------------------------------------------
+
+_ENCODER = json.JSONEncoder(ensure_ascii=False, allow_nan=False, separators=(",", ":"))
+
+
+def _any_number(text: str) -> None:
+    """Python's own reader may take the digits of other scripts."""
+    if not text.isascii():
+        raise ValueError(text + " is no JSON")
+
+
+def _kept_integer(text: str) -> None:
+    _any_number(text)
+    if len(text) > 20 or not -(2**63) <= int(text) < 2**64:
+        raise ValueError("an integer of more than 64 bits, of which the service keeps some digits only")
+
+
+def _kept_real(text: str) -> None:
+    _any_number(text)
+    if abs(float(text)) == float("inf"):
+        raise ValueError("a number beyond the range of a double, which the service refuses")
+
+
+def _exact_integer(text: str) -> None:
+    _kept_integer(text)
+    if text == "-0":
+        raise ValueError("an integer has no negative zero")
+
+
+def _exact_real(text: str) -> None:
+    """A double keeps any number of 15 digits, but for those next to its bounds."""
+    _kept_real(text)
+    number = float(text)
+    if repr(number) != text and (len(text) > 15 or not 1e-300 < abs(number) < 1e300):
+        raise ValueError("a number of more digits than a double has")
+
+
+def _no_number(text: str) -> None:
+    raise ValueError(text + " is no JSON")
+
+
+#: What is JSON; of that, what the service reads; of that, what it prints again as the same value.
+_JSON = json.JSONDecoder(parse_int=_any_number, parse_float=_any_number, parse_constant=_no_number)
+_KEPT_JSON = json.JSONDecoder(parse_int=_kept_integer, parse_float=_kept_real, parse_constant=_no_number)
+_EXACT_JSON = json.JSONDecoder(parse_int=_exact_integer, parse_float=_exact_real, parse_constant=_no_number)
+
+_STRING = re.compile(r'"[^"\\]*(?:\\.[^"\\]*)*"', re.DOTALL)
+_STRING_OR_BLANKS = re.compile(r'("[^"\\]*(?:\\.[^"\\]*)*")|[ \t\r\n]+', re.DOTALL)
+_PAIR = re.compile(r"\\u[dD][89abAB][0-9a-fA-F]{2}\\u[dD][c-fC-F][0-9a-fA-F]{2}")
+_SURROGATE = re.compile(r"\\u[dD][89a-fA-F]")
+_QUOTE = re.compile(r"\\\\|'|\\u0027")
+
+
+def _is_read(text: str, decoder: json.JSONDecoder) -> bool:
+    try:
+        decoder.decode(text)
+        return True
+    except (ValueError, RecursionError):
+        return False
+
+
+def _is_flat(text: str) -> bool:
+    """Whether the service reads all levels."""
+    if text.count("[") + text.count("{") <= _MAX_DEPTH:
+        return True
+    depth = deepest = 0
+    for character in _STRING.sub("", text):
+        depth += (character in "[{") - (character in "]}")
+        deepest = max(deepest, depth)
+    return deepest <= _MAX_DEPTH
+
+
+def _has_lone_surrogate(text: str) -> bool:
+    """Whether an escape such as \\udc00 stands alone. An escaped backslash before a "u" is no such escape."""
+    return "\\u" in text and _SURROGATE.search(_PAIR.sub("", text.replace("\\\\", "--"))) is not None
+
+
+def _is_text(text: str) -> bool:
+    try:
+        return b"\0" not in text.encode()
+    except UnicodeEncodeError:
+        return False
+
+
+def _checked_text(text: str) -> str:
+    if not _is_text(text):
+        raise _Refusal(Result.INVALID_TEXT)
+    return text
+
+
+def _doubled(text: str) -> str:
+    """For the store: the service puts its texts into an SQL statement as they are."""
+    return text.replace("'", "''")
+
+
+def _doubled_in_json(text: str) -> str:
+    """The same within the strings of an object or array, which the service prints anew: an escaped quote becomes a
+    quote there, too."""
+    if "'" not in text and "\\u0027" not in text:
+        return text
+    return _QUOTE.sub(lambda found: found[0] if found[0] == "\\\\" else "''", text)
+
+
+def _json_text(value: Union[Json, Dict[str, Any], List[Any]]) -> str:
+    """`value` as JSON without white space."""
+    if isinstance(value, Json) and isinstance(value.text, str):
+        text = _checked_text(value.text)
+    elif isinstance(value, (dict, list)):
+        text = _checked_text(_encoded(value))
+    else:
+        raise _Refusal(Result.INVALID_JSON)
+    if not _is_read(text, _JSON) or _has_lone_surrogate(text):
+        raise _Refusal(Result.INVALID_JSON)
+    return _STRING_OR_BLANKS.sub(r"\1", text)
+
+
+def _encoded(value: Union[Dict[str, Any], List[Any]]) -> str:
+    try:
+        return _ENCODER.encode(value)
+    except (TypeError, ValueError, RecursionError, RuntimeError):  # the last: another thread is changing it
+        raise _Refusal(Result.INVALID_JSON) from None
+
+
+def _value_for_store(value: Value) -> Optional[str]:
+    """The report's member "value", as JSON."""
+    if value is None:
+        return None
+    if isinstance(value, str):
+        return _ENCODER.encode(_doubled(_checked_text(value)))
+    text = _json_text(value)
+    if text[0] in "{[" and _is_flat(text) and _is_read(text, _EXACT_JSON):
+        return _doubled_in_json(text)
+    # The service would print it as another value: a string without its quotation marks, null as nothing. As a text, it is
+    # not touched.
+    return _ENCODER.encode(_doubled(text))
+
+
+def _value_for_analytics(value: Value) -> Optional[str]:
+    if value is None:
+        return None
+    if isinstance(value, str):
+        raise _Refusal(Result.INVALID_JSON)
+    text = _json_text(value)
+    if text[0] != "{" or not _is_flat(text) or not _is_read(text, _KEPT_JSON):
+        raise _Refusal(Result.INVALID_JSON)
+    return text
+
+
+def _time(time_ms: Optional[int]) -> str:
+    """The service takes a time of ten characters for seconds. One of that length in milliseconds gets a leading zero."""
+    if time_ms is None:
+        return str(time.time_ns() // 1_000_000)
+    if not isinstance(time_ms, int) or not -(2**63) <= time_ms < 2**63:
+        raise _Refusal(Result.INVALID_JSON)
+    text = str(int(time_ms))
+    return text if len(text) != 10 else f'"{int(time_ms):011d}"'
+
+
+def _datagram(text: str) -> bytes:
+    data = text.encode()
+    if len(data) > _MAX_BYTES:
+        raise _Refusal(Result.TOO_LONG)
+    return data
+
+
+def _is_for_analytics(event_id: str) -> bool:
+    return event_id.startswith("A")
+
+
+def _report(event_id: str, value: Value, time_ms: Optional[int], day_report: bool) -> bytes:
+    if _is_for_analytics(event_id):
+        spelled_id, spelled_value = event_id, _value_for_analytics(value)
+    else:
+        spelled_id, spelled_value = _doubled(event_id), _value_for_store(value)
+    member = "" if spelled_value is None else f',"value":{spelled_value}'
+    return _datagram(
+        f'{{"eventID":{_ENCODER.encode(spelled_id)}{member},"createTime":{_time(time_ms)},'
+        f'"isDayReport":{1 if day_report else 0}}}'
+    )
+
+
+def _control(kind: str, **exdata: str) -> bytes:
+    """The service takes any text with the letters eventID in it for a report. Escaped, they read the same."""
+    for text in exdata.values():
+        _checked_text(text)
+    message = _ENCODER.encode({"msgType": kind, "exdata": exdata})
+    return _datagram(message.replace("eventID", "event\\u0049D"))
+
+
+def _announcement(module: Module) -> Union[bytes, Result]:
+    """Or why the module's events cannot be sent."""
+    try:
+        return _control(
+            "init",
+            moduleID=module.id,
+            moduleVersion=module.version,
+            moduleName=module.name,
+            logPath="",
+            dbPath="",
+            openID="",
+            hublinkVersion="",
+        )
+    except _Refusal as refusal:
+        return refusal.result
+
+
+def _user(open_id: str, suite_version: str) -> bytes:
+    if not isinstance(open_id, str) or not isinstance(suite_version, str) or not open_id:
+        raise _Refusal(Result.INVALID_TEXT)  # an empty one, the service does nothing with
+    if "'" in _checked_text(open_id) or "'" in _checked_text(suite_version):
+        raise _Refusal(Result.QUOTE_IN_USER)
+    return _control("updateOpenID", openID=open_id, hublinkVersion=suite_version)
+
+
+# --- Looking for the service --------------------------------------------------------------------------------------------
+
+
+class _Listener(NamedTuple):
+    is_wildcard: bool
+    is_own: bool
+    inode: str
+
+
+def _in_table(address: bytes) -> str:
+    """As the kernel's tables have it: words of 32 bits in the machine's order of bytes."""
+    words = [address[at : at + 4] for at in range(0, len(address), 4)]
+    return "".join(f"{int.from_bytes(word, sys.byteorder):08X}" for word in words)
+
+
+_LOCALHOST = socket.inet_aton(_HOST)
+_EXACT_ADDRESSES = {_in_table(_LOCALHOST), _in_table(bytes(10) + b"\xff\xff" + _LOCALHOST)}
+_WILDCARDS = {_in_table(bytes(4)), _in_table(bytes(16))}
+_TABLES = (Path("/proc/net/udp"), Path("/proc/net/udp6"))
+
+
+def _listeners(table: str, user: int) -> List[_Listener]:
+    found = []
+    for fields in (line.split() for line in table.splitlines() if f":{_PORT:04X} " in line):
+        address, _, port = fields[1].partition(":")
+        if port == f"{_PORT:04X}" and fields[2].endswith(":0000") and address in _EXACT_ADDRESSES | _WILDCARDS:
+            found.append(_Listener(address in _WILDCARDS, int(fields[7]) == user, fields[9]))
+    return found
+
+
+def _listener() -> Optional[_Listener]:
+    """The socket that a datagram to the service ends in. Raises OSError where the system has no table to look into.
+
+    A socket of the very address comes before one of all addresses. Of two alike, another user's is named.
+    """
+    table = _TABLES[0].read_text("ascii")
+    if _TABLES[1].exists():  # not where IPv6 is switched off
+        table += _TABLES[1].read_text("ascii")
+    return min(_listeners(table, os.geteuid()), default=None)
+
+
+#: What an open socket of ours answers to no call. The program closed all of its files, and the number may be another
+#: file's now.
+_NOT_OURS = {errno.EBADF, errno.ENOTSOCK, errno.EDESTADDRREQ, errno.ENOTCONN}
+
+# --- Sending ------------------------------------------------------------------------------------------------------------
+
+
+def _connected() -> socket.socket:
+    """Connected, because only such a socket is told that nobody listens."""
+    made = socket.socket(socket.AF_INET, socket.SOCK_DGRAM)
+    try:
+        made.setblocking(False)
+        if made.getsockopt(socket.SOL_SOCKET, socket.SO_SNDBUF) < _SEND_BUFFER_BYTES:
+            made.setsockopt(socket.SOL_SOCKET, socket.SO_SNDBUF, _SEND_BUFFER_BYTES)
+        made.connect((_HOST, _PORT))
+    except BaseException:
+        made.close()
+        raise
+    return made
+
+
+class Reporter:
+    """Sends events and tells who is signed in. See the top of the file for threads and failure.
+
+    Without a module, events go to the local store or to the default module A759. A service of another user is not
+    sent to, unless `allow_other_users_service` is set.
+    """
+
+    def __init__(self, module: Optional[Module] = None, *, allow_other_users_service: bool = False) -> None:
+        if module is not None and not isinstance(module, Module):
+            raise TypeError("module must be a Module")
+        self._module_id = None if module is None else module.id
+        self._announcement = None if module is None else _announcement(module)
+        self._allow_others = allow_other_users_service
+        self._lock = threading.RLock()  # guards all below; a signal handler may report while its thread does
+        self._counts = dict.fromkeys(Result, 0)
+        self._socket: Optional[socket.socket] = None
+        self._user: Optional[bytes] = None
+        self._user_is_told = False
+        self._module_is_told = False
+        self._service: Optional[str] = None  # the inode of its socket
+        self._is_others = False
+        self._next_look = 0.0
+        self._next_repeat = 0.0
+        _REPORTERS.add(self)
+
+    def event(
+        self, event_id: str, value: Value = None, *, time_ms: Optional[int] = None, day_report: bool = False
+    ) -> Result:
+        """Sends an event of this moment, or of `time_ms` milliseconds after 1970.
+
+        For an event id that begins with A, the value must be nothing or an object; the service writes its own members
+        "openid" and "sys_version" into it.
+        """
+        return self._counted(lambda: self._event(event_id, value, time_ms, day_report))
+
+    def set_user(self, open_id: str, suite_version: str = "") -> Result:
+        """Tells at once who is signed in, and again whenever the service was restarted. It accompanies every event
+        that comes after. An empty `suite_version` leaves the one that the service knows. A user that is refused as such
+        changes nothing; one that could not be sent is sent before the next event."""
+        return self._counted(lambda: self._set_user(open_id, suite_version))
+
+    def count(self, result: Result) -> int:
+        """How many calls of event and set_user ended so. After a fork, the child counts on."""
+        with self._lock:
+            return self._counts[result]
+
+    def close(self) -> None:
+        """Gives the socket back. A later event opens another one."""
+        with self._lock:
+            self._drop_socket()
+
+    def __enter__(self) -> Reporter:
+        return self
+
+    def __exit__(
+        self, kind: Optional[Type[BaseException]], error: Optional[BaseException], trace: Optional[TracebackType]
+    ) -> None:
+        self.close()
+
+    def __del__(self) -> None:
+        # Else the interpreter may print that a socket was left open.
+        if getattr(self, "_socket", None) is not None:
+            self._drop_socket()
+
+    def _counted(self, work: Callable[[], Result]) -> Result:
+        try:
+            result = work()
+        except _Refusal as refusal:
+            result = refusal.result
+        except Exception:  # a reporter that fails must not end the program that reports
+            result = Result.SYSTEM_ERROR
+        with self._lock:
+            self._counts[result] += 1
+        return result
+
+    def _event(self, event_id: str, value: Value, time_ms: Optional[int], day_report: bool) -> Result:
+        announcement = self._announcement_for(event_id)
+        message = _report(event_id, value, time_ms, day_report)
+        with self._lock:
+            return self._deliver(message, announcement)
+
+    def _set_user(self, open_id: str, suite_version: str) -> Result:
+        message = _user(open_id, suite_version)
+        with self._lock:
+            self._user = message
+            self._user_is_told = False
+            return self._deliver(None, None)
+
+    def _announcement_for(self, event_id: str) -> Optional[bytes]:
+        """What must come before the event; nothing for the store and the default module."""
+        if not isinstance(event_id, str) or not event_id or not _is_text(event_id):
+            raise _Refusal(Result.INVALID_EVENT_ID)
+        if not _is_for_analytics(event_id):
+            return None
+        module, bar, _ = event_id.partition("|")
+        if bar and module == _DEFAULT_MODULE:
+            return None
+        if not bar or module != self._module_id:
+            raise _Refusal(Result.INVALID_EVENT_ID)
+        if isinstance(self._announcement, Result):
+            raise _Refusal(self._announcement)
+        return self._announcement
+
+    # What follows is called with the lock held.
+
+    def _deliver(self, message: Optional[bytes], announcement: Optional[bytes]) -> Result:
+        result = Result.SYSTEM_ERROR
+        for _ in range(2):
+            try:
+                return self._try_to_deliver(message, announcement)
+            except ConnectionRefusedError:
+                # About an earlier datagram, which the system told late: the service may be back meanwhile.
+                self._forget_service()
+                result = Result.NOBODY_LISTENS
+            except OSError as error:
+                if error.errno not in _NOT_OURS or self._socket is None:
+                    return self._result_of(error)
+                self._socket.detach()
+                self._socket = None
+        return result
+
+    def _try_to_deliver(self, message: Optional[bytes], announcement: Optional[bytes]) -> Result:
+        now = time.monotonic()
+        if self._socket is None:
+            self._socket = _connected()
+            self._next_look = now
+        if now >= self._next_look:
+            self._look_for_service(now)
+        if self._is_others:
+            return Result.OTHER_USERS_SERVICE
+        if self._user is not None and not self._user_is_told:
+            self._user_is_told = self._is_taken(self._socket, self._user)
+            if not self._user_is_told:
+                return Result.NOBODY_LISTENS
+        if announcement is not None and not self._module_is_told:
+            self._module_is_told = self._is_taken(self._socket, announcement)
+            if not self._module_is_told:
+                return Result.NOBODY_LISTENS
+        return Result.SENT if message is None or self._is_taken(self._socket, message) else Result.NOBODY_LISTENS
+
+    def _is_taken(self, to: socket.socket, message: bytes) -> bool:
+        to.send(message)
+        if to.getsockopt(socket.SOL_SOCKET, socket.SO_ERROR) == 0:
+            return True
+        self._forget_service()
+        return False
+
+    def _look_for_service(self, now: float) -> None:
+        self._next_look = now + _LOOK_SECONDS
+        self._is_others = False
+        try:
+            listener = _listener()
+        except (OSError, ValueError, IndexError):  # no such table here, or not one that we can read
+            if now >= self._next_repeat:
+                self._forget_service()
+                self._next_repeat = now + _REPEAT_SECONDS
+                self._next_look = now + _LOOK_SECONDS
+            return
+        if listener is None or listener.inode != self._service:
+            self._forget_service()
+        if listener is None:
+            return
+        self._service = listener.inode
+        self._is_others = not listener.is_own and not self._allow_others
+        # Another user's may make room for this user's at any time.
+        self._next_look = now if self._is_others else now + _LOOK_SECONDS
+
+    def _forget_service(self) -> None:
+        """A service that was restarted knows neither module nor user."""
+        self._service = None
+        self._user_is_told = False
+        self._module_is_told = False
+        self._next_look = 0.0
+        self._next_repeat = 0.0
+
+    def _result_of(self, error: OSError) -> Result:
+        if error.errno in (errno.EAGAIN, errno.EWOULDBLOCK, errno.ENOBUFS):
+            return Result.WOULD_BLOCK
+        if error.errno == errno.EMSGSIZE:
+            return Result.TOO_LONG
+        self._drop_socket()
+        return Result.SYSTEM_ERROR
+
+    def _drop_socket(self) -> None:
+        if self._socket is not None:
+            self._socket.close()
+        self._socket = None
+
+    def _begin_in_child(self) -> None:
+        self._lock = threading.RLock()  # the old one may be held by a thread that the child does not have
+        self._drop_socket()  # on a shared socket, one process would be told of the other's errors
+
+
+_REPORTERS: weakref.WeakSet[Reporter] = weakref.WeakSet()
+
+
+def _begin_in_child() -> None:
+    for reporter in list(_REPORTERS):
+        reporter._begin_in_child()
+
+
+if hasattr(os, "register_at_fork"):
+    os.register_at_fork(after_in_child=_begin_in_child)
+
+
+# --- The program's log --------------------------------------------------------------------------------------------------
+
+_EventIdOf = Union[str, Callable[[logging.LogRecord], str]]
+
+
+class ReportHandler(logging.Handler):
+    """Sends each log record as an event, for Python's own logging.
+
+        logging.getLogger().addHandler(ReportHandler(reporter, "B100|%(name)s", level=logging.WARNING))
+
+    `event_id` is a text in which "%(name)s" and the record's other attributes are filled in, or a function of the
+    record. The value is an object with "level", "logger", "message", "file" and "line"; the message is what the handler's
+    formatter makes of the record, by default the message and the exception's trace. One that is too long for a datagram is
+    cut at its end, and the object has "cut" then.
+
+    Failure: nothing is raised or printed. `failed` counts the records that could not be formatted, and those that were
+    logged while a record of the same thread was being sent; what became of the others, the reporter counts.
+    """
+
+    def __init__(self, reporter: Reporter, event_id: _EventIdOf = "Log|%(name)s", level: int = logging.NOTSET) -> None:
+        super().__init__(level)
+        self.failed = 0
+        self._reporter = reporter
+        self._event_id = event_id
+        self._thread = threading.local()
+
+    def emit(self, record: logging.LogRecord) -> None:
+        if getattr(self._thread, "is_busy", False):  # a text of the record logs while it is made
+            self.failed += 1
+            return
+        self._thread.is_busy = True
+        try:
+            self._send(record)
+        except Exception:
+            self.failed += 1
+        finally:
+            self._thread.is_busy = False
+
+    def _send(self, record: logging.LogRecord) -> None:
+        made = self._event_id(record) if callable(self._event_id) else self._event_id % record.__dict__
+        event_id = _readable(made)
+        time_ms = int(record.created * 1000)
+        value: Dict[str, Any] = {
+            "level": record.levelname,
+            "logger": _readable(record.name),
+            "message": _readable(self.format(record)),
+            "file": _readable(record.pathname),
+            "line": record.lineno,
+        }
+        while value["message"] and _is_too_long(event_id, value, time_ms):
+            value["message"] = value["message"][: min(len(value["message"]) * 3 // 4, _MAX_BYTES)]
+            value["cut"] = True
+        self._reporter.event(event_id, value, time_ms=time_ms)
+
+
+def _readable(text: str) -> str:
+    """File names that are no UTF-8 reach Python as lone surrogates. A log says them in escapes, rather than nothing."""
+    return text.encode("utf-8", "backslashreplace").decode()
+
+
+def _is_too_long(event_id: str, value: Value, time_ms: int) -> bool:
+    try:
+        _report(event_id, value, time_ms, False)
+    except _Refusal as refusal:
+        return refusal.result is Result.TOO_LONG
+    return False
