@@ -1,0 +1,69 @@
+#include <fmt/format.h>
+#include <fmt/ranges.h>
+
+#include "Tools/reportctl/pages/Completions.h"
+
+namespace reportctl::pages {
+namespace {
+
+struct Tables {
+    std::string commands; ///< patterns of the words that lead to a command
+    std::string values;   ///< what completes an option's value
+    std::string words;    ///< what may come next in a command
+};
+
+std::string ValueCase(const Command& command, const Option& option) {
+    std::string patterns;
+    for (const auto& name : option.names)
+        patterns += fmt::format("{}\"{} {}\"", patterns.empty() ? "" : " | ", command.Name(), name);
+    if (option.choices.empty())
+        return fmt::format("    {}) compopt -o default; return ;;\n", patterns);
+    return fmt::format("    {}) words=\"{}\" ;;\n", patterns, fmt::join(option.choices, " "));
+}
+
+void Add(Tables& tables, const Command& command) {
+    std::vector<std::string> words;
+    for (const auto& sub : command.commands) {
+        words.push_back(sub.path.back());
+        tables.commands += fmt::format("{}\"{}\"", tables.commands.empty() ? "" : " | ", sub.Name());
+    }
+    for (const auto& option : command.options) {
+        if (option.isPositional)
+            continue;
+        words.insert(words.end(), option.names.begin(), option.names.end());
+        if (!option.value.empty())
+            tables.values += ValueCase(command, option);
+    }
+    tables.words += fmt::format("    \"{}\") words=\"{}\" ;;\n", command.Name(), fmt::join(words, " "));
+    for (const auto& sub : command.commands)
+        Add(tables, sub);
+}
+
+} // namespace
+
+std::string BashCompletion(const Command& program) {
+    Tables tables;
+    Add(tables, program);
+    return fmt::format(R"(# completion of {0} for bash
+_{0}() {{
+    local current=${{COMP_WORDS[COMP_CWORD]}} previous=${{COMP_WORDS[COMP_CWORD - 1]}}
+    local command={0} words="" i
+    for ((i = 1; i < COMP_CWORD; i++)); do
+        case "$command ${{COMP_WORDS[i]}}" in
+        {1}) command+=" ${{COMP_WORDS[i]}}" ;;
+        esac
+    done
+    case "$command" in
+{2}    esac
+    case "$command $previous" in
+{3}    esac
+    COMPREPLY=($(compgen -W "$words" -- "$current"))
+    # Nothing fits: a file's name may.
+    [ ${{#COMPREPLY[@]}} -gt 0 ] || compopt -o default
+}}
+complete -F _{0} {0}
+)",
+                       program.Name(), tables.commands, tables.words, tables.values);
+}
+
+} // namespace reportctl::pages

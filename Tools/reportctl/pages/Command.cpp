@@ -1,0 +1,83 @@
+#include "Tools/reportctl/pages/Command.h"
+
+#include <algorithm>
+#include <set>
+
+#include <CLI/CLI.hpp>
+#include <fmt/format.h>
+#include <fmt/ranges.h>
+
+namespace reportctl::pages {
+namespace {
+
+/// The values in "TEXT:{csv,jsonl}", which is how a set that an option is checked against shows in its type.
+std::vector<std::string> ChoicesIn(const std::string& type) {
+    const auto begin = type.find('{');
+    const auto end = type.find('}', begin);
+    if (begin == std::string::npos || end == std::string::npos)
+        return {};
+    auto values = CLI::detail::split(type.substr(begin + 1, end - begin - 1), ',');
+    for (auto& value : values) // a mapping shows as "name->number"
+        value = value.substr(0, value.find("->"));
+    return values;
+}
+
+std::vector<std::string> NamesOf(const CLI::Option& option) {
+    std::vector<std::string> names;
+    for (const auto& name : option.get_snames())
+        names.push_back("-" + name);
+    for (const auto& name : option.get_lnames())
+        names.push_back("--" + name);
+    if (names.empty())
+        names.push_back(option.get_name(true));
+    return names;
+}
+
+/// Sorted, because the parser keeps them in the order of their addresses.
+std::vector<std::string> NamesOf(const std::set<CLI::Option*>& options) {
+    std::vector<std::string> names;
+    names.reserve(options.size());
+    for (const auto* option : options)
+        names.push_back(NamesOf(*option).back());
+    std::sort(names.begin(), names.end());
+    return names;
+}
+
+Option ReadOption(const CLI::Option& option) {
+    const auto type = option.get_type_size() == 0 ? std::string() : option.get_type_name();
+    const auto colon = type.find(':'); // between the type and what the checks say
+    Option read;
+    read.names = NamesOf(option);
+    read.value = type.substr(0, colon);
+    read.limits = colon == std::string::npos ? "" : type.substr(colon + 1);
+    read.description = option.get_description();
+    read.group = option.get_group();
+    read.isPositional = option.get_snames().empty() && option.get_lnames().empty();
+    read.isRequired = option.get_required();
+    read.defaultValue = option.get_default_str();
+    read.choices = ChoicesIn(type);
+    read.needs = NamesOf(option.get_needs());
+    read.excludes = NamesOf(option.get_excludes());
+    return read;
+}
+
+} // namespace
+
+std::string Command::Name(const std::string& separator) const {
+    return fmt::format("{}", fmt::join(path, separator));
+}
+
+Command Read(const CLI::App& app, const std::vector<std::string>& parents) {
+    Command command;
+    command.path = parents;
+    command.path.push_back(app.get_name());
+    command.description = app.get_description();
+    command.footer = app.get_footer();
+    for (const auto* option : app.get_options([](const CLI::Option* o) { return !o->get_group().empty(); }))
+        command.options.push_back(ReadOption(*option));
+    for (const auto* sub : app.get_subcommands([](const CLI::App* a) { return !a->get_group().empty(); }))
+        command.commands.push_back(Read(*sub, command.path));
+    return command;
+}
+
+} // namespace reportctl::pages

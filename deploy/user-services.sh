@@ -1,0 +1,50 @@
+# For the maintainer scripts of packages: starts users' services again, or stops them. Sourced; any POSIX shell, and root.
+# Talks to each user's service manager as that user, by its own socket: that needs no system bus, and a user who put
+# something else in its place deceives nobody else.
+
+ssr_unit=sync-service-report.service
+ssr_program=/usr/lib/sync-service-report/SyncServiceReport
+
+# ssr_each_manager COMMAND...: runs systemctl --user COMMAND... for each user whose manager runs.
+ssr_each_manager() {
+    command -v systemctl >/dev/null || return 0
+    for ssr_runtime in /run/user/*; do
+        [ -S "$ssr_runtime/systemd/private" ] || continue
+        ssr_uid=${ssr_runtime##*/}
+        ssr_gid=$(getent passwd "$ssr_uid" | cut -d: -f4)
+        [ -n "$ssr_gid" ] || continue
+        # A manager that hangs must not keep the package from being installed.
+        timeout 20 setpriv --reuid "$ssr_uid" --regid "$ssr_gid" --init-groups \
+            env XDG_RUNTIME_DIR="$ssr_runtime" systemctl --user --quiet "$@" </dev/null || true
+    done
+}
+
+# ssr_processes: the ids of processes that run the service as it was installed, also when its file has been replaced.
+ssr_processes() {
+    for ssr_process in /proc/[0-9]*; do
+        case $(readlink "$ssr_process/exe" 2>/dev/null || true) in
+        "$ssr_program" | "$ssr_program (deleted)" | "$ssr_program.dpkg-"*) echo "${ssr_process##*/}" ;;
+        esac
+    done
+}
+
+restart_user_services() {
+    ssr_each_manager daemon-reload
+    ssr_each_manager try-restart "$ssr_unit"
+    # What no manager looks after was started by the suite, which may not start it again before the next login.
+    for ssr_process in $(ssr_processes); do
+        case $(readlink "/proc/$ssr_process/exe" 2>/dev/null || true) in
+        *' (deleted)' | *.dpkg-*)
+            echo "Process $ssr_process of $(stat -c %U "/proc/$ssr_process") still runs the version before. It takes the" \
+                "new one when it is started again."
+            ;;
+        esac
+    done
+}
+
+stop_user_services() {
+    ssr_each_manager stop "$ssr_unit"
+    for ssr_process in $(ssr_processes); do
+        kill "$ssr_process" 2>/dev/null || true
+    done
+}
