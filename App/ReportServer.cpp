@@ -12,13 +12,10 @@ namespace {
 
 using SystemTool::IO::JsonDocument;
 
-constexpr int UDP_PORT = 9997;
-constexpr std::size_t LENGTH_OF_SECONDS = 10; // in bytes, a minus sign included
-
 std::string TimeText(const JsonDocument& createTime) {
     std::string text =
         createTime.IsLongLong() ? std::to_string(createTime.ToLongLong()) : createTime.ToString();
-    if (text.size() == LENGTH_OF_SECONDS)
+    if (text.size() == Wire::SECONDS_LENGTH) // in bytes, a minus sign included
         text += "000"; // by length alone, deliberately: senders give seconds as a number or as a text
     return text;
 }
@@ -38,7 +35,7 @@ bool ReportServer::Start() {
         m_pMetrikMgr->Init();
         m_pFrameWorker = new FrameWorker(this);
         m_pFrameWorker->Init();
-        UDPServer::Start(UDP_SERVER_IP, UDP_PORT);
+        UDPServer::Start(UDP_SERVER_IP, Wire::PORT);
         // Both bases have a thread and a loop; this is the queue's pair. What is received before waits in the
         // queue.
         WorkQueue::m_thread.start(static_cast<WorkQueue&>(*this));
@@ -65,14 +62,14 @@ bool ReportServer::Consume(const std::string& msg) {
     try {
         // A search of the raw text and no parse, deliberately: it is what tells the two kinds of message
         // apart.
-        if (msg.find("eventID") == std::string::npos) {
+        if (msg.find(Wire::REPORT_MARK) == std::string::npos) {
             m_pMetrikMgr->Update(msg);
             return true;
         }
         ST_OptLog log;
         if (!JsonToStruct(msg, log))
             return false;
-        if (log.eventID.substr(0, 1) == "A")
+        if (log.eventID.substr(0, 1) == Wire::ANALYTICS_PREFIX)
             m_pMetrikMgr->Send(log);
         else
             m_pFrameWorker->Send(log);
@@ -107,7 +104,7 @@ bool ReportServer::JsonToStruct(const std::string& json, ST_OptLog& out) {
                      error); // the parser's text is the format, deliberately
             return false;
         }
-        out.eventID = report.GetKeyValue("eventID").ToString();
+        out.eventID = report.GetKeyValue(Wire::REPORT_MARK).ToString();
         const JsonDocument value = report.GetKeyValue("value");
         out.value = value.IsObject() ? value.ToJson() : value.ToString();
         out.createTime = TimeText(report.GetKeyValue("createTime"));

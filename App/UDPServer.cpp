@@ -14,7 +14,6 @@
 
 namespace {
 
-constexpr std::size_t RECEIVE_BUFFER_BYTES = 10240;
 constexpr long POLL_TIMEOUT_MS = 250; // how long a stop may take; spares the loop a socket to be woken by
 
 /// What is asked of the kernel. Its default holds some hundred datagrams, which a burst fills while this
@@ -51,7 +50,7 @@ public:
     Poco::Net::SocketAddress m_sender; ///< Not looked at: whoever sends from this machine is welcome.
 
 private:
-    std::array<char, RECEIVE_BUFFER_BYTES + 1> m_bytes{};
+    std::array<char, Wire::MAX_BYTES + 1> m_bytes{};
 };
 
 UDPServer::~UDPServer() {
@@ -123,7 +122,7 @@ bool UDPServer::ReceiveOne(Buffer& buffer) {
     bool received = false;
     try {
         buffer.Clear();
-        const int bytes = m_socket.receiveFrom(buffer.Data(), RECEIVE_BUFFER_BYTES, buffer.m_sender);
+        const int bytes = m_socket.receiveFrom(buffer.Data(), Wire::MAX_BYTES, buffer.m_sender);
         received = true;
         if (bytes >= 1)
             Recv(buffer.Text());

@@ -2,6 +2,8 @@
 
 #include <string>
 
+#include "Common/Wire.h"
+
 // Every source file has a copy of these of its own, built by its own static initialiser: they may be used
 // during static initialisation, where a shared copy of another file might not exist yet.
 

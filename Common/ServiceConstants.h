@@ -2,6 +2,7 @@
 
 #include <string>
 
+#include "Common/Paths.h"
 #include "SystemTool/CommonTool.h"
 #include "SystemTool/IO/Directory.h"
 
@@ -9,7 +10,7 @@
 namespace SyncServiceReport {
 
 /// The directory of "Report.log".
-static const std::string APP_LOG_DIR_PATH = SystemTool::CommonTool::GetUserDataDir() + "/hublink/log/metrik";
+static const std::string APP_LOG_DIR_PATH = Paths::ServiceLogs(SystemTool::CommonTool::GetUserDataDir());
 
 /// The directory of the executable and its plug-ins, ending in a separator. The suite's programs share the
 /// misspelling.

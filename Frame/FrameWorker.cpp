@@ -27,8 +27,7 @@ bool FrameWorker::Init() {
         }
         // The result is not looked at, deliberately: the file may be made later, and until then each insert
         // that fails says so.
-        m_pSqliteDb->Open(
-            Poco::format("%s/hublink/database/Report.db", m_pServer->GetBaseInfo().userDataDir));
+        m_pSqliteDb->Open(Paths::Store(m_pServer->GetBaseInfo().userDataDir));
         DBHelper::instance().Init(m_pSqliteDb);
         SetUserBaseInfo();
         WriteLog({LogLevel::Info, "Init"}, "FrameWorker load success");

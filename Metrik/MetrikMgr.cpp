@@ -57,8 +57,8 @@ bool MetrikMgr::Update(const std::string& json) {
             WriteLog({LogLevel::Error, "Update", 53}, "json formate error :%s", error);
             return false;
         }
-        const std::string msgType = message.GetKeyValue("msgType").ToString();
-        const JsonDocument exdata = message.GetKeyValue("exdata");
+        const std::string msgType = message.GetKeyValue(Wire::MESSAGE_KIND).ToString();
+        const JsonDocument exdata = message.GetKeyValue(Wire::MESSAGE_DATA);
         std::string openID;
         std::string version;
         if (msgType == ORVEK_REPORT_MODULEINIT) {

@@ -30,9 +30,8 @@ bool MetrikWorker::InitDefalut() {
         if (sdk == nullptr)
             return false;
         const std::string& userDataDir = m_pServer->GetBaseInfo().userDataDir;
-        sdk->InitSdk(DEFAULT_MODULE_ID, DEFAULT_MODULE_VERSION, DEFAULT_MODULE_NAME,
-                     Poco::format("%s/hublink/log", userDataDir),
-                     Poco::format("%s/hublink/database", userDataDir), FailCallBackFun, SuccCallBackFun);
+        sdk->InitSdk(DEFAULT_MODULE_ID, DEFAULT_MODULE_VERSION, DEFAULT_MODULE_NAME, Paths::Logs(userDataDir),
+                     Paths::Databases(userDataDir), FailCallBackFun, SuccCallBackFun);
         m_pSdk = sdk;
         return true;
     } catch (...) {

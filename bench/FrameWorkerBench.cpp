@@ -8,7 +8,9 @@
 #include <fmt/format.h>
 
 #include "App/ReportServer.h"
+#include "Common/Paths.h"
 #include "Frame/FrameWorker.h"
+#include "tests/support/StoreTables.h"
 #include "tests/support/TemporaryDirectory.h"
 
 // One report through FrameWorker::Send into a real file, against a bare loop of the same statement's text,
@@ -17,11 +19,6 @@
 // The bare loop runs first and makes SQLite count every allocation, which the plug-in would switch off in a
 // process that had not used SQLite before. So both pay for that here; in the service neither does.
 namespace {
-
-constexpr auto TABLES =
-    "create table OperLog (id integer primary key, eventID text, value text, createTime text, "
-    "pType integer, extData1 text, extData2 text, extData3 text, extData4 text);"
-    "create table BaseInfo (key text, value text);";
 
 const std::string VERSION = "3.0.0.0";
 const std::string USER = "visitor";
@@ -49,15 +46,15 @@ std::string Fill(std::int64_t rows) {
 class Store {
 public:
     explicit Store(std::int64_t rows = 0) {
-        std::filesystem::create_directories(m_directory.Path() + "/hublink/database");
+        std::filesystem::create_directories(SyncServiceReport::Paths::Databases(m_directory.Path()));
         SQLite::Database database(Path(), SQLite::OPEN_READWRITE | SQLite::OPEN_CREATE);
         database.exec("pragma journal_mode=wal");
-        database.exec(TABLES);
+        database.exec(STORE_TABLES);
         if (rows > 0)
             database.exec(Fill(rows));
         ::setenv("XDG_DATA_HOME", m_directory.Path().c_str(), 1);
     }
-    std::string Path() const { return m_directory.Path() + "/hublink/database/Report.db"; }
+    std::string Path() const { return SyncServiceReport::Paths::Store(m_directory.Path()); }
 
 private:
     TemporaryDirectory m_directory;

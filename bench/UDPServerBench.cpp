@@ -7,6 +7,7 @@
 #include <sys/socket.h>
 
 #include "App/UDPServer.h"
+#include "Common/Wire.h"
 #include "bench/Report.h"
 
 // One datagram from the socket to a text, with the datagrams waiting in the socket already: what the
@@ -47,7 +48,7 @@ public:
 
 private:
     Poco::Net::DatagramSocket m_socket{Poco::Net::SocketAddress("127.0.0.1", 0)};
-    std::array<char, 10240> m_buffer{};
+    std::array<char, Wire::MAX_BYTES> m_buffer{};
 };
 
 template <typename AnyReceiver>

@@ -12,16 +12,14 @@
 #include "fuzz/support/Report.h"
 #include "fuzz/support/Require.h"
 #include "tests/fakes/FakeLogger.h"
+#include "tests/support/StoreTables.h"
 #include "tests/support/TemporaryDirectory.h"
 
 using namespace SyncServiceReport;
 
 namespace {
 
-constexpr auto SCHEMA =
-    "create table OperLog (id integer primary key, eventID text, value text, createTime text, pType integer, "
-    "extData1 text, extData2 text, extData3 text, extData4 text);"
-    "create table BaseInfo (key text, value text);"
+constexpr auto ROWS =
     "insert into BaseInfo values ('OpenID', 'u1');"
     "insert into OperLog values (1, 'kept', 'v', '1700000000000', 0, null, null, '3.0.0.0', 'u1')";
 
@@ -46,7 +44,8 @@ public:
                      RTLD_NOW | RTLD_NODELETE) != nullptr,
             "the store's library is beside the program");
         m_look.exec("pragma journal_mode = wal");
-        m_look.exec(SCHEMA);
+        m_look.exec(STORE_TABLES);
+        m_look.exec(ROWS);
         m_others = Ask(OTHERS);
     }
 

@@ -8,19 +8,21 @@
 #include <netinet/in.h>
 #include <sys/socket.h>
 
+#include "Common/Wire.h"
+
 int main() {
     const int receiver = ::socket(AF_INET, SOCK_DGRAM | SOCK_CLOEXEC, 0);
     const int bufferBytes = 8 * 1024 * 1024; // what the service asks for; the kernel grants both the same
     ::setsockopt(receiver, SOL_SOCKET, SO_RCVBUF, &bufferBytes, sizeof bufferBytes);
     sockaddr_in address{};
     address.sin_family = AF_INET;
-    address.sin_port = htons(9997);
+    address.sin_port = htons(Wire::PORT);
     address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
     if (::bind(receiver, reinterpret_cast<const sockaddr*>(&address), sizeof address) != 0) {
         std::perror("bind");
         return 1;
     }
-    std::array<char, 10240> buffer{};
+    std::array<char, Wire::MAX_BYTES> buffer{};
     for (;;)
         ::recvfrom(receiver, buffer.data(), buffer.size(), 0, nullptr, nullptr);
 }

@@ -14,6 +14,7 @@
 #include <sys/prctl.h>
 #include <sys/socket.h>
 
+#include "Common/Wire.h"
 #include "bench/load/Clocks.h"
 #include "bench/load/NumberedReport.h"
 
@@ -38,7 +39,7 @@ class Sender {
 public:
     explicit Sender(const Plan& plan) : m_plan(plan), m_report(plan.eventId) {
         m_service.sin_family = AF_INET;
-        m_service.sin_port = htons(9997);
+        m_service.sin_port = htons(Wire::PORT);
         m_service.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
         if (!plan.stampsFile.empty())
             m_stamps.resize(static_cast<std::size_t>(plan.count)); // and touched, before the clock runs

@@ -16,6 +16,7 @@
 #include <unistd.h>
 
 #include "tests/fakes/FakeLogger.h"
+#include "tests/support/FileContent.h"
 #include "tests/support/MountedOver.h"
 #include "tests/support/TemporaryDirectory.h"
 #include "tests/support/WaitUntil.h"
@@ -79,8 +80,7 @@ std::ptrdiff_t DescriptorCount() {
 }
 
 std::string ContentOfPidFile() {
-    std::ifstream file(PID_FILE);
-    return {std::istreambuf_iterator<char>(file), {}};
+    return ContentOf(PID_FILE);
 }
 
 class InstanceGuard : public ::testing::Test {

@@ -10,9 +10,11 @@
 #include <unistd.h>
 
 #include "App/ReportServer.h"
+#include "Common/Paths.h"
 #include "Frame/DBHelper.h"
 #include "Frame/FrameWorker.h"
 #include "tests/fakes/FakeLogger.h"
+#include "tests/support/StoreTables.h"
 #include "tests/support/TemporaryDirectory.h"
 
 using namespace SyncServiceReport;
@@ -35,18 +37,15 @@ constexpr double SANITIZER_SLOWNESS = 1;
 class RealStore : public ::testing::Test {
 protected:
     RealStore() {
-        std::filesystem::create_directories(m_data.Path() + "/hublink/database");
+        std::filesystem::create_directories(Paths::Databases(m_data.Path()));
         Run("pragma journal_mode=wal");
-        Run("create table OperLog (id integer primary key, eventID text, value text, createTime text, pType "
-            "integer, "
-            "extData1 text, extData2 text, extData3 text, extData4 text)");
-        Run("create table BaseInfo (key text, value text)");
+        Run(STORE_TABLES);
         ::setenv("XDG_DATA_HOME", m_data.Path().c_str(), 1);
         m_server.InitBaseInfo();
     }
     ~RealStore() override { DBHelper::instance().Init(nullptr); }
 
-    std::string File() const { return m_data.Path() + "/hublink/database/Report.db"; }
+    std::string File() const { return Paths::Store(m_data.Path()); }
 
     void Run(const std::string& sql) const {
         SQLite::Database database(File(), SQLite::OPEN_READWRITE | SQLite::OPEN_CREATE, 5000);

@@ -8,6 +8,7 @@
 #include <sys/wait.h>
 
 #include "tests/e2e/support/Service.h"
+#include "tests/support/FileContent.h"
 #include "tests/support/ModeOf.h"
 #include "tests/support/MountedOver.h"
 #include "tests/support/WaitUntil.h"
@@ -32,8 +33,7 @@ std::vector<std::string> MessagesOf(const std::vector<Service::Line>& lines) {
 }
 
 std::string ContentOfPidFile() {
-    std::ifstream file(Service::PID_FILE);
-    return {std::istreambuf_iterator<char>(file), {}};
+    return ContentOf(Service::PID_FILE);
 }
 
 /// One bit for each signal that the process has a handler for, the lowest for signal 1.

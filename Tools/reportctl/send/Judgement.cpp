@@ -5,6 +5,7 @@
 #include <fmt/format.h>
 
 #include "Common/ServiceConstants.h"
+#include "Common/Wire.h"
 #include "SystemTool/IO/JsonDocument.h"
 
 namespace reportctl::send {
@@ -14,8 +15,6 @@ using SyncServiceReport::ORVEK_REPORT_MODULEINIT;
 using SyncServiceReport::ORVEK_REPORT_UPDATEOPENID;
 using SystemTool::IO::JsonDocument;
 
-constexpr std::size_t MAX_BYTES = 10240; // the service's receive buffer
-constexpr std::size_t DIGITS_OF_SECONDS = 10;
 constexpr std::size_t DIGITS_OF_MILLISECONDS = 13;
 
 bool Contains(const std::string& text, const std::string& part) {
@@ -56,7 +55,7 @@ void JudgeTime(Judgement& judgement, const std::string& time) {
     if (time.empty())
         judgement.warnings.emplace_back("it has no createTime; the service keeps an empty one");
     else if (!std::all_of(time.begin(), time.end(), [](char c) { return c >= '0' && c <= '9'; }) ||
-             (time.size() != DIGITS_OF_SECONDS && time.size() != DIGITS_OF_MILLISECONDS))
+             (time.size() != Wire::SECONDS_LENGTH && time.size() != DIGITS_OF_MILLISECONDS))
         judgement.warnings.emplace_back("its createTime has neither ten digits (seconds since 1970) nor "
                                         "thirteen (milliseconds); the service keeps it as it is");
 }
@@ -85,11 +84,11 @@ void JudgeForAnalytics(Judgement& judgement, const std::string& eventID, const s
 }
 
 void JudgeReport(Judgement& judgement, const JsonDocument& report) {
-    const auto eventID = report.GetKeyValue("eventID").ToString();
+    const auto eventID = report.GetKeyValue(Wire::REPORT_MARK).ToString();
     const auto value = ValueText(report.GetKeyValue("value"));
     const auto time = report.GetKeyValue("createTime").ToString();
-    const bool isForAnalytics = eventID.starts_with("A");
-    judgement.what = fmt::format("event {}, for {}", report.GetKeyValue("eventID").ToJson(),
+    const bool isForAnalytics = eventID.starts_with(Wire::ANALYTICS_PREFIX);
+    judgement.what = fmt::format("event {}, for {}", report.GetKeyValue(Wire::REPORT_MARK).ToJson(),
                                  isForAnalytics ? "analytics" : "the store");
     if (eventID.empty())
         judgement.errors.emplace_back(
@@ -124,7 +123,7 @@ void JudgeInit(Judgement& judgement, const JsonDocument& exdata) {
     if (moduleID.empty())
         judgement.errors.emplace_back(
             "it has no moduleID in its exdata: no event could belong to the module");
-    else if (!moduleID.starts_with("A") || Contains(moduleID, "|"))
+    else if (!moduleID.starts_with(Wire::ANALYTICS_PREFIX) || Contains(moduleID, "|"))
         judgement.warnings.emplace_back(
             "no event will reach this module: only event ids that begin with \"A\" "
             "go to analytics, and their module is what stands before the bar");
@@ -141,11 +140,11 @@ void JudgeOpenIdUpdate(Judgement& judgement, const JsonDocument& exdata) {
 }
 
 void JudgeControl(Judgement& judgement, const JsonDocument& message) {
-    const auto msgType = message.GetKeyValue("msgType");
+    const auto msgType = message.GetKeyValue(Wire::MESSAGE_KIND);
     if (msgType.ToString() == ORVEK_REPORT_MODULEINIT)
-        JudgeInit(judgement, message.GetKeyValue("exdata"));
+        JudgeInit(judgement, message.GetKeyValue(Wire::MESSAGE_DATA));
     else if (msgType.ToString() == ORVEK_REPORT_UPDATEOPENID)
-        JudgeOpenIdUpdate(judgement, message.GetKeyValue("exdata"));
+        JudgeOpenIdUpdate(judgement, message.GetKeyValue(Wire::MESSAGE_DATA));
     else
         judgement.errors.push_back(
             fmt::format("it is no report (there is no \"eventID\" in it) and no control message that the "
@@ -155,13 +154,13 @@ void JudgeControl(Judgement& judgement, const JsonDocument& message) {
 }
 
 bool IsControl(const JsonDocument& message) {
-    const auto msgType = message.GetKeyValue("msgType").ToString();
+    const auto msgType = message.GetKeyValue(Wire::MESSAGE_KIND).ToString();
     return msgType == ORVEK_REPORT_MODULEINIT || msgType == ORVEK_REPORT_UPDATEOPENID;
 }
 
 void JudgeMessage(Judgement& judgement, const std::string& text, const JsonDocument& message) {
     // The service searches the raw text, before it parses anything.
-    if (!Contains(text, "eventID"))
+    if (!Contains(text, Wire::REPORT_MARK))
         JudgeControl(judgement, message);
     else if (IsControl(message))
         judgement.errors.emplace_back(
@@ -174,9 +173,9 @@ void JudgeMessage(Judgement& judgement, const std::string& text, const JsonDocum
 
 /// Why nothing of the text can be used; empty when it can be.
 std::string ReasonAgainstText(const std::string& text, JsonDocument& message) {
-    if (text.size() > MAX_BYTES)
+    if (text.size() > Wire::MAX_BYTES)
         return fmt::format("it has {} bytes, and the service cuts a text off after {}", text.size(),
-                           MAX_BYTES);
+                           Wire::MAX_BYTES);
     if (const auto zero = text.find('\0'); zero != std::string::npos)
         return fmt::format("it holds a zero byte, and the service cuts a text off there: byte {}", zero);
     std::string error;

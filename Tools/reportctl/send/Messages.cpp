@@ -3,6 +3,7 @@
 #include <string_view>
 
 #include "Common/ServiceConstants.h"
+#include "Common/Wire.h"
 #include "SystemTool/IO/JsonDocument.h"
 
 namespace reportctl::send {
@@ -26,7 +27,7 @@ void SetValue(JsonDocument& report, const std::string& value) {
 
 /// The service takes any text with these letters in it for a report. Escaped, they read the same.
 std::string WithoutTheMarkOfReports(std::string text) {
-    constexpr std::string_view MARK = "eventID";
+    constexpr std::string_view MARK = Wire::REPORT_MARK;
     for (auto at = text.find(MARK); at != std::string::npos; at = text.find(MARK, at))
         text.replace(at, MARK.size(), "event\\u0049D");
     return text;
@@ -34,8 +35,8 @@ std::string WithoutTheMarkOfReports(std::string text) {
 
 std::string BuildControl(const std::string& msgType, const JsonDocument& exdata) {
     JsonDocument message;
-    message.SetKeyValue("msgType", msgType);
-    message.SetKeyValue("exdata", exdata);
+    message.SetKeyValue(Wire::MESSAGE_KIND, msgType);
+    message.SetKeyValue(Wire::MESSAGE_DATA, exdata);
     return WithoutTheMarkOfReports(message.ToJson());
 }
 
@@ -43,7 +44,7 @@ std::string BuildControl(const std::string& msgType, const JsonDocument& exdata)
 
 std::string BuildReport(const Report& report) {
     JsonDocument message;
-    message.SetKeyValue("eventID", report.eventID);
+    message.SetKeyValue(Wire::REPORT_MARK, report.eventID);
     SetValue(message, report.value);
     message.SetKeyValue("createTime", Number(report.createTime));
     message.SetKeyValue("isDayReport", Number(report.isDayReport ? 1 : 0));

@@ -1,18 +1,16 @@
 #include "Tools/reportctl/send/Sender.h"
 
 #include <cerrno>
-#include <cstdint>
 
 #include <Poco/Net/NetException.h>
 #include <Poco/Net/SocketAddress.h>
 #include <Poco/Net/SocketImpl.h>
 
 #include "Common/ServiceConstants.h"
+#include "Common/Wire.h"
 
 namespace reportctl::send {
 namespace {
-
-constexpr std::uint16_t PORT = 9997;
 
 /// How long the system may take to tell that nobody listens. Linux tells before the send over loopback
 /// returns, but nothing promises that, there or elsewhere. Nobody notices the wait at the end of a command.
@@ -21,7 +19,7 @@ constexpr long REFUSAL_WAIT_MS = 20;
 } // namespace
 
 Sender::Sender() {
-    m_socket.connect(Poco::Net::SocketAddress(SyncServiceReport::UDP_SERVER_IP, PORT));
+    m_socket.connect(Poco::Net::SocketAddress(SyncServiceReport::UDP_SERVER_IP, Wire::PORT));
 }
 
 bool Sender::Send(const std::string& text) {
@@ -45,7 +43,7 @@ bool Sender::IsRefused() const {
 }
 
 std::string Sender::Address() {
-    return Poco::Net::SocketAddress(SyncServiceReport::UDP_SERVER_IP, PORT).toString();
+    return Poco::Net::SocketAddress(SyncServiceReport::UDP_SERVER_IP, Wire::PORT).toString();
 }
 
 } // namespace reportctl::send

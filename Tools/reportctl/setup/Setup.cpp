@@ -2,6 +2,7 @@
 
 #include <filesystem>
 
+#include "Common/Paths.h"
 #include "SystemTool/CommonTool.h"
 #include "Tools/reportctl/setup/Directories.h"
 #include "Tools/reportctl/setup/PidFile.h"
@@ -11,6 +12,8 @@
 
 namespace reportctl::setup {
 namespace {
+
+namespace Paths = SyncServiceReport::Paths;
 
 void SetUpBaseInfo(terminal::Worklog& log, const std::string& store, const SetupOptions& options) {
     if (!options.openID.empty())
@@ -25,10 +28,10 @@ void SetUpUserData(terminal::Worklog& log, const SetupOptions& options) {
         log.Fail("This user has no home directory. Set HOME or XDG_DATA_HOME and run this again.");
         return;
     }
-    const auto root = data + "/hublink";
-    for (const auto* directory : {"", "/database", "/log", "/log/metrik"})
-        EnsurePrivateDirectory(log, root + directory);
-    const auto store = root + "/database/Report.db";
+    for (const auto& directory :
+         {Paths::Suite(data), Paths::Databases(data), Paths::Logs(data), Paths::ServiceLogs(data)})
+        EnsurePrivateDirectory(log, directory);
+    const auto store = Paths::Store(data);
     if (store::EnsureStore(log, store))
         SetUpBaseInfo(log, store, options);
 }

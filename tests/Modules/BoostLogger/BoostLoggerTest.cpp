@@ -13,9 +13,9 @@
 #include <unistd.h>
 
 #include "SystemTool/BSException.h"
-#include "tests/Modules/BoostLogger/Child.h"
 #include "tests/Modules/BoostLogger/LogFiles.h"
 #include "tests/Modules/BoostLogger/Plugin.h"
+#include "tests/support/ChildProcess.h"
 #include "tests/support/TemporaryDirectory.h"
 #include "tests/support/WaitUntil.h"
 
@@ -30,13 +30,13 @@ protected:
     /// Runs `scenario` in a child whose standard output and error go to the file "output".
     template <typename Scenario>
     void RunInChild(Scenario scenario) {
-        Child child([&] {
+        ChildProcess child([&] {
             const int output = open(m_output.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0600);
             dup2(output, STDOUT_FILENO);
             dup2(output, STDERR_FILENO);
             return scenario();
         });
-        ASSERT_EQ(child.Wait(), 0) << ReadFile(m_output);
+        ASSERT_EQ(child.Wait(), 0) << ContentOf(m_output);
     }
 
     /// The text of the exception that InitLog throws; empty when it throws none.
@@ -77,7 +77,7 @@ TEST_F(BoostLogger, WritesNothingAnywhereBeforeItIsConfigured) {
         Log(loader, "nobody hears this", 5);
         return true;
     });
-    EXPECT_EQ(ReadFile(m_output), "");
+    EXPECT_EQ(ContentOf(m_output), "");
     EXPECT_FALSE(std::filesystem::exists(m_directory));
 }
 
@@ -88,11 +88,11 @@ TEST_F(BoostLogger, WritesARecordAsOneLine) {
         Log(loader, "message\n2026-11-20 10:15:30.123 FATAL forged");
         return true;
     });
-    EXPECT_THAT(ReadFile(m_path),
+    EXPECT_THAT(ContentOf(m_path),
                 MatchesRegex("[0-9]{4}-[0-9]{2}-[0-9]{2} [0-9]{2}:[0-9]{2}:[0-9]{2}\\.[0-9]{3} INFO  "
                              "\\[[0-9]+:[0-9]+\\] \\[App/ReportServer:42 Recv\\] "
                              "message\\\\n2026-11-20 10:15:30\\.123 FATAL forged\n"));
-    EXPECT_EQ(ReadFile(m_output), "");
+    EXPECT_EQ(ContentOf(m_output), "");
 }
 
 TEST_F(BoostLogger, HasNoRecordThatNobodyLogged) {
@@ -102,7 +102,7 @@ TEST_F(BoostLogger, HasNoRecordThatNobodyLogged) {
         return true;
     });
     EXPECT_TRUE(std::filesystem::exists(m_path));
-    EXPECT_EQ(ReadFile(m_path), "");
+    EXPECT_EQ(ContentOf(m_path), "");
 }
 
 TEST_F(BoostLogger, WritesTheRecordsOfEveryInstanceIntoTheOneSink) {
@@ -144,8 +144,8 @@ TEST_F(BoostLogger, CopiesRecordsToStandardOutputWhenAsked) {
         Log(loader, "for both");
         return true;
     });
-    EXPECT_THAT(ReadFile(m_output), HasSubstr("for both\n"));
-    EXPECT_EQ(ReadFile(m_output), ReadFile(m_path));
+    EXPECT_THAT(ContentOf(m_output), HasSubstr("for both\n"));
+    EXPECT_EQ(ContentOf(m_output), ContentOf(m_path));
 }
 
 TEST_F(BoostLogger, MakesPrivateFilesAndDirectoriesEvenWithoutAUmask) {
@@ -196,11 +196,11 @@ TEST_F(BoostLogger, ThrowsWhenTheDirectoryCannotBeMade) {
         Log(loader, "goes nowhere and does no harm");
         return !error.empty();
     });
-    EXPECT_THAT(ReadFile(m_output),
+    EXPECT_THAT(ContentOf(m_output),
                 HasSubstr("[STL ERR] TEST APP has no log: cannot make the directory: Not a "
                           "directory, " +
                           m_path + ". Make sure that "));
-    EXPECT_TRUE(ReadFile(m_output).ends_with(" [BOOST ERR] cannot make the directory: Not a directory\n"));
+    EXPECT_TRUE(ContentOf(m_output).ends_with(" [BOOST ERR] cannot make the directory: Not a directory\n"));
 }
 
 TEST_F(BoostLogger, ThrowsWhenTheFileCannotBeOpened) {
@@ -221,7 +221,7 @@ TEST_F(BoostLogger, CanBeConfiguredAfterAFailedAttempt) {
         Log(loader, "here at last");
         return true;
     });
-    EXPECT_THAT(ReadFile(m_path), HasSubstr("here at last"));
+    EXPECT_THAT(ContentOf(m_path), HasSubstr("here at last"));
 }
 
 TEST_F(BoostLogger, BeginsTheLogThatCouldNotBeOpenedAsSoonAsItCan) {
@@ -233,10 +233,10 @@ TEST_F(BoostLogger, BeginsTheLogThatCouldNotBeOpenedAsSoonAsItCan) {
         std::filesystem::remove(m_path);
         return refused && WaitUntil([&] {
                    Log(loader, "here at last");
-                   return ReadFile(m_path).find("here at last") != std::string::npos;
+                   return ContentOf(m_path).find("here at last") != std::string::npos;
                });
     });
-    EXPECT_THAT(ReadFile(m_path),
+    EXPECT_THAT(ContentOf(m_path),
                 HasSubstr(" records could not be written: cannot open the file: Is a directory\n"));
 }
 
@@ -251,7 +251,7 @@ TEST_F(BoostLogger, WritesIntoOneLogOnlyAfterAFailedAttempt) {
         Log(loader, "once");
         return refused;
     });
-    EXPECT_THAT(ReadFile(m_path), MatchesRegex("[^\n]*once\n"));
+    EXPECT_THAT(ContentOf(m_path), MatchesRegex("[^\n]*once\n"));
     EXPECT_FALSE(std::filesystem::exists(first + "/Report.log"));
 }
 

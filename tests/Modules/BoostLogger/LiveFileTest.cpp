@@ -5,8 +5,9 @@
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 
-#include "tests/Modules/BoostLogger/Child.h"
 #include "tests/Modules/BoostLogger/LogFiles.h"
+#include "tests/support/ChildProcess.h"
+#include "tests/support/OrdinaryUser.h"
 #include "tests/support/TemporaryDirectory.h"
 
 using BoostLogger::LiveFile;
@@ -29,7 +30,7 @@ TEST_F(LiveFileTest, AppendsToWhatIsThere) {
     EXPECT_EQ(m_file.SizeBytes(), 4);
     ASSERT_FALSE(m_file.Append("new\n"));
     EXPECT_EQ(m_file.SizeBytes(), 8);
-    EXPECT_EQ(ReadFile(m_path), "old\nnew\n");
+    EXPECT_EQ(ContentOf(m_path), "old\nnew\n");
 }
 
 TEST_F(LiveFileTest, SeesWithinSixteenLinesHowMuchAnotherWriterAppended) {
@@ -56,7 +57,7 @@ TEST_F(LiveFileTest, StartsANewLineAfterAHalfLineThatItFinds) {
     ASSERT_FALSE(m_file.Open(m_path));
     ASSERT_FALSE(m_file.Append("whole\n"));
     ASSERT_FALSE(m_file.Append("next\n"));
-    EXPECT_EQ(ReadFile(m_path), "half of a li\nwhole\nnext\n");
+    EXPECT_EQ(ContentOf(m_path), "half of a li\nwhole\nnext\n");
 }
 
 TEST_F(LiveFileTest, NarrowsTheModeOfAWiderFile) {
@@ -69,7 +70,7 @@ TEST_F(LiveFileTest, NarrowsTheModeOfAWiderFile) {
 TEST_F(LiveFileTest, HasItsModesWhateverTheUmask) {
     for (const mode_t mask : {0000, 0777}) {
         const std::string directory = m_directory.Path() + "/" + std::to_string(mask);
-        Child child([&] {
+        ChildProcess child([&] {
             umask(mask);
             return !MakeDirectory(directory + "/a/b") && !m_file.Open(directory + "/a/b/Report.log");
         });
@@ -91,7 +92,7 @@ TEST_F(LiveFileTest, LeavesTheModeOfADirectoryThatIsThere) {
 
 TEST_F(LiveFileTest, SaysWhyADirectoryCouldNotBeMade) {
     const std::string parent = m_directory.Path();
-    Child child([&] {
+    ChildProcess child([&] {
         return BecomeOrdinaryUser(parent) && chmod(parent.c_str(), 0555) == 0 &&
                MakeDirectory(parent + "/log/metrik").Text() == "cannot make the directory: Permission denied";
     });

@@ -7,12 +7,8 @@
 #include <string>
 #include <vector>
 
+#include "tests/support/FileContent.h"
 #include "tests/support/ModeOf.h"
-
-inline std::string ReadFile(const std::filesystem::path& path) {
-    std::ifstream file(path, std::ios::binary);
-    return {std::istreambuf_iterator<char>(file), std::istreambuf_iterator<char>()};
-}
 
 inline void WriteFile(const std::filesystem::path& path, const std::string& text) {
     std::ofstream(path, std::ios::binary) << text;

@@ -7,8 +7,9 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include "tests/Modules/BoostLogger/Child.h"
 #include "tests/Modules/BoostLogger/LogFiles.h"
+#include "tests/support/ChildProcess.h"
+#include "tests/support/OrdinaryUser.h"
 #include "tests/support/TemporaryDirectory.h"
 #include "tests/support/WaitUntil.h"
 
@@ -173,7 +174,7 @@ TEST_F(LogWriterTest, DoesNotRotateAFileThatAnotherProcessHasRotatedAlready) {
     other.Append(Line(50, 'b'), m_start); // looks at the file, which is full, and rotates
     one.Append(Line(50, 'a'), m_start);   // follows
     EXPECT_EQ(LogFilesOf(m_directory).size(), 2U);
-    EXPECT_EQ(ReadFile(m_path), Line(50, 'b') + Line(50, 'a'));
+    EXPECT_EQ(ContentOf(m_path), Line(50, 'b') + Line(50, 'a'));
 }
 
 TEST_F(LogWriterTest, DoesNotRotateAFileThatSomebodyHasEmptied) {
@@ -183,7 +184,7 @@ TEST_F(LogWriterTest, DoesNotRotateAFileThatSomebodyHasEmptied) {
         writer.Append(Line(100), m_start);
     std::filesystem::resize_file(m_path, 0);
     writer.Append("next\n", m_start);
-    EXPECT_EQ(ReadFile(m_path), "next\n");
+    EXPECT_EQ(ContentOf(m_path), "next\n");
     EXPECT_FALSE(std::filesystem::exists(m_directory + "/Report_1.log"));
 }
 
@@ -193,9 +194,9 @@ TEST_F(LogWriterTest, FollowsAPathThatBecameAnotherFileWithinATenthOfASecond) {
     writer.Append("one\n", m_start);
     std::filesystem::rename(m_path, m_path + ".away");
     writer.Append("two\n", m_start + 99ms);
-    EXPECT_EQ(ReadFile(m_path + ".away"), "one\ntwo\n");
+    EXPECT_EQ(ContentOf(m_path + ".away"), "one\ntwo\n");
     writer.Append("three\n", m_start + 100ms);
-    EXPECT_EQ(ReadFile(m_path), "three\n");
+    EXPECT_EQ(ContentOf(m_path), "three\n");
 }
 
 TEST_F(LogWriterTest, MakesADeletedDirectoryAgain) {
@@ -204,7 +205,7 @@ TEST_F(LogWriterTest, MakesADeletedDirectoryAgain) {
     writer.Append("one\n", m_start);
     std::filesystem::remove_all(m_directory);
     writer.Append("two\n", m_start + 1s);
-    EXPECT_EQ(ReadFile(m_path), "two\n");
+    EXPECT_EQ(ContentOf(m_path), "two\n");
     EXPECT_EQ(ModeOf(m_directory), 0700U);
     EXPECT_EQ(ModeOf(m_path), 0600U);
 }
@@ -246,7 +247,7 @@ TEST_F(LogWriterTest, CountsARecordThatNeverBecameALine) {
 }
 
 TEST_F(LogWriterTest, DoesNotGlueALineToTheHalfOfOneThatAFullDiskCutOff) {
-    Child child([&] {
+    ChildProcess child([&] {
         std::signal(SIGXFSZ, SIG_IGN);
         LogWriter writer(Settings());
         if (writer.Start())
@@ -271,7 +272,7 @@ TEST_F(LogWriterTest, DoesNotGlueALineToTheHalfOfOneThatAFullDiskCutOff) {
 }
 
 TEST_F(LogWriterTest, DropsRecordsRatherThanOutgrowItsFileWhereItMayNotRotate) {
-    Child child([&] {
+    ChildProcess child([&] {
         if (!BecomeOrdinaryUser(m_temporary.Path()))
             return false;
         LogWriter writer(Settings());
@@ -326,7 +327,7 @@ void LogFromTheHandler(int) {
 } // namespace
 
 TEST_F(LogWriterTest, LosesARecordOfASignalHandlerRatherThanWaitForTheThreadThatItInterrupted) {
-    Child child([&] {
+    ChildProcess child([&] {
         LogWriter writer(Settings());
         if (writer.Start())
             return false;

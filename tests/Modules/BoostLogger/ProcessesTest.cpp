@@ -10,9 +10,9 @@
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 
-#include "tests/Modules/BoostLogger/Child.h"
 #include "tests/Modules/BoostLogger/LogFiles.h"
 #include "tests/Modules/BoostLogger/Plugin.h"
+#include "tests/support/ChildProcess.h"
 #include "tests/support/TemporaryDirectory.h"
 #include "tests/support/WaitUntil.h"
 
@@ -89,7 +89,7 @@ TEST_F(BoostLoggerProcesses, EightThreadsGetEveryRecordOutWholeAndInOrder) {
     std::vector<std::string> names;
     for (int thread = 0; thread < 8; ++thread)
         names.push_back("t" + std::to_string(thread));
-    Child child([&] {
+    ChildProcess child([&] {
         LoggerLoader loader(BOOST_LOGGER_PATH);
         Init(loader, {m_temporary.Path(), 10 * 1024 * 1024, 1024 * 1024 * 1024});
         std::vector<std::thread> threads;
@@ -113,8 +113,8 @@ TEST_F(BoostLoggerProcesses, TwoProcessesOnOneLogLoseAndTearNothingWhileBothRota
             return true;
         };
     };
-    Child one(scenario("one"));
-    Child other(scenario("other"));
+    ChildProcess one(scenario("one"));
+    ChildProcess other(scenario("other"));
     ASSERT_EQ(one.Wait(), 0);
     ASSERT_EQ(other.Wait(), 0);
     ExpectNumbers({"one", "other"}, COUNT);
@@ -126,16 +126,16 @@ TEST_F(BoostLoggerProcesses, TwoProcessesOnOneLogLoseAndTearNothingWhileBothRota
 
 TEST_F(BoostLoggerProcesses, ASecondInstanceThatIsRefusedLeavesTheLogOfTheFirstAlone) {
     constexpr int COUNT = MANY / 5;
-    Child first([&] {
+    ChildProcess first([&] {
         LoggerLoader loader(BOOST_LOGGER_PATH);
         Init(loader, {m_temporary.Path()});
         LogNumbers(loader.GetModule(), "first", COUNT);
         return true;
     });
-    ASSERT_TRUE(WaitUntil([&] { return !ReadFile(m_path).empty(); }));
+    ASSERT_TRUE(WaitUntil([&] { return !ContentOf(m_path).empty(); }));
     struct stat before {};
     ASSERT_EQ(stat(m_path.c_str(), &before), 0);
-    Child second([&] {
+    ChildProcess second([&] {
         LoggerLoader loader(BOOST_LOGGER_PATH);
         Init(loader, {m_temporary.Path()});
         Log(loader, "second 0");
@@ -160,7 +160,7 @@ TEST_F(BoostLoggerProcesses, ASecondInstanceThatIsRefusedLeavesTheLogOfTheFirstA
 }
 
 TEST_F(BoostLoggerProcesses, ARecordIsInTheFileWhenWriteLogReturnsEvenIfTheProcessIsKilledThen) {
-    Child child([&] {
+    ChildProcess child([&] {
         LoggerLoader loader(BOOST_LOGGER_PATH);
         Init(loader, {m_temporary.Path()});
         LogNumbers(loader.GetModule(), "last", 3);
@@ -174,7 +174,7 @@ TEST_F(BoostLoggerProcesses, ARecordIsInTheFileWhenWriteLogReturnsEvenIfTheProce
 TEST_F(BoostLoggerProcesses, ExitEndsWhileOtherThreadsAreLogging) {
     for (int round = 0; round < EXITS; ++round) {
         const TemporaryDirectory directory;
-        Child child([&]() -> bool {
+        ChildProcess child([&]() -> bool {
             auto* const logger = StaticLogger(directory.Path());
             LogForEver(logger, "a");
             LogForEver(logger, "b");
@@ -191,7 +191,7 @@ TEST_F(BoostLoggerProcesses, ExitEndsWhileOtherThreadsAreLogging) {
 }
 
 TEST_F(BoostLoggerProcesses, UnloadingTheLastLoaderDoesNotHarmAThreadThatIsLogging) {
-    Child child([&] {
+    ChildProcess child([&] {
         auto loader = std::make_unique<LoggerLoader>(BOOST_LOGGER_PATH);
         Init(*loader, {m_temporary.Path()});
         auto* const logger = loader->GetModule();
@@ -217,7 +217,7 @@ void LogAndExit(int signal) {
 } // namespace
 
 TEST_F(BoostLoggerProcesses, ACrashHandlerCanLogAndExitWhileOtherThreadsAreLogging) {
-    Child child([&]() -> bool {
+    ChildProcess child([&]() -> bool {
         g_crashLogger = StaticLogger(m_temporary.Path());
         std::signal(SIGSEGV, LogAndExit);
         LogForEver(g_crashLogger, "a");
@@ -227,6 +227,6 @@ TEST_F(BoostLoggerProcesses, ACrashHandlerCanLogAndExitWhileOtherThreadsAreLoggi
     });
     EXPECT_TRUE(WaitUntil([&] { return child.HasEnded(); }, 5s));
     EXPECT_EQ(child.Status(), 0);
-    EXPECT_NE(ReadFile(m_path).find("] Signal[11]\n"), std::string::npos);
+    EXPECT_NE(ContentOf(m_path).find("] Signal[11]\n"), std::string::npos);
 }
 #endif

@@ -9,7 +9,7 @@
 #include <unistd.h>
 
 #include "SystemTool/Platform.h"
-#include "tests/Modules/BoostLogger/Child.h"
+#include "tests/support/ChildProcess.h"
 
 using BoostLogger::LogRecord;
 using namespace std::chrono_literals;
@@ -97,7 +97,7 @@ TEST_F(RecordLine, NamesTheThreadThatLogs) {
 
 TEST_F(RecordLine, NamesTheNewProcessAfterAFork) {
     LineOf(m_record, m_time);
-    Child child([&] { return LineOf(m_record, m_time).find(ThisThread()) != std::string::npos; });
+    ChildProcess child([&] { return LineOf(m_record, m_time).find(ThisThread()) != std::string::npos; });
     EXPECT_EQ(child.Wait(), 0);
 }
 

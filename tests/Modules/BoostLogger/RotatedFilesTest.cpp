@@ -61,8 +61,8 @@ TEST_F(RotatedFilesTest, NamesThemselvesAfterAFileWithoutExtension) {
 TEST_F(RotatedFilesTest, NumberTheFilesInTheOrderOfRotation) {
     TakeIn("one");
     TakeIn("two");
-    EXPECT_EQ(ReadFile(At("Report_1.log")), "one");
-    EXPECT_EQ(ReadFile(At("Report_2.log")), "two");
+    EXPECT_EQ(ContentOf(At("Report_1.log")), "one");
+    EXPECT_EQ(ContentOf(At("Report_2.log")), "two");
     EXPECT_FALSE(std::filesystem::exists(At("Report.log")));
 }
 
@@ -71,7 +71,7 @@ TEST_F(RotatedFilesTest, GoOnWithTheHighestNumberOfAnEarlierRun) {
     WriteFile(At("Report_10.log"), "");
     std::filesystem::create_directory(At("Report_12.log")); // somebody else's, but its name is taken
     TakeIn("x");
-    EXPECT_EQ(ReadFile(At("Report_13.log")), "x");
+    EXPECT_EQ(ContentOf(At("Report_13.log")), "x");
 }
 
 TEST_F(RotatedFilesTest, DoNotUseANumberAgainWhoseFileIsGone) {
@@ -79,7 +79,7 @@ TEST_F(RotatedFilesTest, DoNotUseANumberAgainWhoseFileIsGone) {
     m_files.Prune(0);
     EXPECT_FALSE(std::filesystem::exists(At("Report_1.log")));
     TakeIn("two");
-    EXPECT_EQ(ReadFile(At("Report_2.log")), "two");
+    EXPECT_EQ(ContentOf(At("Report_2.log")), "two");
 }
 
 TEST_F(RotatedFilesTest, LeaveTheFilesOfOthersAlone) {

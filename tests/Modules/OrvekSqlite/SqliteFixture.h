@@ -12,6 +12,7 @@
 #include "Plugin/ISqliteDatabase.h"
 #include "Plugin/ModuleLoader.h"
 #include "SystemTool/IO/Directory.h"
+#include "tests/support/StoreTables.h"
 #include "tests/support/TemporaryDirectory.h"
 
 /// The plug-in beside the test program and a directory for its file. What the plug-in did is looked at
@@ -19,12 +20,6 @@
 class SqliteFixture : public testing::Test {
 protected:
     using Loader = SystemTool::ModuleLoader<ISqliteDatabase>;
-
-    static constexpr auto SCHEMA =
-        "create table OperLog (id integer primary key, eventID text, value text, createTime text,"
-        " pType integer, extData1 text, extData2 text, extData3 text, extData4 text);"
-        "create table BaseInfo (key text, value text);"
-        "insert into BaseInfo values ('OpenID', 'u1');";
 
     void SetUp() override { ASSERT_NE(Plugin(), nullptr) << m_loader.GetLastError(); }
 
@@ -36,7 +31,8 @@ protected:
     static void MakeStore(const std::string& path) {
         SQLite::Database database(path, SQLite::OPEN_READWRITE | SQLite::OPEN_CREATE);
         database.exec("pragma journal_mode = wal");
-        database.exec(SCHEMA);
+        database.exec(STORE_TABLES);
+        database.exec("insert into BaseInfo values ('OpenID', 'u1')");
         std::filesystem::permissions(path, std::filesystem::perms{0600});
     }
 

@@ -1,10 +1,11 @@
 #include "tests/e2e/support/HostileDatagrams.h"
 
+#include "Common/Wire.h"
+
 namespace Hostile {
 namespace {
 
-constexpr std::size_t RECEIVED_BYTES = 10240; // of a datagram, at the most
-constexpr std::size_t LONGEST_BYTES = 65507;  // of a datagram, by the protocol
+constexpr std::size_t LONGEST_BYTES = 65507; // of a datagram, by the protocol
 
 std::string Repeated(const std::string& text, std::size_t count) {
     std::string repeated;
@@ -119,10 +120,10 @@ Datagrams InEveryField(const std::vector<std::string>& texts) {
 Datagrams Brackets() {
     Datagrams all;
     for (const std::string opening : {"[", "{", R"({"a":)", R"([{"":)", "\"", "\\"}) {
-        const std::string many = Repeated(opening, RECEIVED_BYTES);
+        const std::string many = Repeated(opening, Wire::MAX_BYTES);
         for (const std::string head :
              {"", R"({"eventID":)", R"({"eventID":"B1","value":)", R"({"eventID":"A759|1","value":)"})
-            all.push_back((head + many).substr(0, RECEIVED_BYTES));
+            all.push_back((head + many).substr(0, Wire::MAX_BYTES));
         all.push_back(Report("A759|1", R"(,"value":")" + Repeated("[", 5000) + "\"")); // parsed a second time
     }
     return all;

@@ -18,6 +18,7 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include "tests/support/FileContent.h"
 #include "tests/support/WaitUntil.h"
 
 namespace {
@@ -25,11 +26,6 @@ namespace {
 const std::string PROGRAM = "SyncServiceReport";
 const std::vector<std::string> PLUGINS = {"libBoostLogger.dylib", "libOrvekSqlite.dylib",
                                           "libMetrikSdk.dylib"};
-
-std::string ContentOf(const std::string& path) {
-    std::ifstream file(path, std::ios::binary);
-    return {std::istreambuf_iterator<char>(file), {}};
-}
 
 std::vector<char*> Pointers(std::vector<std::string>& texts) {
     std::vector<char*> pointers;

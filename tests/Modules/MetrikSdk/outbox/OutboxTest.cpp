@@ -12,6 +12,7 @@
 #include "Modules/MetrikSdk/outbox/StoreError.h"
 #include "tests/Modules/MetrikSdk/support/SmallDisk.h"
 #include "tests/Modules/MetrikSdk/support/Told.h"
+#include "tests/support/FileContent.h"
 #include "tests/support/TemporaryDirectory.h"
 #include "tests/support/WaitUntil.h"
 
@@ -89,8 +90,7 @@ TEST_F(OutboxTest, DoesNotFollowALinkInTheFilesPlace) {
     std::filesystem::create_symlink(target, File());
     Open();
     EXPECT_FALSE(Append());
-    std::ifstream file(target);
-    EXPECT_EQ(std::string(std::istreambuf_iterator<char>(file), {}), "precious");
+    EXPECT_EQ(ContentOf(target), "precious");
 }
 
 TEST_F(OutboxTest, KeepsEventsAcrossRestarts) {

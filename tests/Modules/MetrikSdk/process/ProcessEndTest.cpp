@@ -5,7 +5,7 @@
 
 #include <sys/wait.h>
 
-#include "tests/Modules/MetrikSdk/support/ChildProcess.h"
+#include "tests/Modules/MetrikSdk/support/ChildProgram.h"
 #include "tests/Modules/MetrikSdk/support/PluginFixture.h"
 
 using namespace std::chrono_literals;
@@ -43,7 +43,7 @@ protected:
     /// of it; the numbers that it was told were accepted.
     std::vector<int> KillAtARandomMoment(int firstNumber, KillAfter what) {
         const auto before = m_server.RequestCount();
-        ChildProcess child(m_directory.Path(), firstNumber, "stream");
+        ChildProgram child(m_directory.Path(), firstNumber, "stream");
         child.AwaitOutput();
         if (what == KillAfter::ARequest) {
             EXPECT_TRUE(WaitUntil([&] { return m_server.RequestCount() > before; }));
@@ -62,7 +62,7 @@ protected:
     }
 
     void ExpectACleanExit(const std::string& way) {
-        ChildProcess child(m_directory.Path(), 0, way);
+        ChildProgram child(m_directory.Path(), 0, way);
         const auto status = child.AwaitEnd();
         ASSERT_TRUE(status) << "the process hangs";
         EXPECT_TRUE(WIFEXITED(*status)) << "signal " << WTERMSIG(*status);
@@ -138,7 +138,7 @@ TEST_F(ProcessEndTest, ExitsCleanlyFromTheUploadersOwnThread) {
 TEST_F(ProcessEndTest, SharesItsFileWithAnotherProcessWithoutGapsOrRepeats) {
     SetVariable("OTEL_SDK_DISABLED", "true");
     Start();
-    ChildProcess child(m_directory.Path(), 1'000'000, "exit");
+    ChildProgram child(m_directory.Path(), 1'000'000, "exit");
     Report(3000);
     EXPECT_EQ(child.AwaitEnd(), 0);
     const auto batch = MetrikSdk::outbox::OutboxStore(File(), 5s).Oldest(10'000, 100'000'000);

@@ -3,8 +3,10 @@
 
 #include <sys/stat.h>
 
-#include "tests/Modules/OrvekSqlite/ChildProcess.h"
 #include "tests/Modules/OrvekSqlite/SqliteFixture.h"
+#include "tests/support/ChildProcess.h"
+#include "tests/support/FileContent.h"
+#include "tests/support/OrdinaryUser.h"
 
 // What happens to the file while the service runs, and before.
 namespace {
@@ -28,11 +30,6 @@ protected:
         ASSERT_TRUE(Plugin()->Open(Store())) << Error();
     }
 
-    static std::string ContentOf(const std::string& path) {
-        std::ifstream file(path, std::ios::binary);
-        return {std::istreambuf_iterator<char>(file), {}};
-    }
-
     static void Overwrite(const std::string& path, const std::string& content) {
         std::ofstream(path, std::ios::binary | std::ios::trunc) << content;
     }
@@ -50,14 +47,7 @@ protected:
     }
 
     /// Root may write everything, so a test about rights gives its own up, and the files with them.
-    bool BecomeAnOrdinaryUser() const {
-        constexpr uid_t NOBODY = 65534;
-        if (::geteuid() != 0)
-            return true;
-        return ::chown(Directory().c_str(), NOBODY, NOBODY) == 0 &&
-               ::chown(Store().c_str(), NOBODY, NOBODY) == 0 && ::setgid(NOBODY) == 0 &&
-               ::setuid(NOBODY) == 0;
-    }
+    bool BecomeAnOrdinaryUser() const { return BecomeOrdinaryUser(Directory(), {Store()}); }
 
 private:
     mode_t m_umask = 0;
@@ -83,13 +73,13 @@ TEST_F(DatabaseFile, TakesRowsOnceItsTablesAreMade) {
     EXPECT_TRUE(Plugin()->Open(Store())) << Error();
     EXPECT_FALSE(Exec(Insert("lost")));
     EXPECT_EQ(Error(), "no such table: OperLog");
-    SQLite::Database(Store(), SQLite::OPEN_READWRITE).exec(SCHEMA);
+    SQLite::Database(Store(), SQLite::OPEN_READWRITE).exec(STORE_TABLES);
     EXPECT_TRUE(Exec(Insert("kept"))) << Error();
     EXPECT_EQ(Rows(Store()), "1");
 }
 
 TEST_F(DatabaseFile, IsKeptInWriteAheadMode) {
-    SQLite::Database(Store(), SQLite::OPEN_READWRITE | SQLite::OPEN_CREATE).exec(SCHEMA);
+    SQLite::Database(Store(), SQLite::OPEN_READWRITE | SQLite::OPEN_CREATE).exec(STORE_TABLES);
     ASSERT_EQ(Ask(Store(), "pragma journal_mode"), "delete");
     ASSERT_TRUE(Plugin()->Open(Store())) << Error();
     EXPECT_EQ(Ask(Store(), "pragma journal_mode"), "wal");
@@ -224,7 +214,7 @@ TEST_F(DatabaseFile, TakesRowsOnceItMayBeWritten) {
         int count = 0; // asking commits the statement, which came too soon after the other to be alone
         return Exec(Insert("kept")) && Plugin()->GetTotalCount("select 1", count) ? 0 : 3;
     });
-    EXPECT_EQ(WEXITSTATUS(user.Wait()), 0);
+    EXPECT_EQ(user.Wait(), 0);
     EXPECT_EQ(Rows(Store()), "1");
 }
 
@@ -256,8 +246,7 @@ TEST_F(DatabaseFile, HoldsTheRowOfAProcessThatWasKilledRightAfterItsStatement) {
             ::raise(SIGKILL);
             return 2;
         });
-        const int status = writer.Wait();
-        ASSERT_TRUE(WIFSIGNALED(status) && WTERMSIG(status) == SIGKILL);
+        ASSERT_EQ(writer.Wait(), 128 + SIGKILL);
         EXPECT_EQ(Rows(Store()), std::to_string(killed));
         EXPECT_EQ(Ask(Store(), "pragma integrity_check"), "ok");
     }

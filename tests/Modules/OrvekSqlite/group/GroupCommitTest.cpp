@@ -7,6 +7,7 @@
 
 #include "tests/Modules/OrvekSqlite/SqliteFixture.h"
 #include "tests/support/Fastest.h"
+#include "tests/support/FileContent.h"
 #include "tests/support/WaitUntil.h"
 
 // What is committed when, as another connection sees it.
@@ -72,8 +73,7 @@ protected:
     /// The commits in the write-ahead log: each ends with a frame that tells the size of the database. Too
     /// few rows here for SQLite to start the log over.
     int Commits() const {
-        std::ifstream log(Store() + "-wal", std::ios::binary);
-        const std::string content(std::istreambuf_iterator<char>(log), {});
+        const std::string content = ContentOf(Store() + "-wal");
         constexpr std::size_t HEADER = 32, FRAME = 24 + 4096;
         int commits = 0;
         for (std::size_t frame = HEADER; frame + FRAME <= content.size(); frame += FRAME)

@@ -1,4 +1,5 @@
 #include "tests/Tools/reportctl/support/ReportctlFixture.h"
+#include "tests/support/StoreTables.h"
 
 namespace {
 
@@ -55,6 +56,16 @@ protected:
         " pType integer);"
         "insert into OperLog values (7, 'E1', 'v1', '1', 0), (9, 'E2', 'v2', '2', 1);";
 };
+
+TEST_F(StoreMigration, FindsTheTablesOfOtherTestsAsItMakesThem) {
+    MakeStore(STORE_TABLES);
+    ASSERT_EQ(RunSetup().exitCode, 0);
+    ExpectTheCurrentSchema();
+    const auto made = Ask("select group_concat(sql) from sqlite_master");
+    std::filesystem::remove(Store());
+    MakeStore(STORE_TABLES);
+    EXPECT_EQ(Ask("select group_concat(sql) from sqlite_master"), made) << "set-up changed them";
+}
 
 TEST_F(StoreMigration, AddsWhatAnOlderStoreLacksAndKeepsItsRows) {
     MakeStore(OLD_STORE);

@@ -11,6 +11,8 @@
 #include <gtest/gtest.h>
 #include <sys/wait.h>
 
+#include "tests/support/FileContent.h"
+#include "tests/support/ModeOf.h"
 #include "tests/support/TemporaryDirectory.h"
 
 /// Runs reportctl with a home and a preferences directory of the test's own.
@@ -49,15 +51,6 @@ protected:
     std::string Preferences() const { return m_directory.Path() + "/preferences/hublink"; }
     std::string Database() const { return Data() + "/hublink/database"; }
     std::string Store() const { return Database() + "/Report.db"; }
-
-    static unsigned ModeOf(const std::string& path) {
-        return static_cast<unsigned>(std::filesystem::symlink_status(path).permissions());
-    }
-
-    static std::string ContentOf(const std::string& path) {
-        std::ifstream file(path, std::ios::binary);
-        return {std::istreambuf_iterator<char>(file), {}};
-    }
 
     /// Everything below the test's directory: each path with its mode, each file with its content.
     std::map<std::string, std::string> Everything() const {

@@ -7,12 +7,12 @@
 #include <sys/types.h>
 
 /// The program of Child.cpp as a process. Killed with this object.
-class ChildProcess {
+class ChildProgram {
 public:
-    ChildProcess(const std::string& directory, int firstNumber, const std::string& way);
-    ~ChildProcess();
-    ChildProcess(const ChildProcess&) = delete;
-    ChildProcess& operator=(const ChildProcess&) = delete;
+    ChildProgram(const std::string& directory, int firstNumber, const std::string& way);
+    ~ChildProgram();
+    ChildProgram(const ChildProgram&) = delete;
+    ChildProgram& operator=(const ChildProgram&) = delete;
 
     /// Blocks until it has written something, or has ended.
     void AwaitOutput();

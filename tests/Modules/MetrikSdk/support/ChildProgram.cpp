@@ -1,4 +1,4 @@
-#include "tests/Modules/MetrikSdk/support/ChildProcess.h"
+#include "tests/Modules/MetrikSdk/support/ChildProgram.h"
 
 #include <array>
 #include <csignal>
@@ -30,7 +30,7 @@ void RelaxSanitizers() {
 
 } // namespace
 
-ChildProcess::ChildProcess(const std::string& directory, int firstNumber, const std::string& way) {
+ChildProgram::ChildProgram(const std::string& directory, int firstNumber, const std::string& way) {
     std::array<int, 2> ends{};
     if (::pipe2(ends.data(), O_CLOEXEC) != 0)
         throw std::runtime_error("no pipe");
@@ -54,7 +54,7 @@ ChildProcess::ChildProcess(const std::string& directory, int firstNumber, const 
         throw std::runtime_error("cannot start " + program);
 }
 
-ChildProcess::~ChildProcess() {
+ChildProgram::~ChildProgram() {
     if (!m_status) {
         Kill();
         ::waitpid(m_process, nullptr, 0);
@@ -62,16 +62,16 @@ ChildProcess::~ChildProcess() {
     ::close(m_output);
 }
 
-void ChildProcess::AwaitOutput() {
+void ChildProgram::AwaitOutput() {
     pollfd output{m_output, POLLIN, 0};
     ::poll(&output, 1, -1);
 }
 
-void ChildProcess::Kill() {
+void ChildProgram::Kill() {
     ::kill(m_process, SIGKILL);
 }
 
-std::string ChildProcess::Output() {
+std::string ChildProgram::Output() {
     std::string text;
     std::array<char, 65536> bytes{};
     for (ssize_t count = 0; (count = ::read(m_output, bytes.data(), bytes.size())) > 0;)
@@ -79,7 +79,7 @@ std::string ChildProcess::Output() {
     return text;
 }
 
-std::optional<int> ChildProcess::AwaitEnd(std::chrono::milliseconds deadline) {
+std::optional<int> ChildProgram::AwaitEnd(std::chrono::milliseconds deadline) {
     int status = 0;
     if (WaitUntil([&] { return ::waitpid(m_process, &status, WNOHANG) == m_process; }, deadline))
         m_status = status;

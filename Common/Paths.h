@@ -1,0 +1,34 @@
+#pragma once
+
+#include <string>
+
+/// Where the service keeps its files below the user's data directory, which SystemTool::CommonTool::GetUserDataDir tells.
+/// Nothing is created here.
+namespace SyncServiceReport::Paths {
+
+/// What the suite keeps.
+inline std::string Suite(const std::string& userData) {
+    return userData + "/hublink";
+}
+
+/// The databases: the store, and the analytics outbox of each module that names no other directory.
+inline std::string Databases(const std::string& userData) {
+    return Suite(userData) + "/database";
+}
+
+/// The local store.
+inline std::string Store(const std::string& userData) {
+    return Databases(userData) + "/Report.db";
+}
+
+/// The suite's logs.
+inline std::string Logs(const std::string& userData) {
+    return Suite(userData) + "/log";
+}
+
+/// The service's own log, "Report.log", and its rotated files.
+inline std::string ServiceLogs(const std::string& userData) {
+    return Logs(userData) + "/metrik";
+}
+
+} // namespace SyncServiceReport::Paths
