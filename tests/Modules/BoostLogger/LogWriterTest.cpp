@@ -65,7 +65,7 @@ TEST_F(LogWriterTest, RotatesBeforeAFileWouldBecomeTooLarge) {
 }
 
 TEST_F(LogWriterTest, RotatesBeforeASizeAtWhichTheSystemWouldEndTheProcess) {
-    Child child([this] {
+    ChildProcess child([this] {
         LimitFileSize(1050);
         LogWriter writer(Settings(100'000, 1'000'000));
         const bool started = !writer.Start();
@@ -80,7 +80,7 @@ TEST_F(LogWriterTest, RotatesBeforeASizeAtWhichTheSystemWouldEndTheProcess) {
 }
 
 TEST_F(LogWriterTest, SeesWhatAnotherProcessWroteWhereTheSystemEndsTheProcessAtASize) {
-    Child child([this] {
+    ChildProcess child([this] {
         LimitFileSize(1050);
         LogWriter writer(Settings(100'000, 1'000'000));
         LogWriter other(Settings(100'000, 1'000'000));
@@ -96,7 +96,7 @@ TEST_F(LogWriterTest, SeesWhatAnotherProcessWroteWhereTheSystemEndsTheProcessAtA
 }
 
 TEST_F(LogWriterTest, LosesALineThatIsLargerThanTheSystemLetsAFileBecome) {
-    Child child([this] {
+    ChildProcess child([this] {
         LimitFileSize(1050);
         LogWriter writer(Settings(100'000, 1'000'000));
         const bool started = !writer.Start();
