@@ -21,6 +21,10 @@ std::string ExecutablePath();
 /// A path that opens the running executable's file, on Linux also when another file has taken its place.
 std::string OwnProgramFile();
 
+/// A path that leads to the open directory itself, wherever it is renamed to. (macOS has none that leads through a
+/// descriptor: there it is the directory's path at this moment.) Empty when the system does not tell.
+std::string PathThrough(int directory);
+
 /// The id that the system's own tools show for the calling thread.
 std::uint64_t CurrentThreadId();
 

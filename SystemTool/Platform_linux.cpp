@@ -101,6 +101,10 @@ std::string OwnProgramFile() {
     return "/proc/self/exe";
 }
 
+std::string PathThrough(int directory) {
+    return "/proc/self/fd/" + std::to_string(directory);
+}
+
 std::uint64_t CurrentThreadId() {
     return static_cast<std::uint64_t>(::syscall(SYS_gettid));
 }

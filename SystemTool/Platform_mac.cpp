@@ -4,6 +4,7 @@
 #include <climits>
 #include <cstdlib>
 
+#include <fcntl.h>
 #include <mach-o/dyld.h>
 #include <pthread.h>
 #include <pwd.h>
@@ -44,6 +45,11 @@ std::string ExecutablePath() {
 
 std::string OwnProgramFile() {
     return ExecutablePath();
+}
+
+std::string PathThrough(int directory) {
+    std::array<char, PATH_MAX> path{};
+    return ::fcntl(directory, F_GETPATH, path.data()) == 0 ? path.data() : "";
 }
 
 std::uint64_t CurrentThreadId() {

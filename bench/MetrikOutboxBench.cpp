@@ -12,6 +12,7 @@
 #include "Modules/MetrikSdk/outbox/Outbox.h"
 #include "Modules/MetrikSdk/process/OutboxEngine.h"
 #include "tests/Modules/MetrikSdk/support/LoopbackServer.h"
+#include "tests/Modules/MetrikSdk/support/SettingsFor.h"
 #include "tests/support/TemporaryDirectory.h"
 #include "tests/support/WaitUntil.h"
 
@@ -81,7 +82,7 @@ void Fill(const std::string& directory, std::int64_t count) {
 /// A new outbox with one event and `more` filled in.
 std::unique_ptr<outbox::Outbox> MakeOutbox(const std::string& directory, std::int64_t more,
                                            report::Notifier& notifier) {
-    OutboxSettings settings;
+    auto settings = SettingsFor(directory);
     settings.caps.maxWaitingBytes = std::size_t{4} << 30; // the benchmark may fill it well beyond the usual
     outbox::Outbox(directory, settings, notifier).Append(MODULE, "A759|10001", PAYLOAD);
     Fill(directory, more);
@@ -125,10 +126,12 @@ void UploadEverything(benchmark::State& state) {
         state.PauseTiming();
         const TemporaryDirectory directory;
         report::Notifier notifier(1min);
-        outbox::Outbox(directory.Path(), OutboxSettings(), notifier).Append(MODULE, "A759|10001", PAYLOAD);
+        outbox::Outbox(directory.Path(), SettingsFor(directory.Path()), notifier)
+            .Append(MODULE, "A759|10001", PAYLOAD);
         Fill(directory.Path(), state.range(0));
         state.ResumeTiming();
-        process::OutboxEngine engine(directory.Path(), OutboxSettings(), endpoint, {}, Reporter());
+        process::OutboxEngine engine(directory.Path(), SettingsFor(directory.Path()), endpoint, {},
+                                     Reporter());
         engine.Open();
         if (!WaitUntil([&] { return engine.Events().Status().waiting == 0; }, 600s))
             state.SkipWithError("not delivered");
@@ -142,7 +145,7 @@ void StoreWhileUploading(benchmark::State& state) {
     otlp::EndpointConfig endpoint;
     endpoint.url = collector.Url() + "/v1/logs";
     const TemporaryDirectory directory;
-    process::OutboxEngine engine(directory.Path(), OutboxSettings(), endpoint, {}, Reporter());
+    process::OutboxEngine engine(directory.Path(), SettingsFor(directory.Path()), endpoint, {}, Reporter());
     for (auto _ : state)
         if (!engine.Events().Append(MODULE, "A759|10001", PAYLOAD))
             state.SkipWithError("not stored");

@@ -62,17 +62,45 @@ void Sdk::TellInitFailure(Callback onFailure, const char* reason) noexcept {
 }
 
 bool Sdk::Attach(const std::string& dbDir) {
-    m_engine = m_registry.Acquire(dbDir);
-    if (!m_engine) {
-        if (const auto text = m_registry.ReportNoDirectory())
-            Call(m_onFailure, report::NameOf(report::Cause::Directory), *text);
+    std::string refusal;
+    m_engine = m_registry.Acquire(dbDir, refusal);
+    TellDirectory(refusal);
+    if (!m_engine)
         return false;
-    }
     m_engine->Listeners().Subscribe(m_onFailure, m_onSuccess);
-    if (!m_engine->Open())
+    if (!m_engine->Open() && !MovesToTheFirst())
         return false;
     Call(m_onSuccess, "init", m_module.id);
     return true;
+}
+
+/// What became of the directory that the module gave, when it is not used.
+void Sdk::TellDirectory(const std::string& refusal) {
+    if (m_engine && refusal.empty())
+        return;
+    const auto text = refusal.empty()
+                          ? m_registry.ReportNoDirectory()
+                          : m_registry.Report(report::Cause::Directory,
+                                              refusal + (m_engine ? "; the module uses the first outbox"
+                                                                  : "; events of this module are refused"));
+    if (text)
+        Call(m_onFailure, NameOf(report::Cause::Directory), *text);
+}
+
+/// Leaves an outbox whose directory turned unsafe after it was announced for the first outbox. Whether it did.
+bool Sdk::MovesToTheFirst() {
+    if (!m_engine || !m_engine->Events().IsUnsafe())
+        return false;
+    auto first = m_registry.Acquire({});
+    const bool isAnother = first && first != m_engine;
+    if (isAnother) {
+        Detach();
+        m_engine = std::move(first);
+        m_engine->Listeners().Subscribe(m_onFailure, m_onSuccess);
+    } else {
+        m_registry.Release(first);
+    }
+    return isAnother && m_engine->Open();
 }
 
 void Sdk::Detach() {
@@ -84,7 +112,10 @@ void Sdk::Detach() {
 
 bool Sdk::ReportEvent(std::string eventId, std::string eventJson) {
     try {
-        return m_engine && m_engine->Events().Append(m_module, std::move(eventId), std::move(eventJson));
+        const auto store = [&] {
+            return m_engine && m_engine->Events().Append(m_module, eventId, eventJson);
+        };
+        return store() || (MovesToTheFirst() && store());
     } catch (const std::exception&) { // out of memory: nothing was stored, and there is none to tell it with
         return false;
     }

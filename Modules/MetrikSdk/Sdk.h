@@ -34,6 +34,8 @@ public:
 
 private:
     bool Attach(const std::string& dbDir);
+    void TellDirectory(const std::string& refusal);
+    bool MovesToTheFirst();
     void Detach();
     void TellInitFailure(Callback onFailure, const char* reason) noexcept;
 

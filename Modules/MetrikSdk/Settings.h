@@ -2,6 +2,7 @@
 
 #include <chrono>
 #include <cstddef>
+#include <string>
 
 // What production runs with, and why. Tests hand in their own.
 namespace MetrikSdk {
@@ -58,6 +59,8 @@ struct RetrySettings {
 
 /// How the outbox file is looked after.
 struct FileSettings {
+    /// The user's data directory. Only below it is a directory made that is missing; see Sqlite::SafeDirectory.
+    std::string dataDirectory;
     /// A file that cannot be opened is tried again this often; the first event after that interval pays.
     std::chrono::milliseconds reopenInterval = std::chrono::milliseconds(500);
     /// Patience with another process that holds the write lock. Reports queue up behind this, which loses

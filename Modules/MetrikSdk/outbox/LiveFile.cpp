@@ -5,17 +5,17 @@
 namespace MetrikSdk::outbox {
 namespace {
 
-constexpr const char* FILE_NAME = "/MetrikOutbox.db";
+constexpr const char* FILE_NAME = "MetrikOutbox.db";
 
 } // namespace
 
 LiveFile::LiveFile(std::string directory, const FileSettings& settings)
-    : m_directory(std::move(directory)), m_path(m_directory + FILE_NAME), m_settings(settings) {}
+    : m_directory(std::move(directory)), m_path(m_directory + "/" + FILE_NAME), m_settings(settings) {}
 
 OutboxStore& LiveFile::Ready(SteadyTime now, std::chrono::milliseconds patience,
                              std::vector<report::News>& news) {
     // Looked at for every event: one that went into a deleted file would be lost after we said yes to it.
-    if (m_store && OutboxFiles::IdentityOf(m_path) != m_identity) {
+    if (m_store && Sqlite::IdentityOf(m_path) != m_identity) {
         m_store.reset(); // SQLite leaves the files at the path alone once the path names another
         news.push_back({report::Cause::Vanished,
                         m_path + " was deleted or replaced, with all events that waited in it"});
@@ -25,12 +25,12 @@ OutboxStore& LiveFile::Ready(SteadyTime now, std::chrono::milliseconds patience,
         return *m_store;
     }
     if (m_failedAt && now - *m_failedAt < m_settings.reopenInterval)
-        throw StoreError(StoreFault::TryLater, m_lastError);
+        throw StoreError(m_lastFault, m_lastError);
     try {
         OpenOrBegin(patience, news);
     } catch (const StoreError& error) {
         if (error.fault != StoreFault::TryLater)
-            CloseUntilLater(error.what(), now);
+            CloseUntilLater(error, now);
         throw;
     }
     m_failedAt.reset();
@@ -49,9 +49,9 @@ void LiveFile::OpenOrBegin(std::chrono::milliseconds patience, std::vector<repor
 }
 
 void LiveFile::Open(std::chrono::milliseconds patience) {
-    OutboxFiles::MakeDirectory(m_directory);
-    m_identity = OutboxFiles::Prepare(m_path);
-    m_store = std::make_unique<OutboxStore>(m_path, patience);
+    m_place = OutboxFiles::OpenDirectory(m_directory, m_settings.dataDirectory);
+    m_identity = OutboxFiles::Prepare(*m_place, FILE_NAME);
+    m_store = std::make_unique<OutboxStore>(m_place->PathOf(FILE_NAME), patience);
     ++m_generation;
 }
 
@@ -66,22 +66,24 @@ bool LiveFile::Failed(const StoreError& error, bool firstAttempt, SteadyTime now
         if (error.fault == StoreFault::SetAside)
             SetAside(error.what(), news);
     } catch (const StoreError& worse) {
-        CloseUntilLater(worse.what(), now);
+        CloseUntilLater(worse, now);
         return false;
     }
     if (!firstAttempt)
-        CloseUntilLater(error.what(), now);
+        CloseUntilLater(error, now);
     return firstAttempt;
 }
 
-void LiveFile::CloseUntilLater(const std::string& reason, SteadyTime now) {
+void LiveFile::CloseUntilLater(const StoreError& reason, SteadyTime now) {
     m_store.reset();
     m_failedAt = now;
-    m_lastError = reason;
+    m_lastError = reason.what();
+    // What was wrong with the directory is for the caller to know each time: it may use another.
+    m_lastFault = reason.fault == StoreFault::Unsafe ? StoreFault::Unsafe : StoreFault::TryLater;
 }
 
 void LiveFile::SetAside(const std::string& reason, std::vector<report::News>& news) {
-    const auto name = OutboxFiles::SetAside(m_path, m_identity, WallNow());
+    const auto name = OutboxFiles::SetAside(*m_place, FILE_NAME, m_identity, WallNow());
     if (!name.empty())
         news.push_back({report::Cause::Damage, reason + "; the file was set aside as " + name});
 }

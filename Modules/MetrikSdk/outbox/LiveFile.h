@@ -39,17 +39,20 @@ public:
 private:
     void Open(std::chrono::milliseconds patience);
     void OpenOrBegin(std::chrono::milliseconds patience, std::vector<report::News>& news);
-    void CloseUntilLater(const std::string& reason, SteadyTime now);
+    void CloseUntilLater(const StoreError& reason, SteadyTime now);
     void SetAside(const std::string& reason, std::vector<report::News>& news);
 
     const std::string m_directory;
     const std::string m_path;
     const FileSettings m_settings;
+    std::optional<Sqlite::SafeDirectory>
+        m_place; ///< Checked anew with each opening. Outlives the store in it.
     std::unique_ptr<OutboxStore> m_store;
-    OutboxFiles::Identity m_identity{};
+    Sqlite::Identity m_identity{};
     unsigned m_generation = 0;
     std::optional<SteadyTime> m_failedAt;
     std::string m_lastError;
+    StoreFault m_lastFault = StoreFault::TryLater;
 };
 
 } // namespace MetrikSdk::outbox

@@ -55,7 +55,8 @@ bool Outbox::Open() {
         return true;
     } catch (const StoreError& error) {
         m_patienceUsedUp = true; // thousands of modules may announce themselves while the lock is held
-        m_notifier.TellFailure({report::Cause::File, error.what()});
+        m_isUnsafe = error.fault == StoreFault::Unsafe;
+        m_notifier.TellFailure({CauseOf(error), error.what()});
         return false;
     }
 }
@@ -74,7 +75,8 @@ bool Outbox::Append(const ModuleIdentity& module, std::string eventId, std::stri
     } catch (const StoreError& error) {
         m_patienceUsedUp = true;
         ++m_refused;
-        m_notifier.TellFailure({report::Cause::File, error.what()});
+        m_isUnsafe = error.fault == StoreFault::Unsafe;
+        m_notifier.TellFailure({CauseOf(error), error.what()});
         return false;
     }
 }

@@ -31,6 +31,10 @@ public:
     /// Stores the event. True once it survives kill -9 of this process.
     bool Append(const ModuleIdentity& module, std::string eventId, std::string payload);
 
+    /// Whether the last event or opening failed because another user could change the directory. Its modules are to use
+    /// another outbox.
+    bool IsUnsafe() const { return m_isUnsafe; }
+
     /// The oldest events. They are under way until Release, also when the file is opened anew meanwhile: a cap drops
     /// others first.
     Batch Take(std::size_t maxEvents);
@@ -70,6 +74,7 @@ private:
 
     /// The last event or opening failed, perhaps after all of the patience: the next one has less.
     std::atomic<bool> m_patienceUsedUp = false;
+    std::atomic<bool> m_isUnsafe = false;
     std::atomic<unsigned long> m_refused = 0; ///< Events since the last one that was stored.
 
     std::mutex m_mutex; ///< Guards all below.

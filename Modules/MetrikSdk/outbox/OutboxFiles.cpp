@@ -10,9 +10,9 @@
 
 #include "Modules/MetrikSdk/outbox/StoreError.h"
 #include "Modules/Sqlite/SideFiles.h"
+#include "Modules/Sqlite/Trust.h"
 #include "SystemTool/Errno.h"
 #include "SystemTool/IO/Descriptor.h"
-#include "SystemTool/IO/MakeDirectories.h"
 
 namespace MetrikSdk::outbox::OutboxFiles {
 namespace {
@@ -23,9 +23,9 @@ constexpr mode_t FILE_MODE = 0600;
     throw StoreError(StoreFault::Reopen, what + " " + path + ": " + SystemTool::ErrnoText(error));
 }
 
-bool Exists(const std::string& path) {
+bool Exists(const Sqlite::SafeDirectory& directory, const std::string& name) {
     struct stat status {};
-    return ::lstat(path.c_str(), &status) == 0;
+    return ::fstatat(directory.Number(), name.c_str(), &status, AT_SYMLINK_NOFOLLOW) == 0;
 }
 
 /// Such as 20261120T101530.123Z: sorts by time, and no character that a shell or a file system minds.
@@ -41,54 +41,57 @@ std::string FileNameTime(WallTime now) {
     return text.data();
 }
 
-void Rename(const std::string& from, const std::string& to) {
-    if (::rename(from.c_str(), to.c_str()) != 0 && errno != ENOENT)
-        Fail("Cannot set aside", from);
+void Rename(const Sqlite::SafeDirectory& directory, const std::string& from, const std::string& to) {
+    if (::renameat(directory.Number(), from.c_str(), directory.Number(), to.c_str()) != 0 && errno != ENOENT)
+        Fail("Cannot set aside", directory.Path() + "/" + from);
 }
 
-std::string UnusedName(const std::string& wanted) {
+std::string UnusedName(const Sqlite::SafeDirectory& directory, const std::string& wanted) {
     auto name = wanted;
-    for (int count = 2; Exists(name); ++count)
+    for (int count = 2; Exists(directory, name); ++count)
         name = wanted + "-" + std::to_string(count);
     return name;
 }
 
 } // namespace
 
-void MakeDirectory(const std::string& directory) {
-    if (const auto failure = SystemTool::IO::MakeDirectories(directory))
-        Fail("Cannot make the directory", failure.path, failure.error);
+Sqlite::SafeDirectory OpenDirectory(const std::string& path, const std::string& home) {
+    try {
+        return Sqlite::SafeDirectory::Open(path, home);
+    } catch (const Sqlite::UnsafePath& refusal) {
+        throw StoreError(StoreFault::Unsafe, "The directory " + path + " is not used: " + refusal.what());
+    } catch (const std::system_error& error) {
+        throw StoreError(StoreFault::Reopen, error.what());
+    }
 }
 
-Identity Prepare(const std::string& path) {
+Sqlite::Identity Prepare(const Sqlite::SafeDirectory& directory, const std::string& name) {
+    const auto path = directory.Path() + "/" + name;
+    try {
+        Sqlite::RequireOurFiles(directory.Number(), name, directory.Path());
+    } catch (const Sqlite::UnsafePath& refusal) {
+        throw StoreError(StoreFault::Reopen, std::string("Cannot use the outbox: ") + refusal.what());
+    }
     const SystemTool::IO::Descriptor file(
-        ::open(path.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW, FILE_MODE));
+        ::openat(directory.Number(), name.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW, FILE_MODE));
     struct stat status {};
     if (!file.IsOpen() || ::fstat(file.Number(), &status) != 0)
         Fail("Cannot open", path);
-    if (!S_ISREG(status.st_mode))
-        throw StoreError(StoreFault::Reopen, "Not a regular file: " + path);
     if ((status.st_mode & 07777) != FILE_MODE && ::fchmod(file.Number(), FILE_MODE) != 0)
         Fail("Cannot make private", path);
     return {status.st_dev, status.st_ino};
 }
 
-std::optional<Identity> IdentityOf(const std::string& path) {
-    struct stat status {};
-    if (::lstat(path.c_str(), &status) != 0)
-        return std::nullopt;
-    return Identity{status.st_dev, status.st_ino};
-}
-
-std::string SetAside(const std::string& path, const Identity& identity, WallTime now) {
-    if (IdentityOf(path) != identity)
+std::string SetAside(const Sqlite::SafeDirectory& directory, const std::string& name,
+                     const Sqlite::Identity& identity, WallTime now) {
+    if (Sqlite::IdentityOf(directory.PathOf(name)) != identity)
         return {};
-    auto name = UnusedName(path + ".damaged-" + FileNameTime(now));
+    const auto aside = UnusedName(directory, name + ".damaged-" + FileNameTime(now));
     // The database goes last: a new one beside the side files of an old one would take them for its own.
-    for (const auto* suffix : Sqlite::SIDE_FILE_SUFFIXES)
-        Rename(path + suffix, name + suffix);
-    Rename(path, name);
-    return name;
+    for (const std::string suffix : Sqlite::SIDE_FILE_SUFFIXES)
+        Rename(directory, name + suffix, aside + suffix);
+    Rename(directory, name, aside);
+    return directory.Path() + "/" + aside;
 }
 
 } // namespace MetrikSdk::outbox::OutboxFiles

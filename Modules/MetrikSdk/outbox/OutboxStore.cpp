@@ -8,6 +8,7 @@
 #include "Modules/MetrikSdk/outbox/OutboxSchema.h"
 #include "Modules/MetrikSdk/outbox/SqliteGuard.h"
 #include "Modules/MetrikSdk/outbox/Uuid.h"
+#include "Modules/Sqlite/DirectoryVfs.h"
 
 namespace MetrikSdk::outbox {
 namespace {
@@ -21,7 +22,8 @@ std::int64_t Number(SQLite::Database& database, const char* query) {
 
 SQLite::Database OpenDatabase(const std::string& path) {
     return Guarded("Cannot open the outbox", [&] {
-        return SQLite::Database(path, SQLite::OPEN_READWRITE | SQLite::OPEN_NOMUTEX | SQLite::OPEN_NOFOLLOW);
+        return SQLite::Database(path, SQLite::OPEN_READWRITE | SQLite::OPEN_NOMUTEX | SQLite::OPEN_NOFOLLOW,
+                                0, Sqlite::DirectoryVfs());
     });
 }
 

@@ -3,6 +3,8 @@
 #include <stdexcept>
 #include <string>
 
+#include "Modules/MetrikSdk/report/News.h"
+
 namespace MetrikSdk::outbox {
 
 /// What the holder of a store does after an operation failed.
@@ -10,6 +12,7 @@ enum class StoreFault {
     TryLater, ///< Nothing was changed and the store is in order: a full disk, somebody else's lock.
     Reopen,   ///< The store cannot be used any more; open it again, later if that fails too.
     SetAside, ///< The file is damaged or none of ours.
+    Unsafe,   ///< Another user could change the directory; the outbox must not be there.
 };
 
 class StoreError : public std::runtime_error {
@@ -18,5 +21,10 @@ public:
 
     const StoreFault fault;
 };
+
+/// How the failure is told.
+inline report::Cause CauseOf(const StoreError& error) {
+    return error.fault == StoreFault::Unsafe ? report::Cause::Directory : report::Cause::File;
+}
 
 } // namespace MetrikSdk::outbox

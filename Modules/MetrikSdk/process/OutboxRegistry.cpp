@@ -1,43 +1,48 @@
 #include "Modules/MetrikSdk/process/OutboxRegistry.h"
 
 #include <cstdlib>
-#include <filesystem>
-#include <system_error>
 #include <utility>
+
+#include "Modules/Sqlite/SafeDirectory.h"
+#include "SystemTool/CommonTool.h"
+#include "SystemTool/Text/Utf8.h"
 
 namespace MetrikSdk::process {
 namespace {
 
-/// One name for each directory, whether it exists yet or not; empty for what can be none.
-std::string Canonical(const std::string& directory) {
-    if (directory.empty() || directory.front() != '/' || directory.find('\0') != std::string::npos)
-        return {};
-    std::error_code error;
-    auto path = std::filesystem::weakly_canonical(directory, error).string();
-    if (error)
-        return {};
-    while (path.size() > 1 && path.ends_with('/'))
-        path.pop_back();
-    return path;
+constexpr std::size_t MAX_TOLD_BYTES = 1024; ///< Of a path, in the log.
+
+std::string Shown(const std::string& text) {
+    return std::string(SystemTool::Text::CutUtf8(text, MAX_TOLD_BYTES));
 }
 
 } // namespace
 
-OutboxRegistry::OutboxRegistry(const OutboxSettings& settings, otlp::LookUp lookUp)
-    : m_settings(settings), m_lookUp(std::move(lookUp)),
+OutboxRegistry::OutboxRegistry(const OutboxSettings& settings, otlp::LookUp lookUp,
+                               DataDirectory dataDirectory)
+    : m_settings(settings), m_lookUp(std::move(lookUp)), m_dataDirectory(std::move(dataDirectory)),
       m_reporter(std::make_shared<report::FailureReporter>(settings.tellInterval)) {}
 
 OutboxRegistry& OutboxRegistry::Instance() {
     static auto& instance =
         // NOLINTNEXTLINE(concurrency-mt-unsafe): nothing here changes the environment
-        *new OutboxRegistry(OutboxSettings{}, [](const char* name) { return std::getenv(name); });
+        *new OutboxRegistry(
+            OutboxSettings{}, [](const char* name) { return std::getenv(name); },
+            &SystemTool::CommonTool::GetUserDataDir);
     return instance;
 }
 
 std::shared_ptr<OutboxEngine> OutboxRegistry::Acquire(const std::string& directory) {
+    std::string refusal;
+    return Acquire(directory, refusal);
+}
+
+std::shared_ptr<OutboxEngine> OutboxRegistry::Acquire(const std::string& directory, std::string& refusal) {
     const std::lock_guard lock(m_mutex);
     ForgetReleased();
-    const auto chosen = Choose(directory);
+    auto settings = m_settings;
+    settings.file.dataDirectory = m_dataDirectory();
+    const auto chosen = Choose(Accepted(directory, settings.file.dataDirectory, refusal));
     if (chosen.empty())
         return nullptr;
     auto& known = m_engines[chosen];
@@ -46,14 +51,25 @@ std::shared_ptr<OutboxEngine> OutboxRegistry::Acquire(const std::string& directo
         std::vector<std::string> complaints;
         const auto endpoint = otlp::ReadEndpoint(m_lookUp, complaints);
         engine =
-            std::make_shared<OutboxEngine>(chosen, m_settings, endpoint, std::move(complaints), m_reporter);
+            std::make_shared<OutboxEngine>(chosen, settings, endpoint, std::move(complaints), m_reporter);
         known = engine;
     }
     return engine;
 }
 
-std::string OutboxRegistry::Choose(const std::string& directory) {
-    const auto canonical = Canonical(directory);
+/// The directory's one name; empty, with the reason, for one that must not be used.
+std::string OutboxRegistry::Accepted(const std::string& directory, const std::string& dataDirectory,
+                                     std::string& refusal) {
+    try {
+        if (!directory.empty())
+            return Sqlite::SafeDirectory::Resolve(directory, dataDirectory);
+    } catch (const std::exception& error) {
+        refusal = "The directory " + Shown(directory) + " is not used: " + Shown(error.what());
+    }
+    return {};
+}
+
+std::string OutboxRegistry::Choose(const std::string& canonical) {
     if (canonical.empty())
         return m_firstDirectory;
     if (m_firstDirectory.empty())

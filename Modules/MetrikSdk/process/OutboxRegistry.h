@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstddef>
+#include <functional>
 #include <map>
 #include <memory>
 #include <mutex>
@@ -14,8 +15,9 @@ namespace MetrikSdk::process {
 
 /// The outboxes of this process: one for each database directory, however many modules announce themselves.
 ///
-/// Directories come from outside, in datagrams. Empty and relative ones mean the one that the process gave
-/// first. So does every new one once MAX_OUTBOXES are in use: an outbox costs a file and a thread.
+/// Directories come from outside, in datagrams. Empty ones mean the one that the process gave first. So do those that
+/// break the rule of Sqlite::SafeDirectory, and every new one once MAX_OUTBOXES are in use: an outbox costs a file and a
+/// thread.
 ///
 /// Threads: any.
 class OutboxRegistry {
@@ -23,7 +25,9 @@ public:
     /// The suite uses one directory, a test installation a second one; the rest is room for the unforeseen.
     static constexpr std::size_t MAX_OUTBOXES = 8;
 
-    OutboxRegistry(const OutboxSettings& settings, otlp::LookUp lookUp);
+    using DataDirectory = std::function<std::string()>; ///< Returns the user's data directory.
+
+    OutboxRegistry(const OutboxSettings& settings, otlp::LookUp lookUp, DataDirectory dataDirectory);
 
     /// The process's own, with production's settings. Never destroyed: SDK objects may outlive static ones.
     static OutboxRegistry& Instance();
@@ -31,6 +35,9 @@ public:
     /// The outbox for `directory`; null when there is no directory to use at all. To be given back by
     /// Release.
     std::shared_ptr<OutboxEngine> Acquire(const std::string& directory);
+
+    /// The same; `refusal` tells why it is not the outbox of `directory`, when that must not be used.
+    std::shared_ptr<OutboxEngine> Acquire(const std::string& directory, std::string& refusal);
 
     /// Gives `engine` up. The last user's call stops its uploader before it returns; nobody can open the same
     /// file meanwhile.
@@ -42,11 +49,14 @@ public:
     std::optional<std::string> Report(report::Cause cause, const std::string& text);
 
 private:
-    std::string Choose(const std::string& directory);
+    static std::string Accepted(const std::string& directory, const std::string& dataDirectory,
+                                std::string& refusal);
+    std::string Choose(const std::string& canonical);
     void ForgetReleased();
 
     const OutboxSettings m_settings;
     const otlp::LookUp m_lookUp;
+    const DataDirectory m_dataDirectory;
     std::mutex m_mutex;                                  ///< Guards all below.
     std::shared_ptr<report::FailureReporter> m_reporter; ///< Shared by all outboxes.
     std::string m_firstDirectory;

@@ -43,7 +43,7 @@ Pause UploadCycle::Pass(WallTime now) {
         Settle();
         return TakeAndSend(now);
     } catch (const outbox::StoreError& error) {
-        m_notifier.TellFailure({report::Cause::File, error.what()});
+        m_notifier.TellFailure({CauseOf(error), error.what()});
         otlp::HttpResult none;
         none.fault = error.what();
         return {RetryPolicy::WaitBefore(none, ++m_failures, m_random(), now, m_settings.retry),

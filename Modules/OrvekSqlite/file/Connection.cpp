@@ -5,7 +5,9 @@
 #include <filesystem>
 #include <string_view>
 
+#include "Modules/Sqlite/DatabaseFiles.h"
 #include "Modules/Sqlite/SideFiles.h"
+#include "Modules/Sqlite/Trust.h"
 
 namespace OrvekSqlite::file {
 namespace {
@@ -27,9 +29,19 @@ fs::perms ModeOf(const fs::path& path) {
     return fs::status(path, ignored).permissions();
 }
 
+/// What SQLite would read or play back, and another user could have put there, is not opened.
+void RequireOurFiles(const std::string& path) {
+    try {
+        Sqlite::RequireOurFiles(path);
+    } catch (const Sqlite::UnsafePath& refusal) {
+        throw SQLite::Exception(refusal.what(), SQLITE_PERM);
+    }
+}
+
 /// Takes the right to read the file away from everybody but its owner, before SQLite first looks at its mode:
 /// SQLite gives the side files that it makes the mode of the database, whatever the process's umask.
 const std::string& MadePrivate(const std::string& path) {
+    RequireOurFiles(path);
     SetMode(path, ModeOf(path) & PRIVATE);
     return path;
 }

@@ -89,13 +89,13 @@ TEST_F(MetrikSdkTest, PutsAModuleWithoutADirectoryIntoTheOutboxOfTheFirst) {
 TEST_F(MetrikSdkTest, BeginsAnewWhenItIsInitialisedAgain) {
     Start();
     Report(1);
-    TemporaryDirectory other;
+    const auto other = m_directory.Path() + "/other";
     auto* sdk = m_loader->GetModule();
-    EXPECT_TRUE(sdk->InitSdk("B1", "1", "b", "", other.Path(), nullptr, nullptr));
+    EXPECT_TRUE(sdk->InitSdk("B1", "1", "b", "", other, nullptr, nullptr));
     EXPECT_TRUE(sdk->ReportEvent("B1|1", "{}"));
     EXPECT_EQ(sdk->GetPendingCount(), 1);
     EXPECT_EQ(Totals().waiting, 1);
-    EXPECT_TRUE(std::filesystem::exists(other.Path() + "/MetrikOutbox.db"));
+    EXPECT_TRUE(std::filesystem::exists(other + "/MetrikOutbox.db"));
 }
 
 TEST_F(MetrikSdkTest, TakesTenThousandHostileModulesInOneFileWithOneThread) {

@@ -10,6 +10,7 @@
 #include <sys/stat.h>
 
 #include "Modules/MetrikSdk/outbox/StoreError.h"
+#include "tests/Modules/MetrikSdk/support/SettingsFor.h"
 #include "tests/Modules/MetrikSdk/support/SmallDisk.h"
 #include "tests/Modules/MetrikSdk/support/Told.h"
 #include "tests/support/FileContent.h"
@@ -53,7 +54,7 @@ protected:
 
     TemporaryDirectory m_directory;
     std::string m_path = m_directory.Path() + "/deep/database";
-    OutboxSettings m_settings;
+    OutboxSettings m_settings = SettingsFor(m_directory.Path());
     report::Notifier m_notifier{1min};
     std::unique_ptr<outbox::Outbox> m_outbox;
 };
@@ -76,7 +77,7 @@ TEST_F(OutboxTest, MakesTheDirectoryAndPrivateFilesWhateverTheUmask) {
 TEST_F(OutboxTest, NarrowsAFileThatOthersCouldRead) {
     std::filesystem::create_directories(m_path);
     std::ofstream(File()).close();
-    ::chmod(File().c_str(), 0666);
+    ::chmod(File().c_str(), 0644);
     Open();
     struct stat status {};
     ASSERT_EQ(::stat(File().c_str(), &status), 0);

@@ -15,7 +15,8 @@ namespace {
 class OutboxRegistryTest : public testing::Test {
 protected:
     TemporaryDirectory m_directory;
-    process::OutboxRegistry m_registry{OutboxSettings{}, [](const char*) -> const char* { return nullptr; }};
+    process::OutboxRegistry m_registry{OutboxSettings{}, [](const char*) -> const char* { return nullptr; },
+                                       [this] { return m_directory.Path(); }};
 };
 
 TEST_F(OutboxRegistryTest, SharesOneOutboxForADirectoryHoweverItIsWritten) {

@@ -77,6 +77,7 @@ bool Report(int number) {
 
 int main(int, char** arguments) {
     const std::string directory = arguments[1];
+    ::setenv("XDG_DATA_HOME", directory.c_str(), 1); // below which the plug-in may make what is missing
     int number = std::stoi(arguments[2]);
     const std::string way = arguments[3];
     g_exitInCallback = way == "callback";

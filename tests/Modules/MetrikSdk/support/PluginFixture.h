@@ -25,7 +25,10 @@ class PluginFixture : public testing::Test {
 protected:
     using Loader = SystemTool::ModuleLoader<IMetrikSdk>;
 
-    PluginFixture() { Told::Forget(); }
+    PluginFixture() {
+        Told::Forget();
+        SetVariable("XDG_DATA_HOME", m_directory.Path()); // below which the plug-in may make what is missing
+    }
 
     /// Whatever a test did: what the counters say is what the tables hold.
     void TearDown() override {

@@ -32,7 +32,8 @@ bool EnterOwnMountNamespace() {
 
 int RunChild(const std::string& directory, int bytes, const std::function<void()>& test) {
     if (!EnterOwnMountNamespace() || ::mount("none", "/", nullptr, MS_REC | MS_PRIVATE, nullptr) != 0 ||
-        ::mount("tmpfs", directory.c_str(), "tmpfs", 0, ("size=" + std::to_string(bytes)).c_str()) != 0)
+        ::mount("tmpfs", directory.c_str(), "tmpfs", 0, ("mode=700,size=" + std::to_string(bytes)).c_str()) !=
+            0)
         return UNAVAILABLE;
     test();
     return testing::Test::HasFailure() ? FAILED : PASSED;

@@ -8,6 +8,7 @@
 #include <gtest/gtest.h>
 
 #include "tests/Modules/MetrikSdk/support/ReceivedEvents.h"
+#include "tests/Modules/MetrikSdk/support/SettingsFor.h"
 #include "tests/Modules/MetrikSdk/support/Told.h"
 #include "tests/support/TemporaryDirectory.h"
 
@@ -73,7 +74,7 @@ protected:
     }
 
     TemporaryDirectory m_directory;
-    OutboxSettings m_settings;
+    OutboxSettings m_settings = SettingsFor(m_directory.Path());
     report::Notifier m_notifier{0ms};
     outbox::Outbox m_outbox{m_directory.Path(), m_settings, m_notifier};
     FakeSender m_sender;
@@ -212,6 +213,7 @@ TEST_F(UploadCycleTest, DeletesWhatWasDeliveredBeforeItSendsAnythingElse) {
 
 TEST_F(UploadCycleTest, DoesNotDropForACapWhatWasDeliveredAndIsNotDeletedYet) {
     const TemporaryDirectory directory;
+    m_settings = SettingsFor(directory.Path());
     m_settings.caps.maxWaitingBytes = 10'000;
     outbox::Outbox outbox(directory.Path(), m_settings, m_notifier);
     upload::UploadCycle cycle(outbox, m_sender, m_notifier, m_settings, [] { return 0.5; });

@@ -32,6 +32,7 @@ protected:
 
     static void Overwrite(const std::string& path, const std::string& content) {
         std::ofstream(path, std::ios::binary | std::ios::trunc) << content;
+        fs::permissions(path, fs::perms{0600});
     }
 
     /// A good database, moved to the store's path in one step.
@@ -94,18 +95,41 @@ TEST_F(DatabaseFile, IsReadableByItsOwnerAloneWhenSetUpMadeIt) {
 
 TEST_F(DatabaseFile, IsMadePrivateWhenSomebodyElseMadeItReadable) {
     MakeStore(Store());
-    fs::permissions(Store(), fs::perms{0666});
+    fs::permissions(Store(), fs::perms{0644});
     SQLite::Database other(Store(), SQLite::OPEN_READWRITE);
     other.exec("insert into BaseInfo values ('k', 'v')");
-    ASSERT_EQ(fs::status(Store() + "-wal").permissions(), fs::perms{0666});
+    ASSERT_EQ(fs::status(Store() + "-wal").permissions(), fs::perms{0644});
 
     ASSERT_TRUE(Plugin()->Open(Store())) << Error();
     ASSERT_TRUE(Exec(Insert("x"))) << Error();
     ExpectEveryFilePrivate();
 }
 
+TEST_F(DatabaseFile, IsNotOpenedWhileAnotherUserCouldHaveChangedIt) {
+    OpenStore();
+    ASSERT_TRUE(Exec(Insert("before"))) << Error();
+    Plugin()->Open(Directory() + "/none"); // lets go of it
+    for (const auto* suffix : {"", "-wal", "-shm", "-journal"}) {
+        const auto file = Store() + suffix;
+        if (!fs::exists(file))
+            Overwrite(file, "");
+        fs::permissions(file, fs::perms{0622});
+        EXPECT_FALSE(Plugin()->Open(Store()));
+        EXPECT_EQ(Error(), file + " may be written by other users");
+        EXPECT_FALSE(Exec(Insert("lost")));
+        fs::permissions(file, fs::perms{0600});
+    }
+    fs::permissions(Directory(), fs::perms{0777});
+    EXPECT_FALSE(Exec(Insert("lost")));
+    EXPECT_EQ(Error(), Directory() + " may be written by other users");
+    fs::permissions(Directory(), fs::perms{0700});
+    EXPECT_TRUE(Exec(Insert("after"))) << Error();
+    EXPECT_EQ(Ask(Store(), "select group_concat(eventID) from OperLog"), "before,after");
+}
+
 TEST_F(DatabaseFile, IsFoundThroughASymbolicLink) {
     fs::create_directory(Directory() + "/elsewhere");
+    fs::permissions(Directory() + "/elsewhere", fs::perms{0700});
     const auto target = Directory() + "/elsewhere/Real.db";
     MakeStore(target);
     fs::create_symlink(target, Store());

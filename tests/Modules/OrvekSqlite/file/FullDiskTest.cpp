@@ -12,7 +12,7 @@ class FullDisk : public SqliteFixture {
 protected:
     void SetUp() override {
         SqliteFixture::SetUp();
-        ASSERT_EQ(::mount("full", Directory().c_str(), "tmpfs", 0, "size=1m"), 0);
+        ASSERT_EQ(::mount("full", Directory().c_str(), "tmpfs", 0, "mode=700,size=1m"), 0);
         MakeStore(Store());
         ASSERT_TRUE(Plugin()->Open(Store())) << Plugin()->GetLastErrorMsg();
     }

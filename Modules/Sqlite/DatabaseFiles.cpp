@@ -1,0 +1,63 @@
+#include "Modules/Sqlite/DatabaseFiles.h"
+
+#include <cerrno>
+#include <filesystem>
+
+#include <fcntl.h>
+#include <sys/stat.h>
+
+#include "Modules/Sqlite/SafeDirectory.h"
+#include "Modules/Sqlite/SideFiles.h"
+#include "Modules/Sqlite/Trust.h"
+
+namespace Sqlite {
+namespace {
+
+void RequireOurFile(int directory, const std::string& name, const std::string& shown) {
+    struct stat status {};
+    if (::fstatat(directory, name.c_str(), &status, AT_SYMLINK_NOFOLLOW) != 0) {
+        if (errno == ENOENT)
+            return;
+        throw UnsafePath(shown + " cannot be looked at");
+    }
+    if (!S_ISREG(status.st_mode))
+        throw UnsafePath(shown + " is not a regular file");
+    if (status.st_nlink != 1) // the other name may be anywhere, and what is written here is written there
+        throw UnsafePath(shown + " has more than one name");
+    RequireOursAlone(status, shown);
+}
+
+} // namespace
+
+std::optional<Identity> IdentityOf(const std::string& path) {
+    struct stat status {};
+    if (::lstat(path.c_str(), &status) != 0)
+        return std::nullopt;
+    return Identity{status.st_dev, status.st_ino};
+}
+
+void RequireOurFiles(int directory, const std::string& name, const std::string& shown) {
+    RequireOurFile(directory, name, shown + "/" + name);
+    for (const std::string suffix : SIDE_FILE_SUFFIXES)
+        RequireOurFile(directory, name + suffix, shown + "/" + name + suffix);
+}
+
+void RequireOurFiles(const std::string& path) {
+    std::error_code error;
+    const auto file = std::filesystem::canonical(path, error);
+    if (error || std::filesystem::is_directory(file, error))
+        return;
+    const auto shown = file.parent_path().string();
+    const SystemTool::IO::Descriptor directory(::open(shown.c_str(), SafeDirectory::LOOK_FLAGS));
+    struct stat status {};
+    if (!directory.IsOpen() || ::fstat(directory.Number(), &status) != 0)
+        return;
+    RequireOursAlone(status, shown);
+    RequireOurFiles(directory.Number(), file.filename().string(), shown);
+}
+
+SideFileWatch::SideFileWatch(std::string path)
+    : m_log(path + "-wal"), m_index(std::move(path) + "-shm"), m_logIdentity(IdentityOf(m_log)),
+      m_indexIdentity(IdentityOf(m_index)) {}
+
+} // namespace Sqlite

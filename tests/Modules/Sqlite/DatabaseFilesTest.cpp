@@ -1,0 +1,109 @@
+#include "Modules/Sqlite/DatabaseFiles.h"
+
+#include <filesystem>
+#include <fstream>
+
+#include <gtest/gtest.h>
+#include <sys/stat.h>
+
+#include "Modules/Sqlite/SideFiles.h"
+#include "Modules/Sqlite/Trust.h"
+#include "tests/support/OtherUser.h"
+#include "tests/support/TemporaryDirectory.h"
+
+using namespace Sqlite;
+
+namespace fs = std::filesystem;
+
+namespace {
+
+class DatabaseFilesTest : public ::testing::Test {
+protected:
+    DatabaseFilesTest() { Make(Database()); }
+
+    std::string Database() const { return m_directory.Path() + "/o.db"; }
+
+    static void Make(const std::string& path) {
+        std::ofstream(path).close();
+        fs::permissions(path, fs::perms{0600});
+    }
+
+    /// Empty when SQLite may open the database.
+    std::string Refusal() const {
+        try {
+            RequireOurFiles(Database());
+            return {};
+        } catch (const UnsafePath& refusal) {
+            return refusal.what();
+        }
+    }
+
+    TemporaryDirectory m_directory;
+};
+
+} // namespace
+
+TEST_F(DatabaseFilesTest, MayBeOpenedWhenTheyAreTheirUsersOwnOrMissing) {
+    EXPECT_EQ(Refusal(), "");
+    for (const std::string suffix : SIDE_FILE_SUFFIXES)
+        Make(Database() + suffix);
+    EXPECT_EQ(Refusal(), "");
+    fs::permissions(Database(), fs::perms{0644}); // to be read by others is no danger to the database
+    EXPECT_EQ(Refusal(), "");
+    fs::remove(Database());
+    EXPECT_EQ(Refusal(), "") << "SQLite says itself that it is missing";
+}
+
+TEST_F(DatabaseFilesTest, AreRefusedWhenOneOfThemMayBeWrittenByOthers) {
+    for (const std::string suffix : {"", "-wal", "-shm", "-journal"}) {
+        Make(Database() + suffix);
+        for (const auto mode : {0620U, 0602U}) {
+            fs::permissions(Database() + suffix, fs::perms{mode});
+            EXPECT_EQ(Refusal(), Database() + suffix + " may be written by other users");
+        }
+        fs::permissions(Database() + suffix, fs::perms{0600});
+    }
+}
+
+TEST_F(DatabaseFilesTest, AreRefusedWhenOneOfThemBelongsToAnotherUser) {
+    if (!OtherUser::CanBeMade())
+        GTEST_SKIP() << "only root can give files to another user";
+    for (const std::string suffix : {"-wal", "-shm", "-journal", ""}) {
+        Make(Database() + suffix);
+        OtherUser::Give(Database() + suffix);
+        EXPECT_EQ(Refusal(), Database() + suffix + " belongs to another user");
+        fs::remove(Database() + suffix);
+    }
+}
+
+TEST_F(DatabaseFilesTest, AreRefusedWhenOneOfThemIsALinkOrAnotherKindOfFile) {
+    const auto other = m_directory.Path() + "/other";
+    Make(other);
+    const auto journal = Database() + "-journal";
+    fs::create_symlink(other, journal);
+    EXPECT_EQ(Refusal(), journal + " is not a regular file");
+    fs::remove(journal);
+    fs::create_hard_link(other, journal);
+    EXPECT_EQ(Refusal(), journal + " has more than one name");
+    fs::remove(journal);
+    ASSERT_EQ(::mkfifo(journal.c_str(), 0600), 0);
+    EXPECT_EQ(Refusal(), journal + " is not a regular file");
+}
+
+TEST_F(DatabaseFilesTest, AreRefusedInADirectoryWhereOthersMayPutMore) {
+    fs::permissions(m_directory.Path(), fs::perms{0770});
+    EXPECT_EQ(Refusal(), m_directory.Path() + " may be written by other users");
+    fs::permissions(m_directory.Path(), fs::perms{01777});
+    EXPECT_EQ(Refusal(), m_directory.Path() + " may be written by other users");
+    fs::permissions(m_directory.Path(), fs::perms{0755});
+    EXPECT_EQ(Refusal(), "");
+}
+
+TEST_F(DatabaseFilesTest, AreLookedAtWhereALinkToTheDatabaseLeads) {
+    const auto link = m_directory.Path() + "/link";
+    fs::create_symlink(Database(), link);
+    RequireOurFiles(link);
+    Make(Database() + "-wal");
+    fs::permissions(Database() + "-wal", fs::perms{0666});
+    EXPECT_THROW(RequireOurFiles(link), UnsafePath);
+}
