@@ -56,6 +56,13 @@ void RequireOurFiles(const std::string& path) {
     RequireOurFiles(directory.Number(), file.filename().string(), shown);
 }
 
+bool SideFileWatch::IsInPlace(const std::string& path, std::optional<Identity>& identity) {
+    const auto now = IdentityOf(path);
+    if (!identity)
+        identity = now;
+    return now == identity;
+}
+
 SideFileWatch::SideFileWatch(std::string path)
     : m_log(path + "-wal"), m_index(std::move(path) + "-shm"), m_logIdentity(IdentityOf(m_log)),
       m_indexIdentity(IdentityOf(m_index)) {}

@@ -38,10 +38,13 @@ public:
     /// For the database at `path`, which has just been opened and read from in write-ahead mode.
     explicit SideFileWatch(std::string path);
 
-    bool LogIsInPlace() const { return IdentityOf(m_log) == m_logIdentity; }
-    bool AreInPlace() const { return LogIsInPlace() && IdentityOf(m_index) == m_indexIdentity; }
+    bool LogIsInPlace() { return IsInPlace(m_log, m_logIdentity); }
+    bool AreInPlace() { return LogIsInPlace() && IsInPlace(m_index, m_indexIdentity); }
 
 private:
+    /// An empty database has neither file until its first write: one that appears is the connection's own.
+    static bool IsInPlace(const std::string& path, std::optional<Identity>& identity);
+
     std::string m_log;
     std::string m_index;
     std::optional<Identity> m_logIdentity;

@@ -10,7 +10,7 @@ void LeaveTheFilesOnClose(sqlite3* connection) {
 
 } // namespace
 
-bool RescueDeletedLog(sqlite3* connection, const std::string& path, const SideFileWatch& files) {
+bool RescueDeletedLog(sqlite3* connection, const std::string& path, SideFileWatch& files) {
     LeaveTheFilesOnClose(connection);
     if (files.LogIsInPlace()) // the index alone is gone: the log is read when it is opened again
         return true;

@@ -13,6 +13,6 @@ namespace Sqlite {
 ///
 /// A log that another program has begun since then is the database's log now. Merging the old one into a database that
 /// has a new one would damage it, so the rows of the old one are lost.
-bool RescueDeletedLog(sqlite3* connection, const std::string& path, const SideFileWatch& files);
+bool RescueDeletedLog(sqlite3* connection, const std::string& path, SideFileWatch& files);
 
 } // namespace Sqlite

@@ -20,6 +20,8 @@ OutboxStore& LiveFile::Ready(SteadyTime now, std::chrono::milliseconds patience,
         news.push_back({report::Cause::Vanished,
                         m_path + " was deleted or replaced, with all events that waited in it"});
     }
+    if (m_store && !m_store->IsWhole())
+        Rescue(news);
     if (m_store) {
         m_store->SetLockPatience(patience);
         return *m_store;
@@ -35,6 +37,14 @@ OutboxStore& LiveFile::Ready(SteadyTime now, std::chrono::milliseconds patience,
     }
     m_failedAt.reset();
     return *m_store;
+}
+
+/// A deleted log takes every event that follows, too: so a new one is begun.
+void LiveFile::Rescue(std::vector<report::News>& news) {
+    if (!m_store->Rescue())
+        news.push_back(
+            {report::Cause::Vanished, m_path + "-wal was deleted, with the events that were only in it"});
+    m_store.reset();
 }
 
 void LiveFile::OpenOrBegin(std::chrono::milliseconds patience, std::vector<report::News>& news) {

@@ -39,6 +39,7 @@ public:
 private:
     void Open(std::chrono::milliseconds patience);
     void OpenOrBegin(std::chrono::milliseconds patience, std::vector<report::News>& news);
+    void Rescue(std::vector<report::News>& news);
     void CloseUntilLater(const StoreError& reason, SteadyTime now);
     void SetAside(const std::string& reason, std::vector<report::News>& news);
 

@@ -8,6 +8,7 @@
 #include "Modules/MetrikSdk/outbox/OutboxSchema.h"
 #include "Modules/MetrikSdk/outbox/SqliteGuard.h"
 #include "Modules/MetrikSdk/outbox/Uuid.h"
+#include "Modules/Sqlite/DeletedLog.h"
 #include "Modules/Sqlite/DirectoryVfs.h"
 
 namespace MetrikSdk::outbox {
@@ -30,7 +31,7 @@ SQLite::Database OpenDatabase(const std::string& path) {
 } // namespace
 
 OutboxStore::OutboxStore(const std::string& path, std::chrono::milliseconds lockPatience)
-    : m_database(OpenDatabase(path)) {
+    : m_database(OpenDatabase(path)), m_sideFiles(path) {
     SetLockPatience(lockPatience);
     KeepLogOnClose(true); // until the file is known to be in order
     Guarded("Cannot open the outbox", [&] {
@@ -47,6 +48,11 @@ OutboxStore::OutboxStore(const std::string& path, std::chrono::milliseconds lock
             std::make_unique<SQLite::Statement>(m_database, "DELETE FROM event WHERE id = ?1 AND uuid = ?2");
     });
     KeepLogOnClose(false);
+    m_sideFiles = Sqlite::SideFileWatch(path);
+}
+
+bool OutboxStore::Rescue() {
+    return Sqlite::RescueDeletedLog(m_database.getHandle(), m_database.getFilename(), m_sideFiles);
 }
 
 void OutboxStore::Configure() {

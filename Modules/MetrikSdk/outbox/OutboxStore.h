@@ -9,6 +9,7 @@
 #include <SQLiteCpp/SQLiteCpp.h>
 
 #include "Modules/MetrikSdk/Event.h"
+#include "Modules/Sqlite/DatabaseFiles.h"
 
 namespace MetrikSdk::outbox {
 
@@ -62,6 +63,12 @@ public:
     /// Whether closing leaves the write-ahead log as it is: a damaged file is set aside together with it.
     void KeepLogOnClose(bool keep);
 
+    /// Whether the files beside the database still have their names. Two system calls.
+    bool IsWhole() { return m_sideFiles.AreInPlace(); }
+
+    /// When it is not whole, before it is closed: whether all events are in the file all the same.
+    bool Rescue();
+
     /// Stores the event as its module's next one. Returns the bytes that it counts for.
     std::size_t Store(const ModuleIdentity& module, const NewEvent& event);
 
@@ -105,6 +112,7 @@ private:
     void CountRemoved(const char* counter, const Removed& removed);
 
     SQLite::Database m_database;
+    Sqlite::SideFileWatch m_sideFiles; ///< Made anew once they are open.
     std::unique_ptr<SQLite::Statement> m_insert;
     std::unique_ptr<SQLite::Statement> m_oldest;
     std::unique_ptr<SQLite::Statement> m_delete;

@@ -1,6 +1,7 @@
 #include "Modules/OrvekSqlite/file/LiveFile.h"
 
 #include <filesystem>
+#include <utility>
 
 #include <SQLiteCpp/Exception.h>
 
@@ -37,7 +38,7 @@ std::string AsAbsolute(const std::string& path) {
 } // namespace
 
 void LiveFile::Set(const std::string& path) {
-    m_connection.reset();
+    LetGo();
     m_path = AsAbsolute(path);
 }
 
@@ -52,17 +53,34 @@ void LiveFile::Run(const Operation& operation) {
             operation(*m_connection);
             if ((wasInTransaction && m_connection->InTransaction()) || m_connection->IsInPlace())
                 return;
+            const bool isCommitted = !m_connection->InTransaction();
+            if (LetGo() && isCommitted) // run again, its rows would be there twice
+                return;
         } catch (const SQLite::Exception& error) {
             if (!IsAboutTheFile(error.getErrorCode()) && m_connection->IsInPlace())
                 throw;
-            if (isNew) {
-                m_connection.reset();
+            LetGo();
+            if (isNew)
                 throw;
-            }
         }
-        m_connection.reset();
     }
     throw SQLite::Exception("the database file is being replaced again and again", SQLITE_CANTOPEN);
+}
+
+/// Whether a file beside the database was deleted and all that was committed is in the database all the same.
+bool LiveFile::LetGo() noexcept {
+    if (!m_connection)
+        return false;
+    const auto rescue = m_connection->RescueRows();
+    m_hasLostRows = m_hasLostRows || rescue == Connection::Rescue::Failed;
+    m_connection.reset();
+    return rescue == Connection::Rescue::Done;
+}
+
+void LiveFile::TellLoss() {
+    if (std::exchange(m_hasLostRows, false))
+        throw SQLite::Exception("the write-ahead log was deleted, and the rows that were only in it are lost",
+                                SQLITE_IOERR);
 }
 
 void LiveFile::RollBack() noexcept {
@@ -70,7 +88,7 @@ void LiveFile::RollBack() noexcept {
         return;
     m_connection->RollBack();
     if (m_connection->InTransaction()) // without the memory for a rollback, closing is one
-        m_connection.reset();
+        LetGo();
 }
 
 void LiveFile::WaitForLocks(std::chrono::milliseconds patience) {

@@ -28,6 +28,8 @@ public:
     /// file: then the first run had no effect that counts. A transaction that was open on the old connection
     /// is gone; the operation finds out by Connection::InTransaction.
     ///
+    /// A file beside the database that was deleted costs a new connection, and no row that the operation committed.
+    ///
     /// Within a transaction that was open before and is so afterwards, the file is not looked for: that takes
     /// a microsecond, and who commits will look.
     void Run(const Operation& operation);
@@ -42,14 +44,19 @@ public:
     /// The patience of the settings again.
     void WaitForLocks() { WaitForLocks(m_settings.busyTimeout); }
 
-    void Close() { m_connection.reset(); }
+    void Close() { LetGo(); }
+
+    /// Throws, once, when rows that had been committed were lost since the last call.
+    void TellLoss();
 
 private:
+    bool LetGo() noexcept;
     void Connect();
 
     const Settings m_settings;
     std::string m_path;
     std::chrono::milliseconds m_patience = m_settings.busyTimeout;
+    bool m_hasLostRows = false;
     std::unique_ptr<Connection> m_connection; ///< null: to be opened by the next operation
 };
 

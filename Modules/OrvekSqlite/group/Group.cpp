@@ -15,6 +15,7 @@ bool IsALock(const std::exception& error) {
 } // namespace
 
 void Group::Execute(const std::string& sql) {
+    m_file.TellLoss(); // this statement's line is the one place where it can be told
     const bool isAlone = m_policy.IsAlone(m_last, Clock::now());
     try {
         RefuseWhileOwed();

@@ -29,7 +29,8 @@ public:
     /// Runs one statement. Alone, it is committed when this returns. In a burst it joins a group, and is
     /// committed with it; should that fail, it is run again. Its own error is thrown and leaves the group as
     /// it was. While a group is uncommitted, this throws the reason, but for one try every GroupSettings::retry; when
-    /// the reason is another program's lock, it waits for that.
+    /// the reason is another program's lock, it waits for that. After rows were lost, one statement is refused with that
+    /// for its reason.
     void Execute(const std::string& sql);
 
     /// Commits what is kept, if anything.

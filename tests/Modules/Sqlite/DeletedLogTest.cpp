@@ -93,7 +93,7 @@ TEST_F(DeletedLogTest, IsFoundThroughTheOpenDirectoryAsWell) {
     fs::rename(m_directory.Path() + "/db", m_directory.Path() + "/moved"); // and all that follows goes there
     database.exec("pragma journal_mode = wal");
     database.exec("create table t (x)");
-    const SideFileWatch files(path);
+    SideFileWatch files(path);
     EXPECT_TRUE(files.AreInPlace());
     EXPECT_TRUE(fs::exists(m_directory.Path() + "/moved/o.db-wal"));
     fs::remove(m_directory.Path() + "/moved/o.db-wal");

@@ -155,7 +155,7 @@ void HostileFixture::ExpectOneLineForEachRecord() {
 
 void HostileFixture::ExpectNothingHasGrown() {
     const auto now = WhatIsThere();
-    EXPECT_LE(now.descriptors, m_before.descriptors + m_descriptorsAllowed);
+    EXPECT_LE(now.descriptors, m_before.descriptors);
     EXPECT_THAT(now.threads, UnorderedElementsAreArray(m_before.threads));
     EXPECT_THAT(now.files, UnorderedElementsAreArray(m_before.files));
     EXPECT_THAT(FilesBelow(m_workingDirectory.Path()), IsEmpty());

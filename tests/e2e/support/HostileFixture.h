@@ -22,9 +22,6 @@ protected:
     /// log is one line for each record, and neither memory nor descriptors nor threads nor files have grown.
     void ExpectSoundness(std::int64_t rows, std::int64_t events);
 
-    /// Descriptors that the process may have got.
-    void AllowDescriptors(std::size_t count) { m_descriptorsAllowed = count; }
-
     /// An empty directory that the service was started in.
     const std::string& WorkingDirectory() const { return m_workingDirectory.Path(); }
 
@@ -52,7 +49,6 @@ private:
     std::string m_output; ///< Of the set-up.
     Possessions m_before;
     std::int64_t m_rowsBefore = 0;
-    std::size_t m_descriptorsAllowed = 0;
     std::size_t m_sent = 0;
     std::size_t m_unread = 0; ///< Bytes that may still be in the socket.
 };

@@ -220,6 +220,32 @@ TEST_F(OutboxTest, WritesNoEventIntoADeletedFileHoweverSoonItComes) {
     }
 }
 
+TEST_F(OutboxTest, KeepsItsEventsWhenTheFilesBesideItAreDeleted) {
+    Open();
+    for (const std::string suffix : {"-wal", "-shm"}) {
+        ASSERT_TRUE(Append());
+        ASSERT_TRUE(std::filesystem::remove(File() + suffix));
+        ASSERT_TRUE(Append());
+        EXPECT_TRUE(std::filesystem::exists(File() + suffix)) << "a new one";
+    }
+    EXPECT_EQ(m_outbox->Status().waiting, 4);
+    EXPECT_TRUE(Told::Failures().All().empty()) << "nothing is lost";
+}
+
+TEST_F(OutboxTest, TellsTheLossWhenAnotherProgramHasBegunALogOfItsOwn) {
+    Open();
+    ASSERT_TRUE(Append());
+    for (const std::string suffix : {"-wal", "-shm"})
+        ASSERT_TRUE(std::filesystem::remove(File() + suffix));
+    // A file with nothing in it is enough: whose it is cannot be told.
+    std::ofstream(File() + "-wal").close();
+    ::chmod((File() + "-wal").c_str(), 0600);
+    EXPECT_TRUE(Append());
+    EXPECT_EQ(Told::Failures().Count("outbox vanished: " + File() +
+                                     "-wal was deleted, with the events that were only in it"),
+              1);
+}
+
 TEST_F(OutboxTest, BeginsAnewWhenTheWholeDirectoryIsDeleted) {
     Open();
     Append();

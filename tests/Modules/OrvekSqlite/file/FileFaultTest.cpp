@@ -190,6 +190,56 @@ TEST_F(DatabaseFile, IsUsedAfterItWasDeletedWithItsSideFilesAndMadeAnew) {
     EXPECT_EQ(Ask(Store(), "pragma integrity_check"), "ok");
 }
 
+TEST_F(DatabaseFile, HoldsEveryRowThoughItsSideFilesWereDeletedAndTheProcessKilled) {
+    MakeStore(Store());
+    ChildProcess writer([&](const auto&) {
+        if (!Plugin()->Open(Store()) || !Exec(Insert("first")))
+            return 1;
+        fs::remove(Store() + "-wal");
+        fs::remove(Store() + "-shm");
+        for (int i = 0; i < 3000; ++i)
+            if (!Exec(Insert("later")))
+                return 2;
+        int count = 0; // asking commits the last group
+        if (!Plugin()->GetTotalCount("select 1", count))
+            return 3;
+        ::raise(SIGKILL);
+        return 4;
+    });
+    const int status = writer.Wait();
+    ASSERT_TRUE(WIFSIGNALED(status) && WTERMSIG(status) == SIGKILL) << WEXITSTATUS(status);
+    EXPECT_EQ(Rows(Store()), "3001");
+    EXPECT_EQ(Ask(Store(), "pragma integrity_check"), "ok");
+}
+
+TEST_F(DatabaseFile, HasEachRowOnceWhenASideFileIsDeletedInABurst) {
+    OpenStore();
+    for (int i = 0; i < 5000; ++i) {
+        if (i % 500 == 250)
+            fs::remove(Store() + (i % 1000 < 500 ? "-wal" : "-shm"));
+        ASSERT_TRUE(Exec(Insert(std::to_string(i)))) << Error();
+    }
+    int count = 0;
+    ASSERT_TRUE(Plugin()->GetTotalCount("select 1", count)) << "which commits the last group";
+    EXPECT_EQ(Ask(Store(), "select count(*) || ' ' || count(distinct eventID) from OperLog"), "5000 5000");
+    EXPECT_EQ(Ask(Store(), "pragma integrity_check"), "ok");
+}
+
+TEST_F(DatabaseFile, TellsOnceThatRowsAreLostWhenAnotherProgramHasBegunALogOfItsOwn) {
+    OpenStore();
+    ASSERT_TRUE(Exec(Insert("lost"))) << Error();
+    fs::remove(Store() + "-wal");
+    fs::remove(Store() + "-shm");
+    const auto another = "sqlite3 " + Store() + " \"" + Insert("theirs") + "\"";
+    ASSERT_EQ(std::system(another.c_str()), 0);
+    EXPECT_TRUE(Exec(Insert("kept"))) << Error();
+    EXPECT_FALSE(Exec(Insert("refused")));
+    EXPECT_EQ(Error(), "the write-ahead log was deleted, and the rows that were only in it are lost");
+    EXPECT_TRUE(Exec(Insert("next"))) << Error();
+    EXPECT_EQ(Ask(Store(), "select group_concat(eventID) from OperLog"), "theirs,kept,next");
+    EXPECT_EQ(Ask(Store(), "pragma integrity_check"), "ok");
+}
+
 TEST_F(DatabaseFile, KeepsItsRowsWhenItIsMovedAway) {
     OpenStore();
     ASSERT_TRUE(Exec(Insert("old"))) << Error();
