@@ -90,7 +90,8 @@ TEST_F(SafeDirectoryTest, TakesADirectoryOutsideWhenNoOtherUserCanChangeItsPath)
     if (path.empty())
         GTEST_SKIP() << "only root can make a directory whose path is its own";
     EXPECT_EQ(Refusal(path), "");
-    EXPECT_EQ(Refusal(path + "/new"), path + "/new does not exist, and is only made below the user's data directory");
+    EXPECT_EQ(Refusal(path + "/new"),
+              path + "/new does not exist, and is only made below the user's data directory");
     fs::create_directory(path + "/wide");
     for (const auto mode : {0770U, 0707U, 01777U}) {
         fs::permissions(path + "/wide", fs::perms{mode});
