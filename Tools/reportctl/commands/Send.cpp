@@ -2,17 +2,18 @@
 
 #include <cerrno>
 #include <chrono>
-#include <fstream>
-#include <iostream>
 #include <memory>
 #include <optional>
 
 #include <CLI/CLI.hpp>
 #include <Poco/Exception.h>
+#include <fcntl.h>
 #include <fmt/format.h>
+#include <unistd.h>
 
 #include "Common/Records.h"
 #include "SystemTool/Errno.h"
+#include "SystemTool/IO/Descriptor.h"
 #include "Tools/reportctl/send/Delivery.h"
 #include "Tools/reportctl/send/Messages.h"
 
@@ -64,10 +65,10 @@ int SendReport(const SendOptions& options) {
 
 int SendLines(const std::string& path, const send::DeliverySettings& settings) {
     if (path == STANDARD_INPUT)
-        return send::DeliverLines(std::cin, settings);
-    std::ifstream file(path, std::ios::binary);
-    if (file)
-        return send::DeliverLines(file, settings);
+        return send::DeliverLines(STDIN_FILENO, settings);
+    const SystemTool::IO::Descriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC));
+    if (file.IsOpen())
+        return send::DeliverLines(file.Number(), settings);
     fmt::print(stderr, "error: cannot open {}: {}\n", path, SystemTool::ErrnoText(errno));
     return 1;
 }

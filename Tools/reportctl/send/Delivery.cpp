@@ -7,6 +7,7 @@
 #include <fmt/format.h>
 
 #include "Tools/reportctl/send/Judgement.h"
+#include "Tools/reportctl/send/LineReader.h"
 #include "Tools/reportctl/send/Sender.h"
 
 namespace reportctl::send {
@@ -46,6 +47,11 @@ void PrintText(const std::string& text) {
     std::fputc('\n', stdout);
 }
 
+/// One that is too long for a datagram is none, whatever is in it.
+bool IsBlank(const LineReader& lines) {
+    return lines.IsWhole() && lines.Text().find_first_not_of(BLANK) == std::string::npos;
+}
+
 std::string Count(std::size_t count, const std::string& thing) {
     return fmt::format("{} {}{}", count, thing, count == 1 ? "" : "s");
 }
@@ -56,9 +62,15 @@ public:
     explicit LineDelivery(const DeliverySettings& settings) : m_settings(settings) {}
 
     /// False when there is no use in going on.
-    bool Deliver(std::size_t number, const std::string& line) {
+    bool Deliver(std::size_t number, const LineReader& lines) {
         const auto origin = fmt::format("line {}: ", number);
-        if (!MaySend(origin, Judge(line), m_settings.anyway)) {
+        const auto& line = lines.Text();
+        if (!MaySend(origin, lines.IsWhole() ? Judge(line) : JudgeLonger(lines.Bytes()), m_settings.anyway)) {
+            ++m_bad;
+            return true;
+        }
+        if (m_settings.dryRun && !lines.IsWhole()) {
+            TellError(origin, "no datagram can hold it");
             ++m_bad;
             return true;
         }
@@ -144,14 +156,14 @@ int DeliverOne(const std::string& text, const DeliverySettings& settings) {
     return 0;
 }
 
-int DeliverLines(std::istream& lines, const DeliverySettings& settings) {
+int DeliverLines(int descriptor, const DeliverySettings& settings) {
     LineDelivery delivery(settings);
-    std::string line;
-    for (std::size_t number = 1; std::getline(lines, line); ++number)
-        if (line.find_first_not_of(BLANK) != std::string::npos && !delivery.Deliver(number, line))
+    LineReader lines(descriptor);
+    for (std::size_t number = 1; lines.Next(); ++number)
+        if (!IsBlank(lines) && !delivery.Deliver(number, lines))
             break;
     delivery.AwaitRefusal();
-    if (lines.bad()) {
+    if (lines.HasFailed()) {
         TellError("", "what was to be sent could not be read to its end");
         delivery.Close();
         return 1;

@@ -1,6 +1,5 @@
 #pragma once
 
-#include <istream>
 #include <string>
 
 #include "Tools/reportctl/send/Pace.h"
@@ -19,7 +18,8 @@ int DeliverOne(const std::string& text, const DeliverySettings& settings);
 
 /// The same for each line that is not blank, as it stands, without its line feed. A line that is judged bad
 /// is told with its number and left out; the first that nobody hears is the last. Each line goes out as soon
-/// as it is read, so that `lines` may be a pipe that is still being written.
-int DeliverLines(std::istream& lines, const DeliverySettings& settings);
+/// as it is read, so that the descriptor may be that of a pipe that is still being written. A line of any length
+/// takes no more memory than 64 KiB.
+int DeliverLines(int descriptor, const DeliverySettings& settings);
 
 } // namespace reportctl::send

@@ -171,11 +171,14 @@ void JudgeMessage(Judgement& judgement, const std::string& text, const JsonDocum
         JudgeReport(judgement, message);
 }
 
+std::string TooLong(std::uint64_t bytes) {
+    return fmt::format("it has {} bytes, and the service cuts a text off after {}", bytes, Wire::MAX_BYTES);
+}
+
 /// Why nothing of the text can be used; empty when it can be.
 std::string ReasonAgainstText(const std::string& text, JsonDocument& message) {
     if (text.size() > Wire::MAX_BYTES)
-        return fmt::format("it has {} bytes, and the service cuts a text off after {}", text.size(),
-                           Wire::MAX_BYTES);
+        return TooLong(text.size());
     if (const auto zero = text.find('\0'); zero != std::string::npos)
         return fmt::format("it holds a zero byte, and the service cuts a text off there: byte {}", zero);
     std::string error;
@@ -203,6 +206,10 @@ Judgement Judge(const std::string& text) {
             "place of it. It is processed all the same");
     JudgeMessage(judgement, text, message);
     return judgement;
+}
+
+Judgement JudgeLonger(std::uint64_t bytes) {
+    return {.what = "a text", .errors = {TooLong(bytes)}, .warnings = {}};
 }
 
 } // namespace reportctl::send

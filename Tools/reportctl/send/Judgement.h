@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstdint>
 #include <string>
 #include <vector>
 
@@ -18,5 +19,8 @@ struct Judgement {
 /// The line between errors and warnings: a report that would not end where its sender means it to is an
 /// error, since nobody is told of the loss at the other end.
 Judgement Judge(const std::string& text);
+
+/// The same for a text of which only the length is known, which no datagram can hold.
+Judgement JudgeLonger(std::uint64_t bytes);
 
 } // namespace reportctl::send

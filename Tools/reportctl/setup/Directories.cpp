@@ -40,11 +40,19 @@ void SetMode(const std::string& path, mode_t mode, int openFlags) {
         SystemTool::ThrowErrno(errno);
 }
 
-/// The mode is set again at the end: a directory that appeared meanwhile is as good, but may have another one.
+/// Private at first, then opened as wide as it is to be. One that appeared meanwhile is as good, but may have another mode.
 void Make(const std::string& path, const Kind& kind) {
-    if (const auto failure = SystemTool::IO::MakeDirectories(path, kind.mode, kind.parentMode))
-        SystemTool::ThrowErrno(failure.error);
+    const fs::path itself = (fs::path(path) / "").parent_path(); // without a slash at its end
+    if (const auto parent = itself.parent_path(); !parent.empty())
+        if (const auto failure =
+                SystemTool::IO::MakeDirectories(parent.string(), kind.parentMode, kind.parentMode))
+            SystemTool::ThrowErrno(failure.error);
+    const int refusal = ::mkdir(itself.c_str(), PRIVATE_MODE) == 0 ? 0 : errno;
+    if (refusal != 0 && refusal != EEXIST)
+        SystemTool::ThrowErrno(refusal);
     SetMode(path, kind.mode, kind.openFlags);
+    if (refusal == EEXIST)
+        throw terminal::AlreadyThere();
 }
 
 bool Ensure(terminal::Worklog& log, const std::string& path, const Kind& kind, const std::string& makeAdvice,

@@ -43,7 +43,11 @@ void Make(const std::string& path) {
     // Checked before: a file of this user's own is what keeps the other users out.
     if (const uid_t self = ::geteuid(); self != 0 && self != status.st_uid)
         SystemTool::ThrowErrno(EPERM);
-    const auto file = Opened(CreateIn(directory.Number()));
+    const Descriptor file(CreateIn(directory.Number()));
+    if (!file.IsOpen() && errno == EEXIST)
+        throw terminal::AlreadyThere();
+    if (!file.IsOpen())
+        SystemTool::ThrowErrno(errno);
     if (::geteuid() != status.st_uid && ::fchown(file.Number(), status.st_uid, status.st_gid) != 0)
         SystemTool::ThrowErrno(errno);
 }

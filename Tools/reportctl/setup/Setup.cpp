@@ -2,9 +2,14 @@
 
 #include <filesystem>
 
+#include <fcntl.h>
+#include <sys/file.h>
+
 #include "Common/Paths.h"
 #include "SystemTool/CommonTool.h"
+#include "SystemTool/IO/Descriptor.h"
 #include "Tools/reportctl/setup/Directories.h"
+#include "Tools/reportctl/setup/HomeOwner.h"
 #include "Tools/reportctl/setup/PidFile.h"
 #include "Tools/reportctl/store/BaseInfo.h"
 #include "Tools/reportctl/store/Store.h"
@@ -22,15 +27,29 @@ void SetUpBaseInfo(terminal::Worklog& log, const std::string& store, const Setup
         store::EnsureBaseInfo(log, store, store::SUITE_VERSION_KEY, options.suiteVersion);
 }
 
+/// One set-up at a time makes or changes the store: another one would take the files beside it for what a lost store left
+/// behind. Held for as long as the result lives. Nothing where there is no directory, as in a dry run.
+SystemTool::IO::Descriptor WaitForTurn(const std::string& directory) {
+    SystemTool::IO::Descriptor lock(::open(directory.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+    if (lock.IsOpen())
+        ::flock(lock.Number(), LOCK_EX); // on a file system without locks there is none
+    return lock;
+}
+
 void SetUpUserData(terminal::Worklog& log, const SetupOptions& options) {
     const auto data = SystemTool::CommonTool::GetUserDataDir();
     if (data.empty()) {
         log.Fail("This user has no home directory. Set HOME or XDG_DATA_HOME and run this again.");
         return;
     }
+    if (const auto reason = ReasonAgainstRoot(data)) {
+        log.Fail(*reason);
+        return;
+    }
     for (const auto& directory :
          {Paths::Suite(data), Paths::Databases(data), Paths::Logs(data), Paths::ServiceLogs(data)})
         EnsurePrivateDirectory(log, directory);
+    const auto turn = WaitForTurn(Paths::Databases(data));
     const auto store = Paths::Store(data);
     if (store::EnsureStore(log, store))
         SetUpBaseInfo(log, store, options);

@@ -16,6 +16,9 @@ bool Worklog::Run(const Verb& verb, const std::string& thing, const std::functio
     try {
         if (!m_isDryRun)
             action();
+    } catch (const AlreadyThere&) {
+        AlreadyDone(thing);
+        return true;
     } catch (const std::exception& error) {
         Fail(fmt::format("Not {}: {}: {}. {}", verb.done, thing, error.what(), advice));
         return false;

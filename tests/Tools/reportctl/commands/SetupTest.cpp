@@ -186,6 +186,36 @@ TEST_F(Setup, TellsHowAPidFileBecomesWritableForAll) {
     EXPECT_EQ(ModeOf(PidFile()), 0644u);
 }
 
+TEST_F(Setup, OfManyAtOnceEachSaysWhatItMade) {
+    const auto one =
+        "XDG_DATA_HOME='" + Data() + "' '" REPORTCTL "' setup --preferences-dir '" + Preferences() + "'";
+    const auto outcome = Run("for i in 1 2 3 4 5 6 7 8; do (" + one + "; echo \"code $?\") & done; wait");
+    const auto count = [&outcome](const std::string& text) {
+        int found = 0;
+        for (auto at = outcome.output.find(text); at != std::string::npos;
+             at = outcome.output.find(text, at + 1))
+            ++found;
+        return found;
+    };
+    EXPECT_EQ(count("code 0"), 8) << outcome.output;
+    EXPECT_EQ(count("error: "), 0) << outcome.output;
+    for (const auto& thing : {"directory " + Preferences() + " ", "directory " + Data() + "/hublink ",
+                              "directory " + Database() + " ", "pid file " + PidFile(), "store " + Store()})
+        EXPECT_EQ(count("made " + thing), 1) << thing << "\n" << outcome.output;
+    ExpectEverythingMade();
+}
+
+TEST_F(Setup, SaysSoWhenItsWordsCannotBeWritten) {
+    const auto outcome = RunSetup("2>&1 >/dev/full; }", "{");
+    EXPECT_EQ(outcome.exitCode, 1);
+    EXPECT_EQ(outcome.output, "error: cannot write to standard output: No space left on device\n");
+    const auto closed = RunSetup("2>&1 >&-; }", "{");
+    EXPECT_EQ(closed.exitCode, 1);
+    EXPECT_EQ(closed.output, "error: cannot write to standard output: Bad file descriptor\n");
+    ExpectEverythingMade();
+    EXPECT_EQ(Reportctl("--help >/dev/full").exitCode, 1) << "standard error is as full there";
+}
+
 /// A directory for pid files that is another's, and a user who runs set-up: where the test runs as root, that must be
 /// made.
 class SetupInAnothersDirectory : public Setup {
@@ -233,6 +263,24 @@ TEST_F(SetupInAnothersDirectory, AsksNothingOfAUserWhenThePidFileIsThere) {
     const auto outcome = RunSetupAsNobody();
     EXPECT_EQ(outcome.exitCode, 0) << outcome.output;
     EXPECT_FALSE(outcome.Says("warning")) << outcome.output;
+}
+
+TEST_F(SetupInAnothersDirectory, AsRootMakesNothingInAnothersHomeAndTellsTheCommand) {
+    const auto home = fs::path(Data()).parent_path() / "nobody's";
+    fs::create_directories(home);
+    ASSERT_EQ(::chown(home.c_str(), NOBODY, NOBODY), 0);
+    for (const std::string isDry : {"", " --dry-run"}) {
+        const auto outcome =
+            Run("XDG_DATA_HOME=\"" + home.string() + "/.data\" '" REPORTCTL "' setup --preferences-dir '" +
+                Preferences() + "'" + isDry);
+        EXPECT_EQ(outcome.exitCode, 1) << outcome.output;
+        EXPECT_TRUE(outcome.Says("error: " + home.string() + " belongs to nobody, and set-up runs as root"))
+            << outcome.output;
+        EXPECT_TRUE(outcome.Says("Run: sudo -u nobody env XDG_DATA_HOME='" + home.parent_path().string() +
+                                 "/nobody'\\''s/.data' reportctl setup\n"))
+            << outcome.output;
+        EXPECT_TRUE(fs::is_empty(home));
+    }
 }
 
 TEST_F(SetupInAnothersDirectory, WarnsOfAPidFileThatKeepsOthersOut) {

@@ -140,6 +140,26 @@ TEST_F(SendLines, KeepsThePace) {
     EXPECT_GE(std::chrono::steady_clock::now() - start, std::chrono::milliseconds(195));
 }
 
+TEST_F(SendLines, SaysThatItCannotReadAClosedInput) {
+    const auto outcome = Send("- <&-", "timeout 10 env");
+    EXPECT_EQ(outcome.exitCode, 1);
+    EXPECT_EQ(outcome.output, "error: what was to be sent could not be read to its end\n"
+                              "sent 0 messages (0 bytes)\n");
+}
+
+TEST_F(SendLines, SaysSoWhenItsWordsCannotBeWritten) {
+    Listener listener;
+    const auto outcome = Send(FileOf(Line(1)) + "2>&1 >/dev/full; }", "{");
+    EXPECT_EQ(outcome.exitCode, 1);
+    EXPECT_EQ(outcome.output, "error: cannot write to standard output: No space left on device\n");
+    EXPECT_EQ(listener.Receive(), Line(1)) << "sent all the same";
+    std::string many;
+    for (int number = 0; number < 1000; ++number)
+        many += Line(number) + "\n";
+    EXPECT_EQ(Send(FileOf(many) + "--dry-run >/dev/full").exitCode, 1)
+        << "more than what is kept to be written";
+}
+
 TEST_F(SendLines, SaysWhatItCannotRead) {
     const auto missing = Send("--file /nowhere/lines");
     EXPECT_EQ(missing.exitCode, 1);
