@@ -60,7 +60,9 @@ Result Channel::Deliver(std::string_view datagram, bool isOfModule) noexcept {
     for (int attempt = 0; attempt < 2; ++attempt) {
         if (IsOthersService(Clock::now()))
             return Result::OtherUsersService;
-        const Socket::Outcome outcome = TryToDeliver(datagram, isOfModule);
+        Socket::Outcome outcome = TryToDeliver(datagram, isOfModule);
+        if (outcome == Socket::Outcome::Sent && IsNobodyThere())
+            outcome = Socket::Outcome::Refused;
         if (outcome != Socket::Outcome::RefusedEarlier && outcome != Socket::Outcome::Refused)
             return ResultOf(outcome);
         ForgetTheService();
@@ -91,6 +93,14 @@ bool Channel::IsOthersService(Clock::time_point now) noexcept {
     if (!m_isServiceKnown || m_isOthers || now >= m_lookAgain)
         LookWhoListens(now);
     return m_isOthers && !m_allowsOthers;
+}
+
+/// The system may fail to tell of a refusal: a flood elsewhere takes the room for such messages. So where nobody was seen
+/// to listen, a second look decides.
+bool Channel::IsNobodyThere() noexcept {
+    if (!m_isServiceKnown)
+        LookWhoListens(Clock::now());
+    return !m_isServiceKnown;
 }
 
 void Channel::LookWhoListens(Clock::time_point now) noexcept {

@@ -50,6 +50,7 @@ private:
     Socket::Outcome TryToDeliver(std::string_view datagram, bool isOfModule) noexcept;
     Socket::Outcome Announce(Announcement& announcement) noexcept;
     bool IsOthersService(Clock::time_point now) noexcept;
+    bool IsNobodyThere() noexcept;
     void LookWhoListens(Clock::time_point now) noexcept;
     void ForgetTheService() noexcept;
     void AnnounceAgain() noexcept;

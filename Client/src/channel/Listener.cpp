@@ -16,7 +16,8 @@
 namespace hublink {
 namespace {
 
-constexpr auto TABLE = "/proc/net/udp"; // Linux
+/// Linux; of the calling thread's network, and of the process's where the first is not there.
+constexpr std::array TABLES = {"/proc/thread-self/net/udp", "/proc/net/udp"};
 constexpr std::size_t LINE_BYTES = 128;
 
 /// An address and a port as the table writes them: the address's bytes as one number of this machine.
@@ -84,7 +85,13 @@ private:
 /// A descriptor that is closed at the end.
 class File {
 public:
-    explicit File(const char* path) : m_descriptor(::open(path, O_RDONLY | O_CLOEXEC)) {}
+    /// The first of them that can be opened.
+    template <typename Paths>
+    explicit File(const Paths& paths) {
+        for (const char* path : paths)
+            if (!IsOpen())
+                m_descriptor = ::open(path, O_RDONLY | O_CLOEXEC);
+    }
     ~File() {
         if (IsOpen())
             ::close(m_descriptor);
@@ -102,7 +109,7 @@ public:
     }
 
 private:
-    const int m_descriptor;
+    int m_descriptor = -1;
 };
 
 /// Hands over the complete lines in the first `bytes` of the buffer and moves what is left to its begin.
@@ -119,7 +126,7 @@ std::size_t TakeLines(char* buffer, std::size_t bytes, Search& search) {
 } // namespace
 
 std::optional<Listener> FindListener() noexcept {
-    const File table(TABLE);
+    const File table(TABLES);
     if (!table.IsOpen())
         return std::nullopt;
     std::array<char, 32 * LINE_BYTES> buffer; // NOLINT(*-member-init): written before it is read

@@ -1,0 +1,9 @@
+#pragma once
+
+#include <cstddef>
+
+/// The C++ heap of the tests' program, as one thread sees it.
+struct CountedMemory {
+    static thread_local bool isUsedUp; ///< Each allocation of this thread throws.
+    static thread_local std::size_t allocations;
+};
