@@ -344,10 +344,12 @@ def _listener() -> Optional[_Listener]:
 
     A socket of the very address comes before one of all addresses. Of two alike, another user's is named.
     """
-    table = _TABLES[0].read_text("ascii")
+    # As bytes: a text's codec is imported when it is first used, and a fork in the midst of an import leaves the child a
+    # lock that no thread gives back.
+    table = _TABLES[0].read_bytes()
     if _TABLES[1].exists():  # not where IPv6 is switched off
-        table += _TABLES[1].read_text("ascii")
-    return min(_listeners(table, os.geteuid()), default=None)
+        table += _TABLES[1].read_bytes()
+    return min(_listeners(table.decode(), os.geteuid()), default=None)
 
 
 #: What an open socket of ours answers to no call. The program closed all of its files, and the number may be another
@@ -519,7 +521,6 @@ class Reporter:
         return False
 
     def _look_for_service(self, now: float) -> None:
-        self._next_look = now + _LOOK_SECONDS
         self._is_others = False
         try:
             listener = _listener()
@@ -527,7 +528,7 @@ class Reporter:
             if now >= self._next_repeat:
                 self._forget_service()
                 self._next_repeat = now + _REPEAT_SECONDS
-                self._next_look = now + _LOOK_SECONDS
+            self._next_look = now + _LOOK_SECONDS
             return
         if listener is None or listener.inode != self._service:
             self._forget_service()

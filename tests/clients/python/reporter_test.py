@@ -6,6 +6,7 @@ import pathlib
 import shutil
 import socket
 import subprocess
+import sys
 import tempfile
 import threading
 import time
@@ -13,7 +14,7 @@ import unittest
 import warnings
 from unittest import mock
 
-from support import ADDRESS, NOBODY, Listener, in_child, listener_of_another_user
+from support import ADDRESS, NOBODY, ROOT, Listener, in_child, listener_of_another_user
 
 import hublink_report
 from hublink_report import Module, Reporter, Result
@@ -136,6 +137,7 @@ class AServiceOfAnotherUser(Reporting):
     def test_that_ends_makes_room_for_ones_own(self):
         self.reporter.set_user("u1")
         with listener_of_another_user():
+            self.expect(Result.OTHER_USERS_SERVICE)
             self.expect(Result.OTHER_USERS_SERVICE)
         with Listener() as listener:
             self.expect(Result.SENT)
@@ -267,6 +269,18 @@ class AFork(Reporting):
             release.set()
             thread.join()
 
+    def test_never_meets_a_thread_that_imports_for_the_module(self):
+        """The child would wait for ever for the import's lock."""
+        script = ("import sys; from hublink_report import Json, Module, Reporter, Result; before = set(sys.modules);"
+                  "reporter = Reporter(Module('A100', '1', 'n'));"
+                  "results = {reporter.set_user('u'), reporter.event('A100|1', Json('{\"a\":[1.5,1]}')),"
+                  "reporter.event('B100|1', '\\u00fc'), reporter.event('B100|1', '\\ud800')};"
+                  "assert results == {Result.SENT, Result.INVALID_TEXT}, results; print(*set(sys.modules) - before)")
+        with Listener():
+            outcome = subprocess.run([sys.executable, "-B", "-c", script], cwd=ROOT / "clients/python", text=True,
+                                     check=True, stdout=subprocess.PIPE)
+        self.assertEqual(outcome.stdout.strip(), "")
+
     def test_in_the_midst_of_many_threads_costs_no_event(self):
         threads, events = 4, 300
         with Listener() as listener:
@@ -287,6 +301,9 @@ class Threads(Reporting):
     THREADS, EVENTS = 8, 2000
 
     def test_send_each_event_once_and_the_announcement_first(self):
+        interval = sys.getswitchinterval()
+        self.addCleanup(sys.setswitchinterval, interval)
+        sys.setswitchinterval(1e-6)  # so that threads meet everywhere
         received = []
         with Listener() as listener:
             workers = [threading.Thread(target=self.report, args=(name,)) for name in range(self.THREADS)]
