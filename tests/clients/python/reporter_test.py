@@ -14,7 +14,7 @@ import unittest
 import warnings
 from unittest import mock
 
-from support import ADDRESS, NOBODY, ROOT, Listener, in_child, listener_of_another_user
+from support import ADDRESS, NOBODY, ROOT, Listener, in_child, listener_of_another_user, wait_until
 
 import hublink_report
 from hublink_report import Module, Reporter, Result
@@ -282,47 +282,62 @@ class AFork(Reporting):
         self.assertEqual(outcome.stdout.strip(), "")
 
     def test_in_the_midst_of_many_threads_costs_no_event(self):
-        threads, events = 4, 300
+        forks, events = 20, Listener.AT_ONCE - 10
+        codes, kinds, permits = [], [], threading.Semaphore(0)
+
+        def report():
+            while permits.acquire() and len(codes) < forks:
+                self.expect(Result.SENT)
+
+        workers = [threading.Thread(target=report) for _ in range(4)]
         with Listener() as listener:
-            workers = [threading.Thread(target=lambda: [self.expect(Result.SENT) for _ in range(events)])
-                       for _ in range(threads)]
             for worker in workers:
                 worker.start()
-            codes = [in_child(lambda: self.reporter.event("A100|child") is Result.SENT) for _ in range(20)]
+            while len(codes) < forks:
+                permits.release(events)
+                code = in_child(lambda: self.reporter.event("A100|child") is Result.SENT)
+                wait_until(lambda: self.reporter.count(Result.SENT) == (len(codes) + 1) * events)
+                kinds += listener.kinds()
+                codes.append(code)
+            permits.release(len(workers))
             for worker in workers:
                 worker.join()
-            kinds = listener.kinds()
-        self.assertEqual(codes, [0] * 20)
-        self.assertEqual(self.reporter.count(Result.SENT), threads * events)
-        self.assertEqual((kinds.count("A100|1"), kinds.count("A100|child")), (threads * events, 20))
+        self.assertEqual(codes, [0] * forks)
+        self.assertEqual((kinds.count("A100|1"), kinds.count("A100|child")), (forks * events, forks))
 
 
 class Threads(Reporting):
-    THREADS, EVENTS = 8, 2000
+    THREADS, ROUNDS = 8, 100
+    EVENTS = Listener.AT_ONCE // THREADS  # of a thread in a round
 
     def test_send_each_event_once_and_the_announcement_first(self):
-        interval = sys.getswitchinterval()
-        self.addCleanup(sys.setswitchinterval, interval)
+        self.addCleanup(sys.setswitchinterval, sys.getswitchinterval())
         sys.setswitchinterval(1e-6)  # so that threads meet everywhere
-        received = []
+        received, self.turn = [], threading.Barrier(self.THREADS + 1)
+        workers = [threading.Thread(target=self.report, args=(name,)) for name in range(self.THREADS)]
         with Listener() as listener:
-            workers = [threading.Thread(target=self.report, args=(name,)) for name in range(self.THREADS)]
             for worker in workers:
                 worker.start()
-            while any(worker.is_alive() for worker in workers):
+            for _ in range(self.ROUNDS):
+                self.turn.wait(60)
                 received += listener.kinds()
-            received += listener.kinds()
+                self.turn.wait(60)
+            for worker in workers:
+                worker.join()
+        sent = self.ROUNDS * self.EVENTS
         self.assertEqual(received[0], "init")
-        # Of one thread, the events are in their order.
-        for name in range(self.THREADS):
+        for name in range(self.THREADS):  # the events of one thread are in their order
             self.assertEqual([kind for kind in received if kind.startswith(f"A100|{name}.")],
-                             [f"A100|{name}.{number}" for number in range(self.EVENTS)])
-        self.assertEqual(len(received), 1 + self.THREADS * self.EVENTS)
-        self.assertEqual(self.reporter.count(Result.SENT), self.THREADS * self.EVENTS)
+                             [f"A100|{name}.{number}" for number in range(sent)])
+        self.assertEqual(len(received), 1 + self.THREADS * sent)
+        self.assertEqual(self.reporter.count(Result.SENT), self.THREADS * sent)
 
     def report(self, name):
-        for number in range(self.EVENTS):
+        for number in range(self.ROUNDS * self.EVENTS):
             self.reporter.event(f"A100|{name}.{number}")
+            if number % self.EVENTS == self.EVENTS - 1:
+                self.turn.wait(60)
+                self.turn.wait(60)
 
 
 class AReporter(Reporting):
