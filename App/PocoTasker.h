@@ -1,5 +1,7 @@
 #pragma once
 
+#include <new>
+
 #include <Poco/AutoPtr.h>
 #include <Poco/Notification.h>
 #include <Poco/NotificationQueue.h>
@@ -31,7 +33,7 @@ public:
     /// The consumer's loop. Catches nothing: Consume does.
     void run() override {
         for (;;) {
-            const Poco::AutoPtr<Poco::Notification> item(m_queue.waitDequeueNotification());
+            const Poco::AutoPtr<Poco::Notification> item(Next());
             if (!item)
                 continue; // woken without an item
             if (dynamic_cast<const StopNotification*>(item.get()) != nullptr)
@@ -61,4 +63,16 @@ protected:
 
     Poco::NotificationQueue m_queue;
     Poco::Thread m_thread;
+
+private:
+    /// The next item, waited for. To wait takes memory; where there is none, the thread looks again later and does not end.
+    Poco::Notification* Next() {
+        constexpr long NO_MEMORY_PAUSE_MS = 10;
+        try {
+            return m_queue.waitDequeueNotification();
+        } catch (const std::bad_alloc&) {
+            Poco::Thread::sleep(NO_MEMORY_PAUSE_MS);
+            return nullptr;
+        }
+    }
 };

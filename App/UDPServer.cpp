@@ -20,18 +20,31 @@ constexpr long POLL_TIMEOUT_MS = 250; // how long a stop may take; spares the lo
 /// thread waits for a processor.
 constexpr int SOCKET_BUFFER_BYTES = 8 * 1024 * 1024;
 
-/// For `catch (...)`: prints the exception under way.
-void PrintCaughtException() {
+/// Prints the exception under way. Throws when there is no memory for its text; a line is printed whole or not at all.
+void PrintExceptionUnderWay() {
     try {
         throw;
     } catch (const Poco::Exception& error) {
-        std::cout << "Poco exception: " << error.displayText() << std::endl;
+        const std::string text = error.displayText();
+        std::cout << "Poco exception: " << text << std::endl;
     } catch (const std::exception& error) {
         std::cout << "Std exception: " << error.what() << std::endl;
     } catch (...) {
         const int code = Poco::Error::last();
-        std::cout << "Unknown exception,eCode:" << code << ",desc:" << Poco::Error::getMessage(code)
-                  << std::endl;
+        const std::string text = Poco::Error::getMessage(code);
+        std::cout << "Unknown exception,eCode:" << code << ",desc:" << text << std::endl;
+    }
+}
+
+/// For `catch (...)`: prints the exception under way; where its text cannot be built, the reason for that.
+void PrintCaughtException() noexcept {
+    try {
+        PrintExceptionUnderWay();
+    } catch (...) {
+        try {
+            PrintExceptionUnderWay();
+        } catch (...) { // no memory is left for any line
+        }
     }
 }
 

@@ -75,10 +75,8 @@ static void WriteLog(const LogSite& site, const std::string& format, const Argum
     }
 }
 
-/// For the last handler of a public operation, `catch (...) { return LogCaughtException(site); }`: logs the
-/// exception under way in the words that people search the log for, their trailing blanks included. Always
-/// false, the result of an operation that caught one.
-[[maybe_unused]] static bool LogCaughtException(const LogSite& site) noexcept {
+/// Logs the exception under way. Throws when there is no memory for its text.
+[[maybe_unused]] static void LogExceptionUnderWay(const LogSite& site) {
     try {
         throw;
     } catch (const Poco::Exception& error) {
@@ -88,6 +86,21 @@ static void WriteLog(const LogSite& site, const std::string& format, const Argum
     } catch (...) {
         const int code = Poco::Error::last();
         WriteLog(site, "Unknown exception :%d-%s", code, Poco::Error::getMessage(code));
+    }
+}
+
+/// For the last handler of a public operation, `catch (...) { return LogCaughtException(site); }`: logs the
+/// exception under way in the words that people search the log for, their trailing blanks included. Always
+/// false, the result of an operation that caught one. Where its text cannot be built, the reason for that is logged
+/// instead; without memory for that, nothing is.
+[[maybe_unused]] static bool LogCaughtException(const LogSite& site) noexcept {
+    try {
+        LogExceptionUnderWay(site);
+    } catch (...) {
+        try {
+            LogExceptionUnderWay(site);
+        } catch (...) { // no memory is left for any line
+        }
     }
     return false;
 }

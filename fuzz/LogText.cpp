@@ -63,7 +63,8 @@ void RequireOneHarmlessLine(const LogRecord& record) {
 /// Whether a number is so long that boost::format would compute with it beyond the range of its integers.
 bool HasALongNumber(std::string_view text) {
     const auto isDigit = [](char byte) { return byte >= '0' && byte <= '9'; };
-    return std::ranges::search_n(text, 10, true, {}, isDigit).size() == 10;
+    const auto same = [&](char byte, bool wanted) { return isDigit(byte) == wanted; };
+    return std::search_n(text.begin(), text.end(), 10, true, same) != text.end();
 }
 
 /// boost::format makes room for the directives that it counts, and counts a tabulation whose fill is a percent sign as one

@@ -4,10 +4,7 @@
 #include <stdexcept>
 #include <utility>
 
-#include <rapidjson/document.h>
-#include <rapidjson/stringbuffer.h>
-#include <rapidjson/writer.h>
-
+#include "SystemTool/IO/JsonMemory.h"
 #include "SystemTool/IO/JsonParse.h"
 #include "SystemTool/IO/JsonWalk.h"
 #include "SystemTool/Text/Utf8.h"
@@ -15,9 +12,9 @@
 namespace SystemTool::IO {
 namespace {
 
-using Value = rapidjson::Value;
+using Value = JsonValue;
 
-Value TextValue(const std::string& text, rapidjson::Document::AllocatorType& allocator) {
+Value TextValue(const std::string& text, JsonPool& allocator) {
     const std::string valid = Text::ValidUtf8(text);
     return Value(valid.data(), static_cast<rapidjson::SizeType>(valid.size()), allocator);
 }
@@ -35,8 +32,8 @@ struct JsonDocument::Tree {
     static constexpr std::size_t ROOM_BYTES = 768;
 
     alignas(std::max_align_t) char room[ROOM_BYTES];
-    rapidjson::Document::AllocatorType allocator{room, sizeof room};
-    rapidjson::Document document{&allocator};
+    JsonPool allocator{room, sizeof room};
+    JsonTree document{&allocator};
 };
 
 JsonDocument::JsonDocument(std::shared_ptr<Tree> tree, const Value* value)
@@ -78,6 +75,11 @@ JsonDocument::Value& JsonDocument::Editable() {
     return m_tree->document;
 }
 
+/// After a change that ran out of memory: the object may believe that it has room for a member which it has not.
+void JsonDocument::Abandon() {
+    *this = JsonDocument();
+}
+
 void JsonDocument::SetMember(const std::string& key, Value& value) {
     Value& object = m_tree->document;
     // Of const iterators: comparing the others is ambiguous in C++20, where either side may be the one to convert.
@@ -97,19 +99,29 @@ void JsonDocument::SetMember(const std::string& key, Value& value) {
 
 void JsonDocument::SetKeyValue(const std::string& key, const std::string& value) {
     Editable();
-    Value text = TextValue(value, m_tree->document.GetAllocator());
-    SetMember(key, text);
+    try {
+        Value text = TextValue(value, m_tree->document.GetAllocator());
+        SetMember(key, text);
+    } catch (...) {
+        Abandon();
+        throw;
+    }
 }
 
 void JsonDocument::SetKeyValue(const std::string& key, const JsonDocument& value) {
     const JsonDocument source = value; // keeps its tree when value is this document or a part of it
     Editable();
-    rapidjson::Document copied(&m_tree->document.GetAllocator());
-    if (source.m_value != nullptr) {
-        JsonCopy copy{*source.m_value};
-        copied.Populate(copy);
+    try {
+        JsonTree copied(&m_tree->document.GetAllocator());
+        if (source.m_value != nullptr) {
+            JsonCopy copy{*source.m_value};
+            copied.Populate(copy);
+        }
+        SetMember(key, copied);
+    } catch (...) {
+        Abandon();
+        throw;
     }
-    SetMember(key, copied);
 }
 
 bool JsonDocument::IsObject() const {
@@ -137,8 +149,8 @@ std::string JsonDocument::ToString() const {
 std::string JsonDocument::ToJson() const {
     if (m_value == nullptr)
         return "null";
-    rapidjson::StringBuffer buffer;
-    rapidjson::Writer<rapidjson::StringBuffer> writer(buffer);
+    JsonBuffer buffer;
+    JsonWriter writer(buffer);
     JsonWalk{writer}(*m_value);
     return {buffer.GetString(), buffer.GetSize()};
 }

@@ -8,6 +8,8 @@
 
 namespace SystemTool::IO {
 
+class JsonAllocator;
+
 /// A JSON value with reading and light editing.
 ///
 /// Purpose: reads what comes from outside without ever failing on its shape. Asking for a member that is
@@ -20,7 +22,7 @@ namespace SystemTool::IO {
 ///
 /// Threads: one thread at a time for a document and all that were copied or taken from it, since they share a tree.
 ///
-/// Failure: only SetKeyValue throws.
+/// Failure: what needs memory throws std::bad_alloc when there is none. Nothing else but SetKeyValue throws.
 class JsonDocument { // NOLINT(cppcoreguidelines-special-member-functions): see its copy constructor
 public:
     /// Arrays and objects within each other; a text that goes deeper is refused.
@@ -46,7 +48,7 @@ public:
     /// Sets the member `key`. All members of that name are replaced by one, in the first one's place; a new
     /// one goes to the end. A null document becomes an object first; any other that is no object throws
     /// std::logic_error, because its content would be lost silently. In a text, bytes that are no UTF-8 are replaced
-    /// by U+FFFD, so that what is printed parses again.
+    /// by U+FFFD, so that what is printed parses again. A document whose memory ran out on the way is null.
     void SetKeyValue(const std::string& key, const std::string& value);
     void SetKeyValue(const std::string& key, const JsonDocument& value);
 
@@ -69,14 +71,15 @@ public:
     std::string ToJson() const;
 
 private:
-    using Value = rapidjson::GenericValue<rapidjson::UTF8<char>,
-                                          rapidjson::MemoryPoolAllocator<rapidjson::CrtAllocator>>;
+    using Value =
+        rapidjson::GenericValue<rapidjson::UTF8<char>, rapidjson::MemoryPoolAllocator<JsonAllocator>>;
     struct Tree;
 
     JsonDocument(std::shared_ptr<Tree> tree, const Value* value);
 
     Value& Editable();
     void SetMember(const std::string& key, Value& value);
+    void Abandon();
 
     /// Owns every value of the text that was parsed, or of the object that was built; null for the null
     /// value.

@@ -9,12 +9,11 @@
 #include <string>
 #include <string_view>
 
-#include <rapidjson/document.h>
 #include <rapidjson/error/en.h>
 #include <rapidjson/memorystream.h>
-#include <rapidjson/reader.h>
 
 #include "SystemTool/IO/JsonDocument.h"
+#include "SystemTool/IO/JsonMemory.h"
 #include "SystemTool/Text/Utf8.h"
 
 // How a JSON text is read: JsonDocument and the encoder of analytics events use it, so that both read numbers alike.
@@ -51,7 +50,7 @@ class JsonGuard {
 public:
     using Ch = char;
 
-    JsonGuard(rapidjson::Document& document, int maxDepth) : m_document(document), m_maxDepth(maxDepth) {}
+    JsonGuard(JsonTree& document, int maxDepth) : m_document(document), m_maxDepth(maxDepth) {}
 
     bool Null() { return m_document.Null(); }
     bool Bool(bool value) { return m_document.Bool(value); }
@@ -98,23 +97,23 @@ private:
 
     static_assert(JsonDocument::MAX_DEPTH == 128, "the refusal's text names the limit");
 
-    rapidjson::Document& m_document;
+    JsonTree& m_document;
     const int m_maxDepth;
     int m_depth = 0;
     const char* m_refusal = "";
 };
 
-/// One parse, in the shape that rapidjson::Document::Populate wants: it calls this with itself as the handler.
+/// One parse, in the shape that JsonTree::Populate wants: it calls this with itself as the handler.
 class JsonParse {
 public:
     explicit JsonParse(const std::string& text, int maxDepth = JsonDocument::MAX_DEPTH)
         : m_text(text), m_maxDepth(maxDepth),
           m_start(text.starts_with(BYTE_ORDER_MARK) ? BYTE_ORDER_MARK.size() : 0) {}
 
-    bool operator()(rapidjson::Document& document) {
+    bool operator()(JsonTree& document) {
         rapidjson::MemoryStream bytes(m_text.data() + m_start, m_text.size() - m_start);
         JsonGuard guard(document, m_maxDepth);
-        rapidjson::Reader reader;
+        JsonReader reader;
         m_result = Text::IsAscii(m_text)
                        ? reader.Parse<JSON_PARSE_FLAGS>(bytes, guard)
                        : reader.Parse<JSON_PARSE_FLAGS | rapidjson::kParseValidateEncodingFlag>(bytes, guard);

@@ -2,7 +2,7 @@
 
 #include <vector>
 
-#include <rapidjson/document.h>
+#include "SystemTool/IO/JsonMemory.h"
 
 // How JsonDocument goes through a value; of no use to anybody else.
 namespace SystemTool::IO {
@@ -14,7 +14,7 @@ class JsonWalk {
 public:
     explicit JsonWalk(Handler& handler) : m_handler(handler) {}
 
-    void operator()(const rapidjson::Value& root) {
+    void operator()(const JsonValue& root) {
         Tell(root);
         while (!m_open.empty()) {
             if (m_open.back().next == SizeOf(*m_open.back().value))
@@ -26,15 +26,15 @@ public:
 
 private:
     struct Level {
-        const rapidjson::Value* value;
+        const JsonValue* value;
         rapidjson::SizeType next;
     };
 
-    static rapidjson::SizeType SizeOf(const rapidjson::Value& value) {
+    static rapidjson::SizeType SizeOf(const JsonValue& value) {
         return value.IsObject() ? value.MemberCount() : value.Size();
     }
 
-    void Tell(const rapidjson::Value& value) {
+    void Tell(const JsonValue& value) {
         if (value.IsObject() ? m_handler.StartObject() : value.IsArray() && m_handler.StartArray())
             m_open.push_back({&value, 0});
         else
@@ -51,7 +51,7 @@ private:
     }
 
     void Close() {
-        const rapidjson::Value& value = *m_open.back().value;
+        const JsonValue& value = *m_open.back().value;
         m_open.pop_back();
         if (value.IsObject())
             m_handler.EndObject(value.MemberCount());
@@ -63,11 +63,11 @@ private:
     std::vector<Level> m_open;
 };
 
-/// Fills a document with a copy of a value, for rapidjson::Document::Populate.
+/// Fills a document with a copy of a value, for JsonTree::Populate.
 struct JsonCopy {
-    const rapidjson::Value& source;
+    const JsonValue& source;
 
-    bool operator()(rapidjson::Document& document) const {
+    bool operator()(JsonTree& document) const {
         JsonWalk{document}(source);
         return true;
     }

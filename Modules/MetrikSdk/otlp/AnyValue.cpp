@@ -7,7 +7,7 @@
 namespace MetrikSdk::otlp {
 namespace {
 
-std::string_view TextOf(const rapidjson::Value& value) {
+std::string_view TextOf(const JsonValue& value) {
     return {value.GetString(), value.GetStringLength()};
 }
 
@@ -15,7 +15,7 @@ void WriteText(JsonWriter& writer, std::string_view text) {
     writer.String(text.data(), static_cast<rapidjson::SizeType>(text.size()));
 }
 
-void WriteMembers(JsonWriter& writer, const rapidjson::Value& object) {
+void WriteMembers(JsonWriter& writer, const JsonValue& object) {
     std::set<std::string_view> written;
     for (const auto& member : object.GetObject()) {
         const auto key = TextOf(member.name);
@@ -30,13 +30,13 @@ void WriteMembers(JsonWriter& writer, const rapidjson::Value& object) {
     }
 }
 
-void WriteElements(JsonWriter& writer, const rapidjson::Value& array) {
+void WriteElements(JsonWriter& writer, const JsonValue& array) {
     for (const auto& element : array.GetArray())
         WriteAnyValue(writer, element);
 }
 
 /// Both lists of the protocol look alike: {"<type>": {"values": [...]}}.
-void WriteList(JsonWriter& writer, const rapidjson::Value& value) {
+void WriteList(JsonWriter& writer, const JsonValue& value) {
     writer.Key(value.IsObject() ? "kvlistValue" : "arrayValue");
     writer.StartObject();
     writer.Key("values");
@@ -49,7 +49,7 @@ void WriteList(JsonWriter& writer, const rapidjson::Value& value) {
     writer.EndObject();
 }
 
-void WriteScalar(JsonWriter& writer, const rapidjson::Value& value) {
+void WriteScalar(JsonWriter& writer, const JsonValue& value) {
     if (value.IsString()) {
         writer.Key("stringValue");
         WriteText(writer, TextOf(value));
@@ -67,7 +67,7 @@ void WriteScalar(JsonWriter& writer, const rapidjson::Value& value) {
 
 } // namespace
 
-void WriteAnyValue(JsonWriter& writer, const rapidjson::Value& value) {
+void WriteAnyValue(JsonWriter& writer, const JsonValue& value) {
     writer.StartObject();
     if (value.IsObject() || value.IsArray())
         WriteList(writer, value);

@@ -3,9 +3,6 @@
 #include <map>
 #include <vector>
 
-#include <rapidjson/stringbuffer.h>
-#include <rapidjson/writer.h>
-
 #include "Modules/MetrikSdk/Version.h"
 #include "Modules/MetrikSdk/otlp/AnyValue.h"
 #include "Modules/MetrikSdk/otlp/Payload.h"
@@ -125,7 +122,7 @@ private:
         m_writer.EndObject();
     }
 
-    rapidjson::StringBuffer m_buffer;
+    SystemTool::IO::JsonBuffer m_buffer;
     JsonWriter m_writer{m_buffer};
 };
 

@@ -4,9 +4,8 @@
 #include <optional>
 #include <string>
 
-#include <rapidjson/document.h>
-
 #include "Modules/MetrikSdk/Time.h"
+#include "SystemTool/IO/JsonMemory.h"
 
 namespace MetrikSdk::otlp {
 
@@ -21,14 +20,14 @@ public:
 
     /// The payload as a JSON object; null when it is none, or one that is not sent as one: deeper than
     /// MAX_DEPTH, or not UTF-8.
-    const rapidjson::Value* Object() const { return m_isObject ? &m_document : nullptr; }
+    const SystemTool::IO::JsonValue* Object() const { return m_isObject ? &m_document : nullptr; }
 
     /// When the event happened, by the module's word: extend.createTime, decimal milliseconds as a text.
     /// Nothing when there is none or it makes no sense.
     std::optional<WallTime> CreateTime() const;
 
 private:
-    rapidjson::Document m_document;
+    SystemTool::IO::JsonTree m_document;
     bool m_isObject = false;
 };
 

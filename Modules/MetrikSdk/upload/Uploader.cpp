@@ -50,6 +50,13 @@ void RunUploads(process::OutboxCore& core, otlp::Sender& sender) {
     }
 }
 
+void TellFailure(process::OutboxCore& core, const char* reason) noexcept {
+    try {
+        core.notifier.TellFailure({report::Cause::Upload, reason});
+    } catch (...) { // no memory for the text
+    }
+}
+
 /// An exception that nobody foresaw, such as a lack of memory, must not end the service.
 void RunUntilStopped(process::OutboxCore& core, otlp::Sender& sender) noexcept {
     constexpr std::chrono::seconds RECOVERY(10);
@@ -58,7 +65,7 @@ void RunUntilStopped(process::OutboxCore& core, otlp::Sender& sender) noexcept {
         try {
             RunUploads(core, sender);
         } catch (const std::exception& error) {
-            core.notifier.TellFailure({report::Cause::Upload, error.what()});
+            TellFailure(core, error.what());
             waiting.Await(outbox::CountWaiter::NEVER, std::chrono::steady_clock::now() + RECOVERY);
         }
     }

@@ -1,0 +1,126 @@
+#include <filesystem>
+#include <fstream>
+#include <optional>
+
+#include <SQLiteCpp/SQLiteCpp.h>
+#include <gtest/gtest.h>
+#include <sys/resource.h>
+
+#include "tests/e2e/support/Service.h"
+#include "tests/support/WaitUntil.h"
+
+// The service at a limit of its memory: of its addresses (ulimit -v) or of its data (ulimit -d).
+
+namespace {
+
+constexpr long ROOM_KILOBYTES = 16 * 1024; // what the limit leaves for a backlog
+
+/// A value of the process's status, in kilobytes.
+long Kilobytes(const Service& service, const std::string& name) {
+    std::ifstream status("/proc/" + std::to_string(service.Process()) + "/status");
+    for (std::string line; std::getline(status, line);)
+        if (line.starts_with(name + ":"))
+            return std::stol(line.substr(name.size() + 1));
+    return -1;
+}
+
+struct Limit {
+    const char* name;
+    decltype(RLIMIT_AS) resource;
+    const char* usage; ///< In the process's status.
+};
+
+class MemoryFault : public ::testing::TestWithParam<Limit> {
+protected:
+    MemoryFault() {
+        m_service.Install();
+        m_service.Start();
+        m_arrayOfTwoThousand = "[1";
+        for (int i = 1; i < 2000; ++i)
+            m_arrayOfTwoThousand += ",1";
+        m_arrayOfTwoThousand += "]";
+        SendAndAwaitARow(); // everything that is loaded late is there
+    }
+
+    void SetLimit() {
+        m_limitKilobytes = Kilobytes(m_service, GetParam().usage) + ROOM_KILOBYTES;
+        const auto bytes = static_cast<rlim_t>(m_limitKilobytes) * 1024;
+        const rlimit limit{.rlim_cur = bytes, .rlim_max = bytes};
+        ASSERT_EQ(::prlimit(m_service.Process(), GetParam().resource, &limit, nullptr), 0);
+    }
+
+    void SendLargeReports(int count) const {
+        for (int i = 0; i < count; ++i) {
+            Service::Send(R"({"eventID":"B2","value":)" + m_arrayOfTwoThousand + "}");
+            Service::Send(R"({"eventID":"A759|2","value":{"list":)" + m_arrayOfTwoThousand + "}}");
+        }
+    }
+
+    bool HasRefusedAtTheReceiver() const {
+        return m_service.Output().find("Std exception: std::bad_alloc\n") != std::string::npos;
+    }
+
+    bool HasRefusedAtTheParser() const {
+        return m_service.Log().find(":164 JsonToStruct] Std exception :std::bad_alloc") != std::string::npos;
+    }
+
+    /// Reports come until there is no memory to take another one.
+    void FillTheMemory() {
+        EXPECT_TRUE(WaitUntil([&] { return SendLargeReports(50), HasRefusedAtTheReceiver(); }));
+    }
+
+    /// A report that is sent while memory is short may be lost, so it is sent until it is stored.
+    void SendAndAwaitARow() {
+        const std::string eventID = "marker" + std::to_string(++m_markers);
+        EXPECT_TRUE(WaitUntil([&] {
+            Service::Send(R"({"eventID":")" + eventID + "\"}");
+            return WaitUntil([&] { return RowsOf(eventID) > 0; }, std::chrono::milliseconds(200));
+        }));
+    }
+
+    std::int64_t RowsOf(const std::string& eventID) const {
+        return m_service.Count(m_service.DatabaseFile(),
+                               "select count(*) from OperLog where eventID='" + eventID + "'");
+    }
+
+    Service m_service;
+    std::string m_arrayOfTwoThousand;
+    long m_limitKilobytes = 0;
+    int m_markers = 0;
+};
+
+} // namespace
+
+TEST_P(MemoryFault, ABacklogThatFillsTheMemoryCostsReportsAndNotTheService) {
+#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
+    GTEST_SKIP() << "a sanitizer's own memory takes the addresses, and it ends the program without them";
+#endif
+    const pid_t process = m_service.Process();
+    SetLimit();
+    {
+        SQLite::Database other(m_service.DatabaseFile(), SQLite::OPEN_READWRITE);
+        other.exec("begin immediate"); // the store waits for it, and the queue grows
+        FillTheMemory();
+        other.exec("commit");
+    }
+    EXPECT_TRUE(WaitUntil([&] { return SendLargeReports(5), HasRefusedAtTheParser(); }));
+    SendAndAwaitARow();
+    EXPECT_TRUE(m_service.IsRunning());
+    EXPECT_EQ(m_service.Process(), process);
+    EXPECT_EQ(m_service.Log().find("OnStackCallBack"), std::string::npos);
+
+    constexpr long FREED_KILOBYTES = 1024; // the least: what stays in use lies scattered
+    EXPECT_TRUE(WaitUntil([&] {
+        return Kilobytes(m_service, GetParam().usage) < m_limitKilobytes - FREED_KILOBYTES;
+    })) << Kilobytes(m_service, GetParam().usage)
+        << " of " << m_limitKilobytes << " KB are in use";
+    for (const char* suffix : {"", "-wal", "-shm"})
+        std::filesystem::remove(m_service.DatabaseFile() + suffix);
+    m_service.Install();
+    SendAndAwaitARow(); // for which SQLite maps the new file's memory
+}
+
+INSTANTIATE_TEST_SUITE_P(AtALimitOf, MemoryFault,
+                         ::testing::Values(Limit{"Addresses", RLIMIT_AS, "VmSize"},
+                                           Limit{"Data", RLIMIT_DATA, "VmData"}),
+                         [](const auto& test) { return test.param.name; });
