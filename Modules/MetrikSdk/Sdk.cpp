@@ -9,12 +9,13 @@
 namespace MetrikSdk {
 namespace {
 
-/// A module's texts come from datagrams of 10 KiB, and every module's stay in memory. Longer ones are cut; no
-/// honest module has one.
-constexpr std::size_t MAX_IDENTITY_BYTES = 256;
+/// A module's texts come from datagrams of 10 KiB, and every module's id stays in memory. Longer ones are cut; no honest
+/// module has one.
+constexpr std::size_t MAX_ID_BYTES = 64;
+constexpr std::size_t MAX_TEXT_BYTES = 256; ///< Of a version or a name.
 
-std::string Cut(const std::string& identity) {
-    return std::string(SystemTool::Text::CutUtf8(identity, MAX_IDENTITY_BYTES));
+std::string Cut(const std::string& text, std::size_t maxBytes) {
+    return std::string(SystemTool::Text::CutUtf8(text, maxBytes));
 }
 
 void Call(IMetrikSdk::Callback callback, const std::string& what, const std::string& detail) {
@@ -33,7 +34,7 @@ std::string Sdk::GetSdkVersion() {
 
 std::int64_t Sdk::GetPendingCount() {
     try {
-        return m_engine ? m_engine->Events().Status().waiting : -1;
+        return m_membership ? Events().Status().waiting : -1;
     } catch (const std::exception&) { // told already
         return -1;
     }
@@ -43,10 +44,9 @@ bool Sdk::InitSdk(std::string moduleId, std::string moduleVersion, std::string m
                   std::string /*logDir*/, std::string dbDir, Callback onFailure, Callback onSuccess) {
     try {
         Detach();
-        m_module = {Cut(moduleId), Cut(moduleVersion), Cut(moduleName)};
-        m_onFailure = onFailure;
-        m_onSuccess = onSuccess;
-        return Attach(dbDir);
+        m_id = Cut(moduleId, MAX_ID_BYTES);
+        return Attach(dbDir, {nullptr, onFailure, onSuccess, Cut(moduleVersion, MAX_TEXT_BYTES),
+                              Cut(moduleName, MAX_TEXT_BYTES)});
     } catch (const std::exception& error) {
         TellInitFailure(onFailure, error.what());
         return false;
@@ -61,61 +61,61 @@ void Sdk::TellInitFailure(Callback onFailure, const char* reason) noexcept {
     }
 }
 
-bool Sdk::Attach(const std::string& dbDir) {
+bool Sdk::Attach(const std::string& dbDir, process::Membership module) {
     std::string refusal;
-    m_engine = m_registry.Acquire(dbDir, refusal);
-    TellDirectory(refusal);
-    if (!m_engine)
+    module.engine = m_registry.Acquire(dbDir, refusal);
+    TellDirectory(module.onFailure, module.engine != nullptr, refusal);
+    if (!module.engine)
         return false;
-    m_engine->Listeners().Subscribe(m_onFailure, m_onSuccess);
-    if (!m_engine->Open() && !MovesToTheFirst())
+    m_membership = m_registry.Members().Join(std::move(module));
+    if (!m_membership->engine->Open() && !MovesToTheFirst())
         return false;
-    Call(m_onSuccess, "init", m_module.id);
+    Call(m_membership->onSuccess, "init", m_id);
     return true;
 }
 
 /// What became of the directory that the module gave, when it is not used.
-void Sdk::TellDirectory(const std::string& refusal) {
-    if (m_engine && refusal.empty())
+void Sdk::TellDirectory(Callback onFailure, bool hasOutbox, const std::string& refusal) {
+    if (hasOutbox && refusal.empty())
         return;
     const auto text = refusal.empty()
                           ? m_registry.ReportNoDirectory()
                           : m_registry.Report(report::Cause::Directory,
-                                              refusal + (m_engine ? "; the module uses the first outbox"
-                                                                  : "; events of this module are refused"));
+                                              refusal + (hasOutbox ? "; the module uses the first outbox"
+                                                                   : "; events of this module are refused"));
     if (text)
-        Call(m_onFailure, NameOf(report::Cause::Directory), *text);
+        Call(onFailure, NameOf(report::Cause::Directory), *text);
 }
 
 /// Leaves an outbox whose directory turned unsafe after it was announced for the first outbox. Whether it did.
 bool Sdk::MovesToTheFirst() {
-    if (!m_engine || !m_engine->Events().IsUnsafe())
+    if (!m_membership || !Events().IsUnsafe())
         return false;
     auto first = m_registry.Acquire({});
-    const bool isAnother = first && first != m_engine;
-    if (isAnother) {
-        Detach();
-        m_engine = std::move(first);
-        m_engine->Listeners().Subscribe(m_onFailure, m_onSuccess);
-    } else {
+    if (!first || first == m_membership->engine) {
         m_registry.Release(first);
+        return false;
     }
-    return isAnother && m_engine->Open();
+    auto module = *m_membership;
+    module.engine = std::move(first);
+    Detach();
+    m_membership = m_registry.Members().Join(std::move(module));
+    return m_membership->engine->Open();
 }
 
 void Sdk::Detach() {
-    if (!m_engine)
-        return;
-    m_engine->Listeners().Unsubscribe(m_onFailure, m_onSuccess);
-    m_registry.Release(m_engine);
+    if (m_membership)
+        m_registry.Members().Leave(m_membership);
+}
+
+bool Sdk::Store(const std::string& eventId, const std::string& eventJson) {
+    return m_membership &&
+           Events().Append({m_id, m_membership->version, m_membership->name}, eventId, eventJson);
 }
 
 bool Sdk::ReportEvent(std::string eventId, std::string eventJson) {
     try {
-        const auto store = [&] {
-            return m_engine && m_engine->Events().Append(m_module, eventId, eventJson);
-        };
-        return store() || (MovesToTheFirst() && store());
+        return Store(eventId, eventJson) || (MovesToTheFirst() && Store(eventId, eventJson));
     } catch (const std::exception&) { // out of memory: nothing was stored, and there is none to tell it with
         return false;
     }

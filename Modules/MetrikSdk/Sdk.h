@@ -33,17 +33,18 @@ public:
     bool ReportEvent(std::string eventId, std::string eventJson) override;
 
 private:
-    bool Attach(const std::string& dbDir);
-    void TellDirectory(const std::string& refusal);
+    bool Attach(const std::string& dbDir, process::Membership module);
+    void TellDirectory(Callback onFailure, bool hasOutbox, const std::string& refusal);
     bool MovesToTheFirst();
     void Detach();
+    bool Store(const std::string& eventId, const std::string& eventJson);
+    outbox::Outbox& Events() const { return m_membership->engine->Events(); }
     void TellInitFailure(Callback onFailure, const char* reason) noexcept;
 
     process::OutboxRegistry& m_registry;
-    std::shared_ptr<process::OutboxEngine> m_engine; ///< Null before InitSdk, and without any directory.
-    ModuleIdentity m_module;
-    Callback m_onFailure = nullptr;
-    Callback m_onSuccess = nullptr;
+    std::shared_ptr<const process::Membership>
+        m_membership; ///< Null before InitSdk, and without any directory.
+    std::string m_id;
 };
 
 } // namespace MetrikSdk

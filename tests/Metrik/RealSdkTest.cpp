@@ -1,5 +1,7 @@
 #include <cstdlib>
 #include <filesystem>
+#include <iostream>
+#include <optional>
 #include <set>
 
 #include <SQLiteCpp/SQLiteCpp.h>
@@ -10,6 +12,10 @@
 #include "Metrik/MetrikMgr.h"
 #include "tests/fakes/FakeLogger.h"
 #include "tests/support/TemporaryDirectory.h"
+
+// Of the program's heap, where there is one.
+extern "C" int mallctl(const char* name, void* old, std::size_t* oldSize, void* fresh, std::size_t freshSize)
+    __attribute__((weak));
 
 using namespace SyncServiceReport;
 using ::testing::ElementsAre;
@@ -91,6 +97,58 @@ TEST_F(RealSdk, ManyModulesCostNeitherFilesNorThreads) {
     EXPECT_EQ(ThreadCount(), threads);
     EXPECT_TRUE(Send("../A7'; drop table event; --|1"));
     EXPECT_THAT(Outbox("select event_id from event"), ElementsAre("../A7'; drop table event; --|1"));
+}
+
+namespace {
+
+/// Each with an id, a version and a name of its own, and longer than any honest one.
+class ModulesOfLongTexts : public RealSdk {
+protected:
+    static constexpr std::size_t ID_BYTES = 1000;
+
+    /// Of the program's heap; none in a build that has another heap.
+    static std::optional<std::size_t> AllocatedBytes() {
+        if (::mallctl == nullptr)
+            return std::nullopt;
+        std::uint64_t epoch = 1; // figures are those of the last epoch
+        std::size_t bytes = 0;
+        std::size_t size = sizeof bytes;
+        ::mallctl("epoch", nullptr, nullptr, &epoch, sizeof epoch);
+        ::mallctl("stats.allocated", &bytes, &size, nullptr, 0);
+        return bytes;
+    }
+
+    void Announce(std::size_t modules) {
+        for (std::size_t i = 0; i < modules; ++i) {
+            const auto number = std::to_string(i);
+            ST_InitMsg msg;
+            msg.moduleID = msg.moduleVersion = msg.moduleName =
+                number + std::string(ID_BYTES - number.size(), 'm');
+            m_mgr.AddWorker(msg);
+            FakeLogger().Clear();
+        }
+    }
+
+    static std::size_t ModulesToAnnounce() {
+        const char* modules = std::getenv("SSR_MODULES");
+        return modules == nullptr ? 5'000 : std::stoul(modules);
+    }
+};
+
+} // namespace
+
+TEST_F(ModulesOfLongTexts, CostLittleMoreThanTheirIds) {
+    constexpr std::size_t FOR_A_HUNDRED_THOUSAND = std::size_t{64} << 20;
+    constexpr std::size_t HOWEVER_MANY = std::size_t{1} << 20; // the first thousand versions and names
+    const auto before = AllocatedBytes();
+    if (!before)
+        GTEST_SKIP() << "the figures are those of the program's own heap";
+    const auto modules = ModulesToAnnounce();
+    Announce(modules);
+    const auto bytes = *AllocatedBytes() - *before - modules * ID_BYTES;
+    std::cout << bytes / modules << " bytes a module\n";
+    EXPECT_LT(bytes, modules < 100'000 ? FOR_A_HUNDRED_THOUSAND / 100'000 * modules + HOWEVER_MANY
+                                       : FOR_A_HUNDRED_THOUSAND / 100'000 * modules);
 }
 
 TEST_F(RealSdk, AModuleWithARelativeDirectoryUsesTheFirstOne) {

@@ -17,6 +17,9 @@ namespace {
 /// Row and b-tree overhead of an event, roughly, so that a million empty events do not count as nothing.
 constexpr std::size_t ROW_OVERHEAD_BYTES = 80;
 
+/// Modules whose keys are kept in memory. Any more are looked up for their next event.
+constexpr std::size_t MAX_KNOWN_MODULES = 1000;
+
 std::int64_t Number(SQLite::Database& database, const char* query) {
     return database.execAndGet(query).getInt64();
 }
@@ -122,8 +125,11 @@ std::size_t OutboxStore::Store(const ModuleIdentity& module, const NewEvent& eve
 }
 
 OutboxStore::ReleaseKeys OutboxStore::KeysOf(const ModuleIdentity& module) {
-    const auto known = m_keys.find(module);
-    return known != m_keys.end() ? known->second : m_keys.emplace(module, AddRelease(module)).first->second;
+    if (const auto known = m_keys.find(module); known != m_keys.end())
+        return known->second;
+    if (m_keys.size() >= MAX_KNOWN_MODULES)
+        m_keys.clear();
+    return m_keys.emplace(module, AddRelease(module)).first->second;
 }
 
 OutboxStore::ReleaseKeys OutboxStore::AddRelease(const ModuleIdentity& module) {

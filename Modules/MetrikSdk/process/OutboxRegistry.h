@@ -8,6 +8,7 @@
 #include <string>
 
 #include "Modules/MetrikSdk/otlp/EndpointConfig.h"
+#include "Modules/MetrikSdk/process/Memberships.h"
 #include "Modules/MetrikSdk/process/OutboxEngine.h"
 #include "Modules/MetrikSdk/report/FailureReporter.h"
 
@@ -39,6 +40,9 @@ public:
     /// The same; `refusal` tells why it is not the outbox of `directory`, when that must not be used.
     std::shared_ptr<OutboxEngine> Acquire(const std::string& directory, std::string& refusal);
 
+    /// The modules that use the outboxes.
+    Memberships& Members() { return m_members; }
+
     /// Gives `engine` up. The last user's call stops its uploader before it returns; nobody can open the same
     /// file meanwhile.
     void Release(std::shared_ptr<OutboxEngine>& engine);
@@ -61,6 +65,7 @@ private:
     std::shared_ptr<report::FailureReporter> m_reporter; ///< Shared by all outboxes.
     std::string m_firstDirectory;
     std::map<std::string, std::weak_ptr<OutboxEngine>> m_engines; ///< By canonical directory.
+    Memberships m_members{*this};                                 ///< Guards itself, and is entered first.
 };
 
 } // namespace MetrikSdk::process
