@@ -1,7 +1,7 @@
 #pragma once
 
-// What every source file of the service but the UDP receiver includes. The order is also the order in which a
-// source file's statics are built: the plain constants, the logger, the constants that ask the system.
+// What every source file of the service that logs includes. The order of these headers is also the order in which the
+// statics of a source file are built: the plain constants, the logger, the constants that ask the system.
 #include "Common/Constants.h"
 #include "Common/Logger.h"
 

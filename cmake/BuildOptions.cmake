@@ -1,5 +1,6 @@
-# What every target of ours is built with. Targets ask for it by linking ssr_options; nothing is set globally
-# but the language level and visibility, which a static library and its users must agree on.
+# What every target of ours is built with. A target gets the warnings, the sanitizers and the hardening by linking
+# ssr_options. Set for all targets is only what a static library and its users must agree on (the language level, position
+# independence, visibility) and what concerns the build itself (the build type, ccache, compile_commands.json).
 set(CMAKE_CXX_STANDARD 20)
 set(CMAKE_CXX_STANDARD_REQUIRED ON)
 set(CMAKE_CXX_EXTENSIONS OFF)

@@ -1,8 +1,9 @@
 # ssr_add_plugin(<target> <library name> <source>...)
 #
 # A plug-in is a shared library that is opened at run time by its exact file name, lib<name>.dylib on every
-# platform. It exports CreateModule and DestoryModule and nothing else, so that two plug-ins that link the same
-# static library never share state by accident and closing one really unloads it.
+# platform. It exports CreateModule and DestoryModule and nothing else, so that two plug-ins that link the same static
+# library never share state by accident. Whether it stays in memory when it is closed is each plug-in's own choice, with
+# the reason in its CMakeLists.txt.
 function(ssr_add_plugin target name)
     add_library(${target} MODULE ${ARGN})
     target_link_libraries(${target} PRIVATE ssr_options ssr_package_note)

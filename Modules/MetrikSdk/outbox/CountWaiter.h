@@ -10,20 +10,20 @@
 
 namespace MetrikSdk::outbox {
 
-/// Wakes one waiting thread when a number has grown far enough for it. Ringing costs the other threads one
-/// atomic read unless somebody waits for just that.
+/// Wakes one waiting thread when a count has grown far enough for it. Threads: Set and Stop by any, Await by one. As long
+/// as the waiting thread needs no waking, Set takes no lock: it writes one atomic number and reads another.
 class CountWaiter {
 public:
     static constexpr std::int64_t NEVER = std::numeric_limits<std::int64_t>::max();
 
-    /// The number is now `value`.
+    /// The count is now `value`.
     void Set(std::int64_t value) {
         m_value = value;
         if (value >= m_wanted)
             Notify();
     }
 
-    /// No wait lasts from now on.
+    /// From now on, Await returns at once.
     void Stop() {
         m_stopped = true;
         Notify();
@@ -31,10 +31,10 @@ public:
 
     bool Stopped() const { return m_stopped; }
 
-    /// Returns when the number is at least `wanted`, at `deadline`, or after Stop.
+    /// Returns when the count is at least `wanted`, at `deadline`, or after Stop.
     void Await(std::int64_t wanted, SteadyTime deadline) {
         std::unique_lock lock(m_mutex);
-        m_wanted = wanted; // before the number is read: Set writes and reads in the opposite order
+        m_wanted = wanted; // before the count is read: Set writes and reads in the opposite order
         m_wake.wait_until(lock, deadline, [&] { return m_stopped || m_value >= wanted; });
         m_wanted = NEVER;
     }
@@ -48,7 +48,8 @@ private:
     std::atomic<std::int64_t> m_value = 0;
     std::atomic<std::int64_t> m_wanted = NEVER;
     std::atomic<bool> m_stopped = false;
-    std::mutex m_mutex; ///< Guards nothing but the moment between the waiter's check and its wait.
+    std::mutex
+        m_mutex; ///< Held by the waiter between its check and its wait, so that Notify cannot fall between.
     std::condition_variable m_wake;
 };
 

@@ -32,18 +32,30 @@ bool HasLoneQuote(const std::string& text) {
     return false;
 }
 
-/// What the store is told, the service puts into its SQL as it is. `consequence`: what is lost.
+/// What becomes of a text that goes into the SQL of the store, and what the sender can do about a quote in it.
+struct InTheStore {
+    const char* loss;
+    const char* advice;
+};
+
+constexpr InTheStore OF_A_REPORT{"the database would reject the report", "Write the quote twice: ''"};
+
+/// The user's texts go to analytics too, and there each quote of two is kept.
+constexpr InTheStore OF_THE_USER{"the database would reject every report while it is set",
+                                 "Written twice it is stored as one quote, and goes to analytics as two"};
+
+/// The service puts these texts into its SQL as they are.
 void JudgeForStore(Judgement& judgement, const std::string& name, const std::string& text,
-                   const std::string& consequence) {
+                   const InTheStore& store) {
     if (HasLoneQuote(text))
         judgement.errors.push_back(fmt::format("its {} holds a single quote. The service puts the text into "
-                                               "its SQL as it is, and {}. Write the quote twice: ''",
-                                               name, consequence));
+                                               "its SQL as it is, and {}. {}",
+                                               name, store.loss, store.advice));
     if (text.find('\0') != std::string::npos)
         judgement.errors.push_back(
             fmt::format("its {} holds a zero character (\\u0000). The service puts the "
                         "text into its SQL as it is, and {}",
-                        name, consequence));
+                        name, store.loss));
 }
 
 /// As the service reads it, but for the zeros that it appends to seconds.
@@ -51,10 +63,18 @@ std::string ValueText(const JsonDocument& value) {
     return value.IsObject() ? value.ToJson() : value.ToString();
 }
 
+bool IsNumber(const std::string& text) {
+    return std::all_of(text.begin(), text.end(), [](char c) { return c >= '0' && c <= '9'; });
+}
+
 void JudgeTime(Judgement& judgement, const std::string& time) {
     if (time.empty())
         judgement.warnings.emplace_back("it has no createTime; the service keeps an empty one");
-    else if (!std::all_of(time.begin(), time.end(), [](char c) { return c >= '0' && c <= '9'; }) ||
+    else if (time.size() == Wire::SECONDS_LENGTH && !IsNumber(time))
+        judgement.warnings.emplace_back(
+            "its createTime has ten characters that are not ten digits; the service "
+            "takes it for seconds and appends 000");
+    else if (!IsNumber(time) ||
              (time.size() != Wire::SECONDS_LENGTH && time.size() != DIGITS_OF_MILLISECONDS))
         judgement.warnings.emplace_back("its createTime has neither ten digits (seconds since 1970) nor "
                                         "thirteen (milliseconds); the service keeps it as it is");
@@ -100,7 +120,15 @@ void JudgeReport(Judgement& judgement, const JsonDocument& report) {
         return;
     }
     for (const auto& [name, text] : {std::pair{"event id", eventID}, {"value", value}, {"createTime", time}})
-        JudgeForStore(judgement, name, text, "the database would reject the report");
+        JudgeForStore(judgement, name, text, OF_A_REPORT);
+}
+
+void JudgeUserText(Judgement& judgement, const std::string& name, const std::string& text) {
+    JudgeForStore(judgement, name, text, OF_THE_USER);
+    if (Contains(text, "''") && !HasLoneQuote(text))
+        judgement.warnings.push_back(fmt::format("its {} holds a single quote written twice: it is stored as "
+                                                 "one quote, and goes to analytics as two",
+                                                 name));
 }
 
 void JudgeUser(Judgement& judgement, const JsonDocument& exdata) {
@@ -111,9 +139,8 @@ void JudgeUser(Judgement& judgement, const JsonDocument& exdata) {
                                         "only together with an openID");
     if (openID.empty())
         return;
-    constexpr auto CONSEQUENCE = "the database would reject every report while it is set";
-    JudgeForStore(judgement, "openID", openID, CONSEQUENCE);
-    JudgeForStore(judgement, "hublinkVersion", version, CONSEQUENCE);
+    JudgeUserText(judgement, "openID", openID);
+    JudgeUserText(judgement, "hublinkVersion", version);
 }
 
 void JudgeInit(Judgement& judgement, const JsonDocument& exdata) {

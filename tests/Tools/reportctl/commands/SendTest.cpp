@@ -116,7 +116,8 @@ TEST_F(Send, SendsNothingThatTheServiceWouldNotUse) {
     EXPECT_EQ(outcome.exitCode, 1);
     EXPECT_EQ(outcome.output,
               "error: its openID holds a single quote. The service puts the text into its SQL as it is, and "
-              "the database would reject every report while it is set. Write the quote twice: ''\n"
+              "the database would reject every report while it is set. Written twice it is stored as one "
+              "quote, and goes to analytics as two\n"
               "error: nothing was sent. With --anyway it is sent as it is\n");
     EXPECT_TRUE(listener.IsEmpty());
 }
