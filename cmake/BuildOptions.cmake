@@ -45,7 +45,13 @@ if(SSR_SANITIZE)
         $<$<STREQUAL:$<TARGET_PROPERTY:TYPE>,EXECUTABLE>:$<TARGET_OBJECTS:ssr_sanitizer_options>>)
 endif()
 
-if(NOT SSR_SANITIZE AND NOT CMAKE_BUILD_TYPE STREQUAL "Debug")
+if(SSR_COVERAGE)
+    # Counted with atomic operations: several threads run the same lines.
+    target_compile_options(ssr_options INTERFACE --coverage -fprofile-update=atomic)
+    target_link_options(ssr_options INTERFACE --coverage)
+endif()
+
+if(NOT SSR_SANITIZE AND NOT SSR_COVERAGE AND NOT CMAKE_BUILD_TYPE STREQUAL "Debug")
     set(SSR_HARDENED TRUE)
     include(Hardening)
 endif()
