@@ -45,25 +45,15 @@ private:
 };
 
 TEST_F(SendJudgement, LetsPassWhatTheServiceTakes) {
-    for (const auto& text : {Report("B100|10001"),
-                             Report("B"),
-                             Report("a1", "5"),
-                             Report("|x", "[1]"),
-                             Report("x|y|z", "null"),
-                             Report("B", R"("it''s, '''' and ''")"),
-                             Report("B", R"({"a":"it''s","b":"\u0000"})"),
-                             Report("A1|2"),
-                             Report("A1|2", "null"),
-                             Report("A1|2", "{}"),
-                             Report("A1|2", R"("{\"a\":1}")"),
-                             Report("A1|2", R"("null")"),
-                             Report("A1|it's", R"({"a":"it's"})"),
-                             Report("A|"),
-                             Control("init", R"("moduleID":"A1")"),
-                             Control("init", R"("moduleID":"A1","moduleName":"it's")"),
-                             Control("updateOpenID", R"("openID":5)"),
-                             std::string(R"({"eventID":"B","createTime":"1700000000123"})"),
-                             Report("B", "\"" + std::string(10'240 - Report("B").size(), 'x') + "\"")})
+    for (const auto& text :
+         {Report("B100|10001"), Report("B"), Report("a1", "5"), Report("|x", "[1]"), Report("x|y|z", "null"),
+          Report("B", R"("it''s, '''' and ''")"), Report("B", R"({"a":"it''s","b":"\u0000"})"),
+          Report("A1|2"), Report("A1|2", "null"), Report("A1|2", "{}"), Report("A1|2", R"("{\"a\":1}")"),
+          Report("A1|2", R"("null")"), Report("A1|it's", R"({"a":"it's"})"), Report("A|"),
+          Control("init", R"("moduleID":"A1")"), Control("init", R"("moduleID":"A1","moduleName":"it's")"),
+          Control("updateOpenID", R"("openID":5)"),
+          std::string(R"({"eventID":"B","createTime":"1700000000123"})"),
+          Report("B", "\"" + std::string(10'240 - Report("B").size(), 'x') + "\"")})
         ExpectGood(text);
 }
 
