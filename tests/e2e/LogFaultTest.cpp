@@ -7,6 +7,7 @@
 #include <gtest/gtest.h>
 
 #include "tests/e2e/support/Disk.h"
+#include "tests/e2e/support/FileSizeLimit.h"
 #include "tests/e2e/support/Ledger.h"
 #include "tests/support/WaitUntil.h"
 
@@ -167,6 +168,22 @@ TEST_F(LogFault, ALogThatCannotBeOpenedAtTheStartBeginsWhenItCan) {
     disk.AllowWriting();
     ExpectToGoOn();
     EXPECT_EQ(Matches("records could not be written: cannot open the file: Read-only file system"), 1);
+}
+
+TEST_F(LogFault, AFileSizeLimitDoesNotEndTheService) {
+    constexpr rlim_t LIMIT = 1'000'000;
+    m_service.Install();
+    {
+        const FileSizeLimit limit(LIMIT); // which the service inherits
+        m_service.Start();
+    }
+    for (int i = 0; i < 300; ++i)
+        Service::Send(std::string(10'000, 'x'));
+    const auto rotated = m_service.DataDirectory() + "/hublink/log/metrik/Report_2.log";
+    EXPECT_TRUE(WaitUntil([&] { return std::filesystem::exists(rotated) || !m_service.IsRunning(); }));
+    EXPECT_TRUE(m_service.IsRunning());
+    EXPECT_LE(std::filesystem::file_size(rotated), LIMIT);
+    EXPECT_GE(std::filesystem::file_size(rotated), LIMIT - 11'000);
 }
 
 TEST_F(LogFault, ADiskThatIsFullForLogAndStoreCostsReportsWithoutATrace) {

@@ -1,3 +1,4 @@
+#include <csignal>
 #include <filesystem>
 #include <fstream>
 #include <ostream>
@@ -7,6 +8,7 @@
 #include <gtest/gtest.h>
 
 #include "tests/e2e/support/Disk.h"
+#include "tests/e2e/support/FileSizeLimit.h"
 #include "tests/e2e/support/Ledger.h"
 #include "tests/support/WaitUntil.h"
 
@@ -155,6 +157,17 @@ TEST_F(StoreFault, ADeletedStoreCostsWhatWasInItAndWhatComesUntilSetUpMakesAnoth
     m_service.Install();
     ExpectToGoOn();
     ExpectEachStoredOrLogged("unable to open database file", first);
+}
+
+TEST_F(StoreFault, AFileSizeLimitEndsTheServiceWhenTheStoreReachesIt) {
+    m_service.Install();
+    {
+        const FileSizeLimit limit(1'000'000); // which the service inherits
+        m_service.Start();
+    }
+    for (int i = 0; i < 300; ++i)
+        Service::Send(R"({"eventID":"B1","value":")" + std::string(10'000, 'x') + "\"}");
+    EXPECT_EQ(m_service.AwaitEnd(), -SIGXFSZ);
 }
 
 TEST_F(StoreFault, TheStatementsInTheLogBringTheLostReportsBack) {
