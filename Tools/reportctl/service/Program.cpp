@@ -29,7 +29,7 @@ std::string ServiceLine() {
 
 std::string ProgramPath() {
     const auto here = SystemTool::IO::Directory::GetExcutableDirectory();
-    for (const auto& folder : {here, here + SSR_PROGRAMS_FROM_BIN + "/"}) {
+    for (const auto& folder : {here + SSR_PROGRAMS_FROM_BIN + "/", here}) {
         std::error_code error;
         if (std::filesystem::is_regular_file(folder + NAME, error))
             return std::filesystem::path(folder + NAME).lexically_normal().string();

@@ -5,7 +5,7 @@
 /// The service's program, as it is installed with this reportctl.
 namespace reportctl::service {
 
-/// Its path: beside reportctl, as in a build, or where the installation puts it. Empty when it is at neither place.
+/// Its path: where the installation puts it, or beside reportctl, as in a build. Empty when it is at neither place.
 std::string ProgramPath();
 
 /// For --version: a line for reportctl and one for the service, whose version is read from its file. Running it would
