@@ -76,6 +76,7 @@ Result TakeValue(wire::Report& report, const Value& value, bool isForAnalytics) 
     const wire::JsonFacts facts = wire::ReadJson(report.value);
     if (!facts.isJson)
         return facts.levels == wire::MAX_LEVELS ? Result::TooLong : Result::InvalidJson;
+    report.isCompact = facts.isCompact;
     report.form = isForAnalytics ? wire::ValueForm::Json : FormForStore(facts);
     return isForAnalytics && !IsFitForAnalytics(facts) ? Result::InvalidJson : Result::Sent;
 }

@@ -1,18 +1,20 @@
 #include "wire/Json.h"
 
 #include <algorithm>
-#include <bitset>
+#include <array>
+#include <cstdint>
+
+#include "wire/ByteSet.h"
 
 namespace hublink::wire {
 namespace {
 
-constexpr std::string_view WHITE_SPACE = " \t\r\n";
+constexpr ByteSet WHITE_SPACE(" \t\r\n");
+constexpr ByteSet STRING_STOPS = ByteSet("\"\\").AndControls();
+constexpr ByteSet QUOTES_AND_ESCAPES("'\\");
+constexpr ByteSet SPACE_AND_STRINGS(" \t\r\n\"");
 constexpr std::string_view ESCAPED_QUOTE = "\\u0027";
 constexpr std::size_t UNIT_LENGTH = ESCAPED_QUOTE.size();
-
-bool IsSpace(char c) {
-    return c == ' ' || c == '\t' || c == '\r' || c == '\n';
-}
 
 int HexDigit(char c) {
     if (c >= '0' && c <= '9')
@@ -51,12 +53,11 @@ std::size_t EscapeLength(std::string_view text) {
 
 /// The length of the string at the start of the text, quotes included; 0 when there is none.
 std::size_t StringLength(std::string_view text) {
-    for (std::size_t at = 1; at < text.size();) {
+    for (std::size_t at = STRING_STOPS.FindIn(text, 1); at < text.size();
+         at = STRING_STOPS.FindIn(text, at)) {
         if (text[at] == '"')
             return at + 1;
-        if (static_cast<unsigned char>(text[at]) < 0x20)
-            return 0;
-        const std::size_t length = text[at] == '\\' ? EscapeLength(text.substr(at)) : 1;
+        const std::size_t length = text[at] == '\\' ? EscapeLength(text.substr(at)) : 0;
         if (length == 0)
             return 0;
         at += length;
@@ -64,7 +65,28 @@ std::size_t StringLength(std::string_view text) {
     return 0;
 }
 
-/// One pass over a text. Which kind each open level is stands in a bit, so that depth costs no stack.
+/// A bit for each level. Only those that are used cost anything, which is why it is no std::bitset.
+// NOLINTNEXTLINE(cppcoreguidelines-pro-type-member-init): a word is written when its first level is
+class Levels {
+public:
+    void Set(std::size_t level, bool value) {
+        std::uint64_t& word = m_words[level / WORD_BITS];
+        const std::uint64_t bit = std::uint64_t{1} << (level % WORD_BITS);
+        if (bit == 1)
+            word = 0;
+        word = value ? word | bit : word & ~bit;
+    }
+    bool operator[](std::size_t level) const {
+        return (m_words[level / WORD_BITS] >> (level % WORD_BITS) & 1) != 0;
+    }
+
+private:
+    static constexpr std::size_t WORD_BITS = 64;
+
+    std::array<std::uint64_t, MAX_LEVELS / WORD_BITS> m_words;
+};
+
+/// One pass over a text, which does not recurse however deep its levels are.
 class Reader {
 public:
     explicit Reader(std::string_view text) : m_rest(text) {}
@@ -82,7 +104,10 @@ public:
 private:
     char Next() const { return m_rest.empty() ? '\0' : m_rest.front(); }
 
-    void SkipSpace() { m_rest.remove_prefix(std::min(m_rest.find_first_not_of(WHITE_SPACE), m_rest.size())); }
+    void SkipSpace() {
+        for (; !m_rest.empty() && WHITE_SPACE.Has(m_rest.front()); m_facts.isCompact = false)
+            m_rest.remove_prefix(1);
+    }
 
     bool Take(std::size_t length) {
         m_rest.remove_prefix(length);
@@ -128,7 +153,7 @@ private:
     bool Open(bool isObject) {
         if (m_open == MAX_LEVELS)
             return false;
-        m_isObject[m_open++] = isObject;
+        m_isObject.Set(m_open++, isObject);
         m_facts.levels = std::max(m_facts.levels, m_open);
         m_isBegun = true;
         return Take(1);
@@ -153,7 +178,7 @@ private:
 
     std::string_view m_rest;
     JsonFacts m_facts;
-    std::bitset<MAX_LEVELS> m_isObject;
+    Levels m_isObject;
     std::size_t m_open = 0;
     bool m_isBegun = false; ///< The innermost level has no value yet.
 };
@@ -162,16 +187,12 @@ private:
 template <typename Take>
 void ForEachPart(std::string_view json, Take take) {
     while (!json.empty()) {
-        std::size_t length = 1;
-        if (json.front() == '"')
-            length = StringLength(json);
-        else
-            while (length < json.size() && json[length] != '"' && !IsSpace(json[length]))
-                ++length;
-        if (!IsSpace(json.front()))
+        const char first = json.front();
+        const std::size_t length = WHITE_SPACE.Has(first) ? 1
+                                   : first == '"'         ? StringLength(json)
+                                                          : SPACE_AND_STRINGS.FindIn(json, 1);
+        if (!WHITE_SPACE.Has(first))
             take(json.substr(0, length));
-        else
-            length = std::max<std::size_t>(1, std::min(json.find_first_not_of(WHITE_SPACE), json.size()));
         json.remove_prefix(length);
     }
 }
@@ -179,7 +200,7 @@ void ForEachPart(std::string_view json, Take take) {
 /// A part with each quote written twice, whether it stands there as itself or as an escape.
 void AppendQuotesDoubled(Buffer& buffer, std::string_view part) {
     while (!part.empty()) {
-        const auto at = std::min(part.find_first_of("'\\"), part.size());
+        const std::size_t at = QUOTES_AND_ESCAPES.FindIn(part);
         buffer.Append(part.substr(0, at));
         part.remove_prefix(at);
         if (part.empty())
@@ -197,7 +218,11 @@ JsonFacts ReadJson(std::string_view text) {
     return Reader(text).Read();
 }
 
-void AppendJson(Buffer& buffer, std::string_view json, Quotes quotes) {
+void AppendJson(Buffer& buffer, std::string_view json, Quotes quotes, bool isCompact) {
+    // What programs write has no white space and mostly no quote: then it is copied as it is.
+    const auto hasNone = [json](char c) { return json.find(c) == std::string_view::npos; };
+    if (isCompact && (quotes == Quotes::AsTheyAre || (hasNone('\'') && hasNone('\\'))))
+        return buffer.Append(json);
     ForEachPart(json, [&](std::string_view part) {
         if (quotes == Quotes::Doubled)
             AppendQuotesDoubled(buffer, part);

@@ -17,7 +17,7 @@ void AppendValue(Buffer& buffer, const Report& report) {
         return buffer.Append('"');
     case ValueForm::Json:
         buffer.Append(R"(,"value":)");
-        return AppendJson(buffer, report.value, report.quotes);
+        return AppendJson(buffer, report.value, report.quotes, report.isCompact);
     case ValueForm::JsonText:
         buffer.Append(R"(,"value":")");
         AppendJsonEscaped(buffer, report.value, report.quotes);

@@ -22,7 +22,8 @@ struct Report {
     ValueForm form = ValueForm::Nothing;
     std::string_view value;
     Quotes quotes = Quotes::AsTheyAre; ///< In the event id and the value.
-    std::string_view createTime;       ///< As JSON: a number, or a string.
+    bool isCompact = false;      ///< The value is JSON without white space; false when that is not known.
+    std::string_view createTime; ///< As JSON: a number, or a string.
     bool isDayReport = false;
 };
 

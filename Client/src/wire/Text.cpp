@@ -1,9 +1,10 @@
 #include "wire/Text.h"
 
-#include <array>
 #include <cstddef>
 #include <cstdint>
 #include <cstring>
+
+#include "wire/ByteSet.h"
 
 namespace hublink::wire {
 namespace {
@@ -48,15 +49,8 @@ std::size_t CharacterLength(std::string_view text) {
     return 0;
 }
 
-/// Which bytes stand in a JSON string of ours as something else.
-constexpr std::array<bool, 256> SpecialBytes() {
-    std::array<bool, 256> special{};
-    for (std::size_t control = 0; control < 0x20; ++control)
-        special[control] = true;
-    special['"'] = special['\\'] = special['\''] = true;
-    return special;
-}
-constexpr auto SPECIAL = SpecialBytes();
+/// What stands in a JSON string of ours as something else.
+constexpr ByteSet SPECIAL = ByteSet("\"\\'").AndControls();
 
 void AppendControl(Buffer& buffer, char c) {
     constexpr std::string_view DIGITS = "0123456789abcdef";
@@ -102,15 +96,14 @@ bool IsText(std::string_view text) {
 }
 
 void AppendEscaped(Buffer& buffer, std::string_view text, Quotes quotes) {
-    std::size_t begin = 0; // of a run of bytes that stand for themselves
-    for (std::size_t at = 0; at < text.size(); ++at) {
-        if (!SPECIAL[Byte(text[at])])
-            continue;
-        buffer.Append(text.substr(begin, at - begin));
-        AppendSpecial(buffer, text[at], quotes);
-        begin = at + 1;
+    for (;;) {
+        const std::size_t end = SPECIAL.FindIn(text);
+        buffer.Append(text.substr(0, end));
+        if (end == text.size())
+            return;
+        AppendSpecial(buffer, text[end], quotes);
+        text.remove_prefix(end + 1);
     }
-    buffer.Append(text.substr(begin));
 }
 
 } // namespace hublink::wire
