@@ -1,73 +1,65 @@
 #include "Tools/reportctl/send/Messages.h"
 
-#include <string_view>
-
-#include "Common/ServiceConstants.h"
-#include "Common/Wire.h"
+#include "Client/src/wire/Messages.h"
 #include "SystemTool/IO/JsonDocument.h"
+#include "SystemTool/Text/Utf8.h"
 
 namespace reportctl::send {
 namespace {
 
+namespace wire = hublink::wire;
 using SystemTool::IO::JsonDocument;
+using SystemTool::Text::ValidUtf8;
 
-JsonDocument Number(std::int64_t number) {
-    std::string error;
-    return JsonDocument().FromJson(std::to_string(number), error);
-}
-
-void SetValue(JsonDocument& report, const std::string& value) {
-    std::string error;
-    const JsonDocument parsed = JsonDocument().FromJson(value, error);
-    if (parsed.IsObject())
-        report.SetKeyValue("value", parsed);
-    else
-        report.SetKeyValue("value", value);
-}
-
-/// The service takes any text with these letters in it for a report. Escaped, they read the same.
-std::string WithoutTheMarkOfReports(std::string text) {
-    constexpr std::string_view MARK = Wire::REPORT_MARK;
-    for (auto at = text.find(MARK); at != std::string::npos; at = text.find(MARK, at))
-        text.replace(at, MARK.size(), "event\\u0049D");
-    return text;
-}
-
-std::string BuildControl(const std::string& msgType, const JsonDocument& exdata) {
-    JsonDocument message;
-    message.SetKeyValue(Wire::MESSAGE_KIND, msgType);
-    message.SetKeyValue(Wire::MESSAGE_DATA, exdata);
-    return WithoutTheMarkOfReports(message.ToJson());
+/// What the client library writes, in as much room as it may need; a library's own datagrams end where the service would cut
+/// them. `bytes`: of all texts that go in.
+template <typename Append>
+std::string Written(std::size_t bytes, Append append) {
+    constexpr std::size_t LONGEST_ESCAPE = 6; // of one byte, as in \u0001
+    constexpr std::size_t REST = 512;
+    std::string room(bytes * LONGEST_ESCAPE + REST, '\0');
+    wire::Buffer buffer(room.data(), room.size());
+    append(buffer);
+    return std::string(buffer.Text());
 }
 
 } // namespace
 
 std::string BuildReport(const Report& report) {
-    JsonDocument message;
-    message.SetKeyValue(Wire::REPORT_MARK, report.eventID);
-    SetValue(message, report.value);
-    message.SetKeyValue("createTime", Number(report.createTime));
-    message.SetKeyValue("isDayReport", Number(report.isDayReport ? 1 : 0));
-    return message.ToJson();
+    std::string error;
+    const JsonDocument parsed = JsonDocument().FromJson(report.value, error);
+    const std::string eventID = ValidUtf8(report.eventID);
+    const std::string value = parsed.IsObject() ? parsed.ToJson() : ValidUtf8(report.value);
+    const std::string time = std::to_string(report.createTime);
+    wire::Report message;
+    message.eventId = eventID;
+    message.form = parsed.IsObject() ? wire::ValueForm::Json : wire::ValueForm::Text;
+    message.value = value;
+    message.createTime = time;
+    message.isDayReport = report.isDayReport;
+    return Written(eventID.size() + value.size(),
+                   [&](wire::Buffer& buffer) { AppendReport(buffer, message); });
 }
 
 std::string BuildInit(const SyncServiceReport::ST_InitMsg& module) {
-    JsonDocument exdata;
-    exdata.SetKeyValue("moduleID", module.moduleID);
-    exdata.SetKeyValue("moduleVersion", module.moduleVersion);
-    exdata.SetKeyValue("moduleName", module.moduleName);
-    exdata.SetKeyValue("logPath", module.logPath);
-    exdata.SetKeyValue("dbPath", module.dbPath);
-    exdata.SetKeyValue("openID", module.openID);
-    exdata.SetKeyValue("hublinkVersion", module.hublinkVersion);
-    return BuildControl(SyncServiceReport::ORVEK_REPORT_MODULEINIT, exdata);
+    SyncServiceReport::ST_InitMsg texts = module;
+    std::size_t bytes = 0;
+    for (auto* text : {&texts.moduleID, &texts.moduleVersion, &texts.moduleName, &texts.logPath,
+                       &texts.dbPath, &texts.openID, &texts.hublinkVersion}) {
+        *text = ValidUtf8(*text);
+        bytes += text->size();
+    }
+    const wire::Announcement announcement{texts.moduleID,      texts.moduleVersion, texts.moduleName,
+                                          texts.logPath,       texts.dbPath,        texts.openID,
+                                          texts.hublinkVersion};
+    return Written(bytes, [&](wire::Buffer& buffer) { AppendAnnouncement(buffer, announcement); });
 }
 
 std::string BuildOpenIdUpdate(const std::string& openID, const std::string& suiteVersion) {
-    JsonDocument exdata;
-    exdata.SetKeyValue("openID", openID);
-    exdata.SetKeyValue("hublinkVersion", suiteVersion);
-    return BuildControl(SyncServiceReport::ORVEK_REPORT_UPDATEOPENID, exdata);
+    const std::string user = ValidUtf8(openID);
+    const std::string version = ValidUtf8(suiteVersion);
+    return Written(user.size() + version.size(),
+                   [&](wire::Buffer& buffer) { AppendUser(buffer, user, version); });
 }
 
 } // namespace reportctl::send
