@@ -8,11 +8,14 @@
 #include <pthread.h>
 #include <unistd.h>
 
-#include "Modules/BoostLogger/EscapedText.h"
 #include "SystemTool/Platform.h"
+#include "SystemTool/Text/EscapedText.h"
 #include "SystemTool/Text/Utf8.h"
 
 namespace BoostLogger {
+
+using SystemTool::Text::Append;
+using SystemTool::Text::AppendEscaped;
 
 namespace {
 

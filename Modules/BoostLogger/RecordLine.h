@@ -3,10 +3,13 @@
 #include <chrono>
 #include <cstddef>
 
-#include "Modules/BoostLogger/LineBuffer.h"
 #include "Modules/BoostLogger/LogRecord.h"
+#include "SystemTool/Text/LineBuffer.h"
 
 namespace BoostLogger {
+
+using SystemTool::Text::LineBuffer;
+using SystemTool::Text::TextOf;
 
 /// A longer message is cut. The largest datagram has 10 KiB; whatever is beyond this belongs into no log.
 inline constexpr std::size_t MAX_MESSAGE_BYTES = std::size_t{64} * 1024;

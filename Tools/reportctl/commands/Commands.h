@@ -17,8 +17,12 @@ using Add = void(CLI::App& app, int& exitCode);
 Add AddSetup; ///< `setup` makes what the service needs.
 Add AddRun;   ///< `run` becomes the service as soon as no other one runs.
 Add AddSend;  ///< `send` sends the running service a report or a control message, from flags or line by line.
+Add AddStats; ///< `stats` counts reports.
+Add AddExport; ///< `export` writes the rows of the store as CSV or JSON Lines.
+Add AddBackup; ///< `backup` copies the databases.
+Add AddPrune;  ///< `prune` deletes old rows.
 
 /// In the order of the help.
-inline constexpr std::array ALL{&AddSetup, &AddRun, &AddSend};
+inline constexpr std::array ALL{&AddSetup, &AddRun, &AddSend, &AddStats, &AddExport, &AddBackup, &AddPrune};
 
 } // namespace reportctl::commands

@@ -18,6 +18,10 @@ void AddSetup(CLI::App& app, int& exitCode) {
         "the user whose reports are to be stored. Running it again changes nothing.");
     auto* dryRun = setup->add_flag("--dry-run", options->dryRun, "Say what would be done and change nothing");
     setup->add_flag("--quiet", options->quiet, "Say only what goes wrong")->excludes(dryRun);
+    setup->add_flag(
+        "--compact", options->compact,
+        "Rewrite a large store of an older set-up, so that its file can shrink when `prune` deletes rows. "
+        "Stop the service first: it would wait. Takes the disk space of a second store meanwhile");
     const CLI::Validator notEmpty(
         [](const std::string& text) { return text.empty() ? "an empty text would have no effect" : ""; },
         "TEXT");

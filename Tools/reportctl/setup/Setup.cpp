@@ -51,7 +51,7 @@ void SetUpUserData(terminal::Worklog& log, const SetupOptions& options) {
         EnsurePrivateDirectory(log, directory);
     const auto turn = WaitForTurn(Paths::Databases(data));
     const auto store = Paths::Store(data);
-    if (store::EnsureStore(log, store))
+    if (store::EnsureStore(log, store, options.compact))
         SetUpBaseInfo(log, store, options);
 }
 

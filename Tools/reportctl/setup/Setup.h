@@ -7,6 +7,7 @@ namespace reportctl::setup {
 struct SetupOptions {
     bool dryRun = false;
     bool quiet = false;         ///< tells failures and warnings only
+    bool compact = false;       ///< rewrite a large store of an older set-up so that its file can shrink
     std::string openID;         ///< empty: not to be set
     std::string suiteVersion;   ///< empty: not to be set
     std::string preferencesDir; ///< where the service keeps its pid file

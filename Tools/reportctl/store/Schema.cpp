@@ -9,6 +9,8 @@
 #include <fmt/ranges.h>
 #include <sqlite3.h>
 
+#include "Tools/reportctl/store/Reports.h"
+
 namespace reportctl::store {
 namespace {
 
@@ -118,6 +120,27 @@ void AppendTable(std::vector<std::string>& statements, SQLite::Database& databas
         AppendMissingColumns(statements, table, present);
 }
 
+/// The text that SQLite keeps of the view's definition; empty without one.
+std::string ViewIn(SQLite::Database& database) {
+    SQLite::Statement query(database,
+                            "select type, sql from sqlite_master where name = 'reports' collate nocase");
+    if (!query.executeStep())
+        return {};
+    if (query.getColumn(0).getString() != "view")
+        throw std::runtime_error("there is something else than a view of the name reports");
+    return query.getColumn(1);
+}
+
+/// The view is made anew around every change of a table: renaming one would have SQLite change the view's text.
+void WrapInView(std::vector<std::string>& statements, SQLite::Database& database) {
+    const auto present = ViewIn(database);
+    if (statements.empty() && present == ReportsView())
+        return;
+    if (!present.empty())
+        statements.insert(statements.begin(), "drop view reports");
+    statements.push_back(ReportsView());
+}
+
 } // namespace
 
 int SchemaVersionOf(SQLite::Database& database) {
@@ -128,6 +151,7 @@ std::vector<std::string> StatementsToCurrentSchema(SQLite::Database& database) {
     std::vector<std::string> statements;
     AppendTable(statements, database, OPER_LOG);
     AppendTable(statements, database, BASE_INFO);
+    WrapInView(statements, database);
     if (SchemaVersionOf(database) != SCHEMA_VERSION)
         statements.push_back(fmt::format("pragma user_version = {}", SCHEMA_VERSION));
     return statements;

@@ -28,6 +28,12 @@ constexpr auto PRIVATE_FILE = fs::perms::owner_read | fs::perms::owner_write;
 /// A running service holds the write lock for moments; a person can wait for five seconds, not for ever.
 constexpr int BUSY_TIMEOUT_MS = 5000;
 
+/// What `pragma auto_vacuum` says of a store whose free pages can be given back a few at a time.
+constexpr int AUTO_VACUUM_INCREMENTAL = 2;
+
+/// Rewritten in less than a second.
+constexpr std::uintmax_t MAX_BYTES_TO_REWRITE_UNASKED = std::uintmax_t{64} * 1024 * 1024;
+
 /// A new, private, empty file beside the one that it is for. Gone, with SQLite's files beside it, at the end.
 class DraftFile {
 public:
@@ -84,6 +90,7 @@ void CreateStore(const std::string& path) {
     const DraftFile draft(path);
     {
         auto database = OpenStore(draft.Path());
+        database.exec("pragma auto_vacuum = incremental"); // holds when it comes before everything else
         database.exec("pragma journal_mode = wal");
         RunInTransaction(database, StatementsToCurrentSchema(database));
     }
@@ -142,19 +149,41 @@ void EnsureWriteAheadLog(terminal::Worklog& log, const std::string& path) {
             "Stop who uses it and run this again.");
 }
 
+bool CanShrink(const std::string& path) {
+    return OpenStoreToLook(path).execAndGet("pragma auto_vacuum").getInt() == AUTO_VACUUM_INCREMENTAL;
+}
+
+/// A store of an older set-up keeps the size that it once had. It is rewritten so that `prune` can give space back: at
+/// once when that is short, else when it is asked for, because the service can store nothing meanwhile.
+void EnsureThatItCanShrink(terminal::Worklog& log, const std::string& path, bool mayTakeLong) {
+    if (CanShrink(path) || (!mayTakeLong && fs::file_size(path) > MAX_BYTES_TO_REWRITE_UNASKED))
+        return;
+    log.Run(
+        terminal::CHANGE, fmt::format("{}, rewritten, so that its file can shrink", path),
+        [&] {
+            auto store = OpenStore(path);
+            store.exec("pragma auto_vacuum = incremental");
+            store.exec("vacuum");
+        },
+        "Stop the service and run this again.");
+}
+
 /// The modes are looked at while the store is closed: opening it makes side files of the mode that is about
 /// to be changed.
-bool EnsureExistingStore(terminal::Worklog& log, const std::string& path) {
+bool EnsureExistingStore(terminal::Worklog& log, const std::string& path, bool compact) {
     if (!EnsureSchema(log, path))
         return false;
     EnsurePrivateFiles(log, path);
     EnsureWriteAheadLog(log, path);
+    EnsureThatItCanShrink(log, path, compact);
     return true;
 }
 
 } // namespace
 
 SQLite::Database OpenStore(const std::string& path) {
+    if (!fs::exists(path))
+        throw std::runtime_error(path + " is missing. `reportctl setup` makes it.");
     return SQLite::Database(path, SQLite::OPEN_READWRITE, BUSY_TIMEOUT_MS);
 }
 
@@ -168,11 +197,11 @@ SQLite::Database OpenStoreToLook(const std::string& path) {
     return database;
 }
 
-bool EnsureStore(terminal::Worklog& log, const std::string& path) {
+bool EnsureStore(terminal::Worklog& log, const std::string& path, bool compact) {
     try {
         if (!fs::exists(path))
             return EnsureNewStore(log, path);
-        return EnsureExistingStore(log, path);
+        return EnsureExistingStore(log, path, compact);
     } catch (const SQLite::Exception& error) {
         const bool isDatabase =
             error.getErrorCode() != SQLITE_NOTADB && error.getErrorCode() != SQLITE_CORRUPT;

@@ -15,10 +15,14 @@ namespace reportctl::store {
 /// A file that is no database, and a schema that is newer than this program, are left as they are. Side files without a
 /// store, which may hold rows, are renamed; where that fails no new store is made beside them.
 ///
+/// A store that an older set-up made, whose file cannot shrink, is rewritten: up to 64 MiB always, a larger one with
+/// `compact`. That takes the disk space of another one meanwhile, and the service waits.
+///
 /// False when there is no store to go on with; the log has the reason. True in a dry run that would make it.
-bool EnsureStore(terminal::Worklog& log, const std::string& path);
+bool EnsureStore(terminal::Worklog& log, const std::string& path, bool compact);
 
-/// Opens the store that is there, never makes one. Throws SQLite::Exception.
+/// Opens the database that is there, never makes one. Throws std::runtime_error, with what to do about it, when it is
+/// missing, and SQLite::Exception.
 SQLite::Database OpenStore(const std::string& path);
 
 /// The same for a look at it: rows that a killed service left in the write-ahead log stay there when this is closed.

@@ -18,7 +18,7 @@ protected:
         EXPECT_EQ(ModeOf(Store()), 0600u);
         EXPECT_EQ(ColumnsOf("OperLog"), OPER_LOG_COLUMNS);
         EXPECT_EQ(ColumnsOf("BaseInfo"), "key TEXT0,value TEXT0");
-        EXPECT_EQ(Ask("pragma user_version"), "1");
+        EXPECT_EQ(Ask("pragma user_version"), "2");
         EXPECT_EQ(Ask("pragma journal_mode"), "wal");
         EXPECT_EQ(Ask("pragma integrity_check"), "ok");
     }
@@ -44,7 +44,7 @@ TEST_F(Setup, MakesEverythingThatIsMissing) {
     EXPECT_TRUE(outcome.Says("made directory " + Preferences() + " (mode 1777)\n")) << outcome.output;
     EXPECT_TRUE(outcome.Says("made pid file " + PidFile() + " (mode 0666)\n")) << outcome.output;
     EXPECT_EQ(ContentOf(PidFile()), "");
-    EXPECT_TRUE(outcome.Says("made store " + Store() + " (mode 0600, schema version 1)\n"));
+    EXPECT_TRUE(outcome.Says("made store " + Store() + " (mode 0600, schema version 2)\n"));
     ExpectEverythingMade();
     EXPECT_EQ(Files(), "Report.db ");
 }

@@ -8,7 +8,7 @@ protected:
     void ExpectTheCurrentSchema() const {
         EXPECT_EQ(ColumnsOf("OperLog"), OPER_LOG_COLUMNS);
         EXPECT_EQ(ColumnsOf("BaseInfo"), "key TEXT0,value TEXT0");
-        EXPECT_EQ(Ask("pragma user_version"), "1");
+        EXPECT_EQ(Ask("pragma user_version"), "2");
         EXPECT_EQ(Ask("pragma journal_mode"), "wal");
         EXPECT_EQ(Ask("pragma integrity_check"), "ok");
     }
@@ -61,17 +61,18 @@ TEST_F(StoreMigration, FindsTheTablesOfOtherTestsAsItMakesThem) {
     MakeStore(STORE_TABLES);
     ASSERT_EQ(RunSetup().exitCode, 0);
     ExpectTheCurrentSchema();
-    const auto made = Ask("select group_concat(sql) from sqlite_master");
+    const auto made = Ask("select group_concat(sql) from sqlite_master where type = 'table'");
     std::filesystem::remove(Store());
     MakeStore(STORE_TABLES);
-    EXPECT_EQ(Ask("select group_concat(sql) from sqlite_master"), made) << "set-up changed them";
+    EXPECT_EQ(Ask("select group_concat(sql) from sqlite_master where type = 'table'"), made)
+        << "set-up changed them";
 }
 
 TEST_F(StoreMigration, AddsWhatAnOlderStoreLacksAndKeepsItsRows) {
     MakeStore(OLD_STORE);
     const auto outcome = RunSetup("--open-id u1");
     EXPECT_EQ(outcome.exitCode, 0) << outcome.output;
-    EXPECT_TRUE(outcome.Says("migrated store " + Store() + " (schema version 1) from version 0"))
+    EXPECT_TRUE(outcome.Says("migrated store " + Store() + " (schema version 2) from version 0"))
         << outcome.output;
     ExpectTheCurrentSchema();
     EXPECT_EQ(ModeOf(Store()), 0600u);
@@ -103,7 +104,7 @@ TEST_F(StoreMigration, GivesTheRowsAKeyInTheirOrderAndKeepsForeignColumns) {
     EXPECT_EQ(ColumnsOf("OperLog"), std::string(OPER_LOG_COLUMNS) + ",note varchar(9)0");
     EXPECT_EQ(Ask("select group_concat(id || eventID || ifnull(note, '-') || value) from OperLog"),
               "1E1n1v1,2E2-v2");
-    EXPECT_EQ(Ask("select count(*) from sqlite_master"), "2");
+    EXPECT_EQ(Ask("select count(*) from sqlite_master"), "3");
 }
 
 TEST_F(StoreMigration, MakesATableAgainThatSomebodyDropped) {
@@ -123,8 +124,8 @@ TEST_F(StoreMigration, SwitchesAStoreToTheWriteAheadLog) {
 }
 
 TEST_F(StoreMigration, LeavesANewerStoreAlone) {
-    MakeStore("pragma user_version = 2; create table OperLog (a); create table New (b)");
-    ExpectLeftAlone("has schema version 2, this program knows 1: it was left as it is");
+    MakeStore("pragma user_version = 3; create table OperLog (a); create table New (b)");
+    ExpectLeftAlone("has schema version 3, this program knows 2: it was left as it is");
 }
 
 TEST_F(StoreMigration, LeavesTheLogOfAKilledServiceAloneInADryRun) {
@@ -145,7 +146,7 @@ TEST_F(StoreMigration, LeavesTheLogOfAKilledServiceAloneWhenThereIsNothingToDo) 
 
 TEST_F(StoreMigration, LeavesANewerStoreAloneWithTheLogOfAKilledService) {
     MakeStore("create table OperLog (a)");
-    RunInAServiceThatIsKilled("pragma user_version = 2");
+    RunInAServiceThatIsKilled("pragma user_version = 3");
     ExpectUntouched("--open-id u1", 1, "it was left as it is");
 }
 

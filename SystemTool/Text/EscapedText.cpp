@@ -1,10 +1,10 @@
-#include "Modules/BoostLogger/EscapedText.h"
+#include "SystemTool/Text/EscapedText.h"
 
 #include <cstdint>
 
 #include "SystemTool/Text/Utf8.h"
 
-namespace BoostLogger {
+namespace SystemTool::Text {
 
 namespace {
 
@@ -99,4 +99,4 @@ void AppendEscaped(LineBuffer& line, std::string_view text) {
     }
 }
 
-} // namespace BoostLogger
+} // namespace SystemTool::Text

@@ -1,4 +1,4 @@
-#include "Modules/BoostLogger/EscapedText.h"
+#include "SystemTool/Text/EscapedText.h"
 
 #include <random>
 
@@ -7,9 +7,9 @@
 namespace {
 
 std::string Escaped(std::string_view text) {
-    BoostLogger::LineBuffer line;
-    BoostLogger::AppendEscaped(line, text);
-    return std::string(BoostLogger::TextOf(line));
+    SystemTool::Text::LineBuffer line;
+    SystemTool::Text::AppendEscaped(line, text);
+    return std::string(SystemTool::Text::TextOf(line));
 }
 
 std::string Unescaped(const std::string& text) {

@@ -4,7 +4,7 @@
 
 #include <boost/container/small_vector.hpp>
 
-namespace BoostLogger {
+namespace SystemTool::Text {
 
 /// A line under construction. It lives on the stack of the thread that logs, and a usual record fits without
 /// an allocation; nothing of it outlives the call, so that nothing has to be destroyed when the process
@@ -19,4 +19,4 @@ inline std::string_view TextOf(const LineBuffer& line) {
     return {line.data(), line.size()};
 }
 
-} // namespace BoostLogger
+} // namespace SystemTool::Text

@@ -2,9 +2,9 @@
 
 #include <string_view>
 
-#include "Modules/BoostLogger/LineBuffer.h"
+#include "SystemTool/Text/LineBuffer.h"
 
-namespace BoostLogger {
+namespace SystemTool::Text {
 
 /// Appends `text` so that it stays on its line, does nothing to a terminal and can be turned back into
 /// exactly the same bytes. Readable text in UTF-8 stays as it is, but for:
@@ -14,4 +14,4 @@ namespace BoostLogger {
 ///   direction of text, characters that are not seen    each byte as \x and two hexadecimal digits
 void AppendEscaped(LineBuffer& line, std::string_view text);
 
-} // namespace BoostLogger
+} // namespace SystemTool::Text

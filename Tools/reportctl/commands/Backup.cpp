@@ -1,0 +1,116 @@
+#include <cerrno>
+#include <cstdlib>
+#include <filesystem>
+#include <memory>
+#include <stdexcept>
+#include <string>
+#include <system_error>
+
+#include <CLI/CLI.hpp>
+#include <fcntl.h>
+#include <fmt/format.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include "Tools/reportctl/commands/Commands.h"
+#include "Tools/reportctl/store/Copy.h"
+#include "Tools/reportctl/store/Paths.h"
+#include "Tools/reportctl/store/Store.h"
+#include "Tools/reportctl/terminal/Output.h"
+#include "Tools/reportctl/terminal/Progress.h"
+
+namespace reportctl::commands {
+namespace {
+
+namespace fs = std::filesystem;
+
+constexpr auto HELP = "Example:\n"
+                      "  reportctl backup ~/report-backup-$(date +%F)\n"
+                      "\n"
+                      "To go back to it: stop the service, move Report.db, MetrikOutbox.db and their -wal "
+                      "and -shm away, copy the two files\n"
+                      "of the backup into their place, run `reportctl setup`, start the service. An outbox "
+                      "that was restored sends again\n"
+                      "what it had sent since; the collector can tell by log.record.uid.\n"
+                      "\n";
+
+[[noreturn]] void Throw(const std::string& what) {
+    throw std::system_error(errno, std::generic_category(), what);
+}
+
+/// The directory of the backup. It is this command's own: it must not exist before, and is gone after a failure.
+class NewDirectory {
+public:
+    explicit NewDirectory(std::string path) : m_path(std::move(path)) {
+        if (::mkdir(m_path.c_str(), 0700) != 0)
+            Throw("cannot make the directory " + m_path);
+    }
+    ~NewDirectory() {
+        std::error_code ignored;
+        if (!m_isKept)
+            fs::remove_all(m_path, ignored);
+    }
+    NewDirectory(const NewDirectory&) = delete;
+    NewDirectory& operator=(const NewDirectory&) = delete;
+
+    /// Has everything in it written to the disk, and keeps it.
+    void Keep() {
+        const int directory = ::open(m_path.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
+        const bool isSafe = directory >= 0 && ::syncfs(directory) == 0;
+        ::close(directory);
+        if (!isSafe)
+            Throw("cannot write " + m_path);
+        m_isKept = true;
+    }
+
+private:
+    std::string m_path;
+    bool m_isKept = false;
+};
+
+void Copy(const std::string& from, const std::string& to) {
+    {
+        terminal::Progress progress("copying " + fs::path(from).filename().string());
+        store::CopyDatabase(from, to, [&](int done, int total) { progress.Show(done, total); });
+    }
+    fmt::print("{} ({} bytes)\n", to, fs::file_size(to));
+}
+
+void Backup(const std::string& path) {
+    if (!fs::exists(store::StorePath()))
+        throw std::runtime_error(fmt::format(
+            "{} is missing: there is nothing to back up. `reportctl setup` makes it.", store::StorePath()));
+    NewDirectory directory(path);
+    Copy(store::StorePath(), path + "/Report.db");
+    if (fs::exists(store::OutboxPath()))
+        Copy(store::OutboxPath(), path + "/MetrikOutbox.db");
+    else
+        fmt::print("No outbox: {} is not there, so it has no events.\n", store::OutboxPath());
+    directory.Keep();
+}
+
+int RunBackup(const std::string& path) {
+    try {
+        Backup(path);
+        return 0;
+    } catch (const std::exception& error) {
+        terminal::TellLastError(error.what());
+        return 1;
+    }
+}
+
+} // namespace
+
+void AddBackup(CLI::App& app, int& exitCode) {
+    auto path = std::make_shared<std::string>();
+    auto* command = app.add_subcommand(
+        "backup",
+        "Copy the store and the outbox into a new directory, while the service goes on. Each is copied as it "
+        "is at one moment, and checked. Copying Report.db with cp would leave the newest rows out.");
+    command->add_option("DIRECTORY", *path, "The directory to make (mode 0700); it must not exist")
+        ->required();
+    command->footer(HELP + app.get_footer());
+    command->callback([path, &exitCode] { exitCode = RunBackup(*path); });
+}
+
+} // namespace reportctl::commands

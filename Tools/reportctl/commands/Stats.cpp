@@ -1,0 +1,179 @@
+#include <algorithm>
+#include <filesystem>
+#include <map>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include <CLI/CLI.hpp>
+#include <SQLiteCpp/Exception.h>
+#include <fmt/format.h>
+#include <rapidjson/stringbuffer.h>
+#include <rapidjson/writer.h>
+
+#include "Tools/reportctl/commands/Commands.h"
+#include "Tools/reportctl/commands/FilterOptions.h"
+#include "Tools/reportctl/store/Csv.h"
+#include "Tools/reportctl/store/Paths.h"
+#include "Tools/reportctl/store/Store.h"
+#include "Tools/reportctl/store/Tally.h"
+#include "Tools/reportctl/terminal/Output.h"
+#include "Tools/reportctl/terminal/Printable.h"
+#include "Tools/reportctl/terminal/Result.h"
+
+namespace reportctl::commands {
+namespace {
+
+using store::Count;
+using store::Grouping;
+
+constexpr auto HELP =
+    "Examples:\n"
+    "  reportctl stats                                   # events, the most frequent first\n"
+    "  reportctl stats --by hour --since 2026-11-21\n"
+    "  reportctl stats --by event --event 'B100|' --top 10 --csv\n"
+    "  reportctl stats --by outcome                      # where reports ended, as the service counted them\n"
+    "\n"
+    "Counted are the rows of the store, and the events that the outbox has: those that wait and the dead "
+    "letters. Events\n"
+    "that a collector took have left the outbox; `--by outcome` counts them too, as toAnalytics. Outcomes "
+    "come from the\n"
+    "service's ledger, which counts since it was begun and knows no event ids.\n"
+    "\n";
+
+const std::map<std::string, Grouping> GROUPINGS{{"hour", Grouping::Hour},
+                                                {"day", Grouping::Day},
+                                                {"event", Grouping::Event},
+                                                {"module", Grouping::Module}};
+
+constexpr std::size_t BAR_WIDTH = 30;
+
+struct StatsOptions {
+    FilterOptions filter;
+    std::string by = "event";
+    std::size_t top = 0;
+    bool isUtc = false;
+    bool isJson = false;
+    bool isCsv = false;
+};
+
+/// What was counted, and what to say about where it came from.
+struct Stats {
+    std::vector<Count> counts;
+    std::string sources;
+};
+
+std::int64_t Sum(const store::Tally& tally) {
+    std::int64_t sum = 0;
+    for (const auto& [key, count] : tally)
+        sum += count;
+    return sum;
+}
+
+Stats CountReports(const StatsOptions& options) {
+    const auto grouping = GROUPINGS.at(options.by);
+    const auto filter = options.filter.Read();
+    const auto zone = options.isUtc ? store::Zone::Utc : store::Zone::Local;
+    store::Tally tally;
+    auto database = store::OpenStoreToLook(store::StorePath());
+    store::CountRows(database, grouping, filter, zone, tally);
+    const auto rows = Sum(tally);
+    if (std::filesystem::exists(store::OutboxPath())) {
+        auto outbox = store::OpenStoreToLook(store::OutboxPath());
+        store::CountEvents(outbox, grouping, filter, zone, tally);
+    }
+    return {store::Ranked(tally, grouping, options.top),
+            fmt::format("{} rows of the store, {} events of the outbox (waiting, or dead letters)", rows,
+                        Sum(tally) - rows)};
+}
+
+void PrintJson(const Stats& stats, terminal::Result& output) {
+    rapidjson::StringBuffer text;
+    rapidjson::Writer<rapidjson::StringBuffer> writer(text);
+    writer.StartArray();
+    for (const auto& [key, count] : stats.counts) {
+        writer.StartObject();
+        writer.Key("key");
+        if (key)
+            writer.String(key->data(), static_cast<rapidjson::SizeType>(key->size()));
+        else
+            writer.Null();
+        writer.Key("count");
+        writer.Int64(count);
+        writer.EndObject();
+    }
+    writer.EndArray();
+    output.Write({text.GetString(), text.GetSize()});
+    output.Write("\n");
+}
+
+void PrintCsv(const Stats& stats, terminal::Result& output) {
+    std::string text = "key,count\n";
+    for (const auto& [key, count] : stats.counts) {
+        store::AppendCsvField(text, key);
+        text += fmt::format(",{}\n", count);
+    }
+    output.Write(text);
+}
+
+std::string Label(const Count& count, const std::string& by) {
+    if (count.key)
+        return terminal::Printable(*count.key);
+    return by == "module" ? "(no bar in the event id)" : "(no time)";
+}
+
+void PrintTable(const Stats& stats, const StatsOptions& options, terminal::Result& output) {
+    std::size_t width = 0;
+    std::int64_t most = 1;
+    for (const auto& count : stats.counts) {
+        width = std::max(width, Label(count, options.by).size());
+        most = std::max(most, count.count);
+    }
+    for (const auto& count : stats.counts)
+        output.Write(fmt::format(
+            "{:<{}}  {:>12}  {}\n", Label(count, options.by), width, count.count,
+            std::string(BAR_WIDTH * static_cast<std::size_t>(count.count) / static_cast<std::size_t>(most),
+                        '#')));
+    output.Write(fmt::format("{}Counted: {}.\n", stats.counts.empty() ? "" : "\n", stats.sources));
+}
+
+void Print(const Stats& stats, const StatsOptions& options) {
+    terminal::Result output("");
+    if (options.isJson)
+        PrintJson(stats, output);
+    else if (options.isCsv)
+        PrintCsv(stats, output);
+    else
+        PrintTable(stats, options, output);
+    output.Finish();
+}
+
+int RunStats(const StatsOptions& options) {
+    try {
+        Print(CountReports(options), options);
+        return 0;
+    } catch (const std::exception& error) {
+        terminal::TellLastError(error.what());
+        return 1;
+    }
+}
+
+} // namespace
+
+void AddStats(CLI::App& app, int& exitCode) {
+    auto options = std::make_shared<StatsOptions>();
+    auto* command = app.add_subcommand("stats", "Count reports by hour, day, event, module or outcome.");
+    command->add_option("--by", options->by, "What to count by")
+        ->check(CLI::IsMember({"hour", "day", "event", "module"}))
+        ->capture_default_str();
+    options->filter.AddTo(*command);
+    command->add_option("--top", options->top, "Only so many, the most frequent ones")
+        ->check(CLI::PositiveNumber);
+    command->add_flag("--utc", options->isUtc, "Hours and days of UTC, not of local time");
+    auto* json = command->add_flag("--json", options->isJson, "A JSON array of {\"key\", \"count\"}");
+    command->add_flag("--csv", options->isCsv, "CSV with a header")->excludes(json);
+    command->footer(HELP + app.get_footer());
+    command->callback([options, &exitCode] { exitCode = RunStats(*options); });
+}
+
+} // namespace reportctl::commands

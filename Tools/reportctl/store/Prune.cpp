@@ -1,0 +1,178 @@
+#include "Tools/reportctl/store/Prune.h"
+
+#include <algorithm>
+#include <chrono>
+#include <thread>
+
+#include <SQLiteCpp/Statement.h>
+#include <SQLiteCpp/Transaction.h>
+#include <fmt/format.h>
+
+#include "Tools/reportctl/store/Reports.h"
+#include "Tools/reportctl/store/Rows.h"
+
+namespace reportctl::store {
+namespace {
+
+using Clock = std::chrono::steady_clock;
+
+/// What SQLite calls a store whose free pages can be given back a few at a time.
+constexpr std::int64_t AUTO_VACUUM_INCREMENTAL = 2;
+
+std::int64_t Ask(SQLite::Database& database, const std::string& query) {
+    return database.execAndGet(query).getInt64();
+}
+
+std::int64_t BytesOfFile(SQLite::Database& database) {
+    return Ask(database, "pragma page_count") * Ask(database, "pragma page_size");
+}
+
+std::int64_t BytesInUse(SQLite::Database& database) {
+    return BytesOfFile(database) - Ask(database, "pragma freelist_count") * Ask(database, "pragma page_size");
+}
+
+std::int64_t CountIn(SQLite::Database& database, IdRange range, const ReportFilter& filter) {
+    auto counts = SelectReports(database, "count(*)", filter, "");
+    std::int64_t rows = 0;
+    InPieces(range, 4 * IDS_AT_ONCE, [&](IdRange piece) {
+        BindPiece(counts, piece);
+        counts.executeStep();
+        rows += counts.getColumn(0).getInt64();
+        counts.reset();
+    });
+    return rows;
+}
+
+/// The id of the first row that stays when the oldest `removed` go.
+std::int64_t IdAfter(SQLite::Database& database, std::int64_t removed) {
+    SQLite::Statement query(database, "select id from OperLog order by id limit 1 offset ?");
+    query.bind(1, removed);
+    return query.executeStep() ? query.getColumn(0).getInt64() : AllIds(database).end;
+}
+
+/// How many of the oldest rows must go so that the others fit, when all are alike.
+std::int64_t RowsOverSize(SQLite::Database& database, std::int64_t rows, std::int64_t keepBytes) {
+    const auto inUse = BytesInUse(database);
+    if (inUse <= keepBytes || rows == 0)
+        return 0;
+    const auto part = double(inUse - keepBytes) / double(inUse);
+    return std::clamp(static_cast<std::int64_t>(part * double(rows)) + 1, std::int64_t{1}, rows);
+}
+
+/// Runs `work` in a transaction of its own and then leaves the lock alone for as long as it was held. Returns how long that
+/// was.
+Clock::duration InTurn(SQLite::Database& database, const std::function<void()>& work) {
+    SQLite::Transaction transaction(database, SQLite::TransactionBehavior::IMMEDIATE);
+    const auto begin = Clock::now();
+    work();
+    transaction.commit();
+    const auto held = Clock::now() - begin;
+    std::this_thread::sleep_for(held);
+    return held;
+}
+
+/// The size of the next batch by how long the last one took: towards the time that one may take, in steps of at most two.
+std::int64_t NextBatch(std::int64_t last, Clock::duration took, const PruneSettings& settings) {
+    const auto allowed = std::chrono::milliseconds(settings.batchMs);
+    const double factor =
+        double(allowed.count()) * 1e6 / std::max(1.0, double(std::chrono::nanoseconds(took).count()));
+    return std::clamp(static_cast<std::int64_t>(double(last) * std::clamp(factor, 0.5, 2.0)), std::int64_t{1},
+                      settings.largestBatch);
+}
+
+std::string DeleteStatement(const PruneRule& rule) {
+    const std::string ids = "delete from OperLog where id >= :first and id < :end";
+    return rule.olderThanMs ? fmt::format("{} and {} < :before", ids, TimeOf("createTime")) : ids;
+}
+
+/// Deletes from the rows before `plan.endId`, oldest first.
+class Deletion {
+public:
+    Deletion(SQLite::Database& database, const PruneRule& rule, const PruneSettings& settings)
+        : m_database(database), m_rule(rule), m_settings(settings), m_batch(settings.firstBatch),
+          m_delete(database, DeleteStatement(rule)) {
+        if (rule.olderThanMs)
+            m_delete.bind(":before", *rule.olderThanMs);
+    }
+
+    std::int64_t Run(IdRange ids, const std::function<void(std::int64_t, std::int64_t)>& progress) {
+        std::int64_t removed = 0;
+        for (auto first = ids.first; first < ids.end && !IsEnough();) {
+            const IdRange piece{first, first + std::min(m_batch, MostFrom({first, ids.end}))};
+            const auto took = InTurn(m_database, [&] {
+                BindPiece(m_delete, piece);
+                removed += m_delete.exec();
+            });
+            m_batch = NextBatch(m_batch, took, m_settings);
+            first = piece.end;
+            progress(first - ids.first, ids.end - ids.first);
+        }
+        return removed;
+    }
+
+private:
+    /// By size, it ends when the rest fits, whatever the estimate was.
+    bool IsEnough() { return m_rule.keepBytes && BytesInUse(m_database) <= *m_rule.keepBytes; }
+
+    /// No more than has to go, when all that are left are alike.
+    std::int64_t MostFrom(IdRange left) {
+        const auto ids = left.end - left.first;
+        return m_rule.keepBytes ? RowsOverSize(m_database, ids, *m_rule.keepBytes) : ids;
+    }
+
+    SQLite::Database& m_database;
+    const PruneRule& m_rule;
+    const PruneSettings& m_settings;
+    std::int64_t m_batch;
+    SQLite::Statement m_delete;
+};
+
+/// Moves pages from the file's end into free ones, a few at a time, and cuts the file.
+void GiveSpaceBack(SQLite::Database& database, const PruneSettings& settings) {
+    std::int64_t pages = 16;
+    while (Ask(database, "pragma freelist_count") > 0) {
+        const auto before = Ask(database, "pragma freelist_count");
+        const auto took =
+            InTurn(database, [&] { database.exec(fmt::format("pragma incremental_vacuum({})", pages)); });
+        if (Ask(database, "pragma freelist_count") >= before)
+            return; // other programs free pages as fast
+        pages = NextBatch(pages, took, settings);
+    }
+}
+
+} // namespace
+
+PrunePlan PlanPrune(SQLite::Database& database, const PruneRule& rule) {
+    const auto ids = AllIds(database);
+    PrunePlan plan{.rows = CountIn(database, ids, {}), .removed = 0, .endId = ids.end};
+    if (rule.olderThanMs) {
+        plan.removed =
+            CountIn(database, ids, {.sinceMs = {}, .untilMs = rule.olderThanMs, .eventPrefix = {}});
+        return plan;
+    }
+    if (rule.keepBytes) { // how far it goes shows on the way
+        plan.removed = RowsOverSize(database, plan.rows, *rule.keepBytes);
+        return plan;
+    }
+    plan.removed = std::max(std::int64_t{0}, plan.rows - *rule.keepRows);
+    plan.endId = IdAfter(database, plan.removed);
+    return plan;
+}
+
+PruneResult Prune(SQLite::Database& database, const PruneRule& rule, const PrunePlan& plan,
+                  const PruneSettings& settings,
+                  const std::function<void(std::int64_t done, std::int64_t total)>& progress) {
+    PruneResult result;
+    result.bytesBefore = BytesOfFile(database);
+    result.canShrink = Ask(database, "pragma auto_vacuum") == AUTO_VACUUM_INCREMENTAL;
+    if (plan.removed > 0)
+        result.removed =
+            Deletion(database, rule, settings).Run({AllIds(database).first, plan.endId}, progress);
+    if (result.canShrink)
+        GiveSpaceBack(database, settings);
+    database.exec("pragma wal_checkpoint(passive)");
+    result.bytesAfter = BytesOfFile(database);
+    return result;
+}
+
+} // namespace reportctl::store

@@ -1,0 +1,112 @@
+#include "Tools/reportctl/store/Tally.h"
+
+#include <algorithm>
+#include <ctime>
+
+#include <SQLiteCpp/Statement.h>
+#include <fmt/chrono.h>
+#include <fmt/format.h>
+
+#include "Tools/reportctl/store/Rows.h"
+
+namespace reportctl::store {
+namespace {
+
+/// Every time zone is a multiple of this from UTC, so an hour and a day of any zone is made of whole ones.
+constexpr std::int64_t QUARTER_HOUR_MS = 15LL * 60 * 1000;
+constexpr std::int64_t QUARTER_HOUR_S = QUARTER_HOUR_MS / 1000;
+
+/// Rows are counted fast, so one statement may take more of them than where each row is written out.
+constexpr std::int64_t IDS_AT_ONCE_TO_COUNT = 4 * IDS_AT_ONCE;
+
+/// The events of an outbox with the columns that the rows of ReportsSelect have.
+std::string EventsSelect() {
+    return fmt::format(R"sql(select event_id as event,
+    case when instr(event_id, '|') then substr(event_id, 1, instr(event_id, '|') - 1) end as module,
+    coalesce({}, stored_ms) as time
+from (select event_id, stored_ms,
+             case when json_valid(payload) then json_extract(payload, '$.extend.createTime') end as created
+      from (select event_id, stored_ms, payload from event
+            union all select event_id, stored_ms, payload from dead_letter)))sql",
+                       TimeOf("created"));
+}
+
+bool IsByTime(Grouping grouping) {
+    return grouping == Grouping::Hour || grouping == Grouping::Day;
+}
+
+/// Division that rounds down, for times before 1970, too.
+std::string KeyColumn(Grouping grouping) {
+    if (IsByTime(grouping))
+        return fmt::format("(cast(time as integer) - ((cast(time as integer) % {0}) + {0}) % {0}) / {0}",
+                           QUARTER_HOUR_MS);
+    return grouping == Grouping::Event ? "event" : "module";
+}
+
+std::tm WallClock(std::time_t time, Zone zone) {
+    std::tm wall{};
+    if (zone == Zone::Utc)
+        ::gmtime_r(&time, &wall);
+    else
+        ::localtime_r(&time, &wall);
+    return wall;
+}
+
+/// Such as 2026-11-21T14:00+01:00, or 2026-11-21.
+std::string TimeKey(std::int64_t quarterHour, Grouping grouping, Zone zone) {
+    const auto wall = WallClock(quarterHour * QUARTER_HOUR_S, zone);
+    if (grouping == Grouping::Day)
+        return fmt::format("{:%Y-%m-%d}", wall);
+    const auto offset = wall.tm_gmtoff / 60;
+    return fmt::format("{:%Y-%m-%dT%H}:00{}{:02}:{:02}", wall, offset < 0 ? '-' : '+', std::abs(offset) / 60,
+                       std::abs(offset) % 60);
+}
+
+std::optional<std::string> KeyOf(const SQLite::Column& column, Grouping grouping, Zone zone) {
+    if (column.isNull())
+        return std::nullopt;
+    if (IsByTime(grouping))
+        return TimeKey(column.getInt64(), grouping, zone);
+    return column.getString();
+}
+
+void Add(SQLite::Statement& counts, Grouping grouping, Zone zone, Tally& tally) {
+    while (counts.executeStep())
+        tally[KeyOf(counts.getColumn(0), grouping, zone)] += counts.getColumn(1).getInt64();
+}
+
+} // namespace
+
+void CountRows(SQLite::Database& database, Grouping grouping, const ReportFilter& filter, Zone zone,
+               Tally& tally) {
+    auto counts = SelectReports(database, KeyColumn(grouping) + " as key, count(*)", filter, "group by 1");
+    InPieces(AllIds(database), IDS_AT_ONCE_TO_COUNT, [&](IdRange piece) {
+        BindPiece(counts, piece);
+        Add(counts, grouping, zone, tally);
+    });
+}
+
+void CountEvents(SQLite::Database& database, Grouping grouping, const ReportFilter& filter, Zone zone,
+                 Tally& tally) {
+    SQLite::Statement counts(database, fmt::format("select {} as key, count(*) from ({}) where {} group by 1",
+                                                   KeyColumn(grouping), EventsSelect(), filter.Condition()));
+    filter.BindTo(counts);
+    Add(counts, grouping, zone, tally);
+}
+
+std::vector<Count> Ranked(const Tally& tally, Grouping grouping, std::size_t top) {
+    std::vector<Count> counts;
+    for (const auto& [key, count] : tally)
+        counts.push_back({key, count});
+    const auto isMore = [](const Count& a, const Count& b) { return a.count > b.count; };
+    std::stable_sort(counts.begin(), counts.end(), isMore);
+    if (top != 0 && counts.size() > top)
+        counts.resize(top);
+    if (IsByTime(grouping))
+        std::sort(counts.begin(), counts.end(), [](const Count& a, const Count& b) { return a.key < b.key; });
+    std::stable_partition(counts.begin(), counts.end(),
+                          [](const Count& count) { return count.key.has_value(); });
+    return counts;
+}
+
+} // namespace reportctl::store

@@ -1,0 +1,26 @@
+#pragma once
+
+#include <chrono>
+#include <string>
+
+namespace reportctl::terminal {
+
+using TimePoint = std::chrono::time_point<std::chrono::system_clock, std::chrono::milliseconds>;
+
+/// What a person may write for a point in time, for a command's help.
+inline constexpr auto TIME_FORMS =
+    "10m, 2h or 90d back from now, or a date or date-time such as 2026-11-21, 2026-11-21T14:05 or "
+    "2026-11-21T14:05:06Z; local time unless it ends in Z or an offset such as +01:00";
+
+/// Reads a point in time that a person wrote, in one of TIME_FORMS. `s` for seconds and `w` for weeks are understood,
+/// too. A date alone is its first moment.
+///
+/// Throws std::invalid_argument for anything else, with a message that says what would be right.
+TimePoint ReadTime(const std::string& text, TimePoint now);
+
+/// The milliseconds since 1970 that createTime holds.
+inline std::int64_t MillisecondsOf(TimePoint time) {
+    return time.time_since_epoch().count();
+}
+
+} // namespace reportctl::terminal
