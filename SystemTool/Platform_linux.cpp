@@ -2,9 +2,13 @@
 
 #include <array>
 #include <cstdlib>
+#include <ctime>
 #include <fstream>
 
+#include <fcntl.h>
+#include <linux/sock_diag.h>
 #include <pwd.h>
+#include <sys/socket.h>
 #include <sys/syscall.h>
 #include <sys/utsname.h>
 #include <unistd.h>
@@ -59,6 +63,13 @@ std::string PrettyNameOf(const char* osReleasePath) {
     return {};
 }
 
+/// A lock of the opening and not of the process: it does not go when another opening of the same file is closed.
+int ControlLock(int file, int command, struct flock& lock) {
+    lock.l_type = F_WRLCK;
+    lock.l_whence = SEEK_SET; // with start and length 0: the whole file
+    return ::fcntl(file, command, &lock);
+}
+
 } // namespace
 
 std::string UserDataDir() {
@@ -107,6 +118,34 @@ std::string PathThrough(int directory) {
 
 std::uint64_t CurrentThreadId() {
     return static_cast<std::uint64_t>(::syscall(SYS_gettid));
+}
+
+std::int64_t CoarseTimeMs() {
+    timespec now{};
+    ::clock_gettime(CLOCK_REALTIME_COARSE, &now);
+    return std::int64_t{now.tv_sec} * 1000 + now.tv_nsec / 1'000'000;
+}
+
+bool AllocateFile(int file, std::int64_t bytes) {
+    return ::posix_fallocate(file, 0, bytes) == 0;
+}
+
+bool TryLockFile(int file) {
+    struct flock lock {};
+    return ControlLock(file, F_OFD_SETLK, lock) == 0;
+}
+
+bool IsFileLocked(int file) {
+    struct flock lock {};
+    return ControlLock(file, F_OFD_GETLK, lock) == 0 && lock.l_type != F_UNLCK;
+}
+
+std::optional<std::uint32_t> DatagramsDropped(int socket) {
+    std::array<std::uint32_t, SK_MEMINFO_VARS> figures{};
+    socklen_t size = sizeof figures;
+    if (::getsockopt(socket, SOL_SOCKET, SO_MEMINFO, figures.data(), &size) != 0 || size != sizeof figures)
+        return std::nullopt;
+    return figures[SK_MEMINFO_DROPS];
 }
 
 } // namespace SystemTool::Platform

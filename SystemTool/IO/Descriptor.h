@@ -14,6 +14,8 @@ public:
     /// Takes over what open() returned; a negative number is no descriptor.
     explicit Descriptor(int number) : m_number(number) {}
     ~Descriptor() { Close(); }
+    Descriptor(const Descriptor&) = delete;
+    Descriptor& operator=(const Descriptor&) = delete;
     Descriptor(Descriptor&& other) noexcept : m_number(std::exchange(other.m_number, -1)) {}
     Descriptor& operator=(Descriptor&& other) noexcept {
         std::swap(m_number, other.m_number); // the other one closes what was ours
