@@ -4,12 +4,15 @@
 
 #include "Common/Common.h"
 #include "Frame/FrameWorker.h"
+#include "Ledger/Outcome.h"
 #include "Metrik/MetrikMgr.h"
 #include "SystemTool/IO/JsonDocument.h"
 
 namespace SyncServiceReport {
 namespace {
 
+using ReportLedger::Ended;
+using ReportLedger::Outcome;
 using SystemTool::IO::JsonDocument;
 
 std::string TimeText(const JsonDocument& createTime) {
@@ -22,7 +25,9 @@ std::string TimeText(const JsonDocument& createTime) {
 
 } // namespace
 
-ReportServer::ReportServer() = default;
+ReportServer::ReportServer() {
+    WatchBy(m_intake);
+}
 
 ReportServer::~ReportServer() {
     Stop();
@@ -53,28 +58,33 @@ void ReportServer::Stop() {
 bool ReportServer::Recv(const std::string& msg) {
     // The received text is the format string, deliberately. One that boost::format cannot make sense of is
     // found in the log by its "[BoostLogError]" mark; it is processed like any other.
-    WriteLog({LogLevel::Info, "Recv", 42}, msg);
+    if (!WriteLog({LogLevel::Info, "Recv", 42}, msg))
+        m_ledger.CouldNotFormat();
     Produce(msg);
+    m_ledger.Queued();
     return true;
 }
 
 bool ReportServer::Consume(const std::string& msg) {
+    // How a report ended is named where that is known; what is named here is what a destination's answer alone tells.
+    const ReportLedger::Handling handling(m_ledger);
     try {
         // A search of the raw text and no parse, deliberately: it is what tells the two kinds of message
         // apart.
         if (msg.find(Wire::REPORT_MARK) == std::string::npos) {
-            m_pMetrikMgr->Update(msg);
+            Ended(m_pMetrikMgr->Update(msg) ? Outcome::OtherControl : Outcome::Exception);
             return true;
         }
         ST_OptLog log;
         if (!JsonToStruct(msg, log))
             return false;
         if (log.eventID.substr(0, 1) == Wire::ANALYTICS_PREFIX)
-            m_pMetrikMgr->Send(log);
+            Ended(m_pMetrikMgr->Send(log) ? Outcome::ToAnalytics : Outcome::Analytics);
         else
-            m_pFrameWorker->Send(log);
+            Ended(m_pFrameWorker->Send(log) ? Outcome::Stored : Outcome::Store);
         return true;
     } catch (...) {
+        Ended(Outcome::Exception);
         return LogCaughtException({LogLevel::Warning, "Consume", 76});
     }
 }
@@ -102,6 +112,7 @@ bool ReportServer::JsonToStruct(const std::string& json, ST_OptLog& out) {
         if (!error.empty()) {
             WriteLog({LogLevel::Error, "JsonToStruct", 123},
                      error); // the parser's text is the format, deliberately
+            Ended(Outcome::NotJson);
             return false;
         }
         out.eventID = report.GetKeyValue(Wire::REPORT_MARK).ToString();
@@ -112,6 +123,7 @@ bool ReportServer::JsonToStruct(const std::string& json, ST_OptLog& out) {
         out.isDayReport = report.GetKeyValue("isDayReport").ToInt() == 1;
         return true;
     } catch (...) {
+        Ended(Outcome::Exception);
         return LogCaughtException({LogLevel::Warning, "JsonToStruct", 164});
     }
 }

@@ -4,9 +4,11 @@
 
 #include <Poco/SharedPtr.h>
 
+#include "App/IntakeWatch.h"
 #include "App/PocoTasker.h"
 #include "App/UDPServer.h"
 #include "Common/Records.h"
+#include "Ledger/Writer.h"
 
 namespace SyncServiceReport {
 
@@ -42,6 +44,9 @@ public:
 
     void Stop();
 
+    /// Counts every report, and what became of it. In memory only, until its owner opens its file, which is before Start.
+    ReportLedger::Writer& Ledger() { return m_ledger; }
+
     /// Logs and queues a datagram's text; always true.
     bool Recv(const std::string& msg) override;
 
@@ -69,6 +74,8 @@ private:
     Poco::SharedPtr<MetrikMgr> m_pMetrikMgr;
     Poco::SharedPtr<FrameWorker> m_pFrameWorker;
     ST_BaseInfo m_baseInfo;
+    ReportLedger::Writer m_ledger;
+    IntakeWatch m_intake{m_ledger, m_socket};
 };
 
 } // namespace SyncServiceReport

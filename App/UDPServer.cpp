@@ -116,6 +116,8 @@ bool UDPServer::WaitForDatagram() {
         if (!readable)
             m_poll->add(m_socket, Poco::Net::PollSet::POLL_READ); // throws when the kernel dropped it
         m_pollFailed = false;
+        if (!readable && m_watch != nullptr)
+            m_watch->Idle();
         return readable;
     } catch (...) {
         if (!m_pollFailed)
@@ -136,14 +138,18 @@ bool UDPServer::ReceiveOne(Buffer& buffer) {
     try {
         buffer.Clear();
         const int bytes = m_socket.receiveFrom(buffer.Data(), Wire::MAX_BYTES, buffer.m_sender);
-        received = true;
+        received = bytes >= 0;
+        if (received && m_watch != nullptr)
+            m_watch->Received(static_cast<std::size_t>(bytes));
         if (bytes >= 1)
             Recv(buffer.Text());
-        return bytes >= 0;
+        return received;
     } catch (...) {
         PrintCaughtException();
         if (!received)
             m_poll.reset();
+        else if (m_watch != nullptr)
+            m_watch->Failed();
         return false;
     }
 }

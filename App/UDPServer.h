@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstddef>
 #include <optional>
 #include <string>
 
@@ -7,6 +8,22 @@
 #include <Poco/Net/PollSet.h>
 #include <Poco/Runnable.h>
 #include <Poco/Thread.h>
+
+/// Is told what the receiver sees and its texts do not show. All of it on the receiving thread, and none of it may throw or
+/// wait.
+class DatagramWatch {
+public:
+    virtual ~DatagramWatch() = default;
+
+    /// A datagram of so many bytes was taken from the socket, also one of none, which goes no further.
+    virtual void Received(std::size_t bytes) = 0;
+
+    /// An exception cost the datagram that was received last.
+    virtual void Failed() = 0;
+
+    /// No datagram came within a poll's timeout.
+    virtual void Idle() = 0;
+};
 
 /// Receives datagrams on a thread of its own and hands each one, as text, to Recv. Knows nothing of what they mean.
 ///
@@ -44,6 +61,9 @@ protected:
     /// ignored, and an exception costs this datagram only.
     virtual bool Recv(const std::string& msg) = 0;
 
+    /// Tells `watch` from now on, which must live as long as the receiver runs. Before Start.
+    void WatchBy(DatagramWatch& watch) { m_watch = &watch; }
+
     Poco::Thread m_thread;
     Poco::Net::DatagramSocket m_socket;
 
@@ -63,4 +83,6 @@ private:
 
     /// Whether the last poll failed, so that a socket that stays broken is reported once.
     bool m_pollFailed = false;
+
+    DatagramWatch* m_watch = nullptr; ///< Not owned; without one, nobody is told.
 };

@@ -8,6 +8,8 @@
 #include "Common/Common.h"
 #include "SystemTool/BSException.h"
 #include "SystemTool/IO/StandardDescriptors.h"
+#include "SystemTool/Platform.h"
+#include "SystemTool/Version.h"
 
 using namespace SyncServiceReport;
 
@@ -30,6 +32,13 @@ void ConfigureLog() {
     }
 }
 
+/// Behind the instance check, so that a refused second instance does not touch what the first one counts. A file that cannot
+/// be had costs the file and nothing else.
+void OpenLedger(ReportLedger::Writer& ledger) {
+    ledger.Open(Paths::Run(SystemTool::CommonTool::GetUserDataDir()), SystemTool::Version::Number(),
+                SystemTool::Version::BuildId(), SystemTool::Platform::CoarseTimeMs());
+}
+
 } // namespace
 
 int main() {
@@ -44,6 +53,7 @@ int main() {
     }
     Poco::Event stopEvent(Poco::Event::EVENT_AUTORESET);
     Poco::SharedPtr<ReportServer> server(new ReportServer);
+    OpenLedger(server->Ledger());
     server->Start();  // a start that failed has been logged; what does run is worth keeping
     stopEvent.wait(); // for ever: the service ends by a signal
     return 0;

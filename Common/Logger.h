@@ -54,11 +54,11 @@ struct LogSite {
 /// instead. People search the log for that mark to find datagrams with percent signs.
 ///
 /// Never throws, whatever the logger does, also where the report of a failed write fails itself: a log line is not worth
-/// a report.
+/// a report. False when such an Error line took the text's place.
 template <typename... Arguments>
-static void WriteLog(const LogSite& site, const std::string& format, const Arguments&... arguments) noexcept {
+static bool WriteLog(const LogSite& site, const std::string& format, const Arguments&... arguments) noexcept {
     if (pSysLog == nullptr)
-        return;
+        return true;
     const auto write = [&site](LogLevel level, const std::string& text) {
         pSysLog->WriteLog(static_cast<int>(level), "", std::string(site.file), site.function, site.line, text,
                           0);
@@ -66,13 +66,16 @@ static void WriteLog(const LogSite& site, const std::string& format, const Argum
     try {
         try {
             if (sizeof...(arguments) == 0 && IsOwnText(format))
-                return write(site.level, format);
-            write(site.level, BuildLogText(format, arguments...));
+                write(site.level, format);
+            else
+                write(site.level, BuildLogText(format, arguments...));
         } catch (const std::exception& error) {
             write(LogLevel::Error, std::string("[BoostLogError]") + error.what());
+            return false;
         }
     } catch (...) { // the logger itself is failing: there is nobody left to tell
     }
+    return true;
 }
 
 /// Logs the exception under way. Throws when there is no memory for its text.

@@ -31,4 +31,9 @@ inline std::string ServiceLogs(const std::string& userData) {
     return Logs(userData) + "/metrik";
 }
 
+/// What belongs to the running service: its ledger.
+inline std::string Run(const std::string& userData) {
+    return Suite(userData) + "/run";
+}
+
 } // namespace SyncServiceReport::Paths

@@ -29,6 +29,9 @@ public:
     /// Takes the plug-in's object from now on; always true.
     bool Init(ISqliteDatabase* db);
 
+    /// Whether there is an object to call.
+    bool HasDatabase() const { return m_pSqliteDb != nullptr; }
+
     bool CreateTable(const std::string& sql);
     bool ExecSql(const std::string& sql) const;
 

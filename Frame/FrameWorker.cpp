@@ -9,8 +9,12 @@
 #include "App/ReportServer.h"
 #include "Common/Common.h"
 #include "Frame/DBHelper.h"
+#include "Ledger/Outcome.h"
 
 namespace SyncServiceReport {
+
+using ReportLedger::Ended;
+using ReportLedger::Outcome;
 
 FrameWorker::FrameWorker(ReportServer* server) : m_pServer(server) {}
 
@@ -67,8 +71,11 @@ bool FrameWorker::Send(const ST_OptLog& log) {
             fmt::format("insert into OperLog (eventID,value,createTime,pType,extData3,extData4) "
                         "values('{}', '{}','{}',{},'{}','{}')",
                         log.eventID, log.value, log.createTime, log.pType, info.suiteVersion, info.openID);
+        if (!DBHelper::instance().HasDatabase())
+            Ended(Outcome::NoStore);
         return DBHelper::instance().ExecSql(sql);
     } catch (...) {
+        Ended(Outcome::Exception);
         return LogCaughtException({LogLevel::Warning, "Send"});
     }
 }

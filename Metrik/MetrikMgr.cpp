@@ -2,12 +2,15 @@
 
 #include "App/ReportServer.h"
 #include "Common/Common.h"
+#include "Ledger/Outcome.h"
 #include "Metrik/MetrikWorker.h"
 #include "SystemTool/IO/JsonDocument.h"
 
 namespace SyncServiceReport {
 namespace {
 
+using ReportLedger::Ended;
+using ReportLedger::Outcome;
 using SystemTool::IO::JsonDocument;
 
 ST_InitMsg InitMsgFrom(const JsonDocument& exdata) {
@@ -55,6 +58,7 @@ bool MetrikMgr::Update(const std::string& json) {
         if (!error.empty()) {
             // The log's readers search for this spelling.
             WriteLog({LogLevel::Error, "Update", 53}, "json formate error :%s", error);
+            Ended(Outcome::NotJson);
             return false;
         }
         const std::string msgType = message.GetKeyValue(Wire::MESSAGE_KIND).ToString();
@@ -76,6 +80,8 @@ bool MetrikMgr::Update(const std::string& json) {
             info.suiteVersion = version;
             m_pServer->SetBaseInfo(info);
         }
+        if (msgType == ORVEK_REPORT_MODULEINIT || msgType == ORVEK_REPORT_UPDATEOPENID)
+            Ended(Outcome::Control);
         return true;
     } catch (...) {
         return LogCaughtException({LogLevel::Warning, "Update", 93});
@@ -87,17 +93,20 @@ bool MetrikMgr::Send(const ST_OptLog& log) {
         const auto bar = log.eventID.find('|');
         if (bar == std::string::npos) {
             WriteLog({LogLevel::Warning, "Send", 107}, "eventID error :%s", log.eventID);
+            Ended(Outcome::EventIdWithoutBar);
             return false;
         }
         const std::string module = log.eventID.substr(0, bar);
         const auto found = m_mapWorkers.find(module);
         if (found == m_mapWorkers.end()) {
             WriteLog({LogLevel::Warning, "Send", 115}, "module not init :%s", module);
+            Ended(Outcome::ModuleNotInit);
             return false;
         }
         Poco::SharedPtr<IWorker> worker = found->second;
         return worker->Send(log);
     } catch (...) {
+        Ended(Outcome::Exception);
         return LogCaughtException({LogLevel::Warning, "Send", 122});
     }
 }

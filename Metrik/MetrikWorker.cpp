@@ -4,10 +4,13 @@
 
 #include "App/ReportServer.h"
 #include "Common/Common.h"
+#include "Ledger/Outcome.h"
 #include "SystemTool/IO/JsonDocument.h"
 
 namespace SyncServiceReport {
 
+using ReportLedger::Ended;
+using ReportLedger::Outcome;
 using SystemTool::IO::JsonDocument;
 
 // NOLINTBEGIN(performance-unnecessary-value-param): the SDK's callbacks take their texts by value
@@ -81,6 +84,7 @@ bool MetrikWorker::Send(const ST_OptLog& log) {
             if (!error.empty()) {
                 WriteLog({LogLevel::Error, "Send", 107},
                          error); // the parser's text is the format, deliberately
+                Ended(Outcome::ValueNotJson);
                 return false;
             }
         }
@@ -92,6 +96,7 @@ bool MetrikWorker::Send(const ST_OptLog& log) {
         root.SetKeyValue("eventData", eventData);
         return m_pSdk->ReportEvent(log.eventID, root.ToJson());
     } catch (...) {
+        Ended(Outcome::Exception);
         return LogCaughtException({LogLevel::Warning, "Send", 121});
     }
 }

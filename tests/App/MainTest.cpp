@@ -11,6 +11,7 @@
 
 #include "SystemTool/CommonTool.h"
 #include "SystemTool/IO/Directory.h"
+#include "tests/support/TemporaryDirectory.h"
 #include "tests/support/WaitUntil.h"
 
 using ::testing::HasSubstr;
@@ -26,6 +27,7 @@ public:
     explicit Program(const char* environment, rlim_t stackBytes = RLIM_INFINITY) {
         if (::pipe(m_output) != 0)
             throw std::runtime_error("no pipe");
+        ::setenv("XDG_DATA_HOME", m_data.Path().c_str(), 1); // where it keeps its ledger
         m_process = ::fork();
         if (m_process == 0) {
             ::dup2(m_output[1], STDOUT_FILENO);
@@ -80,6 +82,7 @@ public:
 
 private:
     pid_t m_process;
+    TemporaryDirectory m_data;
     int m_output[2];
     std::string m_text;
 };

@@ -63,6 +63,8 @@ public:
         return m_received;
     }
 
+    using UDPServer::WatchBy;
+
     bool IsRunning() const { return m_thread.isRunning(); }
 
     /// Whether the receiving thread, which must have received something, waits for more.
@@ -114,6 +116,30 @@ public:
 
 private:
     std::atomic<pid_t>& m_threadId;
+};
+
+/// What a receiver tells its watch, in words.
+class Watch final : public DatagramWatch {
+public:
+    void Received(std::size_t bytes) override { Tell(std::to_string(bytes)); }
+    void Failed() override { Tell("failed"); }
+    void Idle() override { ++m_idle; }
+
+    std::vector<std::string> Told() {
+        const std::lock_guard lock(m_mutex);
+        return m_told;
+    }
+    int TimesIdle() const { return m_idle; }
+
+private:
+    void Tell(const std::string& word) {
+        const std::lock_guard lock(m_mutex);
+        m_told.push_back(word);
+    }
+
+    std::mutex m_mutex; ///< Guards the words.
+    std::vector<std::string> m_told;
+    std::atomic<int> m_idle = 0;
 };
 
 class UDPServerTest : public ::testing::Test {
@@ -347,4 +373,38 @@ TEST_F(UDPServerTest, HasTheLargestReceiveBufferThatTheKernelGrants) {
     Poco::Net::DatagramSocket asked(SocketAddress(LOOPBACK, 0));
     asked.setReceiveBufferSize(8 * 1024 * 1024);
     EXPECT_EQ(m_receiver.ReceiveBufferBytes(), asked.getReceiveBufferSize());
+}
+
+TEST_F(UDPServerTest, TellsItsWatchOfEachDatagramAlsoOfWhatGoesNoFurther) {
+    Watch watch;
+    m_receiver.WatchBy(watch);
+    ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
+    Send("");
+    Send("throw std");
+    Send(std::string(10239, 'x'));
+    Send(std::string(20000, 'x'));
+    Await(3);
+    EXPECT_THAT(watch.Told(), ElementsAre("0", "9", "failed", "10239", "10240"));
+    m_receiver.Stop();
+}
+
+TEST_F(UDPServerTest, TellsItsWatchWhenNothingComes) {
+    Watch watch;
+    m_receiver.WatchBy(watch);
+    ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
+    EXPECT_TRUE(WaitUntil([&] { return watch.TimesIdle() >= 2; }));
+    m_receiver.Stop();
+    EXPECT_THAT(watch.Told(), ElementsAre());
+}
+
+TEST_F(UDPServerTest, TellsNobodyOfAReceiveThatFailed) {
+    Watch watch;
+    m_receiver.WatchBy(watch);
+    ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
+    Send("fail the next receive");
+    Await(1);
+    Send("after");
+    Await(2);
+    EXPECT_THAT(watch.Told(), ElementsAre("21", "5"));
+    m_receiver.Stop();
 }

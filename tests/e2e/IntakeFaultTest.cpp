@@ -32,4 +32,11 @@ TEST(IntakeFault, AStoppedServiceLosesWhatDoesNotFitTheSocketAndStoresTheRest) {
         Service::Send(R"({"eventID":"B2|1"})");
     EXPECT_TRUE(WaitUntil([&] { return service.RowCount() == rows + 100; }));
     EXPECT_EQ(Service::DroppedByKernel(), dropped);
+    EXPECT_TRUE(WaitUntil([&] {
+        return service.Counted(ReportLedger::DROPPED_BY_KERNEL) == static_cast<std::uint64_t>(dropped);
+    })) << "the ledger has them too";
+    service.Kill();
+    service.Start();
+    EXPECT_EQ(service.Counted(ReportLedger::DROPPED_BY_KERNEL), static_cast<std::uint64_t>(dropped))
+        << "the next socket counts from 0";
 }

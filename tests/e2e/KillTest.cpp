@@ -158,6 +158,8 @@ protected:
         ASSERT_TRUE(WaitUntil([&] { return m_reader.Continue() > sent; }, READY_WITHIN + 10s));
         const Milliseconds took = Clock::now() - begin;
         EXPECT_LT(took, READY_WITHIN);
+        EXPECT_TRUE(m_service.Books().counting);
+        EXPECT_TRUE(m_service.Books().balanced);
         m_longestStart = std::max(m_longestStart, took);
     }
 
@@ -185,6 +187,23 @@ protected:
         m_dropped += std::max(std::int64_t{0}, Service::DroppedByKernel());
         m_service.Kill();
         m_killedAt.push_back(load.Sent());
+        ExpectTrueLedger();
+    }
+
+    /// What was received has ended or is lost, and nothing that was counted before is gone.
+    void ExpectTrueLedger() {
+        const auto books = m_service.Books();
+        if (books.sight == ReportLedger::Sight::Missing) // the first one was killed before it made one
+            return;
+        ASSERT_EQ(books.sight, ReportLedger::Sight::Sound);
+        EXPECT_FALSE(books.counting);
+        EXPECT_EQ(books.total[ReportLedger::RECEIVED],
+                  ReportLedger::EndedIn(books.total) + books.total[ReportLedger::LOST_AT_ENDS]);
+        for (unsigned i = 0; i < ReportLedger::COUNTERS; ++i)
+            if (i != ReportLedger::RECEIVING && i != ReportLedger::MOST_WAITING_SINCE_START) {
+                EXPECT_GE(books.total[i], m_counted[i]) << "place " << i;
+            }
+        m_counted = books.total;
     }
 
     void ExpectSoundDatabases() {
@@ -228,6 +247,7 @@ protected:
     std::int64_t m_events = 0;            ///< In the outbox before the last kill.
     std::int64_t m_mostLost = 0;          ///< Reports that were sent, and not in the store when a kill came.
     Milliseconds m_longestStart{0};
+    ReportLedger::Counts m_counted{}; ///< By the ledger, at the last kill.
 };
 
 } // namespace
@@ -251,8 +271,11 @@ TEST_F(Kill, CostsNoRowThatWasCommittedAndTheNextStartTakesReportsAtOnce) {
     m_reader.VerifyAllAgain();
     m_reader.ExpectWhatWasSeen();
     ASSERT_NO_FATAL_FAILURE(ExpectOrderWithoutGaps());
+    EXPECT_GE(m_service.Counted(ReportLedger::Outcome::Stored) + kills, m_reader.Numbers().size())
+        << "each row but those that a kill left uncounted";
+    EXPECT_EQ(m_service.Books().begun, ReportLedger::Begun::NoFile) << "it was never found damaged";
     std::cout << kills << " kills, " << m_reader.Numbers().size() << " rows, " << EventCount() << " events, "
               << m_dropped << " dropped by the kernel; from start to a stored report at most "
               << m_longestStart.count() << " ms; sent and not stored at a kill at most " << m_mostLost
-              << std::endl;
+              << "; lost at ends by the ledger " << m_counted[ReportLedger::LOST_AT_ENDS] << std::endl;
 }

@@ -51,13 +51,17 @@ std::string Report(int i) {
            R"(","value":{"button":"save","page":"editor","count":3,"text":"as people write it"},"createTime":1700000000})";
 }
 
-void SendAtRate(int first, int end) {
+/// Looks now and then.
+template <typename Action>
+void SendAtRate(int first, int end, Action look) {
     const auto begin = std::chrono::steady_clock::now();
     for (int i = first; i < end; ++i) {
         const auto due = begin + std::chrono::microseconds(1'000'000LL * (i - first) / RATE);
         if (std::chrono::steady_clock::now() < due)
             std::this_thread::sleep_until(due); // the pace, not a wait for anything
         Service::Send(Report(i));
+        if (i % 1000 == 0)
+            look();
     }
 }
 
@@ -100,7 +104,7 @@ TEST(Load, EveryReportEndsSomewhereInOrder) {
     LogCount log(service.DataDirectory() + "/hublink/log/metrik");
     int stretches = 0;
     for (int first = 0; first < sent; first += STRETCH, ++stretches) {
-        SendAtRate(first, std::min(first + STRETCH, sent));
+        SendAtRate(first, std::min(first + STRETCH, sent), [&] { ASSERT_TRUE(service.Books().balanced); });
         service.AwaitQuiet();
         log.Continue();
     }
@@ -112,6 +116,14 @@ TEST(Load, EveryReportEndsSomewhereInOrder) {
     EXPECT_EQ(sent, rows + events + log.Refused() + dropped);
     EXPECT_EQ(dropped, 0) << "at this rate the receiver keeps up";
     EXPECT_EQ(log.Received(), sent + stretches - dropped) << "with the markers, each one is in the log";
+
+    const auto counted = [&](ReportLedger::Outcome outcome) {
+        return static_cast<std::int64_t>(service.Counted(outcome));
+    };
+    EXPECT_EQ(counted(ReportLedger::Outcome::Stored), rows + stretches);
+    EXPECT_EQ(counted(ReportLedger::Outcome::ToAnalytics), events);
+    EXPECT_EQ(counted(ReportLedger::Outcome::NotJson), log.Refused());
+    EXPECT_TRUE(service.Books().balanced);
 
     int events_expected = 0;
     int refused_expected = 0;

@@ -114,7 +114,20 @@ void HostileFixture::ExpectSoundness(std::int64_t rows, std::int64_t events) {
     ASSERT_TRUE(m_service.IsRunning());
     ExpectSoundDatabases(rows, events);
     ExpectOneLineForEachRecord();
+    ExpectTrueLedger();
     ExpectNothingHasGrown();
+}
+
+void HostileFixture::ExpectTrueLedger() {
+    const auto books = m_service.Books();
+    EXPECT_TRUE(books.balanced);
+    EXPECT_EQ(books.total[ReportLedger::RECEIVED], m_sent);
+    EXPECT_EQ(ReportLedger::EndedIn(books.total), m_sent) << "the good one came last";
+    EXPECT_EQ(m_service.Counted(ReportLedger::Outcome::Stored),
+              static_cast<std::uint64_t>(m_service.RowCount()) + 1)
+        << "with the marker, which was taken out";
+    EXPECT_EQ(books.total[ReportLedger::LOST_AT_ENDS], 0U);
+    EXPECT_EQ(books.total[ReportLedger::DROPPED_BY_KERNEL], 0U);
 }
 
 void HostileFixture::ExpectTheNextReportIsStored() {

@@ -19,7 +19,7 @@ protected:
     void Send(const std::string& datagram);
 
     /// The next report is stored in time, the store and the outbox have got so many rows and events and are sound, the
-    /// log is one line for each record, and neither memory nor descriptors nor threads nor files have grown.
+    /// log is one line for each record, the ledger has them all, and neither memory nor descriptors nor threads nor files have grown.
     void ExpectSoundness(std::int64_t rows, std::int64_t events);
 
     /// An empty directory that the service was started in.
@@ -42,6 +42,7 @@ private:
     void ExpectTheNextReportIsStored();
     void ExpectSoundDatabases(std::int64_t rows, std::int64_t events);
     void ExpectOneLineForEachRecord();
+    void ExpectTrueLedger();
     void ExpectNothingHasGrown();
 
     TemporaryDirectory m_workingDirectory;

@@ -67,10 +67,22 @@ Service::Service() {
 }
 
 Service::~Service() {
+    ExpectBalance();
     Kill();
     // A program with a data race goes on after the report.
     if (const auto output = Output(); output.find("Sanitizer: ") != std::string::npos)
         ADD_FAILURE() << output;
+}
+
+/// Whatever happened to the service: what it received has ended, waits, or was lost. There is no ledger where the disk took
+/// none.
+void Service::ExpectBalance() {
+    const auto isBalanced = [this] {
+        const auto books = Books();
+        return books.sight != ReportLedger::Sight::Damaged && (!books.counting || books.balanced);
+    };
+    EXPECT_TRUE(WaitUntil(isBalanced, std::chrono::seconds(1)))
+        << ReportLedger::UnaccountedIn(Books().total) << " reports are missing in the ledger";
 }
 
 void Service::Remove(const std::string& plugin) {

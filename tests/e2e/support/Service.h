@@ -8,11 +8,12 @@
 
 #include <sys/types.h>
 
+#include "Ledger/Reader.h"
 #include "tests/support/TemporaryDirectory.h"
 
 /// The real program with the real plug-ins, in a user data directory of its own. The sandbox of the test
 /// gives it port 9997 and the pid file's directory. Killed by the destructor, which fails the test when a sanitizer found
-/// something in it.
+/// something in it, or when its ledger does not balance.
 class Service {
 public:
     /// A line of the log, taken apart.
@@ -81,6 +82,7 @@ public:
     std::string LogFile() const { return DataDirectory() + "/hublink/log/metrik/Report.log"; }
     std::string DatabaseFile() const { return DataDirectory() + "/hublink/database/Report.db"; }
     std::string OutboxFile() const { return DataDirectory() + "/hublink/database/MetrikOutbox.db"; }
+    std::string LedgerFile() const { return DataDirectory() + "/hublink/run/Report.ledger"; }
     static constexpr auto PID_FILE = "/Library/Preferences/hublink/Report.pid";
 
     /// What the program, and reportctl, wrote to standard output and standard error.
@@ -102,6 +104,15 @@ public:
     std::int64_t Count(const std::string& file, const std::string& sql) const;
     std::int64_t RowCount() const { return Count(DatabaseFile(), "select count(*) from OperLog"); }
 
+    /// What its ledger says.
+    ReportLedger::Look Books() const { return ReportLedger::LookAt(LedgerFile()); }
+
+    /// One number of it, since the service was installed.
+    std::uint64_t Counted(ReportLedger::Counter counter) const { return Books().total[counter]; }
+    std::uint64_t Counted(ReportLedger::Outcome outcome) const {
+        return Books().total[static_cast<unsigned>(outcome)];
+    }
+
     /// Of its memory, what the machine has in use for it.
     long ResidentKilobytes() const;
 
@@ -115,6 +126,7 @@ public:
     static bool TookAllDatagrams();
 
 private:
+    void ExpectBalance();
     std::vector<std::string> Environment() const;
     pid_t Spawn(const std::string& program, const std::vector<std::string>& arguments) const;
 
