@@ -133,6 +133,15 @@ def queue(found):
     return table(["the queue", ""], rows)
 
 
+def ledger(found):
+    times = found["service"]
+    with_it, without = times["QueuedWithLedger"], times["QueuedWithoutLedger"]
+    return table(["processor time for a report", ""],
+                 [("what both threads count of it, alone", f"{times['CountedReport']:.1f} ns"),
+                  ("into the queue and out of it, without the ledger", f"{without:.1f} ns"),
+                  ("the same with the ledger", f"{with_it:.1f} ns"), ("difference", f"{with_it - without:.1f} ns")])
+
+
 def rest(found):
     run = found["service"]
     return table(["while nobody sends", ""], [("from start to bound socket", f"{run['ready_ms']:.1f} ms"),
@@ -141,4 +150,4 @@ def rest(found):
 
 
 SECTIONS = {"rates": rates, "floods": floods, "latencies": latencies, "baselines": baselines, "growth": growth,
-            "queue": queue, "rest": rest}
+            "queue": queue, "ledger": ledger, "rest": rest}

@@ -59,6 +59,7 @@ TARGETS = (
     Target("rows a second into the largest table, against an empty one", 0.9, True, _growth_ratio),
     Target("memory of a queued report of 180 bytes", 400, False,
            lambda r: r["queue"]["service"]["bytes_per_item"], " bytes"),
+    Target("counting a report in the ledger", 20, False, lambda r: r["ledger"]["service"]["CountedReport"], " ns"),
     Target("latency of a report that comes alone, 99 of 100", 5, False, _lone_p99, " ms"),
 )
 
