@@ -37,9 +37,10 @@ std::optional<Identity> IdentityOf(const std::string& path) {
 }
 
 void RequireOurFiles(int directory, const std::string& name, const std::string& shown) {
-    RequireOurFile(directory, name, shown + "/" + name);
+    const std::string path = std::filesystem::path(shown) / name;
+    RequireOurFile(directory, name, path);
     for (const std::string suffix : SIDE_FILE_SUFFIXES)
-        RequireOurFile(directory, name + suffix, shown + "/" + name + suffix);
+        RequireOurFile(directory, name + suffix, path + suffix);
 }
 
 void RequireOurFiles(const std::string& path) {
