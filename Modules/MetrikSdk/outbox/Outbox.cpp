@@ -115,7 +115,7 @@ void Outbox::LearnAbout(OutboxStore& store) {
 void Outbox::Recount(OutboxStore& store) {
     const auto status = store.Status();
     m_waitingEvents = status.waiting;
-    m_waitingBytes = status.waitingBytes;
+    m_waitingBytes = status.waitingBytes + status.moduleBytes; // both are on the disk
     m_waitingCount.Set(m_waitingEvents);
 }
 

@@ -6,16 +6,15 @@ namespace MetrikSdk::outbox {
 
 /// "MOBX": lets file(1) and a person tell an outbox from another database.
 constexpr int APPLICATION_ID = 0x4d4f4258;
-constexpr int SCHEMA_VERSION = 1;
+constexpr int SCHEMA_VERSION = 2;
 
-/// The trigger keeps the sums right in the very statement that stores an event, so that storing is one
-/// statement, and nothing ever has to count the events.
-constexpr const char* SCHEMA = R"sql(
+constexpr const char* TABLES = R"sql(
 CREATE TABLE module(
     id            INTEGER PRIMARY KEY,
     module_id     TEXT    NOT NULL UNIQUE,
     last_sequence INTEGER NOT NULL DEFAULT 0,
-    stored_bytes  INTEGER NOT NULL DEFAULT 0);
+    stored_bytes  INTEGER NOT NULL DEFAULT 0,
+    last_event    INTEGER NOT NULL DEFAULT 0);
 CREATE TABLE module_release(
     id      INTEGER PRIMARY KEY,
     module  INTEGER NOT NULL REFERENCES module(id),
@@ -54,17 +53,47 @@ CREATE TABLE totals(
     dropped              INTEGER NOT NULL DEFAULT 0,
     removed_bytes        INTEGER NOT NULL DEFAULT 0,
     dead_letters         INTEGER NOT NULL DEFAULT 0,
-    dead_letter_bytes    INTEGER NOT NULL DEFAULT 0);
+    dead_letter_bytes    INTEGER NOT NULL DEFAULT 0,
+    forgotten_stored     INTEGER NOT NULL DEFAULT 0,
+    forgotten_bytes      INTEGER NOT NULL DEFAULT 0);
+)sql";
+
+/// From version 1, whose modules were kept for ever. Which of them have an event waiting is not known: until the last that
+/// waits now has left, all of them count as such.
+constexpr const char* MIGRATION = R"sql(
+ALTER TABLE module ADD COLUMN last_event INTEGER NOT NULL DEFAULT 0;
+UPDATE module SET last_event = (SELECT coalesce(max(id), 0) FROM event);
+ALTER TABLE totals ADD COLUMN forgotten_stored INTEGER NOT NULL DEFAULT 0;
+ALTER TABLE totals ADD COLUMN forgotten_bytes INTEGER NOT NULL DEFAULT 0;
+DROP TRIGGER event_stored;
+DROP VIEW outbox_status;
+)sql";
+
+/// The trigger keeps the sums right in the very statement that stores an event, so that storing is one statement, and
+/// nothing ever has to count the events.
+///
+/// What a module's rows and their indexes cost is estimated from above: a text over some 200 bytes takes a page of its own
+/// in an index.
+constexpr const char* TRIGGER_AND_VIEW = R"sql(
+CREATE INDEX dead_letter_module ON dead_letter(module);
 CREATE TRIGGER event_stored AFTER INSERT ON event BEGIN
-    UPDATE module SET last_sequence = NEW.sequence, stored_bytes = stored_bytes + NEW.bytes
+    UPDATE module SET last_sequence = NEW.sequence, stored_bytes = stored_bytes + NEW.bytes,
+                      last_event = NEW.id
         WHERE id = NEW.module;
 END;
 CREATE VIEW outbox_status AS
     SELECT outbox_id, stored, delivered, refused, dead_lettered, dropped,
            stored - delivered - refused - dead_lettered - dropped AS waiting,
-           stored_bytes - removed_bytes AS waiting_bytes, dead_letters, dead_letter_bytes
-    FROM totals, (SELECT coalesce(sum(last_sequence), 0) AS stored,
-                         coalesce(sum(stored_bytes), 0) AS stored_bytes FROM module);
+           stored_bytes - removed_bytes AS waiting_bytes, dead_letters, dead_letter_bytes, modules,
+           module_text_bytes + release_bytes AS module_bytes
+    FROM (SELECT totals.*, forgotten_stored + in_modules AS stored,
+                 forgotten_bytes + bytes_in_modules AS stored_bytes, modules, module_text_bytes
+          FROM totals, (SELECT count(*) AS modules, coalesce(sum(last_sequence), 0) AS in_modules,
+                               coalesce(sum(stored_bytes), 0) AS bytes_in_modules,
+                               coalesce(sum(150 + 3 * octets + (octets > 200) * 1024), 0) AS module_text_bytes
+                        FROM (SELECT *, length(CAST(module_id AS BLOB)) AS octets FROM module))),
+         (SELECT coalesce(sum(150 + 3 * octets + (octets > 200) * 1024), 0) AS release_bytes
+          FROM (SELECT length(CAST(version AS BLOB)) + length(CAST(name AS BLOB)) AS octets FROM module_release));
 )sql";
 
 } // namespace MetrikSdk::outbox

@@ -20,6 +20,17 @@ constexpr std::size_t ROW_OVERHEAD_BYTES = 80;
 /// Modules whose keys are kept in memory. Any more are looked up for their next event.
 constexpr std::size_t MAX_KNOWN_MODULES = 1000;
 
+/// Modules that are forgotten in one transaction: some milliseconds of one call.
+constexpr std::int64_t MAX_FORGOTTEN_AT_ONCE = 1000;
+
+constexpr const char* NEWEST_RELEASE = "SELECT coalesce(max(id), 0) FROM module_release";
+
+/// As the view estimates it; a module that the file knew by another version counts a little too much.
+std::size_t BytesOf(const ModuleIdentity& module) {
+    const auto cost = [](std::size_t octets) { return 150 + 3 * octets + (octets > 200 ? 1024U : 0U); };
+    return cost(module.id.size()) + cost(module.version.size() + module.name.size());
+}
+
 std::int64_t Number(SQLite::Database& database, const char* query) {
     return database.execAndGet(query).getInt64();
 }
@@ -43,7 +54,8 @@ OutboxStore::OutboxStore(const std::string& path, std::chrono::milliseconds lock
         m_insert = std::make_unique<SQLite::Statement>(
             m_database,
             "INSERT INTO event(uuid, module, release, sequence, event_id, payload, stored_ms, bytes) "
-            "SELECT ?1, id, ?3, last_sequence + 1, ?4, ?5, ?6, ?7 FROM module WHERE id = ?2");
+            "SELECT ?1, m.id, r.id, last_sequence + 1, ?4, ?5, ?6, ?7 FROM module AS m "
+            "JOIN module_release AS r ON r.id = ?3 AND r.module = m.id WHERE m.id = ?2");
         m_oldest = std::make_unique<SQLite::Statement>(
             m_database, "SELECT id, uuid, release, sequence, event_id, payload, stored_ms, bytes FROM event "
                         "ORDER BY id LIMIT ?1");
@@ -83,12 +95,18 @@ void OutboxStore::CreateOrCheckSchema() {
     const auto version = Number(m_database, "PRAGMA user_version");
     const auto objects = Number(m_database, "SELECT count(*) FROM sqlite_schema");
     if (version == 0 && objects == 0) {
-        m_database.exec(SCHEMA);
+        m_database.exec(TABLES);
+        m_database.exec(TRIGGER_AND_VIEW);
         m_database.exec("PRAGMA application_id = " + std::to_string(APPLICATION_ID));
         m_database.exec("PRAGMA user_version = " + std::to_string(SCHEMA_VERSION));
         SQLite::Statement totals(m_database, "INSERT INTO totals(id, outbox_id) VALUES(1, ?1)");
         totals.bind(1, NewUuid(WallNow()));
         totals.exec();
+        transaction.commit();
+    } else if (Number(m_database, "PRAGMA application_id") == APPLICATION_ID && version == 1) {
+        m_database.exec(MIGRATION);
+        m_database.exec(TRIGGER_AND_VIEW);
+        m_database.exec("PRAGMA user_version = " + std::to_string(SCHEMA_VERSION));
         transaction.commit();
     } else if (Number(m_database, "PRAGMA application_id") != APPLICATION_ID || version != SCHEMA_VERSION) {
         throw StoreError(StoreFault::SetAside, "The file is a database, but no outbox of this version");
@@ -120,7 +138,7 @@ std::size_t OutboxStore::Store(const ModuleIdentity& module, const NewEvent& eve
         // No row means that the module was deleted under us; what else is gone, nobody can know.
         if (insert->exec() != 1)
             throw StoreError(StoreFault::Reopen, "The outbox has lost a module");
-        return bytes;
+        return bytes + keys.newBytes;
     });
 }
 
@@ -129,11 +147,14 @@ OutboxStore::ReleaseKeys OutboxStore::KeysOf(const ModuleIdentity& module) {
         return known->second;
     if (m_keys.size() >= MAX_KNOWN_MODULES)
         m_keys.clear();
-    return m_keys.emplace(module, AddRelease(module)).first->second;
+    const auto keys = AddRelease(module);
+    m_keys.emplace(module, ReleaseKeys{keys.module, keys.release});
+    return keys;
 }
 
 OutboxStore::ReleaseKeys OutboxStore::AddRelease(const ModuleIdentity& module) {
     auto transaction = WriteTransaction(m_database);
+    const auto newest = Number(m_database, NEWEST_RELEASE);
     SQLite::Statement addModule(m_database, "INSERT INTO module(module_id) VALUES(?1) "
                                             "ON CONFLICT DO UPDATE SET module_id = ?1 RETURNING id");
     addModule.bindNoCopy(1, module.id);
@@ -150,6 +171,8 @@ OutboxStore::ReleaseKeys OutboxStore::AddRelease(const ModuleIdentity& module) {
     keys.release = addRelease.getColumn(0).getInt64();
     addRelease.reset();
     transaction.commit();
+    if (keys.release > newest)
+        keys.newBytes = BytesOf(module);
     return keys;
 }
 
@@ -195,6 +218,32 @@ bool OutboxStore::Delete(const StoredEvent& event) {
     return statement->exec() == 1;
 }
 
+/// To be called in the transaction that removed events. Modules of few events go first: a flood of them does not push out
+/// one that reports every day. The newest is kept, so that no key is given out twice: another process may know it.
+void OutboxStore::ForgetIdleModules() {
+    if (Number(m_database, "SELECT EXISTS (SELECT 1 FROM event)") == 0) // the next ones get low rows again
+        m_database.exec("UPDATE module SET last_event = 0 WHERE last_event > 0");
+    const auto excess = Number(m_database, "SELECT count(*) FROM module") - MAX_IDLE_MODULES;
+    if (excess <= 0)
+        return;
+    m_database.exec("CREATE TEMP TABLE IF NOT EXISTS idle(id INTEGER PRIMARY KEY); DELETE FROM idle");
+    SQLite::Statement find(
+        m_database,
+        "INSERT INTO idle SELECT id FROM module AS m "
+        "WHERE last_event < (SELECT coalesce(min(id), 9223372036854775807) FROM event) "
+        "AND id < (SELECT max(id) FROM module) "
+        "AND id != (SELECT module FROM module_release ORDER BY id DESC LIMIT 1) "
+        "AND NOT EXISTS (SELECT 1 FROM dead_letter WHERE module = m.id) ORDER BY last_sequence, id LIMIT ?1");
+    find.bind(1, std::min(excess, MAX_FORGOTTEN_AT_ONCE));
+    if (find.exec() == 0)
+        return;
+    m_database.exec(
+        "UPDATE totals SET forgotten_stored = forgotten_stored + n, forgotten_bytes = forgotten_bytes + b "
+        "FROM (SELECT sum(last_sequence) AS n, sum(stored_bytes) AS b FROM module WHERE id IN idle)");
+    m_database.exec("DELETE FROM module_release WHERE module IN idle; DELETE FROM module WHERE id IN idle");
+    m_keys.clear();
+}
+
 void OutboxStore::CountRemoved(const char* counter, const Removed& removed) {
     SQLite::Statement update(m_database, std::string("UPDATE totals SET ") + counter + " = " + counter +
                                              " + ?1, removed_bytes = removed_bytes + ?2");
@@ -216,6 +265,7 @@ void OutboxStore::RemoveDelivered(const Batch& batch, std::size_t refused) {
         const auto rejected = std::min(static_cast<std::int64_t>(refused), removed.events);
         CountRemoved("refused", {rejected, 0});
         CountRemoved("delivered", {removed.events - rejected, removed.bytes});
+        ForgetIdleModules();
         transaction.commit();
     });
 }
@@ -241,6 +291,7 @@ void OutboxStore::MoveToDeadLetters(const StoredEvent& event, const Refusal& ref
                                                "dead_letter_bytes = dead_letter_bytes + ?1");
             held.bind(1, bytes);
             held.exec();
+            ForgetIdleModules();
         }
         transaction.commit();
     });
@@ -299,6 +350,7 @@ std::size_t OutboxStore::DropOldest(std::int64_t afterRow, WallTime before, std:
             removed.events += Delete(event) ? 1 : 0;
         if (removed.events > 0)
             CountRemoved("dropped", removed);
+        ForgetIdleModules();
         transaction.commit();
         return static_cast<std::size_t>(removed.events);
     });
@@ -307,8 +359,9 @@ std::size_t OutboxStore::DropOldest(std::int64_t afterRow, WallTime before, std:
 OutboxStatus OutboxStore::Status() {
     return Guarded("Cannot read the outbox's status", [&] {
         SQLite::Statement query(
-            m_database, "SELECT outbox_id, stored, delivered, refused, dead_lettered, dropped, waiting, "
-                        "waiting_bytes, dead_letters, dead_letter_bytes FROM outbox_status");
+            m_database,
+            "SELECT outbox_id, stored, delivered, refused, dead_lettered, dropped, waiting, "
+            "waiting_bytes, dead_letters, dead_letter_bytes, modules, module_bytes FROM outbox_status");
         query.executeStep();
         const auto number = [&](int column) { return query.getColumn(column).getInt64(); };
         return OutboxStatus{query.getColumn(0).getString(),
@@ -320,7 +373,9 @@ OutboxStatus OutboxStore::Status() {
                             number(6),
                             number(7),
                             number(8),
-                            number(9)};
+                            number(9),
+                            number(10),
+                            number(11)};
     });
 }
 

@@ -25,6 +25,8 @@ struct OutboxStatus {
     std::int64_t waitingBytes = 0;
     std::int64_t deadLetters = 0; ///< Rows that the dead-letter table holds now.
     std::int64_t deadLetterBytes = 0;
+    std::int64_t modules = 0;     ///< Known to the file.
+    std::int64_t moduleBytes = 0; ///< What they take there.
 };
 
 /// Why a collector did not take an event.
@@ -69,7 +71,8 @@ public:
     /// When it is not whole, before it is closed: whether all events are in the file all the same.
     bool Rescue();
 
-    /// Stores the event as its module's next one. Returns the bytes that it counts for.
+    /// Stores the event as its module's next one. Returns the bytes that it counts for, with those of a module that the
+    /// file did not know.
     std::size_t Store(const ModuleIdentity& module, const NewEvent& event);
 
     /// The oldest events, at most `maxEvents`, ending with the one that reaches `maxBytes`.
@@ -89,6 +92,9 @@ public:
     std::size_t DropOldest(std::int64_t afterRow, WallTime before, std::int64_t excessBytes,
                            std::size_t maxRows);
 
+    /// So many modules are remembered when nothing of theirs waits. A suite has some tens, whose numbers so go on.
+    static constexpr std::int64_t MAX_IDLE_MODULES = 1000;
+
     /// Reads the sums; grows with the number of modules, not of events.
     OutboxStatus Status();
 
@@ -96,6 +102,7 @@ private:
     struct ReleaseKeys {
         std::int64_t module;
         std::int64_t release;
+        std::size_t newBytes = 0; ///< What its rows take, when they were just made.
     };
     struct Removed {
         std::int64_t events = 0;
@@ -108,6 +115,7 @@ private:
     ReleaseKeys KeysOf(const ModuleIdentity& module);
     ReleaseKeys AddRelease(const ModuleIdentity& module);
     ModuleIdentity IdentityOf(std::int64_t release);
+    void ForgetIdleModules();
     bool Delete(const StoredEvent& event);
     void CountRemoved(const char* counter, const Removed& removed);
 

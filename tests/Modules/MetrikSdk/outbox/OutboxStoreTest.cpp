@@ -1,9 +1,12 @@
 #include "Modules/MetrikSdk/outbox/OutboxStore.h"
 
+#include <cstdlib>
+#include <filesystem>
 #include <fstream>
 #include <limits>
 
 #include <gtest/gtest.h>
+#include <sys/stat.h>
 
 #include "Modules/MetrikSdk/outbox/StoreError.h"
 #include "tests/support/TemporaryDirectory.h"
@@ -14,6 +17,8 @@ using namespace std::chrono_literals;
 namespace {
 
 const ModuleIdentity A759{"A759", "1", "default"};
+/// Written by a program of that version: three events of A759, of which the first was delivered.
+constexpr auto VERSION_1 = SSR_SOURCE_DIR "/tests/Modules/MetrikSdk/outbox/outbox-1.sql";
 const WallTime NOW{1'800'000'000s};
 constexpr WallTime NEVER_TOO_OLD{};
 constexpr std::size_t ANY_BYTES = std::numeric_limits<std::size_t>::max();
@@ -69,6 +74,56 @@ TEST_F(OutboxStoreTest, CountsEachModulesEventsFromOneAcrossRestartsDeletionsAnd
     EXPECT_EQ(sequences, (std::vector<std::int64_t>{3, 4, 2}));
     EXPECT_EQ(batch.releases.at(batch.events[0].release).version, "2");
     EXPECT_EQ(batch.releases.at(batch.events[1].release).version, "1");
+}
+
+TEST_F(OutboxStoreTest, ForgetsModulesOfWhichNothingWaitsOnceThereAreTooMany) {
+    Store(A759, "1");
+    Store(A759, "2");
+    const auto many = outbox::OutboxStore::MAX_IDLE_MODULES + 500;
+    for (int i = 0; i < many; ++i)
+        Store({"M" + std::to_string(i), "1", "m"}, "x");
+    EXPECT_EQ(m_store->Status().modules, many + 1) << "something of each waits";
+    m_store->MoveToDeadLetters(m_store->Oldest(1, ANY_BYTES).events[0], {400, "bad"}, NOW);
+    while (m_store->Status().waiting > 100)
+        m_store->RemoveDelivered(m_store->Oldest(100, ANY_BYTES), 0);
+    const auto status = m_store->Status();
+    EXPECT_EQ(status.modules, outbox::OutboxStore::MAX_IDLE_MODULES);
+    EXPECT_EQ(status.stored, many + 2) << "their events are counted for ever";
+    EXPECT_EQ(status.delivered + status.deadLettered + status.waiting, status.stored);
+    const auto left = m_store->Oldest(100, ANY_BYTES);
+    EXPECT_EQ(left.releases.at(left.events.front().release).id, "M" + std::to_string(many - 1));
+    Store(A759, "3");
+    EXPECT_EQ(m_store->Oldest(1000, ANY_BYTES).events.back().sequence, 3) << "it has a dead letter";
+}
+
+TEST_F(OutboxStoreTest, CountsWhatModulesTakeOnTheDisk) {
+    const auto before = m_store->Status().moduleBytes;
+    for (int i = 0; i < 2000; ++i) {
+        const auto text = std::to_string(i) + std::string(250, 'x');
+        Store({text.substr(0, 64), text, text}, "");
+    }
+    const auto status = m_store->Status();
+    SQLite::Database file(m_path, SQLite::OPEN_READWRITE);
+    file.exec("PRAGMA wal_checkpoint(TRUNCATE)");
+    const auto onDisk = static_cast<std::int64_t>(std::filesystem::file_size(m_path));
+    EXPECT_GT(status.waitingBytes + status.moduleBytes - before, onDisk * 9 / 10);
+    EXPECT_LT(status.waitingBytes + status.moduleBytes - before, onDisk * 2);
+}
+
+TEST_F(OutboxStoreTest, TakesAnOutboxOfTheFirstVersionOver) {
+    m_store.reset();
+    std::filesystem::remove(m_path);
+    ASSERT_EQ(std::system(("sqlite3 " + m_path + " < " + std::string(VERSION_1)).c_str()), 0);
+    ::chmod(m_path.c_str(), 0600);
+    Open();
+    auto status = m_store->Status();
+    EXPECT_EQ(status.stored, 3);
+    EXPECT_EQ(status.delivered, 1);
+    EXPECT_EQ(status.waiting, 2);
+    Store(A759, "next");
+    EXPECT_EQ(m_store->Oldest(10, ANY_BYTES).events.back().sequence, 4);
+    m_store->RemoveDelivered(m_store->Oldest(10, ANY_BYTES), 0);
+    EXPECT_EQ(m_store->Status().waiting, 0);
 }
 
 TEST_F(OutboxStoreTest, KeepsItsIdentityAcrossRestarts) {

@@ -220,6 +220,20 @@ TEST_F(OutboxTest, WritesNoEventIntoADeletedFileHoweverSoonItComes) {
     }
 }
 
+TEST_F(OutboxTest, StaysWithinItsCapThoughEachEventIsOfAnotherModule) {
+    m_settings.caps.maxWaitingBytes = 8 << 20;
+    Open();
+    for (int i = 0; i < 6'000; ++i) {
+        const auto text = std::to_string(i) + std::string(250, 'x');
+        ASSERT_TRUE(m_outbox->Append({text.substr(0, 64), text, text}, "A1|1", "{}"));
+    }
+    const auto status = m_outbox->Status();
+    EXPECT_LE(status.waitingBytes + status.moduleBytes, 8 << 20);
+    EXPECT_GT(status.waiting, 1000);
+    m_outbox.reset();
+    EXPECT_LT(std::filesystem::file_size(File()), 12U << 20);
+}
+
 TEST_F(OutboxTest, KeepsItsEventsWhenTheFilesBesideItAreDeleted) {
     Open();
     for (const std::string suffix : {"-wal", "-shm"}) {
