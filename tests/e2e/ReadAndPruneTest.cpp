@@ -1,0 +1,107 @@
+#include <atomic>
+#include <chrono>
+#include <filesystem>
+#include <thread>
+
+#include <SQLiteCpp/Database.h>
+#include <gtest/gtest.h>
+
+#include "tests/e2e/support/Service.h"
+
+// What people do with the store while the service writes to it: nothing that it is sent may be lost or refused.
+
+namespace {
+
+using namespace std::chrono_literals;
+
+constexpr int OLD_ROWS = 150'000;
+#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
+constexpr int RATE = 200; // reports a second; a sanitized program is many times slower
+#else
+constexpr int RATE = 2'000;
+#endif
+
+/// Sends reports at a fixed rate on a thread of its own, as long as it lives.
+class Stream {
+public:
+    Stream() : m_thread([this] { Run(); }) {}
+    ~Stream() { Stop(); }
+    Stream(const Stream&) = delete;
+    Stream& operator=(const Stream&) = delete;
+
+    /// How many it has sent.
+    int Stop() {
+        m_stop = true;
+        if (m_thread.joinable())
+            m_thread.join();
+        return m_sent;
+    }
+
+private:
+    void Run() {
+        const auto begin = std::chrono::steady_clock::now();
+        for (; !m_stop; ++m_sent) {
+            std::this_thread::sleep_until(begin + std::chrono::microseconds(1'000'000LL * m_sent / RATE));
+            Service::Send(R"({"eventID":"new|1","value":"as people write it","createTime":1900000000})");
+        }
+    }
+
+    std::atomic<bool> m_stop = false;
+    int m_sent = 0;
+    std::thread m_thread;
+};
+
+class StoreInUse : public testing::Test {
+protected:
+    void SetUp() override {
+        m_service.Install();
+        SQLite::Database(m_service.DatabaseFile(), SQLite::OPEN_READWRITE)
+            .exec("with recursive n(i) as (select 1 union all select i + 1 from n where i < " +
+                  std::to_string(OLD_ROWS) +
+                  ") insert into OperLog (eventID, value, createTime) select 'old|1', 'value ' || i, "
+                  "1700000000000 from n");
+        m_service.Start();
+    }
+
+    /// All that was sent is stored, nothing was dropped or refused, and the ledger agrees.
+    void ExpectAllStored(int sent) {
+        m_service.AwaitQuiet();
+        EXPECT_EQ(
+            m_service.Count(m_service.DatabaseFile(), "select count(*) from OperLog where eventID = 'new|1'"),
+            sent);
+        EXPECT_EQ(Service::DroppedByKernel(), 0);
+        EXPECT_EQ(m_service.Counted(ReportLedger::Outcome::Store), 0u);
+        EXPECT_GT(sent, 0);
+    }
+
+    std::uintmax_t WalBytes() const { return std::filesystem::file_size(m_service.DatabaseFile() + "-wal"); }
+
+    Service m_service;
+};
+
+TEST_F(StoreInUse, IsPrunedWithoutAReportLost) {
+    const auto before = std::filesystem::file_size(m_service.DatabaseFile());
+    Stream reports;
+    ASSERT_EQ(m_service.Reportctl({"prune", "--older-than", "2025-01-01", "--yes"}), 0) << m_service.Output();
+    const auto walBytes = WalBytes();
+    ExpectAllStored(reports.Stop());
+    EXPECT_EQ(
+        m_service.Count(m_service.DatabaseFile(), "select count(*) from OperLog where eventID = 'old|1'"), 0);
+    EXPECT_LT(walBytes, before) << "the write-ahead log grew with what was deleted";
+    EXPECT_LT(std::filesystem::file_size(m_service.DatabaseFile()), before / 2)
+        << "the space was not given back";
+}
+
+TEST_F(StoreInUse, IsExportedCountedAndCopiedWithoutAReportLost) {
+    const auto copy = m_service.DataDirectory() + "/backup";
+    Stream reports;
+    for (const auto& arguments :
+         {std::vector<std::string>{"export", "--output", m_service.DataDirectory() + "/out.csv"},
+          std::vector<std::string>{"stats", "--by", "hour"}, std::vector<std::string>{"backup", copy}})
+        ASSERT_EQ(m_service.Reportctl(arguments), 0) << m_service.Output();
+    ExpectAllStored(reports.Stop());
+    EXPECT_EQ(m_service.Count(copy + "/Report.db", "select count(*) from OperLog where eventID = 'old|1'"),
+              OLD_ROWS);
+}
+
+} // namespace
