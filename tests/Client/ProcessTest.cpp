@@ -126,6 +126,10 @@ TEST_F(ClientInItsProcess, AForkMayFallIntoTheEventsOfOtherThreads) {
             while (!stop)
                 m_reporter.Event("B1");
         });
+    threads.emplace_back([&] { // and into the beginning and the end of a reporter
+        while (!stop)
+            hublink::Reporter().Event("B1");
+    });
     for (int i = 0; i < 50; ++i)
         EXPECT_EQ(ResultInChild([&] { return m_reporter.Event("B2"); }), Result::Sent);
     stop = true;

@@ -35,6 +35,14 @@ Result ResultOf(Socket::Outcome outcome) {
 
 } // namespace
 
+Channel::Channel(const Options& options) noexcept : m_allowsOthers(options.allowOtherUsersService) {
+    Enlist();
+}
+
+Channel::~Channel() {
+    Delist();
+}
+
 void Channel::SetModule(std::string announcement, Result isWritten) noexcept {
     const std::lock_guard lock(m_mutex);
     m_module.datagram = std::move(announcement);

@@ -25,7 +25,10 @@ namespace hublink {
 /// Threads: any.
 class Channel final : private ForkGuard {
 public:
-    explicit Channel(const Options& options) noexcept : m_allowsOthers(options.allowOtherUsersService) {}
+    explicit Channel(const Options& options) noexcept;
+    ~Channel();
+    Channel(const Channel&) = delete;
+    Channel& operator=(const Channel&) = delete;
 
     /// Before the first event. `announcement`: the datagram; when it cannot be written, why.
     void SetModule(std::string announcement, Result isWritten) noexcept;

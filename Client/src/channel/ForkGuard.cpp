@@ -11,18 +11,19 @@ ForkGuard* g_first = nullptr;
 
 } // namespace
 
-ForkGuard::ForkGuard() noexcept {
-    // Without memory for the handlers a child shares its parent's socket, which works, but mixes up their errors.
-    static const int registered = ::pthread_atfork(&BeforeFork, &AfterForkInParent, &AfterForkInChild);
-    static_cast<void>(registered);
+/// When the library is loaded, and not with the first guard, which a fork might fall into. Without memory for the handlers
+/// a child shares its parent's socket, which works, but mixes up their errors.
+const int ForkGuard::HANDLERS = ::pthread_atfork(&BeforeFork, &AfterForkInParent, &AfterForkInChild);
+
+void ForkGuard::Enlist() noexcept {
     const std::lock_guard lock(g_listMutex);
-    m_next = g_first; // NOLINT(cppcoreguidelines-prefer-member-initializer): not without the lock
+    m_next = g_first;
     if (m_next != nullptr)
         m_next->m_previous = this;
     g_first = this;
 }
 
-ForkGuard::~ForkGuard() {
+void ForkGuard::Delist() noexcept {
     const std::lock_guard lock(g_listMutex);
     if (m_next != nullptr)
         m_next->m_previous = m_previous;

@@ -10,12 +10,17 @@ namespace hublink {
 /// Threads: any. Destroy it when no thread uses it any more.
 class ForkGuard {
 public:
-    ForkGuard() noexcept;
     ForkGuard(const ForkGuard&) = delete;
     ForkGuard& operator=(const ForkGuard&) = delete;
 
 protected:
-    ~ForkGuard();
+    ForkGuard() = default;
+    ~ForkGuard() = default;
+
+    /// Forks know the guard between these two: the last thing that its constructor does, and the first of its destructor,
+    /// since another thread may fork at any moment.
+    void Enlist() noexcept;
+    void Delist() noexcept;
 
     std::mutex m_mutex; ///< Guards what the derived class says.
 
@@ -23,6 +28,7 @@ private:
     /// In the child, with the lock held and before anything else of the program runs there. No memory may be allocated.
     virtual void BeginInChild() noexcept = 0;
 
+    static const int HANDLERS; ///< Of forks; 0 when they are there.
     static void BeforeFork() noexcept;
     static void AfterForkInParent() noexcept;
     static void AfterForkInChild() noexcept;
