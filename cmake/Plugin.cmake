@@ -2,8 +2,13 @@
 #
 # A plug-in is a shared library that is opened at run time by its exact file name, lib<name>.dylib on every
 # platform. It exports CreateModule and DestoryModule and nothing else, so that two plug-ins that link the same static
-# library never share state by accident. Whether it stays in memory when it is closed is each plug-in's own choice, with
-# the reason in its CMakeLists.txt.
+# library never share state by accident. 
+#
+# Its code outlives its user: once opened, a plug-in stays in memory until the process ends. exit() destroys the last
+# loaders while other threads may still be inside a plug-in: in WriteLog, in a statement, in an upload that hangs in the
+# file system or in libcurl's resolver. To wait for them could take for ever. So a plug-in leaves objects that are in use
+# where they are, and the linker's flag keeps the code. (On macOS no flag is needed: dyld never unloads an image with
+# thread-local variables, and each of the plug-ins has some.)
 function(ssr_add_plugin target name)
     add_library(${target} MODULE ${ARGN})
     target_link_libraries(${target} PRIVATE ssr_options ssr_package_note)
@@ -11,7 +16,8 @@ function(ssr_add_plugin target name)
         OUTPUT_NAME ${name} PREFIX lib SUFFIX .dylib LIBRARY_OUTPUT_DIRECTORY ${SSR_BIN_DIR})
     if(NOT APPLE)
         set(exports ${PROJECT_SOURCE_DIR}/cmake/plugin.exports)
-        target_link_options(${target} PRIVATE -Wl,--version-script=${exports} -Wl,--no-undefined)
+        target_link_options(${target} PRIVATE
+            -Wl,--version-script=${exports} -Wl,--no-undefined -Wl,-z,nodelete)
         set_property(TARGET ${target} APPEND PROPERTY LINK_DEPENDS ${exports})
         if(SSR_SANITIZE)
             # The sanitizer's runtime is the program's; the linker cannot see it from here.

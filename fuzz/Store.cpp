@@ -4,7 +4,6 @@
 #include <filesystem>
 
 #include <SQLiteCpp/SQLiteCpp.h>
-#include <dlfcn.h>
 
 #include "Frame/DBHelper.h"
 #include "fuzz/support/FuzzedServer.h"
@@ -38,11 +37,6 @@ class Store {
 public:
     Store() {
         ::setenv("XDG_DATA_HOME", m_data.Path().c_str(), 1);
-        // Closed and opened again with each server, the library would take its coverage counters away from the fuzzer.
-        Require(
-            ::dlopen((SystemTool::IO::Directory::GetExcutableDirectory() + "libOrvekSqlite.dylib").c_str(),
-                     RTLD_NOW | RTLD_NODELETE) != nullptr,
-            "the store's library is beside the program");
         m_look.exec("pragma journal_mode = wal");
         m_look.exec(STORE_TABLES);
         m_look.exec(ROWS);

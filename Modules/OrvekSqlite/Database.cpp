@@ -47,8 +47,8 @@ private:
 bool Database::Open(const std::string& path) {
     const Entry entry(*this);
     // What the old file did not take goes to the new one: it was accepted, and this is the store from now on.
-    Report([&] { m_group.Commit(); });
-    return Report([&] {
+    KeepError([&] { m_group.Commit(); });
+    return KeepError([&] {
         m_file.Set(path);
         m_file.Run([](file::Connection&) {});
     });
@@ -57,8 +57,8 @@ bool Database::Open(const std::string& path) {
 bool Database::CreateTable(const std::string& sql) {
     const Entry entry(*this);
     // Kept statements go first, but may wait for this very table.
-    Report([&] { m_group.Commit(); });
-    return Report([&] {
+    KeepError([&] { m_group.Commit(); });
+    return KeepError([&] {
         m_file.Run([&](file::Connection& connection) {
             connection.Prepare(sql, guard::Permission::CreateTable).Execute();
         });
@@ -67,7 +67,7 @@ bool Database::CreateTable(const std::string& sql) {
 
 bool Database::ExecSql(const std::string& sql) {
     const Entry entry(*this);
-    const bool done = Report([&] { m_group.Execute(sql); });
+    const bool done = KeepError([&] { m_group.Execute(sql); });
     if (done)
         m_committer.Notice();
     return done;
@@ -113,23 +113,24 @@ std::string Database::GetLastErrorMsg() {
 }
 
 bool Database::Finish() {
+    // First: a thread that runs statement after statement would hardly let us have the object.
+    m_isFinished = true;
     if (m_inside == std::this_thread::get_id() || m_committer.IsThisThread())
         return false; // the thread that crashed in here is not coming back
     const bool isOwnersThread =
         m_lastInside == std::thread::id() || m_lastInside == std::this_thread::get_id();
     if (!LockBefore(group::Clock::now() + m_settings.group.exitWait))
         return false;
-    m_file.WaitForLocks(std::chrono::milliseconds(0));
-    Report([&] { m_group.Commit(); });
+    m_group.CommitWithoutWaiting();
     m_file.Close();
-    m_isFinished = true;
     m_mutex.unlock();
     m_committer.Stop();
     return isOwnersThread;
 }
+
 bool Database::RunAfterCommit(const file::LiveFile::Operation& operation) {
     const Entry entry(*this);
-    return Report([&] {
+    return KeepError([&] {
         m_group.Commit();
         m_file.Run(operation);
     });
@@ -137,7 +138,7 @@ bool Database::RunAfterCommit(const file::LiveFile::Operation& operation) {
 
 /// The one place where failures become texts.
 template <typename Action>
-bool Database::Report(Action action) {
+bool Database::KeepError(Action action) {
     try {
         if (m_isFinished)
             throw SQLite::Exception("the database object is destroyed", SQLITE_MISUSE);

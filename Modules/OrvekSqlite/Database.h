@@ -30,13 +30,13 @@ namespace OrvekSqlite {
 /// What is committed survives the end of the process, kill -9 included, which so loses at most the last 10 ms
 /// of a burst. A commit that fails loses nothing: the group's statements are kept and committed, in order,
 /// once the database takes them, by the committer if nothing follows; new statements fail with the error text
-/// meanwhile, at once but for one in a tenth of a second, which tries; when another program's lock is the
-/// reason, after they waited for it. Kept are the group's texts, 5 MiB at most; they end with the process.
+/// meanwhile. They fail at once, but one in a tenth of a second tries to commit first; when another program's lock is
+/// the reason, each of them waits for the lock. Kept are the group's texts, 5 MiB at most; they end with the process.
 ///
 /// Other programs: the write lock is free between groups. When another process has the file open, it stays
-/// free for as long as the group held it, so that the other gets its turn. Another program's lock is waited
-/// for by the thread that calls, for Settings::busyTimeout; what calls for that long keeps its queue. The
-/// committer does not wait, so it never keeps a caller waiting.
+/// free for as long as the group held it, so that the other gets its turn. When another program has the lock, the
+/// caller waits up to Settings::busyTimeout; its own queue grows meanwhile. The committer does not wait for a lock,
+/// so it never keeps a caller waiting.
 ///
 /// Failure: no operation throws. Each that returns false leaves its reason for GetLastErrorMsg, in SQLite's
 /// own words when SQLite refused, in the guard's when the plug-in did ("not authorized: ..."). A failure
@@ -82,8 +82,8 @@ public:
     /// crashed. Waits a fifth of a second at most for an operation to end; when it does not, a crash may cost
     /// the last 10 ms of a burst. The commit and the close take as long as the disk does.
     ///
-    /// False: another thread may still be in an operation, or come back with the next. Then the object must
-    /// stay where it is, and the code too; operations fail from here on.
+    /// False: another thread may still be in an operation, or come back with the next. Then the object must stay where
+    /// it is. An operation that is under way goes on; every operation that begins later fails.
     [[nodiscard]] bool Finish();
 
 private:
@@ -91,18 +91,18 @@ private:
 
     bool RunAfterCommit(const file::LiveFile::Operation& operation);
     template <typename Action>
-    bool Report(Action action);
+    bool KeepError(Action action);
     bool LockBefore(group::Clock::time_point deadline);
 
     const Settings m_settings;
+    std::atomic<bool> m_isFinished = false; ///< set by Finish; every operation that begins later fails
     std::mutex m_mutex; ///< guards all below but the two thread ids; held throughout an operation
     file::LiveFile m_file{m_settings};
     group::Group m_group{m_file, m_settings.group};
     std::string m_lastError;
-    bool m_isFinished = false;
     std::atomic<std::thread::id> m_inside;     ///< the thread in an operation, if one is
     std::atomic<std::thread::id> m_lastInside; ///< the thread of the operation before
-    group::Committer m_committer{m_mutex, m_group, m_file};
+    group::Committer m_committer{m_mutex, m_group};
 };
 
 } // namespace OrvekSqlite

@@ -2,7 +2,6 @@
 
 #include <vector>
 
-#include <dlfcn.h>
 #include <sqlite3.h>
 
 #define SSR_EXPORT __attribute__((visibility("default")))
@@ -16,14 +15,11 @@ void DoWithoutStatistics() {
     sqlite3_config(SQLITE_CONFIG_MEMSTATUS, 0);
 }
 
-/// Keeps an object that another thread may still use, and this library with it. Destruction like that comes
-/// once at most: in a process that exits while its other threads go on.
+/// Keeps an object that another thread may still use: in a process that exits while its other threads go on. The list
+/// tells leak checkers that this is no leak. The code stays in memory anyway, see cmake/Plugin.cmake.
 void LeaveBehind(const OrvekSqlite::Database* database) {
     static auto* const left = new std::vector<const OrvekSqlite::Database*>;
     left->push_back(database);
-    Dl_info self{};
-    if (::dladdr(&left, &self) != 0)
-        (void)::dlopen(self.dli_fname, RTLD_NOW | RTLD_NOLOAD | RTLD_NODELETE);
 }
 
 } // namespace

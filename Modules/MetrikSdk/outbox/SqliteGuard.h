@@ -6,25 +6,23 @@
 #include <sqlite3.h>
 
 #include "Modules/MetrikSdk/outbox/StoreError.h"
+#include "Modules/Sqlite/ErrorKind.h"
 
 // What every operation of the store does around its SQL.
 namespace MetrikSdk::outbox {
 
-/// What a failure of SQLite's means for whoever holds the store.
+/// What the holder of the store does about an error of SQLite's.
 inline StoreFault FaultOf(const SQLite::Exception& error) {
-    switch (error.getErrorCode() & 0xff) {
-    case SQLITE_CORRUPT:
-    case SQLITE_NOTADB:
-        return StoreFault::SetAside;
-    case SQLITE_BUSY:
-    case SQLITE_LOCKED:
-    case SQLITE_FULL:
-    case SQLITE_NOMEM:
-    case SQLITE_INTERRUPT:
+    switch (Sqlite::KindOf(error.getErrorCode())) {
+    case Sqlite::ErrorKind::Wait:
         return StoreFault::TryLater;
-    default:
-        return StoreFault::Reopen;
+    case Sqlite::ErrorKind::Damage:
+        return StoreFault::SetAside;
+    case Sqlite::ErrorKind::Reopen:
+    case Sqlite::ErrorKind::Statement: // the statements are ours, so this one should have worked
+        break;
     }
+    return StoreFault::Reopen;
 }
 
 /// Runs one operation of the store, with SQLite's failures turned into ours.

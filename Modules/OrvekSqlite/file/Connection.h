@@ -39,8 +39,11 @@ public:
         return guard::Statement(m_database.getHandle(), m_guard, sql, permission);
     }
 
-    /// Runs one statement that changes data and returns no row.
+    /// Runs one statement that changes data and returns no row. Outside a transaction, which could undo it, only where
+    /// the file is still in its place.
     void Execute(const std::string& sql) {
+        if (!InTransaction())
+            RequireInPlace();
         if (!m_insert.Execute(sql))
             Prepare(sql, guard::Permission::Write).Execute();
     }
@@ -49,8 +52,11 @@ public:
     void Begin() { m_database.exec("begin immediate"); }
 
     /// Once it returned, the transaction survives the end of the process. When it throws, nothing of the
-    /// transaction is stored, but the transaction may still be open.
-    void Commit() { m_database.exec("commit"); }
+    /// transaction is stored, but the transaction may still be open. Throws when the file is not in its place any more.
+    void Commit() {
+        RequireInPlace();
+        m_database.exec("commit");
+    }
 
     /// Ends the transaction, if there is one, without its effect.
     void RollBack() noexcept;
@@ -71,10 +77,6 @@ public:
     /// and only looking afterwards tells. Costs three stats and a read of 16 bytes, some two microseconds.
     bool IsInPlace();
 
-    /// Throws when not. Asked before what could not be undone: what is not in the old file need not be in
-    /// both.
-    void RequireInPlace();
-
     /// What became of rows that were committed, when a file beside the database was deleted.
     enum class Rescue { NotNeeded, Done, Failed };
 
@@ -82,6 +84,8 @@ public:
     Rescue RescueRows() noexcept;
 
 private:
+    /// Throws when not. Asked before what could not be undone: what is not in the old file need not be in both.
+    void RequireInPlace();
     bool HasLostItsName();
     bool HasDatabaseHeader();
 

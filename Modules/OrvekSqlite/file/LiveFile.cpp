@@ -5,22 +5,15 @@
 
 #include <SQLiteCpp/Exception.h>
 
+#include "Modules/Sqlite/ErrorKind.h"
+
 namespace OrvekSqlite::file {
 namespace {
 
-/// Errors that are the open file's rather than the statement's: another look at the path may be the remedy.
-bool IsAboutTheFile(int code) {
-    switch (code & 0xff) {
-    case SQLITE_READONLY:
-    case SQLITE_IOERR:
-    case SQLITE_CORRUPT:
-    case SQLITE_CANTOPEN:
-    case SQLITE_PROTOCOL:
-    case SQLITE_NOTADB:
-        return true;
-    default:
-        return false;
-    }
+/// Errors of the open file, and not of the statement. To look at the path again may be the remedy.
+bool IsAboutTheFile(const SQLite::Exception& error) {
+    const auto kind = Sqlite::KindOf(error.getErrorCode());
+    return kind == Sqlite::ErrorKind::Reopen || kind == Sqlite::ErrorKind::Damage;
 }
 
 /// A file that is replaced again while it is opened anew is somebody's busy script; one that is replaced each
@@ -57,7 +50,7 @@ void LiveFile::Run(const Operation& operation) {
             if (LetGo() && isCommitted) // run again, its rows would be there twice
                 return;
         } catch (const SQLite::Exception& error) {
-            if (!IsAboutTheFile(error.getErrorCode()) && m_connection->IsInPlace())
+            if (!IsAboutTheFile(error) && m_connection->IsInPlace())
                 throw;
             LetGo();
             if (isNew)
@@ -91,7 +84,18 @@ void LiveFile::RollBack() noexcept {
         LetGo();
 }
 
-void LiveFile::WaitForLocks(std::chrono::milliseconds patience) {
+void LiveFile::WithoutWaiting(const std::function<void()>& action) {
+    SetPatience(std::chrono::milliseconds(0));
+    try {
+        action();
+    } catch (...) {
+        SetPatience(m_settings.busyTimeout);
+        throw;
+    }
+    SetPatience(m_settings.busyTimeout);
+}
+
+void LiveFile::SetPatience(std::chrono::milliseconds patience) {
     m_patience = patience;
     if (m_connection)
         m_connection->WaitForLocks(patience);

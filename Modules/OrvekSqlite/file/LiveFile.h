@@ -38,11 +38,9 @@ public:
     bool IsShared() { return m_connection && m_connection->IsShared(); }
     void RollBack() noexcept;
 
-    /// How long statements wait for the lock of another connection from here on.
-    void WaitForLocks(std::chrono::milliseconds patience);
-
-    /// The patience of the settings again.
-    void WaitForLocks() { WaitForLocks(m_settings.busyTimeout); }
+    /// Runs `action`, whose operations on this file fail at once where another program has the lock. All other
+    /// operations wait for it, up to Settings::busyTimeout.
+    void WithoutWaiting(const std::function<void()>& action);
 
     void Close() { LetGo(); }
 
@@ -51,6 +49,7 @@ public:
 
 private:
     bool LetGo() noexcept;
+    void SetPatience(std::chrono::milliseconds patience);
     void Connect();
 
     const Settings m_settings;

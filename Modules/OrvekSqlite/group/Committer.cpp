@@ -20,7 +20,7 @@ void Committer::Start() {
     try {
         m_thread = std::thread(&Committer::Run, this);
     } catch (const std::exception&) {
-        CommitNow(); // no thread to be had: then a group is one statement, until there is
+        m_group.CommitWithoutWaiting(); // no thread to be had: then a group is one statement, until there is
     }
 }
 
@@ -45,17 +45,8 @@ void Committer::Run() {
         else if (Clock::now() < *due)
             m_wake.wait_until(lock, *due);
         else
-            CommitNow();
+            m_group.CommitWithoutWaiting();
     }
-}
-
-void Committer::CommitNow() {
-    m_file.WaitForLocks(std::chrono::milliseconds(0));
-    try {
-        m_group.Commit();
-    } catch (const std::exception&) { // the group keeps the reason, and its statements
-    }
-    m_file.WaitForLocks();
 }
 
 } // namespace OrvekSqlite::group

@@ -15,92 +15,114 @@ bool IsALock(const std::exception& error) {
 } // namespace
 
 void Group::Execute(const std::string& sql) {
-    m_file.TellLoss(); // this statement's line is the one place where it can be told
-    const bool isAlone = m_policy.IsAlone(m_last, Clock::now());
+    m_file.TellLoss(); // the log line of a refused statement is the only place where it can be told
+    const auto now = Clock::now();
     try {
-        RefuseWhileOwed();
-        isAlone ? ExecuteAlone(sql) : ExecuteInGroup(sql);
+        RefuseWhileUncommitted(now);
+        m_policy.IsAlone(m_last, now) ? ExecuteAlone(sql) : ExecuteInGroup(sql, now);
     } catch (...) {
-        EndStatement();
+        EndStatement(Clock::now());
         throw;
     }
-    EndStatement();
+    EndStatement(Clock::now());
 }
 
-/// Commits a group that is complete, whatever became of the statement: a caller whose statements are all
-/// refused takes the mutex again so quickly that the committer would get it too late.
-void Group::EndStatement() noexcept {
-    m_last = Clock::now();
-    if (!m_kept.IsEmpty() && !IsUncommitted() &&
-        m_policy.IsComplete(m_kept.Count(), m_kept.Bytes(), m_began, *m_last))
-        TryToCommit();
+void Group::RefuseWhileUncommitted(Clock::time_point now) {
+    if (m_state != State::Uncommitted)
+        return;
+    if (!m_policy.MayTry(m_lastTry, m_metALock, now))
+        std::rethrow_exception(m_reason);
+    Commit();
 }
 
 void Group::ExecuteAlone(const std::string& sql) {
     Commit();
-    m_file.Run([&](file::Connection& connection) {
-        connection.RequireInPlace();
-        connection.Execute(sql);
-    });
+    m_file.Run([&](file::Connection& connection) { connection.Execute(sql); });
 }
 
-void Group::ExecuteInGroup(const std::string& sql) {
+void Group::ExecuteInGroup(const std::string& sql, Clock::time_point now) {
     m_kept.Reserve(sql);
-    if (!m_file.InTransaction())
-        LeaveTheLockToOthers();
+    if (m_state != State::Open)
+        LeaveTheLockToOthers(now);
     try {
         m_file.Run([&](file::Connection& connection) {
-            Open(connection);
+            Begin(connection);
             connection.Execute(sql);
         });
     } catch (...) {
-        if (m_kept.IsEmpty())
-            m_file.RollBack(); // a group of nothing holds no lock
-        else if (IsUncommitted())
-            TryToCommit(); // a full disk or a trigger's RAISE(ROLLBACK) undid the others, too
+        AfterFailedStatement();
         throw;
     }
     m_kept.Add(sql);
+    m_state = State::Open;
 }
 
-/// A lock is waited for as ever, though the committer, which does not wait, has met it.
-void Group::RefuseWhileOwed() {
-    if (!IsUncommitted())
-        return;
-    if (!m_metALock && Clock::now() < m_policy.NextTry(m_lastTry))
-        throw SQLite::Exception(m_failure, SQLITE_BUSY);
-    Commit();
+/// Usually, the transaction is as it was. But a full disk, or RAISE(ROLLBACK) in a trigger, ends the whole transaction:
+/// then the statements before this one are tried again at once.
+void Group::AfterFailedStatement() noexcept {
+    if (m_kept.IsEmpty()) {
+        m_file.RollBack(); // a group of nothing holds no lock
+        m_state = State::Empty;
+    } else if (!m_file.InTransaction()) {
+        TryToCommit();
+    }
+}
+
+/// Commits a group that is complete, whether the statement was run or refused. A caller whose statements are all refused
+/// takes the mutex again so quickly that the committer would get it too late.
+void Group::EndStatement(Clock::time_point now) noexcept {
+    m_last = now;
+    if (m_state == State::Open && m_policy.IsComplete(m_kept.Count(), m_kept.Bytes(), m_began, now))
+        TryToCommit();
 }
 
 void Group::Commit() {
-    if (m_kept.IsEmpty())
+    if (m_state == State::Empty)
         return;
     try {
         m_file.Run([&](file::Connection& connection) {
-            Open(connection);
-            connection.RequireInPlace();
+            Begin(connection);
             connection.Commit();
         });
     } catch (const std::exception& error) {
-        m_file.RollBack(); // the lock is for those who may be able to do something about it
+        m_file.RollBack(); // another program may need the lock to remove the reason
+        m_state = State::Uncommitted;
         m_lastTry = Clock::now();
+        m_reason = std::current_exception();
         m_metALock = IsALock(error);
-        m_failure = error.what();
         throw;
     }
     m_kept.Clear();
+    m_state = State::Empty;
     const auto now = Clock::now();
     m_freeUntil = m_file.IsShared() ? now + m_policy.Pause(now - m_began) : now;
 }
 
+void Group::TryToCommit() noexcept {
+    try {
+        Commit();
+    } catch (...) { // the group keeps the reason for the next try
+    }
+}
+
+void Group::CommitWithoutWaiting() noexcept {
+    m_file.WithoutWaiting([this] { TryToCommit(); });
+}
+
 std::optional<Clock::time_point> Group::Due() const {
-    if (m_kept.IsEmpty())
+    switch (m_state) {
+    case State::Empty:
         return std::nullopt;
-    return IsUncommitted() ? m_policy.NextTry(m_lastTry) : m_policy.Due(m_began);
+    case State::Open:
+        return m_policy.Due(m_began);
+    case State::Uncommitted:
+        break;
+    }
+    return m_policy.NextTry(m_lastTry);
 }
 
 /// Begins the transaction, unless it is open, and brings it to where the kept statements had it.
-void Group::Open(file::Connection& connection) {
+void Group::Begin(file::Connection& connection) {
     if (connection.InTransaction())
         return;
     connection.Begin();
@@ -113,9 +135,9 @@ void Group::Open(file::Connection& connection) {
     }
 }
 
-/// A statement that a constraint refuses now, in another file or after another program's change, is dropped,
-/// as it would have been had it come now: kept, it would be in the way of all others for ever. Any other
-/// error, a missing table for one, can be remedied and is waited for.
+/// Drops a statement that a constraint refuses now, in another file or after another program's change. It would have been
+/// refused had it come now, and if it were kept, all others would wait for it for ever. Any other error, such as a missing
+/// table, can be remedied: then the group waits.
 void Group::RunAgain(file::Connection& connection) {
     for (std::size_t i = 0; i < m_kept.Count();) {
         try {
@@ -125,7 +147,7 @@ void Group::RunAgain(file::Connection& connection) {
             if (error.getErrorCode() != SQLITE_CONSTRAINT)
                 throw;
             m_kept.Remove(i);
-            if (!connection.InTransaction()) { // a trigger rolled back what was before it, too
+            if (!connection.InTransaction()) { // a trigger rolled back the statements before it, too
                 connection.Begin();
                 i = 0;
             }
@@ -133,15 +155,8 @@ void Group::RunAgain(file::Connection& connection) {
     }
 }
 
-void Group::TryToCommit() noexcept {
-    try {
-        Commit();
-    } catch (...) { // kept, with the reason, for the next try
-    }
-}
-
-void Group::LeaveTheLockToOthers() {
-    if (Clock::now() < m_freeUntil)
+void Group::LeaveTheLockToOthers(Clock::time_point now) const {
+    if (now < m_freeUntil)
         std::this_thread::sleep_until(m_freeUntil);
 }
 

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <exception>
 #include <optional>
 #include <string>
 
@@ -12,53 +13,68 @@ namespace OrvekSqlite::group {
 
 /// Runs single statements, and lets those of a burst share a transaction.
 ///
-///     nothing kept ── a statement in a burst ──→ open ── commit ──→ nothing kept
-///                                                 │                      ↑
-///                                                 └─ failure → uncommitted ┘ run again and committed
+///     Empty ──── a statement in a burst ───→ Open ──── commit ───→ Empty
+///                                             │
+///                                             └─ failure ─→ Uncommitted ── run again and committed ─→ Empty
 ///
-/// Open: the write lock is ours, and the transaction holds the effect of every statement kept. Uncommitted: no
-/// transaction, the lock is free, and the kept statements wait for the database to take them. Which of the
-/// two it is, SQLite says (LiveFile::InTransaction): it ends a transaction by itself on some errors.
+/// A statement that was accepted is kept, as its text, until it is committed.
 ///
 /// Threads: one at a time.
-/// Failure: throws; a statement that was accepted is kept until it is committed.
+/// Failure: throws; what is kept stays kept.
 class Group {
 public:
     Group(file::LiveFile& file, const GroupSettings& settings) : m_file(file), m_policy(settings) {}
 
-    /// Runs one statement. Alone, it is committed when this returns. In a burst it joins a group, and is
-    /// committed with it; should that fail, it is run again. Its own error is thrown and leaves the group as
-    /// it was. While a group is uncommitted, this throws the reason, but for one try every GroupSettings::retry; when
-    /// the reason is another program's lock, it waits for that. After rows were lost, one statement is refused with that
-    /// for its reason.
+    /// Runs one statement, and throws its error.
+    ///
+    /// A statement that comes alone is committed when this returns. In a burst it joins the group: it is committed with
+    /// the group, and run again if that fails. Its own error leaves the group as it was.
+    ///
+    /// While the group is uncommitted, every statement is refused with the reason. Once in GroupSettings::retry one of
+    /// them tries to commit the group first, and is run if that works. If another program's lock is the reason, each of
+    /// them tries, and waits for the lock.
+    ///
+    /// After rows were lost, one statement is refused with that for its reason.
     void Execute(const std::string& sql);
 
-    /// Commits what is kept, if anything.
+    /// Commits what is kept. Throws when that failed.
     void Commit();
 
-    /// When Commit is to be called; nothing while nothing is kept.
+    /// The same for the committer: never waits for another program's lock, and keeps the reason of a failure.
+    void CommitWithoutWaiting() noexcept;
+
+    /// When Commit is to be called; nothing while the group is empty.
     std::optional<Clock::time_point> Due() const;
 
 private:
+    enum class State {
+        Empty, ///< Nothing is kept.
+        Open,  ///< We hold the write lock, and the transaction holds the effect of every statement kept.
+        Uncommitted, ///< There is no transaction and no lock. The kept statements wait for the database to take them.
+    };
+
     void ExecuteAlone(const std::string& sql);
-    void ExecuteInGroup(const std::string& sql);
-    void RefuseWhileOwed();
-    void EndStatement() noexcept;
-    void Open(file::Connection& connection);
+    void ExecuteInGroup(const std::string& sql, Clock::time_point now);
+    void RefuseWhileUncommitted(Clock::time_point now);
+    void AfterFailedStatement() noexcept;
+    void EndStatement(Clock::time_point now) noexcept;
+    void Begin(file::Connection& connection);
     void RunAgain(file::Connection& connection);
     void TryToCommit() noexcept;
-    void LeaveTheLockToOthers();
-    bool IsUncommitted() const { return !m_kept.IsEmpty() && !m_file.InTransaction(); }
+    void LeaveTheLockToOthers(Clock::time_point now) const;
 
     file::LiveFile& m_file;
     const GroupPolicy m_policy;
-    KeptStatements m_kept; ///< accepted, and not known to be committed
-    Clock::time_point m_began;
+    KeptStatements m_kept;                   ///< accepted, and not known to be committed
+    State m_state = State::Empty;            ///< of m_kept
+    Clock::time_point m_began;               ///< while Open: when the transaction began
     std::optional<Clock::time_point> m_last; ///< end of the statement before
     Clock::time_point m_freeUntil;           ///< others may have the lock until then
-    Clock::time_point m_lastTry;             ///< to commit, which failed with m_failure
-    std::string m_failure;
-    bool m_metALock = false; ///< whether m_failure is another program's lock
+
+    // While Uncommitted: the last try to commit.
+    Clock::time_point m_lastTry;
+    std::exception_ptr m_reason; ///< why it failed
+    bool m_metALock = false;     ///< whether that is another program's lock
 };
 
 } // namespace OrvekSqlite::group

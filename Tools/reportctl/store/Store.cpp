@@ -13,6 +13,7 @@
 #include <fmt/format.h>
 #include <sqlite3.h>
 
+#include "Modules/Sqlite/ErrorKind.h"
 #include "Modules/Sqlite/SideFiles.h"
 #include "SystemTool/Errno.h"
 #include "SystemTool/IO/Descriptor.h"
@@ -203,8 +204,7 @@ bool EnsureStore(terminal::Worklog& log, const std::string& path, bool compact) 
             return EnsureNewStore(log, path);
         return EnsureExistingStore(log, path, compact);
     } catch (const SQLite::Exception& error) {
-        const bool isDatabase =
-            error.getErrorCode() != SQLITE_NOTADB && error.getErrorCode() != SQLITE_CORRUPT;
+        const bool isDatabase = Sqlite::KindOf(error.getErrorCode()) != Sqlite::ErrorKind::Damage;
         log.Fail(fmt::format("{}: {}. It was left as it is.{}", path, error.what(),
                              isDatabase ? "" : " Move it away and run this again to get a new store."));
     } catch (const std::exception& error) {

@@ -17,7 +17,7 @@ namespace {
 namespace fs = std::filesystem;
 using namespace std::chrono_literals;
 
-class OwedGroup : public SqliteFixture {
+class UncommittedGroup : public SqliteFixture {
 protected:
     void SetUp() override {
         SqliteFixture::SetUp();
@@ -78,7 +78,7 @@ protected:
     }
 
     /// A group that could not be committed because the disk was full.
-    int OweAGroup() {
+    int LeaveAGroupUncommitted() {
         EXPECT_TRUE(Exec(Insert("0"))) << Error();
         MakeFilesFull();
         const int accepted = ExecUntilRefused(1);
@@ -90,16 +90,16 @@ private:
     rlimit m_unlimited{};
 };
 
-TEST_F(OwedGroup, IsCommittedInItsOrderByItselfOnceThereIsRoom) {
-    const int accepted = OweAGroup();
+TEST_F(UncommittedGroup, IsCommittedInItsOrderByItselfOnceThereIsRoom) {
+    const int accepted = LeaveAGroupUncommitted();
     EXPECT_NE(Error(), "");
     MakeRoom();
     EXPECT_TRUE(WaitForAllUpTo(accepted)) << All(Store());
     EXPECT_EQ(Ask(Store(), "pragma integrity_check"), "ok");
 }
 
-TEST_F(OwedGroup, HasNewStatementsFailWithItsErrorAndAtOnce) {
-    OweAGroup();
+TEST_F(UncommittedGroup, HasNewStatementsFailWithItsErrorAndAtOnce) {
+    LeaveAGroupUncommitted();
     const auto error = Error();
     EXPECT_TRUE(error == "disk I/O error" || error == "database or disk is full") << error;
     const auto refuse = [&] {
@@ -112,17 +112,17 @@ TEST_F(OwedGroup, HasNewStatementsFailWithItsErrorAndAtOnce) {
     MakeRoom();
 }
 
-TEST_F(OwedGroup, GoesBeforeTheStatementsThatFollow) {
-    const int accepted = OweAGroup();
+TEST_F(UncommittedGroup, GoesBeforeTheStatementsThatFollow) {
+    const int accepted = LeaveAGroupUncommitted();
     MakeRoom();
     ASSERT_TRUE(WaitUntil([&] { return Exec(Insert(std::to_string(accepted))); }));
     EXPECT_TRUE(WaitForAllUpTo(accepted + 1)) << All(Store());
 }
 
-TEST_F(OwedGroup, LeavesTheLockToOthers) {
+TEST_F(UncommittedGroup, LeavesTheLockToOthers) {
     SQLite::Database other(Store(), SQLite::OPEN_READWRITE);
     other.exec("begin immediate; rollback"); // has all its files open before they are full
-    const int accepted = OweAGroup();
+    const int accepted = LeaveAGroupUncommitted();
     EXPECT_TRUE(WaitUntil([&] { // between two tries of the plug-in, each of which takes the lock
         return sqlite3_exec(other.getHandle(), "begin immediate; rollback", nullptr, nullptr, nullptr) ==
                SQLITE_OK;
@@ -132,10 +132,10 @@ TEST_F(OwedGroup, LeavesTheLockToOthers) {
     EXPECT_TRUE(WaitForAllUpTo(accepted));
 }
 
-TEST_F(OwedGroup, LosesOnlyTheStatementThatAConstraintRefusesWhenItIsRunAgain) {
+TEST_F(UncommittedGroup, LosesOnlyTheStatementThatAConstraintRefusesWhenItIsRunAgain) {
     SQLite::Database other(Store(), SQLite::OPEN_READWRITE, 5000);
     other.exec("begin immediate; rollback");
-    const int accepted = OweAGroup();
+    const int accepted = LeaveAGroupUncommitted();
     MakeRoomUnderALock(other);
     other.exec("create trigger t before insert on OperLog when new.eventID = '1' begin"
                " select raise(rollback, 'not that one'); end; commit");
@@ -144,10 +144,10 @@ TEST_F(OwedGroup, LosesOnlyTheStatementThatAConstraintRefusesWhenItIsRunAgain) {
     EXPECT_EQ("0,1," + All(Store()).substr(2), AllUpTo(accepted + 1));
 }
 
-TEST_F(OwedGroup, HasNewStatementsWaitForAnotherProgramsLock) {
+TEST_F(UncommittedGroup, HasNewStatementsWaitForAnotherProgramsLock) {
     SQLite::Database other(Store(), SQLite::OPEN_READWRITE);
     other.exec("begin immediate; rollback");
-    const int accepted = OweAGroup();
+    const int accepted = LeaveAGroupUncommitted();
     MakeRoomUnderALock(other);
     const auto start = std::chrono::steady_clock::now();
     std::thread release([&] {
@@ -160,8 +160,8 @@ TEST_F(OwedGroup, HasNewStatementsWaitForAnotherProgramsLock) {
     EXPECT_TRUE(WaitForAllUpTo(accepted + 1)) << All(Store());
 }
 
-TEST_F(OwedGroup, FailsTheOperationsThatWouldCommitIt) {
-    const int accepted = OweAGroup();
+TEST_F(UncommittedGroup, FailsTheOperationsThatWouldCommitIt) {
+    const int accepted = LeaveAGroupUncommitted();
     std::vector<std::vector<std::string>> rows;
     int count = 7;
     EXPECT_FALSE(Plugin()->QuerySql("select 1", rows));
@@ -173,8 +173,8 @@ TEST_F(OwedGroup, FailsTheOperationsThatWouldCommitIt) {
     EXPECT_EQ(All(Store()), AllUpTo(accepted));
 }
 
-TEST_F(OwedGroup, SurvivesManyTriesWithoutDoubles) {
-    const int accepted = OweAGroup();
+TEST_F(UncommittedGroup, SurvivesManyTriesWithoutDoubles) {
+    const int accepted = LeaveAGroupUncommitted();
     int tries = 0;
     EXPECT_TRUE(WaitUntil([&] {
         EXPECT_FALSE(Exec(Insert("refused")));
@@ -187,7 +187,7 @@ TEST_F(OwedGroup, SurvivesManyTriesWithoutDoubles) {
 /// A file that changes while a group is open. The group closes by itself after some milliseconds, so the
 /// change may come just after it: the statements until the first refusal are in one of the two files, in
 /// order, and none in both.
-class ChangedFile : public OwedGroup {
+class ChangedFile : public UncommittedGroup {
 protected:
     void ReplaceStore() {
         const auto fresh = Directory() + "/fresh";

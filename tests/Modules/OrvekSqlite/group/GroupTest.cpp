@@ -32,6 +32,15 @@ protected:
         ASSERT_TRUE(WaitUntil([&] { return Clock::now() >= due; }));
     }
 
+    int CodeOfRefusal() {
+        try {
+            m_group.Execute(Insert("refused"));
+        } catch (const SQLite::Exception& refusal) {
+            return refusal.getErrorCode();
+        }
+        return SQLITE_OK;
+    }
+
     static OrvekSqlite::GroupSettings SeldomTriedAgain() {
         OrvekSqlite::GroupSettings settings;
         settings.retry = std::chrono::hours(1);
@@ -48,16 +57,32 @@ TEST_F(GroupTest, IsCommittedByTheNextStatementOnceItIsDueAlsoByOneThatIsRefused
     EXPECT_FALSE(m_group.Due());
 }
 
-TEST_F(GroupTest, ThatIsOwedIsNotTriedAgainByAStatementBeforeItsTime) {
+TEST_F(GroupTest, ThatIsUncommittedIsNotTriedAgainByAStatementBeforeItsTime) {
     OpenDueGroup();
     const auto aside = Store() + ".aside";
     std::filesystem::rename(Store(), aside);
     EXPECT_THROW(m_group.Commit(), SQLite::Exception);
     std::filesystem::rename(aside, Store());
-    EXPECT_THROW(m_group.Execute(Insert("refused")), SQLite::Exception);
+    EXPECT_EQ(CodeOfRefusal(), SQLITE_CANTOPEN) << "the reason of the commit that failed";
     EXPECT_TRUE(m_group.Due());
     EXPECT_NO_THROW(m_group.Commit());
     EXPECT_FALSE(m_group.Due());
+}
+
+TEST_F(GroupTest, IsEmptyOnceTheTableRefusesItsOnlyStatement) {
+    ASSERT_TRUE(WaitUntil([&] {
+        m_group.Commit();
+        m_group.Execute(Insert("twice"));
+        return m_group.Due().has_value(); // one statement is kept
+    }));
+    const auto fresh = Store() + ".fresh";
+    MakeStore(fresh);
+    SQLite::Database(fresh, SQLite::OPEN_READWRITE)
+        .exec("create unique index u on OperLog (eventID); insert into OperLog (eventID) values ('twice')");
+    std::filesystem::rename(fresh, Store());
+    EXPECT_NO_THROW(m_group.Commit());
+    EXPECT_FALSE(m_group.Due());
+    EXPECT_EQ(Rows(Store()), "1");
 }
 
 } // namespace

@@ -1,0 +1,37 @@
+#pragma once
+
+#include <sqlite3.h>
+
+namespace Sqlite {
+
+/// What an error of SQLite's is about, named for what can be done.
+enum class ErrorKind {
+    Wait, ///< Nothing is wrong with the file: another program's lock, a full disk, no memory. Try again later.
+    Reopen,    ///< The open file cannot be used any more. Open its path again.
+    Damage,    ///< The file is damaged, or no database.
+    Statement, ///< The statement's own fault.
+};
+
+/// `code` may be an extended one.
+inline ErrorKind KindOf(int code) {
+    switch (code & 0xff) {
+    case SQLITE_BUSY:
+    case SQLITE_LOCKED:
+    case SQLITE_FULL:
+    case SQLITE_NOMEM:
+    case SQLITE_INTERRUPT:
+        return ErrorKind::Wait;
+    case SQLITE_READONLY:
+    case SQLITE_IOERR:
+    case SQLITE_CANTOPEN:
+    case SQLITE_PROTOCOL:
+        return ErrorKind::Reopen;
+    case SQLITE_CORRUPT:
+    case SQLITE_NOTADB:
+        return ErrorKind::Damage;
+    default:
+        return ErrorKind::Statement;
+    }
+}
+
+} // namespace Sqlite
