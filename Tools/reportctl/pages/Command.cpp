@@ -43,19 +43,34 @@ std::vector<std::string> NamesOf(const std::set<CLI::Option*>& options) {
     return names;
 }
 
+bool IsOneWord(const std::string& text) {
+    return text.find_first_not_of("ABCDEFGHIJKLMNOPQRSTUVWXYZ") == std::string::npos;
+}
+
+/// "TEXT:TIME" is a value called TIME, "INT:NONNEGATIVE" an INT, and "INT:INT in [1 - 9]" an INT with limits.
+void ReadType(Option& read, const std::string& type) {
+    const auto colon = type.find(':');
+    read.value = type.substr(0, colon);
+    read.choices = ChoicesIn(type);
+    if (colon == std::string::npos)
+        return;
+    const auto check = type.substr(colon + 1);
+    if (!IsOneWord(check))
+        read.limits = check;
+    else if (read.value == "TEXT")
+        read.value = check;
+}
+
 Option ReadOption(const CLI::Option& option) {
-    const auto type = option.get_type_size() == 0 ? std::string() : option.get_type_name();
-    const auto colon = type.find(':'); // between the type and what the checks say
     Option read;
     read.names = NamesOf(option);
-    read.value = type.substr(0, colon);
-    read.limits = colon == std::string::npos ? "" : type.substr(colon + 1);
+    if (option.get_type_size() != 0)
+        ReadType(read, option.get_type_name());
     read.description = option.get_description();
     read.group = option.get_group();
     read.isPositional = option.get_snames().empty() && option.get_lnames().empty();
     read.isRequired = option.get_required();
     read.defaultValue = option.get_default_str();
-    read.choices = ChoicesIn(type);
     read.needs = NamesOf(option.get_needs());
     read.excludes = NamesOf(option.get_excludes());
     return read;
