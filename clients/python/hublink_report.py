@@ -6,8 +6,8 @@
     reporter.event("A100|10001", {"page": "start"})  # begins with A: to analytics
     reporter.event("B100|10001", "it's open")        # any other: to the local store
 
-Purpose: a text arrives exactly as it was given, or the result says why it was not sent. The module doubles quotes for the
-store, escapes JSON, announces its own module, tells the signed-in user, and does both again when the service was
+Purpose: a text arrives exactly as it was given, or the result says why it was not sent. The module doubles quotes for
+the store, escapes JSON, announces its own module, tells the signed-in user, and does both again when the service was
 restarted.
 
 Threads: every operation may be called from any thread, and in a child after a fork, which has a socket of its own.
@@ -16,9 +16,9 @@ The module starts no thread.
 Failure: `event` and `set_user` never raise, whatever they are given, never wait, and write nothing to the terminal. An
 argument of a wrong type counts as one that cannot be sent. Only KeyboardInterrupt and the like pass through.
 
-What `Result.SENT` promises: the system took the datagram, and a program listens. Linux drops without a word what does not
-fit into the listener's buffer, so some of a long burst that comes faster than the service takes it are lost. A busy system
-may tell a moment late that no program listens; then it is the next event that learns of it.
+What `Result.SENT` promises: the system took the datagram, and a program listens. Linux drops without a word what does
+not fit into the listener's buffer, so some of a long burst that comes faster than the service takes it are lost. A busy
+system may tell a moment late that no program listens; then it is the next event that learns of it.
 
 Standard library only; Python 3.9 and later.
 """
@@ -59,8 +59,8 @@ class Result(enum.Enum):
     NOBODY_LISTENS = 1
     TOO_LONG = 2  #: more than 10240 bytes as a datagram
     INVALID_TEXT = 3  #: half a surrogate pair, which UTF-8 cannot hold, or a zero character; an empty open id
-    #: No JSON. For analytics, a value that is neither nothing nor an object which the service can read: at most 127 levels,
-    #: integers of at most 64 bits, numbers within the range of a double.
+    #: No JSON. For analytics, a value that is neither nothing nor an object which the service can read: at most 127
+    #: levels, integers of at most 64 bits, numbers within the range of a double.
     INVALID_JSON = 4
     #: Empty, no text as above; or for analytics, without the reporter's module or A759 before a bar.
     INVALID_EVENT_ID = 5
@@ -71,7 +71,7 @@ class Result(enum.Enum):
 
 
 class Module(NamedTuple):
-    """The module of the suite that reports: its id as it stands before the bar of its event ids, which begins with A."""
+    """The module of the suite that reports. Its id begins with A and stands before the bar of its event ids."""
 
     id: str
     version: str = ""
@@ -95,7 +95,7 @@ class _Refusal(Exception):
         self.result = result
 
 
-# --- Writing messages ---------------------------------------------------------------------------------------------------
+# --- Writing messages -----------------------------------------------------------------------------------------------
 
 _ENCODER = json.JSONEncoder(ensure_ascii=False, allow_nan=False, separators=(",", ":"))
 
@@ -227,8 +227,8 @@ def _value_for_store(value: Value) -> Optional[str]:
     text = _json_text(value)
     if text[0] in "{[" and _is_flat(text) and _is_read(text, _EXACT_JSON):
         return _doubled_in_json(text)
-    # The service would print it as another value: a string without its quotation marks, null as nothing. As a text, it is
-    # not touched.
+    # The service would print it as another value: a string without its quotation marks, null as nothing. As a text, it
+    # is not touched.
     return _ENCODER.encode(_doubled(text))
 
 
@@ -244,7 +244,7 @@ def _value_for_analytics(value: Value) -> Optional[str]:
 
 
 def _time(time_ms: Optional[int]) -> str:
-    """The service takes a time of ten characters for seconds. One of that length in milliseconds gets a leading zero."""
+    """The service takes a time of ten characters for seconds. One of ten in milliseconds gets a leading zero."""
     if time_ms is None:
         return str(time.time_ns() // 1_000_000)
     if not isinstance(time_ms, int) or not -(2**63) <= time_ms < 2**63:
@@ -309,7 +309,7 @@ def _user(open_id: str, suite_version: str) -> bytes:
     return _control("updateOpenID", openID=open_id, hublinkVersion=suite_version)
 
 
-# --- Looking for the service --------------------------------------------------------------------------------------------
+# --- Looking for the service ----------------------------------------------------------------------------------------
 
 
 class _Listener(NamedTuple):
@@ -344,8 +344,8 @@ def _listener() -> Optional[_Listener]:
 
     A socket of the very address comes before one of all addresses. Of two alike, another user's is named.
     """
-    # As bytes: a text's codec is imported when it is first used, and a fork in the midst of an import leaves the child a
-    # lock that no thread gives back.
+    # As bytes: a text's codec is imported when it is first used, and a fork in the midst of an import leaves the child
+    # a lock that no thread gives back.
     table = _TABLES[0].read_bytes()
     if _TABLES[1].exists():  # not where IPv6 is switched off
         table += _TABLES[1].read_bytes()
@@ -356,7 +356,7 @@ def _listener() -> Optional[_Listener]:
 #: file's now.
 _NOT_OURS = {errno.EBADF, errno.ENOTSOCK, errno.EDESTADDRREQ, errno.ENOTCONN}
 
-# --- Sending ------------------------------------------------------------------------------------------------------------
+# --- Sending --------------------------------------------------------------------------------------------------------
 
 
 def _connected() -> socket.socket:
@@ -577,7 +577,7 @@ if hasattr(os, "register_at_fork"):
     os.register_at_fork(after_in_child=_begin_in_child)
 
 
-# --- The program's log --------------------------------------------------------------------------------------------------
+# --- The program's log ----------------------------------------------------------------------------------------------
 
 _EventIdOf = Union[str, Callable[[logging.LogRecord], str]]
 
@@ -588,9 +588,9 @@ class ReportHandler(logging.Handler):
         logging.getLogger().addHandler(ReportHandler(reporter, "B100|%(name)s", level=logging.WARNING))
 
     `event_id` is a text in which "%(name)s" and the record's other attributes are filled in, or a function of the
-    record. The value is an object with "level", "logger", "message", "file" and "line"; the message is what the handler's
-    formatter makes of the record, by default the message and the exception's trace. One that is too long for a datagram is
-    cut at its end, and the object has "cut" then.
+    record. The value is an object with "level", "logger", "message", "file" and "line"; the message is what the
+    handler's formatter makes of the record, by default the message and the exception's trace. One that is too long for
+    a datagram is cut at its end, and the object has "cut" then.
 
     Failure: nothing is raised or printed. `failed` counts the records that could not be formatted, and those that were
     logged while a record of the same thread was being sent; what became of the others, the reporter counts.

@@ -119,7 +119,7 @@ class AnObject(Sending):
         for number in (str(2**64), str(-(2**63) - 1), "1" * 5000, "1e400", "-0", "0.12345678901234567", "1e-400"):
             text = '{"a":%s,"b":"\'"}' % number
             self.assertEqual(self.value(STORE, Json(text)), text.replace("'", "''"))
-        for number in (2**64 - 1, -(2**63), 1.7976931348623157e308, 5e-324, -0.0, 0.1 + 0.2, 100000000000000000000000.0):
+        for number in (2**64 - 1, -(2**63), 1.7976931348623157e308, 5e-324, -0.0, 0.1 + 0.2, 1e22 * 10):
             self.assertEqual(self.value(STORE, {"a": number}), {"a": number})
 
     def test_is_refused_for_analytics_where_the_service_cannot_read_it(self):
@@ -134,8 +134,8 @@ class AnObject(Sending):
 
 class Jsons(Sending):
     def test_are_checked(self):
-        for text in ("", " ", "{", "{'a':1}", '{"a":1}}', "[1,]", "NaN", "-Infinity", "01", "1.", "\ufeff{}", '"\n"', "tru",
-                     '"\\x"', '"\\u12"', "\u0661", "1.\u0661"):
+        for text in ("", " ", "{", "{'a':1}", '{"a":1}}', "[1,]", "NaN", "-Infinity", "01", "1.", "\ufeff{}", '"\n"',
+                     "tru", '"\\x"', '"\\u12"', "\u0661", "1.\u0661"):
             self.refused(Result.INVALID_JSON, STORE, Json(text))
 
     def test_may_hold_whole_surrogate_pairs_in_escapes(self):
@@ -190,7 +190,8 @@ class AModule(Sending):
         self.assertEqual(json.loads(announcement)["exdata"]["moduleName"], '\\eventIDeventID"')
 
     def test_that_cannot_be_announced_has_events_that_cannot_be_sent(self):
-        for module, result in ((Module("A1", "\0"), Result.INVALID_TEXT), (Module("A1", "", "\ud800"), Result.INVALID_TEXT),
+        for module, result in ((Module("A1", "\0"), Result.INVALID_TEXT),
+                               (Module("A1", "", "\ud800"), Result.INVALID_TEXT),
                                (Module("A1", "x" * 10240), Result.TOO_LONG)):
             reporter = Reporter(module)
             self.assertIs(reporter.event("A1|1"), result)

@@ -13,12 +13,12 @@ PROGRAMS, CASES = sys.argv[1], int(sys.argv[2])
 SEED = random.randrange(2**32)
 AT_ONCE_BYTES = 100_000  # what the service's buffer surely holds, with the system's own bookkeeping
 
-PIECES = ["'", "''", "\"", "\\", "%", "%s", "%1%", "\\u0027", "\\'", "eventID", '"eventID":"A1|1"', "|", "\n", "\r\n", "\t",
-          "\x01", "\x1f", "\x7f", "\u00e4", "\u2028", "\ufeff", "\uffff", "\U0001f600", "\U0010ffff", "');--", "values(",
-          "{}", "[", "null", "true", "1.5", " ", "a", "B100", "A759", "openid.", "x" * 40]
+PIECES = ["'", "''", "\"", "\\", "%", "%s", "%1%", "\\u0027", "\\'", "eventID", '"eventID":"A1|1"', "|", "\n",
+          "\r\n", "\t", "\x01", "\x1f", "\x7f", "\u00e4", "\u2028", "\ufeff", "\uffff", "\U0001f600", "\U0010ffff",
+          "');--", "values(", "{}", "[", "null", "true", "1.5", " ", "a", "B100", "A759", "openid.", "x" * 40]
 BROKEN = ["\0", "\ud800", "\udfff", "\udc00\ud800"]
-NUMBERS = [0, 1, -1, 2**31, 2**53 + 1, 2**63 - 1, -(2**63), 2**64 - 1, 0.0, -0.0, 1.5, -2.5e-7, 5e-324, 1.7976931348623157e308,
-           1e16, 1e22, 123456789.125, 0.1, 1 / 3]
+NUMBERS = [0, 1, -1, 2**31, 2**53 + 1, 2**63 - 1, -(2**63), 2**64 - 1, 0.0, -0.0, 1.5, -2.5e-7, 5e-324,
+           1.7976931348623157e308, 1e16, 1e22, 123456789.125, 0.1, 1 / 3]
 NO_NUMBERS = [2**64, -(2**63) - 1, 10**30, float("nan"), float("inf")]
 SCALARS = [None, True, False]
 
@@ -34,7 +34,8 @@ class Cases:
         if self.random.random() < 0.01:
             pieces.append(self.random.choice(BROKEN))
         if self.random.random() < 0.3:
-            pieces.append(chr(self.random.choice([self.random.randrange(1, 0xd800), self.random.randrange(0xe000, 0x110000)])))
+            low, high = self.random.choice([(1, 0xd800), (0xe000, 0x110000)])  # all but the surrogates
+            pieces.append(chr(self.random.randrange(low, high)))
         self.random.shuffle(pieces)
         if longest > 20 and self.random.random() < 0.02:
             pieces.append("\u00e4" * self.random.randrange(4900, 5200))  # to both sides of the longest datagram
@@ -69,11 +70,13 @@ class Cases:
             return made if isinstance(made, (dict, list)) else {"a": made}
         if kind < 9:
             try:
-                return Json(json.dumps(made, ensure_ascii=self.random.random() < 0.5, indent=self.random.choice([None, 1])))
+                return Json(json.dumps(made, ensure_ascii=self.random.random() < 0.5,
+                                       indent=self.random.choice([None, 1])))
             except (TypeError, ValueError):
                 return None
-        return Json(self.random.choice(['{"a":1,"a":{"a":2},"a":"\'"}', '{"a\\u0027":"\\u0000\\/\\b"}', "[1e2,-0,-0.0,1E-5]",
-                                        " [ ] ", "{", "1 1", '"\\ud800"', "[" * 127 + "]" * 127, "[" * 128 + "]" * 128,
+        return Json(self.random.choice(['{"a":1,"a":{"a":2},"a":"\'"}', '{"a\\u0027":"\\u0000\\/\\b"}',
+                                        "[1e2,-0,-0.0,1E-5]", " [ ] ", "{", "1 1", '"\\ud800"', "[" * 127 + "]" * 127,
+                                        "[" * 128 + "]" * 128,
                                         self.text()]))
 
     def event_id(self):
@@ -134,7 +137,8 @@ class Sent(unittest.TestCase):
                 cls.users[result].append(new)
                 if result is Result.SENT:
                     user = (new[0], new[1] or user[1])
-            case = (cases.event_id(), cases.value(), cases.random.choice([number, 1234567890, 1700000000123 + number, -number]))
+            time_ms = cases.random.choice([number, 1234567890, 1700000000123 + number, -number])
+            case = (cases.event_id(), cases.value(), time_ms)
             waiting += 1000 + 4 * len(all_of(case[1]))
             result = reporter.event(*case[:2], time_ms=case[2], day_report=number % 2 == 0)
             cls.results[result].append(case)

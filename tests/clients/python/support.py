@@ -114,7 +114,8 @@ class Service:
 
     @staticmethod
     def line_of_its_socket():
-        return next((line.split() for line in SOCKET_TABLE.read_text().splitlines() if ": 0100007F:270D " in line), None)
+        lines = SOCKET_TABLE.read_text().splitlines()
+        return next((line.split() for line in lines if ": 0100007F:270D " in line), None)
 
     def drain(self):
         """Waits until the service has taken all datagrams off its socket, so that none is dropped."""
