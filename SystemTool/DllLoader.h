@@ -7,7 +7,7 @@
 namespace SystemTool {
 
 /// A shared library that is opened at run time. Closed by the destructor.
-/// One thread at a time; whoever fetched a symbol must not use it after Unload.
+/// One thread at a time; a symbol that was fetched must not be used after Unload.
 class DllLoader : public boost::dll::shared_library {
 public:
     /// Opens the library at `path`, used exactly as given (no prefix, no suffix), with all its symbols

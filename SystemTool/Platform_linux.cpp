@@ -37,7 +37,7 @@ std::string WithoutTrailingSeparators(std::string path) {
 /// The text of an absolute path in the environment; empty for an unset, empty or relative one, which the
 /// desktop's base directory rules tell programs to ignore.
 std::string AbsolutePathFromEnvironment(const char* name) {
-    const char* value = std::getenv(name); // NOLINT(concurrency-mt-unsafe): nobody sets any
+    const char* value = std::getenv(name); // NOLINT(concurrency-mt-unsafe): no thread sets any
     return value != nullptr && value[0] == '/' ? value : "";
 }
 

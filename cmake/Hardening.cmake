@@ -1,5 +1,5 @@
-# What the shipped programs are built with so that a memory error ends the process instead of serving who provoked it:
-# anybody on the machine may send the service a datagram. Optimised builds only: the fortified functions need the
+# What the shipped programs are built with so that a memory error ends the process instead of serving the attacker:
+# every user of the machine may send the service a datagram. Optimised builds only: the fortified functions need the
 # optimiser, and the sanitizers bring checks of their own.
 include(CheckCXXCompilerFlag)
 include(CheckLinkerFlag)

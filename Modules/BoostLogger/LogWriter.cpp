@@ -135,13 +135,13 @@ FileFailure LogWriter::Put(std::string_view line) {
     return m_live.Append(line);
 }
 
-/// The lock is the live file's own: whoever waited for it finds that the path is another file by then, which
+/// The lock is the live file's own: a process that waited for it finds that the path is another file by then, which
 /// means that the rotation is done already. Opening the new file gives the lock up.
 FileFailure LogWriter::Rotate() {
     if (const FileFailure failure = m_live.Lock())
         return failure;
     if (!m_live.IsGoneFrom(m_path)) {
-        if (m_live.SizeBytes() == 0) { // somebody has emptied it since the last look
+        if (m_live.SizeBytes() == 0) { // it was emptied since the last look
             m_live.Unlock();
             return {};
         }

@@ -59,7 +59,7 @@ void StartSink(const LogSettings& settings) {
     g_settings = new LogSettings(settings);
 }
 
-/// The same settings again are no error: whoever asks for the log that there is has it.
+/// The same settings again are no error: the caller asks for the log that there is.
 void Configure(const LogSettings& settings) {
     CheckSettings(settings);
     const std::lock_guard lock(g_configuring);

@@ -11,7 +11,7 @@ namespace BoostLogger {
 using SystemTool::Text::LineBuffer;
 using SystemTool::Text::TextOf;
 
-/// A longer message is cut. The largest datagram has 10 KiB; whatever is beyond this belongs into no log.
+/// A longer message is cut. The largest datagram has 10 KiB; what is beyond this belongs into no log.
 inline constexpr std::size_t MAX_MESSAGE_BYTES = std::size_t{64} * 1024;
 
 /// Appends the whole line of `record`, its newline included:

@@ -17,7 +17,7 @@ namespace BoostLogger {
 
 namespace {
 
-/// A number that no rotation reaches: a file of that name is somebody else's, and must not become our last
+/// A number that no rotation reaches: a file of that name is not ours, and must not become our last
 /// one.
 constexpr std::uint64_t MAX_NUMBER = 1'000'000'000'000'000;
 

@@ -19,7 +19,7 @@ struct RotatedFile {
 std::vector<RotatedFile> FilesToDelete(std::vector<RotatedFile> files, std::int64_t budgetBytes);
 
 /// The files Report_1.log, Report_2.log ... beside a live file Report.log.
-/// Threads: one at a time. Processes: whoever holds the live file's lock.
+/// Threads: one at a time. Processes: only the one that holds the live file's lock.
 class RotatedFiles {
 public:
     RotatedFiles(std::string directory, const std::string& liveName);

@@ -7,7 +7,7 @@
 // What production runs with, and why. Tests hand in their own.
 namespace MetrikSdk {
 
-/// How much the outbox keeps while nobody takes it.
+/// How much the outbox keeps while no collector takes it.
 struct CapSettings {
     /// A million events of the common size. A desktop that is away from its collector for a month stays far
     /// below; a runaway module cannot fill a small disk.
@@ -23,7 +23,7 @@ struct CapSettings {
     std::size_t maxDropsAtOnce = 1000;
     /// Drops this far apart are two incidents, and each is told.
     std::chrono::milliseconds dropRunEnds = std::chrono::minutes(10);
-    /// Refused events are kept for a person to look at. Nobody looks at more than this, and a collector that
+    /// Refused events are kept for a person to look at. A person looks at no more than this, and a collector that
     /// refuses everything must not move the whole outbox here unbounded.
     std::size_t maxDeadLetters = 10'000;
     std::size_t maxDeadLetterBytes = std::size_t{16} * 1024 * 1024;

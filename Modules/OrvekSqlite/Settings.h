@@ -6,8 +6,8 @@
 
 namespace OrvekSqlite {
 
-/// What one statement may cost. The plug-in is handed texts that any local program had a hand in, so a bound
-/// stands on everything that SQLite can be made to spend.
+/// Bounds on the work and the memory of one statement. Any local program can put its text into a statement, so there
+/// is a bound on everything that SQLite can be made to use.
 struct Limits {
     /// One value, and one row. A report's datagram carries 10 KB, so that the longest text of it fits a
     /// hundred times.
@@ -26,7 +26,7 @@ struct Limits {
     /// Length of a LIKE pattern; matching one can take exponential time in the number of its wildcards.
     int likePatternBytes = 100;
 
-    /// Triggers within triggers. Ours has none; a table that somebody else extended may have a few.
+    /// Triggers within triggers. Ours has none; a table that another program extended may have a few.
     int triggerDepth = 10;
 
     /// Steps of the virtual machine for an INSERT, which takes about 30; with a thousand triggers' worth of
@@ -57,8 +57,8 @@ struct GroupSettings {
     /// statement at most, so that with the longest statement it is 5 MiB. Usual groups have 0.4 MB.
     std::size_t bytes = 4'194'304;
 
-    /// How often a group that could not be committed is tried again. Somebody made room on the disk or ended
-    /// a transaction: a person does not notice a tenth of a second, and ten tries a second cost nothing.
+    /// How often a group that could not be committed is tried again. When a person has made room on the disk or ended
+    /// a transaction, he does not notice a tenth of a second, and ten tries a second cost nothing.
     std::chrono::milliseconds retry{100};
 
     /// The longest that the lock is left free for others after a group. They get as long as the group had it;
@@ -73,8 +73,8 @@ struct GroupSettings {
 /// How the database is opened.
 struct Settings {
     /// How long a statement waits for another process's write lock before it fails. A backup or a person's
-    /// open transaction of 10 seconds must cost no row, and half as much again is the slack. Longer would
-    /// only make the queue before us grow: reports that keep coming are kept in memory meanwhile.
+    /// open transaction of 10 seconds must not lose a row, and half as much again is the slack. To wait
+    /// longer would only make the queue grow: new reports are kept in memory meanwhile.
     std::chrono::milliseconds busyTimeout = std::chrono::seconds(15);
 
     /// The write-ahead log is cut back to this after a checkpoint. A reader that stayed for long may have let

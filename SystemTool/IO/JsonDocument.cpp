@@ -55,7 +55,7 @@ JsonDocument JsonDocument::GetKeyValue(const std::string& key) const {
     return member == m_value->MemberEnd() ? JsonDocument() : JsonDocument(m_tree, &member->value);
 }
 
-/// This document's value, in a tree that nobody else holds, as an object.
+/// This document's value, in a tree that no other document holds, as an object.
 JsonDocument::Value& JsonDocument::Editable() {
     if (m_value != nullptr && !m_value->IsNull() && !m_value->IsObject())
         throw std::logic_error("A member cannot be set in a JSON value that is no object: " +

@@ -17,7 +17,7 @@ class JsonAllocator;
 /// So a caller reads `document.GetKeyValue("a").GetKeyValue("b").ToString()` without a test in between.
 ///
 /// Cost: a value shares its text's tree. Copying a JsonDocument, or taking a member, copies a pointer and not
-/// the value, however large; only SetKeyValue copies, and only what it is about to change while somebody else
+/// the value, however large; only SetKeyValue copies, and only what it is about to change while another document
 /// holds it. Nothing here recurses on the call stack with the depth of the input.
 ///
 /// Threads: one thread at a time for a document and all that were copied or taken from it, since they share a tree.

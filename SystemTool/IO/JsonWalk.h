@@ -4,7 +4,7 @@
 
 #include "SystemTool/IO/JsonMemory.h"
 
-// How JsonDocument goes through a value; of no use to anybody else.
+// How JsonDocument goes through a value. Only JsonDocument uses it.
 namespace SystemTool::IO {
 
 /// Tells `handler` the whole of `root`, in order, as a parser would. The open arrays and objects are kept on

@@ -16,7 +16,7 @@ namespace MetrikSdk::outbox {
 /// Keeps the outbox file of one directory open and usable:
 ///
 ///     closed ──► open ──┬─► damaged   set aside, and a new file begun at once
-///       ▲               ├─► vanished  deleted or replaced by somebody: a new file begun at once
+///       ▲               ├─► vanished  deleted or replaced: a new file begun at once
 ///       └───────────────┴─► failing   closed, and opened again by a later call
 ///
 /// Threads: one at a time. News is appended for the caller to tell when it holds no lock.

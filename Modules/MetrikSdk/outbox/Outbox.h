@@ -2,15 +2,14 @@
 
 #include <atomic>
 #include <mutex>
-#include <optional>
 #include <string>
 #include <vector>
 
 #include "Modules/MetrikSdk/Settings.h"
+#include "Modules/MetrikSdk/outbox/CapKeeper.h"
 #include "Modules/MetrikSdk/outbox/CountWaiter.h"
 #include "Modules/MetrikSdk/outbox/LiveFile.h"
 #include "Modules/MetrikSdk/outbox/OutboxStore.h"
-#include "Modules/MetrikSdk/outbox/PruneRule.h"
 #include "Modules/MetrikSdk/report/Notifier.h"
 
 namespace MetrikSdk::outbox {
@@ -18,9 +17,9 @@ namespace MetrikSdk::outbox {
 /// The outbox of one directory, for all modules and the uploader of a process, kept within its caps.
 ///
 /// Threads: any. One lock over one connection, because every operation is short, and a connection that
-/// nobody else in the process uses can be closed safely when its file is to be set aside.
+/// no other part of the process uses can be closed safely when its file is to be set aside.
 /// Failure: Append and Open return false, the others throw StoreError. Append and Open tell the notifier,
-/// as everybody does who notices damage or drops; never while the lock is held.
+/// and so does each operation that notices damage or drops; never while the lock is held.
 class Outbox {
 public:
     Outbox(const std::string& directory, const OutboxSettings& settings, report::Notifier& notifier);
@@ -45,28 +44,29 @@ public:
 
     OutboxStatus Status();
 
-    /// Rings with the number of waiting events, as far as this process knows it: what another process does to
-    /// the same file is learned within a minute.
+    /// How many events wait, as far as this process knows: it learns within a minute what another process does to the
+    /// same file.
     CountWaiter& WaitingCount() { return m_waitingCount; }
 
 private:
     /// Who waits for a lock: a module's event would be lost, the uploader comes back.
     enum class Caller { Module, Uploader };
 
+    /// What belongs to one call and ends with it.
+    struct Call {
+        SteadyTime now;
+        std::chrono::milliseconds patience; ///< with another process's lock
+        std::vector<report::News> news;     ///< told once the lock is released
+    };
+
     template <typename Operation>
     auto WithStore(Caller caller, Operation operation);
     template <typename Operation>
-    auto AttemptTwice(Operation operation);
+    auto AttemptTwice(Call& call, Operation operation);
 
-    void StoreEvent(OutboxStore& store, const ModuleIdentity& module, const NewEvent& event);
-    void TellEndOfFailures();
-    void LearnAbout(OutboxStore& store);
-    void Recount(OutboxStore& store);
-    void KeepWithinCaps(OutboxStore& store);
-    WallTime OldestAllowed();
-    void Drop(OutboxStore& store, WallTime before, std::int64_t excess);
-    void KeepDeadLettersWithinCaps(OutboxStore& store);
-    void TellDrop(std::size_t dropped);
+    void StoreEvent(OutboxStore& store, const ModuleIdentity& module, const NewEvent& event, Call& call);
+    void TellEndOfFailures(Call& call);
+    void LearnAbout(OutboxStore& store, SteadyTime now);
 
     const OutboxSettings m_settings;
     report::Notifier& m_notifier;
@@ -78,19 +78,9 @@ private:
     std::atomic<unsigned long> m_refused = 0; ///< Events since the last one that was stored.
 
     std::mutex m_mutex; ///< Guards all below.
-    LiveFile m_keeper;
-    unsigned m_knownGeneration = 0;
-    std::int64_t m_waitingEvents = 0;
-    std::int64_t m_waitingBytes = 0;
-    std::int64_t m_underWayUpTo = 0;         ///< The last row that was taken and not released.
-    std::chrono::milliseconds m_patience{0}; ///< Of the operation under way.
-    SteadyTime m_now{};                      ///< Of the operation under way.
-    SteadyTime m_openedSteady{};             ///< Both times of when the file was opened.
-    WallTime m_openedAt{};
-    PruneRule::ClockWatch m_clocks;
-    SteadyTime m_nextAgeCheck{};
-    std::optional<SteadyTime> m_lastDrop;
-    std::vector<report::News> m_news; ///< Told once the lock is released.
+    LiveFile m_file;
+    unsigned m_knownGeneration = 0; ///< Of m_file, that m_caps knows.
+    CapKeeper m_caps;
 };
 
 } // namespace MetrikSdk::outbox

@@ -79,7 +79,7 @@ void OutboxStore::Configure() {
     m_database.exec("PRAGMA synchronous = NORMAL");
     m_database.exec("PRAGMA journal_size_limit = 16777216"); // a burst's log is given back to the disk
     m_database.exec("PRAGMA temp_store = MEMORY");           // nothing beside the outbox itself is written
-    m_database.exec("PRAGMA trusted_schema = OFF"); // somebody may have put another file in the place
+    m_database.exec("PRAGMA trusted_schema = OFF");          // the file may have been replaced by another one
 }
 
 bool OutboxStore::IsOutbox() {
@@ -135,7 +135,7 @@ std::size_t OutboxStore::Store(const ModuleIdentity& module, const NewEvent& eve
         insert->bindNoCopy(5, event.payload);
         insert->bind(6, static_cast<std::int64_t>(event.storedAt.time_since_epoch().count()));
         insert->bind(7, static_cast<std::int64_t>(bytes));
-        // No row means that the module was deleted under us; what else is gone, nobody can know.
+        // No row means that the module was deleted under us; it is unknown what else is gone.
         if (insert->exec() != 1)
             throw StoreError(StoreFault::Reopen, "The outbox has lost a module");
         return bytes + keys.newBytes;

@@ -16,8 +16,8 @@ std::int64_t ExcessBytes(std::int64_t waitingBytes, const CapSettings& caps);
 /// Events that were stored before this are too old.
 ///
 /// `now` is the wall clock. `openedAt` and `elapsed` are the wall clock when the outbox was opened and the
-/// steady time since: a clock that is set years ahead while the service runs must not cost every waiting
-/// event, so the earlier reading counts. A machine that slept keeps its events longer, at worst.
+/// steady time since: a clock that is set years ahead while the service runs must not make every waiting
+/// event too old, so the earlier reading counts. A machine that slept keeps its events longer, at worst.
 WallTime OldestAllowed(WallTime now, WallTime openedAt, std::chrono::milliseconds elapsed,
                        const CapSettings& caps);
 

@@ -9,7 +9,7 @@ namespace MetrikSdk::outbox {
 
 /// What the holder of a store does after an operation failed.
 enum class StoreFault {
-    TryLater, ///< Nothing was changed and the store is in order: a full disk, somebody else's lock.
+    TryLater, ///< Nothing was changed and the store is in order: a full disk, another program's lock.
     Reopen,   ///< The store cannot be used any more; open it again, later if that fails too.
     SetAside, ///< The file is damaged or none of ours.
     Unsafe,   ///< Another user could change the directory; the outbox must not be there.

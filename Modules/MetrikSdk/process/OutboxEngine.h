@@ -19,7 +19,7 @@ public:
                  const std::optional<otlp::EndpointConfig>& endpoint, std::vector<std::string> complaints,
                  std::shared_ptr<report::FailureReporter> reporter);
 
-    /// Opens the outbox file, and tells what was wrong with the configuration, which nobody could be told
+    /// Opens the outbox file, and tells what was wrong with the configuration, which could not be told
     /// earlier.
     bool Open();
 

@@ -43,7 +43,7 @@ public:
     /// The modules that use the outboxes.
     Memberships& Members() { return m_members; }
 
-    /// Gives `engine` up. The last user's call stops its uploader before it returns; nobody can open the same
+    /// Gives `engine` up. The last user's call stops its uploader before it returns; no other thread can open the same
     /// file meanwhile.
     void Release(std::shared_ptr<OutboxEngine>& engine);
 

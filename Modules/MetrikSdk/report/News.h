@@ -4,7 +4,7 @@
 
 namespace MetrikSdk::report {
 
-/// What went wrong, as coarse as somebody who reads the log wants it repeated.
+/// What went wrong. Coarse on purpose: in the log, each of these is repeated once in an interval at most.
 enum class Cause {
     Configuration, ///< A variable of the environment that makes no sense.
     Directory,     ///< No directory to keep the outbox in.
@@ -15,14 +15,14 @@ enum class Cause {
     Drop,          ///< Events given up for a cap.
     Upload,        ///< The collector cannot be reached or asks to wait.
     Refusal,       ///< Events that the collector will never take.
-    Init,          ///< A module could not be initialised for a reason that nobody foresaw.
+    Init,          ///< A module could not be initialised for an unexpected reason.
     Count          ///< How many causes there are.
 };
 
 /// The first text of the failure callback.
 const char* NameOf(Cause cause);
 
-/// A failure, or the end of failures, on its way to whoever wants to know.
+/// A failure, or the end of failures, on its way to the callbacks.
 struct News {
     enum class Kind { Failure, End };
     Cause cause;

@@ -19,8 +19,8 @@ namespace MetrikSdk::report {
 /// Threads: any. A callback runs while the notifier's lock is held, so that after Unsubscribe no call to it
 /// is under way or will come; it may report events, but not initialise or destroy an SDK object.
 /// The end of failures goes to the failure callback too: it is the one whose texts end in a log.
-/// Failure: what a callback throws goes nowhere, and a failure that cannot be told, for want of memory, neither:
-/// whoever tells one is in the middle of handling it.
+/// Failure: what a callback throws goes nowhere, and a failure that cannot be told for lack of memory is
+/// not told: the caller is in the middle of handling it.
 class Notifier {
 public:
     explicit Notifier(std::shared_ptr<FailureReporter> reporter) : m_reporter(std::move(reporter)) {}
@@ -37,7 +37,7 @@ public:
     void TellFailures(const std::vector<News>& news) noexcept;
     void TellSuccess(const std::string& what, const std::string& detail);
 
-    /// From now on nobody in this process is told anything: exit() is running, and what the callbacks use may
+    /// From now on no callback of this process is called: exit() is running, and what the callbacks use may
     /// be destroyed already.
     static void Silence();
 

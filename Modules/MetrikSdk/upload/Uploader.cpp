@@ -57,7 +57,7 @@ void TellFailure(process::OutboxCore& core, const char* reason) noexcept {
     }
 }
 
-/// An exception that nobody foresaw, such as a lack of memory, must not end the service.
+/// An unexpected exception, such as a lack of memory, must not end the service.
 void RunUntilStopped(process::OutboxCore& core, otlp::Sender& sender) noexcept {
     constexpr std::chrono::seconds RECOVERY(10);
     auto& waiting = core.outbox.WaitingCount();

@@ -47,16 +47,16 @@ const std::string& MadePrivate(const std::string& path) {
 }
 
 /// Gives the side files that are there already the database's mode, before SQLite opens them. They may be too
-/// wide, made by another process before the database was private, or too narrow, made while nobody was to
-/// write it. Named by SQLite, which resolved symbolic links first.
+/// wide, made by another process before the database was private, or too narrow, made while the database was
+/// read-only. Named by SQLite, which resolved symbolic links first.
 void AlignSideFiles(sqlite3* connection) {
     const std::string file = sqlite3_db_filename(connection, "main");
     for (const auto* suffix : Sqlite::SIDE_FILE_SUFFIXES)
         SetMode(file + suffix, ModeOf(file));
 }
 
-/// The schema is somebody else's text: it may not call functions that reach outside the database, and nobody
-/// writes it but through CREATE and DROP. A text in double quotes is a name, never a literal.
+/// The schema is a text from outside: it may not call functions that reach outside the database, and only
+/// CREATE and DROP may change it. A text in double quotes is a name, never a literal.
 void Harden(sqlite3* connection) {
     sqlite3_db_config(connection, SQLITE_DBCONFIG_DEFENSIVE, 1, nullptr);
     sqlite3_db_config(connection, SQLITE_DBCONFIG_TRUSTED_SCHEMA, 0, nullptr);

@@ -16,8 +16,8 @@ bool IsAboutTheFile(const SQLite::Exception& error) {
     return kind == Sqlite::ErrorKind::Reopen || kind == Sqlite::ErrorKind::Damage;
 }
 
-/// A file that is replaced again while it is opened anew is somebody's busy script; one that is replaced each
-/// time is no store.
+/// A file may be replaced again while it is opened anew, by a busy script. One that is replaced each time is no
+/// store.
 constexpr int MAX_ATTEMPTS = 3;
 
 /// A later change of the working directory must not lead to another file, and no name is special to SQLite

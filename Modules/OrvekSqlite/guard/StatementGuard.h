@@ -21,7 +21,7 @@ enum class Permission {
 /// The service builds its INSERT without escaping what a report says, deliberately, so a report can end its
 /// own literal and continue in SQL. This is where that ends:
 ///
-/// - Nobody may attach a database, use a pragma, load an extension, open a transaction or make a virtual
+/// - No statement may attach a database, use a pragma, load an extension, open a transaction or make a virtual
 ///   table.
 /// - An INSERT may hold only literals and operators. No function: `printf('%.*c',1000000000,'x')` is a single
 ///   step of the virtual machine and so passes any progress handler. No sub-select: a cross join needs

@@ -13,11 +13,11 @@ struct DeliverySettings {
 };
 
 /// Judges `text`, sends it, and tells the person what came of it. Returns the exit code: 0, or 1 when it was
-/// not sent or nobody listens. Throws Poco::Exception for what the system refuses to send.
+/// not sent or no program listens. Throws Poco::Exception for what the system refuses to send.
 int DeliverOne(const std::string& text, const DeliverySettings& settings);
 
 /// The same for each line that is not blank, as it stands, without its line feed. A line that is judged bad
-/// is told with its number and left out; the first that nobody hears is the last. Each line goes out as soon
+/// is told with its number and left out. The first line that no program takes is the last that is sent. Each line goes out as soon
 /// as it is read, so that the descriptor may be that of a pipe that is still being written. A line of any length
 /// takes no more memory than 64 KiB.
 int DeliverLines(int descriptor, const DeliverySettings& settings);

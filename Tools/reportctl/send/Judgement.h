@@ -17,7 +17,7 @@ struct Judgement {
 /// depends on the service's state (whether a module was announced, whether the store is there) is not judged.
 ///
 /// The line between errors and warnings: a report that would not end where its sender means it to is an
-/// error, since nobody is told of the loss at the other end.
+/// error, since the sender would not learn of the loss.
 Judgement Judge(const std::string& text);
 
 /// The same for a text of which only the length is known, which no datagram can hold.

@@ -9,19 +9,19 @@ namespace reportctl::send {
 
 /// Sends texts to the service, a datagram each.
 ///
-/// Nobody answers a datagram, so this can tell only whether somebody listens: the socket is connected, and
-/// the system then reports a datagram for a port that nobody has bound.
+/// A datagram gets no answer, so this can tell only whether a program listens on the port: the socket is connected,
+/// and the system then reports a datagram for a port that no program has bound.
 ///
 /// One thread. Failure: what the system refuses to send throws Poco::Exception.
 class Sender {
 public:
     Sender();
 
-    /// Sends one datagram. False when nobody listens, as far as is known by then: the report about this
+    /// Sends one datagram. False when no program listens, as far as is known by then: the report about this
     /// datagram may come later, and is then the answer to the next call.
     bool Send(const std::string& text);
 
-    /// Gives a late report its time to arrive. False when nobody listens.
+    /// Waits a moment for a report that comes late. False when no program listens.
     bool IsHeard();
 
     /// The address that is sent to, for people.

@@ -10,7 +10,7 @@ namespace reportctl::store {
 
 /// Makes sure of the database at `path`: mode 0600, write-ahead log, the tables of the current schema.
 ///
-/// A new one is built under another name and gets its own in one step: nobody ever sees half a store, and one
+/// A new one is built under another name and gets its own in one step: no program ever sees half a store, and one
 /// that appears meanwhile is not overwritten. An older schema is migrated, with its rows, in one transaction.
 /// A file that is no database, and a schema that is newer than this program, are left as they are. Side files without a
 /// store, which may hold rows, are renamed; where that fails no new store is made beside them.
