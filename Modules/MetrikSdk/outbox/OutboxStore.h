@@ -100,8 +100,8 @@ public:
 
 private:
     struct ReleaseKeys {
-        std::int64_t module;
-        std::int64_t release;
+        std::int64_t module = 0;
+        std::int64_t release = 0;
         std::size_t newBytes = 0; ///< What its rows take, when they were just made.
     };
     struct Removed {
