@@ -14,8 +14,10 @@ namespace reportctl::commands {
 /// program into `exitCode`, which must outlive the parsing.
 using Add = void(CLI::App& app, int& exitCode);
 
-Add AddSetup; ///< `setup` makes what the service needs.
-Add AddRun;   ///< `run` becomes the service as soon as no other one runs.
+Add AddSetup;   ///< `setup` makes what the service needs.
+Add AddRun;     ///< `run` becomes the service as soon as no other one runs.
+Add AddStatus;  ///< `status` tells whether the service is healthy, and what to do when it is not.
+Add AddMetrics; ///< `metrics` writes the same as figures for a monitoring system.
 Add AddSend;  ///< `send` sends the running service a report or a control message, from flags or line by line.
 Add AddStats; ///< `stats` counts reports.
 Add AddExport; ///< `export` writes the rows of the store as CSV or JSON Lines.
@@ -23,6 +25,7 @@ Add AddBackup; ///< `backup` copies the databases.
 Add AddPrune;  ///< `prune` deletes old rows.
 
 /// In the order of the help.
-inline constexpr std::array ALL{&AddSetup, &AddRun, &AddSend, &AddStats, &AddExport, &AddBackup, &AddPrune};
+inline constexpr std::array ALL{&AddSetup, &AddRun,    &AddStatus, &AddMetrics, &AddSend,
+                                &AddStats, &AddExport, &AddBackup, &AddPrune};
 
 } // namespace reportctl::commands

@@ -47,7 +47,8 @@ void SyncDirectoryOf(const std::string& path) {
 
 } // namespace
 
-Result::Result(const std::string& path) : m_path(path == "-" ? std::string() : path) {
+Result::Result(const std::string& path, mode_t mode)
+    : m_path(path == "-" ? std::string() : path), m_mode(mode) {
     m_buffer.reserve(BUFFER_BYTES);
     if (IsStandardOutput())
         m_descriptor = STDOUT_FILENO;
@@ -99,7 +100,8 @@ void Result::Finish() {
     Flush();
     if (m_draft.empty())
         return;
-    if (::fsync(m_descriptor) != 0 || ::rename(m_draft.c_str(), m_path.c_str()) != 0)
+    if (::fchmod(m_descriptor, m_mode) != 0 || ::fsync(m_descriptor) != 0 ||
+        ::rename(m_draft.c_str(), m_path.c_str()) != 0)
         Throw("cannot write " + m_path);
     m_draft.clear();
     SyncDirectoryOf(m_path);

@@ -3,11 +3,13 @@
 #include <string>
 #include <string_view>
 
+#include <sys/types.h>
+
 namespace reportctl::terminal {
 
 /// Where a command's result goes: standard output, or a file that appears whole or not at all.
 ///
-/// A file is written under another name beside its own, mode 0600, and gets its name in Finish, after its contents are
+/// A file is written under another name beside its own, mode 0600 unless another one is asked for, and gets its name in Finish, after its contents are
 /// on the disk; one that was there before stays as it is until then, and for good when anything fails. A path that
 /// names a device or a pipe is written to as it is.
 ///
@@ -15,7 +17,7 @@ namespace reportctl::terminal {
 class Result {
 public:
     /// An empty path, or "-", is standard output.
-    explicit Result(const std::string& path);
+    explicit Result(const std::string& path, mode_t mode = 0600);
     ~Result();
     Result(const Result&) = delete;
     Result& operator=(const Result&) = delete;
@@ -32,6 +34,7 @@ private:
     void OpenFile();
 
     std::string m_path;
+    mode_t m_mode;
     std::string m_draft; ///< empty: there is nothing to be renamed or removed
     int m_descriptor = -1;
     std::string m_buffer;

@@ -1,0 +1,37 @@
+#include <memory>
+#include <string>
+
+#include <CLI/CLI.hpp>
+
+#include "Tools/reportctl/commands/Commands.h"
+#include "Tools/reportctl/status/Status.h"
+#include "Tools/reportctl/terminal/Result.h"
+
+namespace reportctl::commands {
+namespace {
+
+/// A collector is another user.
+constexpr mode_t READABLE = 0644;
+
+} // namespace
+
+void AddMetrics(CLI::App& app, int& exitCode) {
+    auto* metrics = app.add_subcommand("metrics", "Write what status shows as figures for a monitoring "
+                                                  "system, in Prometheus's text format. The exit code "
+                                                  "is 0 when they were written, whatever they say.");
+    auto file = std::make_shared<std::string>();
+    metrics
+        ->add_option(
+            "--output", *file,
+            "Write them to FILE, readable for all users: the whole of it or, on a failure, none of it.")
+        ->type_name("FILE");
+    metrics->callback([file, &exitCode] {
+        const auto status = status::Gather();
+        terminal::Result result(*file, READABLE);
+        result.Write(MetricsOf(status, Judge(status)));
+        result.Finish();
+        exitCode = 0;
+    });
+}
+
+} // namespace reportctl::commands

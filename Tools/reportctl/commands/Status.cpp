@@ -1,0 +1,95 @@
+#include <chrono>
+#include <cstdlib>
+#include <memory>
+#include <string_view>
+#include <thread>
+
+#include <CLI/CLI.hpp>
+#include <fmt/format.h>
+#include <unistd.h>
+
+#include "Tools/reportctl/commands/Commands.h"
+#include "Tools/reportctl/status/Status.h"
+
+namespace reportctl::commands {
+namespace {
+
+struct Options {
+    bool isJson = false;
+    bool isWatch = false;
+    double seconds = 2;
+};
+
+/// A terminal that knows colours, and nobody who does not want them.
+bool WantsColours() {
+    // NOLINTBEGIN(concurrency-mt-unsafe): one thread
+    const char* const noColour = std::getenv("NO_COLOR");
+    const char* const terminal = std::getenv("TERM");
+    // NOLINTEND(concurrency-mt-unsafe)
+    return ::isatty(STDOUT_FILENO) == 1 && (noColour == nullptr || *noColour == '\0') &&
+           terminal != nullptr && std::string_view(terminal) != "dumb";
+}
+
+int ShowOnce(const Options& options) {
+    const auto status = status::Gather();
+    const auto judgement = Judge(status);
+    fmt::print("{}",
+               options.isJson ? JsonOf(status, judgement) : ScreenOf(status, judgement, WantsColours()));
+    return static_cast<int>(judgement.verdict);
+}
+
+/// From the top left corner, each line wiped behind its end, and what is below: the screen does not flicker.
+std::string InPlace(std::string screen) {
+    for (std::size_t at = 0; (at = screen.find('\n', at)) != std::string::npos; at += 4)
+        screen.insert(at, "\x1b[K");
+    return "\x1b[H" + screen + "\x1b[J";
+}
+
+/// Until a signal ends it. The rates of now are those between two looks.
+int Watch(const Options& options) {
+    const bool isTerminal = ::isatty(STDOUT_FILENO) == 1;
+    if (isTerminal)
+        fmt::print("\x1b[2J");
+    ReportLedger::Look before;
+    for (;;) {
+        auto status = status::Gather();
+        if (before.counting && status.ledger.counting)
+            status.lastSecond =
+                ledger::RatesBetween(before.total, status.ledger.total,
+                                     std::chrono::milliseconds(status.ledger.atMs - before.atMs));
+        before = status.ledger;
+        const auto judgement = Judge(status);
+        const auto text =
+            options.isJson ? JsonOf(status, judgement) : ScreenOf(status, judgement, WantsColours());
+        fmt::print("{}", isTerminal && !options.isJson ? InPlace(text) : text);
+        if (std::fflush(stdout) != 0)
+            return 1; // whoever read it is gone
+        std::this_thread::sleep_for(std::chrono::duration<double>(options.seconds));
+    }
+}
+
+} // namespace
+
+void AddStatus(CLI::App& app, int& exitCode) {
+    auto* status = app.add_subcommand(
+        "status",
+        "Show whether the service is healthy: what runs, what it has counted, its store, outbox and log, and "
+        "what to do about what is wrong. Changes no file. The exit code is 0 for healthy, 1 for degraded and "
+        "2 "
+        "for down.");
+    auto options = std::make_shared<Options>();
+    status->add_flag("--json", options->isJson, "Write one JSON object (docs/Status.md).");
+    auto* const watch =
+        status
+            ->add_option("--watch", options->seconds,
+                         "Show it again every SECONDS (2 unless given), until a signal ends it.")
+            ->type_name("SECONDS")
+            ->expected(0, 1)
+            ->check(CLI::Range(0.1, 86400.0));
+    status->callback([options, watch, &exitCode] {
+        options->isWatch = watch->count() > 0;
+        exitCode = options->isWatch ? Watch(*options) : ShowOnce(*options);
+    });
+}
+
+} // namespace reportctl::commands

@@ -1,0 +1,142 @@
+#include "Tools/reportctl/service/Processes.h"
+
+#include <algorithm>
+#include <array>
+#include <charconv>
+#include <filesystem>
+#include <fstream>
+#include <iterator>
+#include <sstream>
+
+#include <fcntl.h>
+#include <fmt/format.h>
+#include <pwd.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include "Common/Constants.h"
+#include "Common/Wire.h"
+#include "SystemTool/IO/Descriptor.h"
+
+namespace reportctl::service {
+namespace {
+
+namespace fs = std::filesystem;
+
+constexpr auto LOOPBACK = "0100007F"; // as the kernel's table writes addresses
+constexpr auto ANY_ADDRESS = "00000000";
+
+std::string Folder(pid_t process) {
+    return fmt::format("/proc/{}", process);
+}
+
+std::string ContentOf(const std::string& path) {
+    std::ifstream file(path, std::ios::binary);
+    return {std::istreambuf_iterator<char>(file), {}};
+}
+
+std::string TargetOf(const fs::path& link) {
+    std::error_code error;
+    return fs::read_symlink(link, error).string();
+}
+
+} // namespace
+
+std::string NameOf(uid_t user) {
+    passwd entry{};
+    passwd* found = nullptr;
+    std::array<char, 16384> buffer{};
+    if (::getpwuid_r(user, &entry, buffer.data(), buffer.size(), &found) != 0 || found == nullptr)
+        return std::to_string(user);
+    return found->pw_name;
+}
+
+std::optional<std::string> ProgramNameOf(pid_t process) {
+    // What an upgrade has replaced is marked " (deleted)".
+    if (const auto path = TargetOf(Folder(process) + "/exe"); !path.empty())
+        return fs::path(path.substr(0, path.rfind(" (deleted)"))).filename().string();
+    auto name = ContentOf(Folder(process) + "/comm");
+    if (name.empty())
+        return std::nullopt;
+    name.pop_back();
+    return name;
+}
+
+std::optional<uid_t> OwnerOf(pid_t process) {
+    struct stat status {};
+    if (::stat(Folder(process).c_str(), &status) != 0)
+        return std::nullopt;
+    return status.st_uid;
+}
+
+std::optional<std::string> EnvironmentOf(pid_t process, const std::string& name) {
+    std::istringstream variables(ContentOf(Folder(process) + "/environ"));
+    for (std::string variable; std::getline(variables, variable, '\0');)
+        if (variable.starts_with(name + "="))
+            return variable.substr(name.size() + 1);
+    return std::nullopt;
+}
+
+std::optional<bool> HasLoaded(pid_t process, const std::string& library) {
+    const auto maps = ContentOf(Folder(process) + "/maps");
+    if (maps.empty())
+        return std::nullopt;
+    return maps.find("/" + library) != std::string::npos;
+}
+
+std::optional<bool> HasSocket(pid_t process, std::uint64_t inode) {
+    const auto wanted = fmt::format("socket:[{}]", inode);
+    std::error_code error;
+    fs::directory_iterator files(Folder(process) + "/fd", error);
+    if (error)
+        return std::nullopt;
+    return std::any_of(begin(files), end(files),
+                       [&](const fs::directory_entry& file) { return TargetOf(file.path()) == wanted; });
+}
+
+std::optional<pid_t> ProcessOfSocket(std::uint64_t inode) {
+    std::error_code error;
+    for (const auto& entry : fs::directory_iterator("/proc", error)) {
+        const auto name = entry.path().filename().string();
+        pid_t process = 0;
+        if (std::from_chars(name.data(), name.data() + name.size(), process).ec == std::errc() &&
+            HasSocket(process, inode).value_or(false))
+            return process;
+    }
+    return std::nullopt;
+}
+
+std::vector<BoundSocket> SocketsAtTheServicesPort() {
+    const auto port = fmt::format(":{:04X}", Wire::PORT);
+    std::vector<BoundSocket> exact;
+    std::vector<BoundSocket> any;
+    std::ifstream table("/proc/net/udp");
+    for (std::string line; std::getline(table, line);) {
+        std::istringstream fields(line);
+        const std::vector<std::string> words{std::istream_iterator<std::string>(fields), {}};
+        if (words.size() < 10)
+            continue;
+        BoundSocket socket;
+        std::from_chars(words[7].data(), words[7].data() + words[7].size(), socket.owner);
+        std::from_chars(words[9].data(), words[9].data() + words[9].size(), socket.inode);
+        if (words[1] == LOOPBACK + port)
+            exact.push_back(socket);
+        else if (words[1] == ANY_ADDRESS + port)
+            any.push_back(socket);
+    }
+    exact.insert(exact.end(), any.begin(), any.end());
+    return exact;
+}
+
+std::optional<pid_t> LockHolder() {
+    const SystemTool::IO::Descriptor file(
+        ::open((MAC_REG_PATH + "/Report.pid").c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK));
+    struct flock whole {};
+    whole.l_type = F_WRLCK;
+    whole.l_whence = SEEK_SET;
+    if (!file.IsOpen() || ::fcntl(file.Number(), F_GETLK, &whole) != 0 || whole.l_type == F_UNLCK)
+        return std::nullopt;
+    return whole.l_pid;
+}
+
+} // namespace reportctl::service

@@ -1,0 +1,55 @@
+#include <algorithm>
+#include <filesystem>
+
+#include <sys/stat.h>
+#include <sys/statvfs.h>
+#include <unistd.h>
+
+#include "Common/Paths.h"
+#include "SystemTool/CommonTool.h"
+#include "SystemTool/Platform.h"
+#include "Tools/reportctl/status/Parts.h"
+#include "Tools/reportctl/status/Status.h"
+#include "Tools/reportctl/store/Paths.h"
+
+namespace reportctl::status {
+namespace {
+
+namespace fs = std::filesystem;
+namespace Paths = SyncServiceReport::Paths;
+
+/// Of the file system of a directory, or of the nearest one above it that is there.
+Disk LookAtDisk(fs::path directory) {
+    std::error_code error;
+    while (!fs::exists(directory, error) && directory.has_relative_path())
+        directory = directory.parent_path();
+    struct statvfs space {};
+    if (::statvfs(directory.c_str(), &space) != 0)
+        return {};
+    return {std::uint64_t{space.f_bavail} * space.f_frsize, std::uint64_t{space.f_blocks} * space.f_frsize};
+}
+
+/// Whose service is meant: root may look at another user's.
+uid_t OwnerOfData(const std::string& data) {
+    struct stat status {};
+    return ::stat(Paths::Suite(data).c_str(), &status) == 0 ? status.st_uid : ::geteuid();
+}
+
+} // namespace
+
+Status Gather() {
+    const std::string data = SystemTool::CommonTool::GetUserDataDir();
+    Status status;
+    status.ledger = ReportLedger::LookAt(Paths::Run(data) + "/" + ReportLedger::FILE_NAME);
+    status.atMs = SystemTool::Platform::CoarseTimeMs();
+    status.lastMinute = ledger::OfTheLastMinute(status.ledger);
+    status.lastSecond = ledger::OfTheLastSecond(status.ledger);
+    status.service = LookAtService(status.ledger, OwnerOfData(data));
+    status.store = LookAtStore(store::StorePath());
+    status.log = LookAtLog(Paths::ServiceLogs(data), status.atMs);
+    status.outbox = LookAtOutbox(store::OutboxPath(), status.service, status.log);
+    status.disk = LookAtDisk(data);
+    return status;
+}
+
+} // namespace reportctl::status

@@ -1,0 +1,98 @@
+#include <algorithm>
+#include <filesystem>
+
+#include "Modules/MetrikSdk/otlp/EndpointConfig.h"
+#include "Tools/reportctl/service/Processes.h"
+#include "Tools/reportctl/status/Parts.h"
+#include "Tools/reportctl/store/Unchanged.h"
+
+namespace reportctl::status {
+namespace {
+
+/// Events of several modules are told apart up to so many: the table has no index, so that storing an event stays one step.
+constexpr std::int64_t MOST_TOLD_APART = 20'000;
+
+/// The words with which the outbox tells that a failure is over.
+constexpr auto TAKEN_AGAIN = "events are taken again";
+constexpr auto STORED_AGAIN = "Events are stored again";
+
+void ReadTotals(SQLite::Database& database, Outbox& outbox) {
+    SQLite::Statement totals(
+        database, "select delivered, refused, dead_lettered, dropped, dead_letters, removed_bytes, "
+                  "(select coalesce(sum(last_sequence), 0) from module), "
+                  "(select coalesce(sum(stored_bytes), 0) from module) from totals");
+    if (!totals.executeStep())
+        return;
+    const auto number = [&](int column) { return totals.getColumn(column).getInt64(); };
+    outbox.delivered = number(0);
+    outbox.refused = number(1);
+    outbox.dropped = number(3);
+    outbox.deadLetters = number(4);
+    outbox.waiting = number(6) - number(0) - number(1) - number(2) - number(3);
+    outbox.waitingBytes = number(7) - number(5);
+}
+
+void ReadModules(SQLite::Database& database, Outbox& outbox) {
+    SQLite::Statement modules(database, "select module_id, last_sequence from module order by id");
+    while (modules.executeStep())
+        outbox.modules.push_back(
+            {modules.getColumn(0).getString(), std::nullopt, modules.getColumn(1).getInt64()});
+    if (outbox.modules.size() == 1)
+        outbox.modules.front().waiting = outbox.waiting;
+    if (outbox.modules.size() < 2 || outbox.waiting.value_or(0) > MOST_TOLD_APART)
+        return;
+    SQLite::Statement waiting(database, "select (select count(*) from event where event.module = module.id) "
+                                        "from module order by id");
+    if (outbox.modules.size() > 50) // one pass for each of them
+        return;
+    for (auto& module : outbox.modules)
+        if (waiting.executeStep())
+            module.waiting = waiting.getColumn(0).getInt64();
+}
+
+/// As the service's SDK understood its environment when it started.
+std::optional<std::string> EndpointOf(const Service& service) {
+    if (!service.process)
+        return std::nullopt;
+    std::vector<std::string> complaints;
+    std::vector<std::string> kept; // the looked-up texts must outlive the reading
+    kept.reserve(64);
+    const auto lookUp = [&](const char* name) -> const char* {
+        const auto value = service::EnvironmentOf(*service.process, name);
+        return value ? kept.emplace_back(*value).c_str() : nullptr;
+    };
+    const auto config = MetrikSdk::otlp::ReadEndpoint(lookUp, complaints);
+    return config ? std::optional(MetrikSdk::otlp::WithoutSecrets(config->url)) : std::nullopt;
+}
+
+/// The last that it told, unless it says that all is well again.
+std::optional<std::string> LastFailureIn(const Log& log) {
+    const auto& line = log.lastFromOutbox;
+    if (!line || line->text.find(TAKEN_AGAIN) != std::string::npos ||
+        line->text.find(STORED_AGAIN) != std::string::npos)
+        return std::nullopt;
+    return line->text;
+}
+
+} // namespace
+
+Outbox LookAtOutbox(const std::string& path, const Service& service, const Log& log) {
+    Outbox outbox;
+    outbox.path = path;
+    outbox.endpoint = EndpointOf(service);
+    outbox.lastFailure = LastFailureIn(log);
+    std::error_code error;
+    outbox.isPresent = std::filesystem::is_regular_file(path, error);
+    if (!outbox.isPresent)
+        return outbox;
+    try {
+        auto database = store::OpenUnchanged(path);
+        ReadTotals(database, outbox);
+        ReadModules(database, outbox);
+    } catch (const std::exception& failure) {
+        outbox.problem = failure.what();
+    }
+    return outbox;
+}
+
+} // namespace reportctl::status

@@ -1,0 +1,216 @@
+#include <map>
+#include <utility>
+
+#include <fmt/format.h>
+
+#include "SystemTool/Text/Utf8.h"
+#include "Tools/reportctl/status/Names.h"
+#include "Tools/reportctl/status/Status.h"
+#include "Tools/reportctl/terminal/Printable.h"
+
+namespace reportctl::status {
+namespace {
+
+constexpr std::size_t NAME_WIDTH = 10;
+constexpr std::size_t TEXT_WIDTH = 100; // of a line of the log
+
+std::string Bytes(std::uint64_t bytes) {
+    if (bytes < 10'000)
+        return fmt::format("{} B", bytes);
+    if (bytes < 10'000'000)
+        return fmt::format("{:.1f} KB", static_cast<double>(bytes) / 1e3);
+    if (bytes < 10'000'000'000)
+        return fmt::format("{:.1f} MB", static_cast<double>(bytes) / 1e6);
+    return fmt::format("{:.1f} GB", static_cast<double>(bytes) / 1e9);
+}
+
+std::string Number(std::uint64_t number) {
+    auto text = std::to_string(number);
+    for (auto at = static_cast<std::ptrdiff_t>(text.size()) - 3; at > 0; at -= 3)
+        text.insert(static_cast<std::size_t>(at), ",");
+    return text;
+}
+
+std::string Number(const std::optional<std::int64_t>& number) {
+    return number ? Number(static_cast<std::uint64_t>(*number)) : "?";
+}
+
+constexpr std::int64_t MINUTE = 60;
+constexpr std::int64_t HOUR = 60 * MINUTE;
+constexpr std::int64_t DAY = 24 * HOUR;
+
+std::string Duration(std::int64_t ms) {
+    const auto seconds = ms / 1000;
+    if (seconds < 2 * MINUTE)
+        return fmt::format("{} s", seconds);
+    if (seconds < 2 * HOUR)
+        return fmt::format("{} min", seconds / MINUTE);
+    return seconds < 2 * DAY ? fmt::format("{} h", seconds / HOUR) : fmt::format("{} days", seconds / DAY);
+}
+
+/// The beginning of a text of others, as a terminal may show it.
+std::string Shown(const std::string& text) {
+    return terminal::Printable(SystemTool::Text::CutUtf8(text, TEXT_WIDTH)) +
+           (text.size() > TEXT_WIDTH ? " ..." : "");
+}
+
+class Screen {
+public:
+    Screen(const Status& status, bool isColoured) : m_status(status), m_isColoured(isColoured) {}
+
+    std::string Text(const Judgement& judgement) {
+        ShowVerdict(judgement);
+        ShowService();
+        ShowLedger();
+        ShowStore();
+        ShowOutbox();
+        ShowLog();
+        if (m_status.disk.freeBytes)
+            Row("disk", Bytes(*m_status.disk.freeBytes) + " free");
+        return m_text;
+    }
+
+private:
+    std::string Coloured(const char* colour, const std::string& text) const {
+        return m_isColoured ? fmt::format("\x1b[1;{}m{}\x1b[0m", colour, text) : text;
+    }
+
+    void Row(const char* name, const std::string& text) {
+        m_text += fmt::format("{:<{}} {}\n", name, NAME_WIDTH, text);
+    }
+
+    void ShowVerdict(const Judgement& judgement) {
+        switch (judgement.verdict) {
+        case Verdict::Healthy:
+            Row("verdict", Coloured("32", "healthy"));
+            break;
+        case Verdict::Degraded:
+            Row("verdict", Coloured("33", "degraded"));
+            break;
+        case Verdict::Down:
+            Row("verdict", Coloured("31", "down"));
+            break;
+        }
+        for (const auto& reason : judgement.reasons)
+            Row("", "- " + terminal::Printable(reason));
+    }
+
+    void ShowService() {
+        const Service& service = m_status.service;
+        if (!service.isRunning)
+            Row("service", "not running");
+        else
+            Row("service",
+                fmt::format("running as process {}{}, version {}, {}", *service.process,
+                            service.startedAtMs ? fmt::format(" for {} (since {})",
+                                                              Duration(m_status.atMs - *service.startedAtMs),
+                                                              IsoTime(*service.startedAtMs))
+                                                : "",
+                            service.version.value_or("unknown"),
+                            service.isListening ? "listening" : "not listening"));
+        if (service.buildId)
+            Row("", "build " + *service.buildId);
+        if (service.portHolder && !service.isListening)
+            Row("port 9997",
+                fmt::format("{} of user {}", Shown(service.portHolder->name.value_or("a program")),
+                            Shown(service.portHolder->user)));
+        const auto word = [](bool isThere) { return isThere ? "there" : "MISSING"; };
+        Row("plug-ins", fmt::format("logger {}, store {}, SDK {}", word(service.hasLogger),
+                                    word(service.hasStore), word(service.hasSdk)));
+    }
+
+    void ShowLedger() {
+        const auto& look = m_status.ledger;
+        if (look.sight != ReportLedger::Sight::Sound)
+            return Row("ledger", "there is none that can be read");
+        const auto sinceStart = SinceStart(look);
+        m_text +=
+            fmt::format("\n{:<{}} {:<20}{:>16}{:>16}\n", "ledger", NAME_WIDTH, "", "in all", "since start");
+        const auto row = [&](const char* name, std::uint64_t total, std::uint64_t since) {
+            m_text += fmt::format("{:<{}} {:<20}{:>16}{:>16}\n", "", NAME_WIDTH, name, Number(total),
+                                  look.counting ? Number(since) : "-");
+        };
+        for (const Name& name : COUNTERS)
+            if (IsMain(name) || look.total[name.place] != 0)
+                row(name.json, look.total[name.place], sinceStart[name.place]);
+        row("refused", ledger::RefusedIn(look.total), ledger::RefusedIn(sinceStart));
+        for (const Name& reason : REASONS)
+            if (look.total[reason.place] != 0)
+                row(fmt::format("  {}", reason.json).c_str(), look.total[reason.place],
+                    sinceStart[reason.place]);
+        row("waiting", ReportLedger::WaitingIn(look.total), ReportLedger::WaitingIn(look.total));
+        row("mostWaiting", look.total[ReportLedger::MOST_WAITING], sinceStart[ReportLedger::MOST_WAITING]);
+        ShowRates("a second, now", m_status.lastSecond);
+        ShowRates("in the last minute", m_status.lastMinute);
+        m_text += "\n";
+    }
+
+    static bool IsMain(const Name& name) {
+        return name.place == ReportLedger::RECEIVED || name.place == ReportLedger::DROPPED_BY_KERNEL ||
+               name.place == ReportLedger::LOST_AT_ENDS ||
+               name.place == Place(ReportLedger::Outcome::Stored) ||
+               name.place == Place(ReportLedger::Outcome::ToAnalytics);
+    }
+
+    void ShowRates(const char* name, const ledger::Rates& rates) {
+        m_text += fmt::format("{:<{}} {:<20}{:.1f} received, {:.1f} stored, {:.1f} refused\n", "", NAME_WIDTH,
+                              name, rates.received, rates.stored, rates.refused);
+    }
+
+    void ShowStore() {
+        const Store& store = m_status.store;
+        if (!store.isPresent)
+            return Row("store", "missing: " + terminal::Printable(store.path));
+        Row("store", fmt::format("{}{} rows, {}, -wal {}, schema version {}, newest createTime {}",
+                                 store.areRowsCounted ? "" : "up to ", Number(store.rows), Bytes(store.bytes),
+                                 Bytes(store.walBytes),
+                                 store.schemaVersion ? std::to_string(*store.schemaVersion) : "?",
+                                 store.newestCreateTime ? Shown(*store.newestCreateTime) : "-"));
+        Row("", terminal::Printable(store.path));
+    }
+
+    void ShowOutbox() {
+        const Outbox& outbox = m_status.outbox;
+        if (!outbox.isPresent)
+            return Row("outbox", "missing: " + terminal::Printable(outbox.path));
+        Row("outbox",
+            fmt::format("{} waiting ({}), {} delivered, {} refused, {} dead letters, {} dropped",
+                        Number(outbox.waiting),
+                        outbox.waitingBytes ? Bytes(static_cast<std::uint64_t>(*outbox.waitingBytes)) : "?",
+                        Number(outbox.delivered), Number(outbox.refused), Number(outbox.deadLetters),
+                        Number(outbox.dropped)));
+        Row("",
+            fmt::format("{} {}; {}", outbox.modules.size(), outbox.modules.size() == 1 ? "module" : "modules",
+                        outbox.endpoint ? "sent to " + Shown(*outbox.endpoint)
+                                        : std::string("no collector is set: events stay here")));
+    }
+
+    /// The last lines, equal ones counted.
+    void ShowLog() {
+        const Log& log = m_status.log;
+        Row("log", fmt::format("{}; in the last ten minutes {} errors, {} warnings", Bytes(log.bytes),
+                               log.errors, log.warnings));
+        std::map<std::string, int> times;
+        for (const auto& line : log.last)
+            ++times[line.level + line.site + line.text];
+        for (auto line = log.last.rbegin(); line != log.last.rend(); ++line) {
+            const int count = std::exchange(times[line->level + line->site + line->text], 0);
+            if (count != 0)
+                Row("", fmt::format("{} {}{:<5} [{}] {}", IsoTime(line->atMs).substr(11, 8),
+                                    count > 1 ? fmt::format("{}x ", count) : "", line->level,
+                                    Shown(line->site), Shown(line->text)));
+        }
+    }
+
+    const Status& m_status;
+    bool m_isColoured;
+    std::string m_text;
+};
+
+} // namespace
+
+std::string ScreenOf(const Status& status, const Judgement& judgement, bool isColoured) {
+    return Screen(status, isColoured).Text(judgement);
+}
+
+} // namespace reportctl::status

@@ -1,0 +1,95 @@
+#include <filesystem>
+
+#include <sys/stat.h>
+
+#include "SystemTool/Version.h"
+#include "Tools/reportctl/service/Processes.h"
+#include "Tools/reportctl/service/Program.h"
+#include "Tools/reportctl/status/Parts.h"
+
+namespace reportctl::status {
+namespace {
+
+namespace fs = std::filesystem;
+
+std::optional<std::string> Known(const std::string& text) {
+    return text.empty() ? std::nullopt : std::optional(text);
+}
+
+/// When a process began to run: its folder in /proc is made then, or a moment later.
+std::optional<std::int64_t> StartOf(pid_t process) {
+    struct stat status {};
+    if (::stat(("/proc/" + std::to_string(process)).c_str(), &status) != 0)
+        return std::nullopt;
+    return std::int64_t{status.st_mtim.tv_sec} * 1000 + status.st_mtim.tv_nsec / 1'000'000;
+}
+
+/// The process that counts in this user's ledger; without a ledger, the one that holds the machine's lock, if it is this
+/// user's.
+void FindProcess(Service& service, const ReportLedger::Look& ledger, uid_t owner) {
+    const auto holder = service::LockHolder();
+    const auto user = holder ? service::OwnerOf(*holder) : std::nullopt;
+    if (ledger.counting)
+        service.process = static_cast<pid_t>(ledger.process);
+    else if (user == owner)
+        service.process = holder;
+    else if (user)
+        service.otherUser = service::NameOf(*user);
+    service.isRunning = service.process.has_value();
+}
+
+void DescribeProcess(Service& service, const ReportLedger::Look& ledger) {
+    if (ledger.counting) {
+        service.startedAtMs = ledger.startedAtMs;
+        service.version = Known(ledger.programVersion);
+        service.buildId = Known(ledger.buildId);
+    } else if (service.isRunning) {
+        const auto program = SystemTool::Version::Of("/proc/" + std::to_string(*service.process) + "/exe");
+        service.startedAtMs = StartOf(*service.process);
+        service.version = Known(program.version);
+        service.buildId = Known(program.buildId);
+    }
+}
+
+/// Where another process's sockets cannot be seen, its user's socket is taken for its own.
+bool IsOf(const service::BoundSocket& socket, const Service& service, uid_t owner) {
+    return service.isRunning &&
+           service::HasSocket(*service.process, socket.inode).value_or(socket.owner == owner);
+}
+
+void FindPortHolder(Service& service, uid_t owner) {
+    const auto sockets = service::SocketsAtTheServicesPort();
+    for (const auto& socket : sockets)
+        service.isListening |= IsOf(socket, service, owner);
+    if (sockets.empty())
+        return;
+    PortHolder holder;
+    holder.process = service.isListening ? service.process : service::ProcessOfSocket(sockets.front().inode);
+    if (holder.process)
+        holder.name = service::ProgramNameOf(*holder.process);
+    holder.user = service::NameOf(service.isListening ? owner : sockets.front().owner);
+    service.portHolder = holder;
+}
+
+bool HasPlugin(const Service& service, const std::string& library) {
+    if (service.isRunning)
+        if (const auto loaded = service::HasLoaded(*service.process, library))
+            return *loaded;
+    std::error_code error;
+    return fs::exists(fs::path(service::ProgramPath()).parent_path() / library, error);
+}
+
+} // namespace
+
+Service LookAtService(const ReportLedger::Look& ledger, uid_t owner) {
+    Service service;
+    FindProcess(service, ledger, owner);
+    DescribeProcess(service, ledger);
+    FindPortHolder(service, owner);
+    service.hasLogger = HasPlugin(service, "libBoostLogger.dylib");
+    service.hasStore = HasPlugin(service, "libOrvekSqlite.dylib");
+    service.hasSdk = HasPlugin(service, "libMetrikSdk.dylib");
+    return service;
+}
+
+} // namespace reportctl::status

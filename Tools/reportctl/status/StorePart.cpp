@@ -1,0 +1,62 @@
+#include <filesystem>
+
+#include "Tools/reportctl/status/Parts.h"
+#include "Tools/reportctl/store/Unchanged.h"
+
+namespace reportctl::status {
+namespace {
+
+namespace fs = std::filesystem;
+
+/// Up to so many rows are counted one by one, which takes some milliseconds. Counting reads each page of the table, so of
+/// more rows only the span of the ids is taken: the number of rows, as long as rows were removed from the oldest end only.
+constexpr std::int64_t MOST_COUNTED = 50'000;
+
+std::uint64_t SizeOf(const std::string& path) {
+    std::error_code error;
+    const auto size = fs::file_size(path, error);
+    return error ? 0 : size;
+}
+
+void CountRows(SQLite::Database& database, Store& store) {
+    const std::int64_t span =
+        database
+            .execAndGet("select coalesce(max(rowid), 0) - coalesce((select min(rowid) from OperLog), 1) + 1 "
+                        "from OperLog")
+            .getInt64();
+    store.areRowsCounted = span <= MOST_COUNTED;
+    store.rows = store.areRowsCounted ? database.execAndGet("select count(*) from OperLog").getInt64() : span;
+}
+
+void Read(SQLite::Database& database, Store& store) {
+    store.schemaVersion = database.execAndGet("pragma user_version").getInt();
+    store.hasTables = database.tableExists("OperLog") && database.tableExists("BaseInfo");
+    if (!database.tableExists("OperLog"))
+        return;
+    CountRows(database, store);
+    SQLite::Statement newest(database, "select createTime from OperLog order by rowid desc limit 1");
+    if (newest.executeStep())
+        store.newestCreateTime = newest.getColumn(0).getString();
+}
+
+} // namespace
+
+Store LookAtStore(const std::string& path) {
+    Store store;
+    store.path = path;
+    std::error_code error;
+    store.isPresent = fs::is_regular_file(path, error);
+    if (!store.isPresent)
+        return store;
+    store.bytes = SizeOf(path);
+    store.walBytes = SizeOf(path + "-wal");
+    try {
+        auto database = store::OpenUnchanged(path);
+        Read(database, store);
+    } catch (const std::exception& failure) {
+        store.problem = failure.what();
+    }
+    return store;
+}
+
+} // namespace reportctl::status

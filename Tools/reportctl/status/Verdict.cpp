@@ -1,0 +1,182 @@
+#include <algorithm>
+#include <array>
+
+#include <fmt/format.h>
+
+#include "Tools/reportctl/status/Status.h"
+
+namespace reportctl::status {
+namespace {
+
+using namespace std::chrono_literals;
+using ReportLedger::Outcome;
+
+constexpr std::chrono::milliseconds RECENT = 10min;
+constexpr std::uint64_t LEAST_FREE = 500'000'000;
+constexpr std::uint64_t SMALL_DISK = 10'000'000'000; // where the least is a part of it
+constexpr std::uint64_t PART_OF_A_SMALL_DISK = 20;   // 5 %
+
+/// What is the service's fault, or the machine's, and what to do about it. Other refusals are senders' mistakes.
+struct Fault {
+    unsigned place;
+    const char* what;
+    const char* advice;
+};
+constexpr std::array FAULTS{
+    Fault{ReportLedger::DROPPED_BY_KERNEL, "dropped by the kernel before the service could take them",
+          "They came faster than the service takes them: let senders send more slowly, or raise "
+          "net.core.rmem_max."},
+    Fault{ReportLedger::LOST_AT_ENDS, "received and not handled when the service ended",
+          "Find out in the log, or in the system's journal, what ended it."},
+    Fault{static_cast<unsigned>(Outcome::Store), "refused by the store",
+          "The log has each of them with the reason: docs/Reliability.md tells what it means."},
+    Fault{static_cast<unsigned>(Outcome::NoStore), "refused because there is no store",
+          "Put libOrvekSqlite.dylib beside the service's program and restart the service."},
+    Fault{static_cast<unsigned>(Outcome::Analytics), "refused by the analytics SDK, or for want of it",
+          "Look for FailCallBackFun and for \"Failed to load\" in the log."},
+    Fault{static_cast<unsigned>(Outcome::Exception), "lost to an exception",
+          "Look for \"exception\" in the log; the machine may be out of memory."},
+};
+
+class Judging {
+public:
+    explicit Judging(const Status& status) : m_status(status) {}
+
+    Judgement Result() {
+        JudgeService();
+        JudgeLedger();
+        JudgePlugins();
+        JudgeStore();
+        JudgeOutbox();
+        JudgeDisk();
+        return m_judgement;
+    }
+
+private:
+    void Add(Verdict verdict, std::string reason) {
+        m_judgement.verdict = std::max(m_judgement.verdict, verdict);
+        m_judgement.reasons.push_back(std::move(reason));
+    }
+
+    std::string Holder() const {
+        const auto& holder = *m_status.service.portHolder;
+        return fmt::format("{} of user {}{}", holder.name.value_or("a program"), holder.user,
+                           holder.process ? fmt::format(" (process {})", *holder.process) : "");
+    }
+
+    void JudgeService() {
+        const Service& service = m_status.service;
+        if (!service.isRunning && service.otherUser)
+            return Add(Verdict::Down,
+                       fmt::format("The service of user {} runs on this machine, and only one can. Yours "
+                                   "can run when that one has ended: `reportctl run` waits for it.",
+                                   *service.otherUser));
+        if (!service.isRunning)
+            Add(Verdict::Down,
+                "The service is not running. Start it: `systemctl --user start sync-service-report`, or "
+                "sign in to the suite again.");
+        if (!service.isListening && service.portHolder)
+            Add(Verdict::Down,
+                fmt::format("Port 9997 is held by {}: reports go there. End that program, then restart "
+                            "the service.",
+                            Holder()));
+        else if (service.isRunning && !service.isListening)
+            Add(Verdict::Down, "The service runs and does not listen on port 9997. Restart it.");
+    }
+
+    /// The marks may be younger than the time of the last one, after a restart for example.
+    static std::string Told(const Fault& fault, std::uint64_t count) {
+        return fmt::format("In the last ten minutes, {} {}. {}",
+                           count > 1 ? fmt::format("{} reports were", count) : "a report was", fault.what,
+                           fault.advice);
+    }
+
+    bool IsRecent(unsigned place) const {
+        const auto lastMs = static_cast<std::int64_t>(m_status.ledger.lastMs[place]);
+        return lastMs != 0 && m_status.atMs - lastMs <= RECENT.count();
+    }
+
+    void JudgeLedger() {
+        const auto& look = m_status.ledger;
+        if (m_status.service.isRunning && !look.counting)
+            Add(Verdict::Degraded,
+                "The service keeps no ledger in its file, so nobody can tell what it refuses or loses. "
+                "docs/Ledger.md tells why that may be; restart the service when it is mended.");
+        if (look.sight != ReportLedger::Sight::Sound)
+            return;
+        for (const Fault& fault : FAULTS)
+            if (look.total[fault.place] != 0 && IsRecent(fault.place))
+                Add(Verdict::Degraded, Told(fault, ledger::GrownIn(look, fault.place, RECENT)));
+        if (!look.balanced)
+            Add(Verdict::Degraded, fmt::format("The ledger does not balance: {} reports are unaccounted for. "
+                                               "Please report this with the "
+                                               "output of `reportctl status --json`.",
+                                               ReportLedger::UnaccountedIn(look.total)));
+    }
+
+    void JudgePlugins() {
+        const auto judge = [this](bool isThere, const char* library, const char* loss) {
+            if (!isThere)
+                Add(Verdict::Degraded,
+                    fmt::format("The plug-in {} is missing: {}. Install the service again and "
+                                "restart it.",
+                                library, loss));
+        };
+        judge(m_status.service.hasStore, "libOrvekSqlite.dylib", "no report is stored");
+        judge(m_status.service.hasSdk, "libMetrikSdk.dylib", "no event is taken for analytics");
+        judge(m_status.service.hasLogger, "libBoostLogger.dylib", "there is no log");
+    }
+
+    void JudgeStore() {
+        const Store& store = m_status.store;
+        if (!store.isPresent)
+            Add(Verdict::Degraded,
+                fmt::format("The store {} is missing. Make it: `reportctl setup`.", store.path));
+        else if (!store.problem.empty())
+            Add(Verdict::Degraded,
+                fmt::format("The store {} cannot be read: {}. docs/Database.md tells how to repair "
+                            "it.",
+                            store.path, store.problem));
+        else if (!store.hasTables)
+            Add(Verdict::Degraded,
+                fmt::format("The store {} has not its tables. Make them: `reportctl setup`.", store.path));
+    }
+
+    void JudgeOutbox() {
+        const Outbox& outbox = m_status.outbox;
+        if (!outbox.problem.empty())
+            Add(Verdict::Degraded,
+                fmt::format("The outbox {} cannot be read: {}.", outbox.path, outbox.problem));
+        if (outbox.deadLetters.value_or(0) > 0)
+            Add(Verdict::Degraded,
+                fmt::format("The collector refused {} events for good. docs/Outbox.md tells how to "
+                            "look at them, and how to send them again.",
+                            *outbox.deadLetters));
+        if (outbox.lastFailure)
+            Add(Verdict::Degraded,
+                fmt::format("The outbox has a failure that lasts: {}", *outbox.lastFailure));
+    }
+
+    void JudgeDisk() {
+        const Disk& disk = m_status.disk;
+        if (!disk.freeBytes || !disk.totalBytes)
+            return;
+        const auto least =
+            *disk.totalBytes < SMALL_DISK ? *disk.totalBytes / PART_OF_A_SMALL_DISK : LEAST_FREE;
+        if (*disk.freeBytes < least)
+            Add(Verdict::Degraded,
+                fmt::format("Only {} MB are free where the service keeps its data. Make room there.",
+                            *disk.freeBytes / 1'000'000));
+    }
+
+    const Status& m_status;
+    Judgement m_judgement;
+};
+
+} // namespace
+
+Judgement Judge(const Status& status) {
+    return Judging(status).Result();
+}
+
+} // namespace reportctl::status
