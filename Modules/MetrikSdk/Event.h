@@ -40,6 +40,13 @@ struct StoredEvent {
     std::size_t bytes = 0; ///< What the event counts for in every bound on bytes.
 };
 
+/// Finds an event again: another one may have its row in a file that was begun anew.
+struct EventKey {
+    std::int64_t row = 0;
+    std::string uuid;
+};
+using EventKeys = std::map<std::int64_t, std::string>; ///< The uuid of each row.
+
 /// The oldest waiting events, in the order in which they were stored.
 struct Batch {
     std::string outboxId; ///< Tells one outbox file of a fleet from all others.

@@ -57,6 +57,18 @@ struct RetrySettings {
     int refusalsBeforeWaiting = 10;
 };
 
+/// What becomes of an event that a collector does not take alone, while it takes others.
+struct AsideSettings {
+    /// Before the second try; doubles with each further one.
+    std::chrono::milliseconds firstPause = std::chrono::minutes(1);
+    /// A collector that was mended has the event within this.
+    std::chrono::milliseconds maxPause = std::chrono::hours(1);
+    /// So many tries, between which others were taken: some four hours. What fails for so long fails for ever.
+    int strikes = 10;
+    /// One that comes on top is sent again and again until there is room. They cost memory and a look at each batch.
+    std::size_t maxEvents = 512;
+};
+
 /// How the outbox file is looked after.
 struct FileSettings {
     /// The user's data directory. Only below it is a directory made that is missing; see Sqlite::SafeDirectory.
@@ -75,6 +87,7 @@ struct OutboxSettings {
     CapSettings caps;
     BatchSettings batch;
     RetrySettings retry;
+    AsideSettings aside;
     FileSettings file;
     /// The failure callback ends in the service's log: the same cause is told this often at most.
     std::chrono::milliseconds tellInterval = std::chrono::minutes(1);

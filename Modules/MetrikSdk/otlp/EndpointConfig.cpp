@@ -190,9 +190,10 @@ private:
 
     void ReadCompression(EndpointConfig& config) {
         OfferPair("COMPRESSION", [&](const Variable& compression) {
-            config.gzip = compression.value == "gzip";
-            const bool valid = config.gzip || compression.value == "none";
-            if (!valid)
+            const bool valid = compression.value == "gzip" || compression.value == "none";
+            if (valid)
+                config.gzip = compression.value == "gzip";
+            else
                 m_complaints.push_back(compression.name + " is neither gzip nor none and counts as unset");
             return valid;
         });

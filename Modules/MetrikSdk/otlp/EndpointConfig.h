@@ -15,7 +15,8 @@ struct EndpointConfig {
     std::vector<std::pair<std::string, std::string>> headers;
     /// For a whole request, connecting included. The variables' documented default.
     std::chrono::milliseconds timeout = std::chrono::seconds(10);
-    bool gzip = false;
+    /// Events are much alike, and shrink a lot. Collectors unpack.
+    bool gzip = true;
     std::string certificate; ///< PEM file to trust instead of the system's certificates; empty: the system's.
     std::string clientKey;   ///< PEM files to identify ourselves with; empty: not at all.
     std::string clientCertificate;

@@ -7,6 +7,7 @@ namespace MetrikSdk::otlp {
 /// What came back for one request.
 struct HttpResult {
     std::string fault;      ///< Why there was no complete answer; empty when there was one.
+    bool began = false;     ///< Part of the body had left, so that the fault may be its size's.
     bool abandoned = false; ///< We ended the request ourselves, because we are to stop.
     long status = 0;
     std::string contentType;

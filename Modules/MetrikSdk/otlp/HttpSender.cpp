@@ -159,6 +159,9 @@ HttpResult HttpSender::Finish(CURLcode code, Answer& answer) {
     if (code == CURLE_OK || (code == CURLE_WRITE_ERROR && answer.cut))
         return result;
     result.abandoned = MustEnd();
+    curl_off_t sent = 0;
+    ::curl_easy_getinfo(m_easy.get(), CURLINFO_SIZE_UPLOAD_T, &sent);
+    result.began = sent > 0;
     result.fault = m_error[0] != '\0' ? m_error : ::curl_easy_strerror(code);
     return result;
 }

@@ -102,9 +102,16 @@ void Outbox::LearnAbout(OutboxStore& store, SteadyTime now) {
     m_knownGeneration = m_file.Generation();
 }
 
-Batch Outbox::Take(std::size_t maxEvents) {
+Batch Outbox::TakeOne(const EventKey& key) {
     return WithStore(Caller::Uploader, [&](OutboxStore& store, Call&) {
-        auto batch = store.Oldest(maxEvents, m_settings.batch.maxBytes);
+        m_caps.SetUnderWay(key.row);
+        return store.One(key);
+    });
+}
+
+Batch Outbox::Take(std::size_t maxEvents, const EventKeys& without) {
+    return WithStore(Caller::Uploader, [&](OutboxStore& store, Call&) {
+        auto batch = store.Oldest(maxEvents, m_settings.batch.maxBytes, without);
         if (batch.events.empty())
             m_caps.Recount(store);
         else

@@ -34,9 +34,12 @@ public:
     /// another outbox.
     bool IsUnsafe() const { return m_isUnsafe; }
 
-    /// The oldest events. They are under way until Release, also when the file is opened anew meanwhile: a cap drops
-    /// others first.
-    Batch Take(std::size_t maxEvents);
+    /// The oldest events but those of `without`. They are under way until Release, also when the file is opened anew
+    /// meanwhile: a cap drops others first.
+    Batch Take(std::size_t maxEvents, const EventKeys& without = {});
+
+    /// The event, if it still waits. The same holds for it.
+    Batch TakeOne(const EventKey& key);
     void Release();
 
     void RemoveDelivered(const Batch& batch, std::size_t refused);

@@ -31,6 +31,10 @@ std::size_t BytesOf(const ModuleIdentity& module) {
     return cost(module.id.size()) + cost(module.version.size() + module.name.size());
 }
 
+/// The columns as AddTo reads them.
+constexpr const char* SELECT_EVENT =
+    "SELECT id, uuid, release, sequence, event_id, payload, stored_ms, bytes FROM event ";
+
 std::int64_t Number(SQLite::Database& database, const char* query) {
     return database.execAndGet(query).getInt64();
 }
@@ -56,9 +60,8 @@ OutboxStore::OutboxStore(const std::string& path, std::chrono::milliseconds lock
             "INSERT INTO event(uuid, module, release, sequence, event_id, payload, stored_ms, bytes) "
             "SELECT ?1, m.id, r.id, last_sequence + 1, ?4, ?5, ?6, ?7 FROM module AS m "
             "JOIN module_release AS r ON r.id = ?3 AND r.module = m.id WHERE m.id = ?2");
-        m_oldest = std::make_unique<SQLite::Statement>(
-            m_database, "SELECT id, uuid, release, sequence, event_id, payload, stored_ms, bytes FROM event "
-                        "ORDER BY id LIMIT ?1");
+        m_oldest = std::make_unique<SQLite::Statement>(m_database,
+                                                       std::string(SELECT_EVENT) + "ORDER BY id LIMIT ?1");
         m_delete =
             std::make_unique<SQLite::Statement>(m_database, "DELETE FROM event WHERE id = ?1 AND uuid = ?2");
     });
@@ -185,30 +188,49 @@ ModuleIdentity OutboxStore::IdentityOf(std::int64_t release) {
     return {query.getColumn(0).getString(), query.getColumn(1).getString(), query.getColumn(2).getString()};
 }
 
-Batch OutboxStore::Oldest(std::size_t maxEvents, std::size_t maxBytes) {
+Batch OutboxStore::Oldest(std::size_t maxEvents, std::size_t maxBytes, const EventKeys& without) {
     return Guarded("Cannot read the outbox", [&] {
         Batch batch;
         std::size_t bytes = 0;
         const Use oldest(*m_oldest);
-        oldest->bind(1, static_cast<std::int64_t>(maxEvents));
-        while (bytes < maxBytes && oldest->executeStep()) {
-            StoredEvent event{oldest->getColumn(0).getInt64(),
-                              oldest->getColumn(1).getString(),
-                              oldest->getColumn(2).getInt64(),
-                              oldest->getColumn(3).getInt64(),
-                              oldest->getColumn(4).getString(),
-                              oldest->getColumn(5).getString(),
-                              WallTime(std::chrono::milliseconds(oldest->getColumn(6).getInt64())),
-                              static_cast<std::size_t>(oldest->getColumn(7).getInt64())};
-            bytes += event.bytes;
-            if (!batch.releases.contains(event.release))
-                batch.releases.emplace(event.release, IdentityOf(event.release));
-            batch.events.push_back(std::move(event));
+        oldest->bind(1, static_cast<std::int64_t>(maxEvents + without.size()));
+        while (batch.events.size() < maxEvents && bytes < maxBytes && oldest->executeStep()) {
+            const auto left = without.find(oldest->getColumn(0).getInt64());
+            if (left == without.end() || left->second != oldest->getColumn(1).getString())
+                bytes += AddTo(batch, *oldest.operator->());
         }
-        if (!batch.events.empty())
-            batch.outboxId = m_database.execAndGet("SELECT outbox_id FROM totals").getString();
         return batch;
     });
+}
+
+Batch OutboxStore::One(const EventKey& key) {
+    return Guarded("Cannot read the outbox", [&] {
+        Batch batch;
+        SQLite::Statement one(m_database, std::string(SELECT_EVENT) + "WHERE id = ?1 AND uuid = ?2");
+        one.bind(1, key.row);
+        one.bindNoCopy(2, key.uuid);
+        if (one.executeStep())
+            AddTo(batch, one);
+        return batch;
+    });
+}
+
+/// Returns the bytes that the event counts for.
+std::size_t OutboxStore::AddTo(Batch& batch, const SQLite::Statement& row) {
+    StoredEvent event{row.getColumn(0).getInt64(),
+                      row.getColumn(1).getString(),
+                      row.getColumn(2).getInt64(),
+                      row.getColumn(3).getInt64(),
+                      row.getColumn(4).getString(),
+                      row.getColumn(5).getString(),
+                      WallTime(std::chrono::milliseconds(row.getColumn(6).getInt64())),
+                      static_cast<std::size_t>(row.getColumn(7).getInt64())};
+    if (!batch.releases.contains(event.release))
+        batch.releases.emplace(event.release, IdentityOf(event.release));
+    if (batch.outboxId.empty())
+        batch.outboxId = m_database.execAndGet("SELECT outbox_id FROM totals").getString();
+    batch.events.push_back(std::move(event));
+    return batch.events.back().bytes;
 }
 
 bool OutboxStore::Delete(const StoredEvent& event) {

@@ -75,8 +75,11 @@ public:
     /// file did not know.
     std::size_t Store(const ModuleIdentity& module, const NewEvent& event);
 
-    /// The oldest events, at most `maxEvents`, ending with the one that reaches `maxBytes`.
-    Batch Oldest(std::size_t maxEvents, std::size_t maxBytes);
+    /// The oldest events but those of `without`, at most `maxEvents`, ending with the one that reaches `maxBytes`.
+    Batch Oldest(std::size_t maxEvents, std::size_t maxBytes, const EventKeys& without = {});
+
+    /// The event, if it still waits.
+    Batch One(const EventKey& key);
 
     /// Deletes what is still there of `batch`. `refused` of them count as refused, the others as delivered.
     void RemoveDelivered(const Batch& batch, std::size_t refused);
@@ -116,6 +119,7 @@ private:
     ReleaseKeys AddRelease(const ModuleIdentity& module);
     ModuleIdentity IdentityOf(std::int64_t release);
     void ForgetIdleModules();
+    std::size_t AddTo(Batch& batch, const SQLite::Statement& row);
     bool Delete(const StoredEvent& event);
     void CountRemoved(const char* counter, const Removed& removed);
 

@@ -50,12 +50,16 @@ SystemTool::IO::JsonDocument ParseAnswer(const std::string& body) {
 
 Verdict Judge(const otlp::HttpResult& result) {
     if (!result.fault.empty())
-        return Verdict::Wait;
+        return result.began ? Verdict::WaitAndHalve : Verdict::Wait;
     if (IsSuccess(result.status))
         return IsWebPage(result) ? Verdict::Wait : Verdict::Delete;
     // A redirect is the address's fault and not the events'. It is not followed: it could carry the
     // credentials to another host.
-    return result.status < 400 || AsksToWait(result.status) ? Verdict::Wait : Verdict::Halve;
+    if (result.status < 400)
+        return Verdict::Wait;
+    if (AsksToWait(result.status))
+        return Verdict::WaitThenHalve;
+    return result.status == 413 ? Verdict::HalveForSize : Verdict::Halve;
 }
 
 PartialSuccess ReadPartialSuccess(const otlp::HttpResult& result, std::size_t sent) {

@@ -3,11 +3,14 @@
 #include <chrono>
 #include <functional>
 #include <optional>
+#include <string>
 
 #include "Modules/MetrikSdk/otlp/Sender.h"
 #include "Modules/MetrikSdk/outbox/CountWaiter.h"
 #include "Modules/MetrikSdk/outbox/Outbox.h"
-#include "Modules/MetrikSdk/upload/BatchSplitter.h"
+#include "Modules/MetrikSdk/upload/AsideList.h"
+#include "Modules/MetrikSdk/upload/BatchSizer.h"
+#include "Modules/MetrikSdk/upload/RetryPolicy.h"
 
 namespace MetrikSdk::upload {
 
@@ -22,7 +25,8 @@ struct Pause {
 ///
 /// An event leaves the outbox only through here (or for a cap): after its delivery is known, or with its
 /// verdict into the dead letters. What was delivered and could not be deleted, for a full disk say, is kept
-/// in mind and deleted before anything else is sent.
+/// in mind and deleted before anything else is sent. Which events go is decided by BatchPlan and BatchSizer,
+/// and by AsideList for those that the collector does not take.
 ///
 /// Threads: one. Failure: told to the notifier, and waited for.
 class UploadCycle {
@@ -38,12 +42,30 @@ private:
         Batch batch;
         std::size_t refused = 0;
     };
+    /// A request and what came back.
+    struct Exchange {
+        Batch batch;
+        bool isAside = false; ///< The batch is one event that had stepped aside.
+        std::size_t bodyBytes = 0;
+        otlp::HttpResult result;
+
+        RequestSize Size() const { return {batch.events.size(), bodyBytes}; }
+    };
 
     Pause TakeAndSend(WallTime now);
-    Pause Act(Batch batch, const otlp::HttpResult& result, WallTime now);
-    Pause Delivered(Batch batch, const otlp::HttpResult& result);
-    Pause Refused(const Batch& batch, const otlp::HttpResult& result, WallTime now);
-    Pause MoveToDeadLetters(const StoredEvent& event, const otlp::HttpResult& result, WallTime now);
+    std::optional<Pause> TryAside(WallTime now);
+    Pause Idle(WallTime now) const;
+    Pause Send(Batch batch, bool isAside, WallTime now);
+    std::string EncodeWithinBound(Batch& batch) const;
+    Pause Act(Exchange exchange, WallTime now);
+    Pause Delivered(Exchange exchange);
+    void TellDelivery(std::size_t count, const PartialSuccess& partial);
+    Pause NotTaken(const Exchange& exchange, Verdict verdict, WallTime now);
+    void StepAside(const StoredEvent& event, WallTime now);
+    Pause AsideFailed(const Exchange& exchange, WallTime now);
+    Pause Refused(const Exchange& exchange, Blame blame, WallTime now);
+    void MoveToDeadLetters(const Exchange& exchange, const std::string& reason);
+    Pause WaitAfterRefusals(const otlp::HttpResult& result, WallTime now);
     Pause WaitAfter(const otlp::HttpResult& result, WallTime now);
     void Settle();
 
@@ -52,7 +74,9 @@ private:
     report::Notifier& m_notifier;
     const OutboxSettings m_settings;
     std::function<double()> m_random; ///< Uniform in [0, 1).
-    BatchSplitter m_splitter;
+    BatchSizer m_sizer;
+    AsideList m_aside;
+    bool m_isAsidesTurn = false;      ///< A batch was taken since one that is aside was tried.
     std::optional<Removal> m_removal; ///< Delivered, and not deleted yet.
     int m_failures = 0;               ///< Requests in a row that must be repeated.
     int m_refusalsInARow = 0;         ///< Events refused for good since one was last accepted.

@@ -85,8 +85,8 @@ TEST_F(EndpointConfigTest, LetsTheSignalsOwnVariableWinInEveryPair) {
                               {"OTEL_EXPORTER_OTLP_LOGS_HEADERS", "b=2"},
                               {"OTEL_EXPORTER_OTLP_TIMEOUT", "1000"},
                               {"OTEL_EXPORTER_OTLP_LOGS_TIMEOUT", "2000"},
-                              {"OTEL_EXPORTER_OTLP_COMPRESSION", "none"},
-                              {"OTEL_EXPORTER_OTLP_LOGS_COMPRESSION", "gzip"},
+                              {"OTEL_EXPORTER_OTLP_COMPRESSION", "gzip"},
+                              {"OTEL_EXPORTER_OTLP_LOGS_COMPRESSION", "none"},
                               {"OTEL_EXPORTER_OTLP_CERTIFICATE", "/base.pem"},
                               {"OTEL_EXPORTER_OTLP_LOGS_CERTIFICATE", "/logs.pem"},
                               {"OTEL_EXPORTER_OTLP_CLIENT_KEY", "/base.key"},
@@ -96,7 +96,7 @@ TEST_F(EndpointConfigTest, LetsTheSignalsOwnVariableWinInEveryPair) {
     ASSERT_EQ(config->headers.size(), 1U);
     EXPECT_EQ(config->headers[0].first, "b");
     EXPECT_EQ(config->timeout, 2s);
-    EXPECT_TRUE(config->gzip);
+    EXPECT_FALSE(config->gzip);
     EXPECT_EQ(config->certificate, "/logs.pem");
     EXPECT_EQ(config->clientKey, "/logs.key");
     EXPECT_EQ(config->clientCertificate, "/logs.crt");
@@ -104,9 +104,9 @@ TEST_F(EndpointConfigTest, LetsTheSignalsOwnVariableWinInEveryPair) {
 
 TEST_F(EndpointConfigTest, TakesTheCommonVariableOfEachPairToo) {
     const auto config = Read({{"OTEL_EXPORTER_OTLP_LOGS_ENDPOINT", "http://c"},
-                              {"OTEL_EXPORTER_OTLP_COMPRESSION", "gzip"},
+                              {"OTEL_EXPORTER_OTLP_COMPRESSION", "none"},
                               {"OTEL_EXPORTER_OTLP_TIMEOUT", "250"}});
-    EXPECT_TRUE(config->gzip);
+    EXPECT_FALSE(config->gzip);
     EXPECT_EQ(config->timeout, 250ms);
 }
 
@@ -117,7 +117,7 @@ TEST_F(EndpointConfigTest, KeepsTheDefaultForAValueThatMakesNoSense) {
             10s);
         EXPECT_EQ(m_complaints.size(), 1U) << bad;
     }
-    EXPECT_FALSE(
+    EXPECT_TRUE(
         Read({{"OTEL_EXPORTER_OTLP_ENDPOINT", "http://c"}, {"OTEL_EXPORTER_OTLP_COMPRESSION", "zstd"}})
             ->gzip);
     EXPECT_EQ(m_complaints.size(), 1U);
@@ -128,12 +128,12 @@ TEST_F(EndpointConfigTest, TakesTheCommonVariableWhereTheSignalsOwnMakesNoSense)
                               {"OTEL_EXPORTER_OTLP_LOGS_ENDPOINT", "gopher://c"},
                               {"OTEL_EXPORTER_OTLP_TIMEOUT", "250"},
                               {"OTEL_EXPORTER_OTLP_LOGS_TIMEOUT", "soon"},
-                              {"OTEL_EXPORTER_OTLP_COMPRESSION", "gzip"},
+                              {"OTEL_EXPORTER_OTLP_COMPRESSION", "none"},
                               {"OTEL_EXPORTER_OTLP_LOGS_COMPRESSION", "zstd"}});
     ASSERT_TRUE(config);
     EXPECT_EQ(config->url, "http://c/v1/logs");
     EXPECT_EQ(config->timeout, 250ms);
-    EXPECT_TRUE(config->gzip);
+    EXPECT_FALSE(config->gzip);
     EXPECT_EQ(m_complaints.size(), 3U);
 }
 

@@ -1,7 +1,4 @@
 #include "Modules/MetrikSdk/upload/BatchPlan.h"
-#include "Modules/MetrikSdk/upload/BatchSplitter.h"
-
-#include <set>
 
 #include <gtest/gtest.h>
 
@@ -67,51 +64,6 @@ TEST(BatchPlan, DoesNotHoldEventsFromTheFuture) {
 TEST(BatchPlan, DoesNotHoldEventsOfAnImpossibleTime) {
     for (const auto time : {WallTime::min(), WallTime::max()})
         EXPECT_EQ(Plan(Waiting(3, 1, time)).wait, 0ms);
-}
-
-/// Lets a splitter work off `events` events of which `bad` are refused; the number of requests it took.
-int WorkOff(std::size_t events, const std::set<std::size_t>& bad, std::set<std::size_t>& found) {
-    upload::BatchSplitter splitter(512);
-    std::size_t next = 0;
-    int requests = 0;
-    while (next < events && requests < 10'000) {
-        ++requests;
-        const auto count = std::min(splitter.Limit(), events - next);
-        const auto firstBad = bad.lower_bound(next);
-        if (firstBad == bad.end() || *firstBad >= next + count) {
-            splitter.Gone(count);
-            next += count;
-        } else if (splitter.Refused(count)) {
-            found.insert(next++);
-            splitter.Found();
-        }
-    }
-    return requests;
-}
-
-TEST(BatchSplitter, FindsTheOneBadEventOfABatchWhereverItIs) {
-    for (std::size_t bad = 0; bad < 500; ++bad) {
-        std::set<std::size_t> found;
-        EXPECT_LE(WorkOff(500, {bad}, found), 20) << bad;
-        EXPECT_EQ(found, std::set<std::size_t>{bad});
-    }
-}
-
-TEST(BatchSplitter, FindsEveryBadEvent) {
-    const std::set<std::size_t> bad{0, 1, 250, 499};
-    std::set<std::size_t> found;
-    WorkOff(500, bad, found);
-    EXPECT_EQ(found, bad);
-}
-
-TEST(BatchSplitter, SendsFullBatchesAgainWhenTheRefusalWasAPassingOne) {
-    upload::BatchSplitter splitter(512);
-    EXPECT_FALSE(splitter.Refused(500));
-    EXPECT_EQ(splitter.Limit(), 250U);
-    splitter.Gone(250);
-    EXPECT_EQ(splitter.Limit(), 250U);
-    splitter.Gone(250);
-    EXPECT_EQ(splitter.Limit(), 512U);
 }
 
 } // namespace

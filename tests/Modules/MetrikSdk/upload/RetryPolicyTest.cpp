@@ -25,11 +25,15 @@ TEST(RetryPolicy, DeletesWhatWasTaken) {
 
 TEST(RetryPolicy, KeepsTheBatchWhereTheCollectorAsksToWait) {
     for (const long status : {429, 502, 503, 504})
-        EXPECT_EQ(Judge(Answer(status)), upload::Verdict::Wait) << status;
+        EXPECT_EQ(Judge(Answer(status)), upload::Verdict::WaitThenHalve) << status;
+}
+
+TEST(RetryPolicy, LearnsALengthFromAnAnswerThatSaysTooLarge) {
+    EXPECT_EQ(Judge(Answer(413)), upload::Verdict::HalveForSize);
 }
 
 TEST(RetryPolicy, HalvesOnEveryOtherError) {
-    for (const long status : {400, 401, 404, 408, 413, 422, 499, 500, 501, 505, 599})
+    for (const long status : {400, 401, 404, 408, 422, 499, 500, 501, 505, 599})
         EXPECT_EQ(Judge(Answer(status)), upload::Verdict::Halve) << status;
 }
 
@@ -41,7 +45,9 @@ TEST(RetryPolicy, KeepsTheBatchOnARedirect) {
 TEST(RetryPolicy, KeepsTheBatchWhenTheAnswerIsNotComplete) {
     auto cut = Answer(200);
     cut.fault = "transfer closed";
-    EXPECT_EQ(Judge(cut), upload::Verdict::Wait);
+    EXPECT_EQ(Judge(cut), upload::Verdict::Wait) << "nothing of the batch had left";
+    cut.began = true;
+    EXPECT_EQ(Judge(cut), upload::Verdict::WaitAndHalve);
 }
 
 TEST(RetryPolicy, TakesAWebPageForALogInPage) {
@@ -58,10 +64,12 @@ TEST(RetryPolicy, JudgesAnErrorByItsStatusAlsoWhenItsTextIsAPage) {
         page.contentType = "text/html";
         return Judge(page);
     };
-    for (const long status : {400, 401, 413, 500})
+    for (const long status : {400, 401, 500})
         EXPECT_EQ(judge(status), upload::Verdict::Halve) << status;
-    for (const long status : {302, 429, 502, 503, 504})
-        EXPECT_EQ(judge(status), upload::Verdict::Wait) << status;
+    EXPECT_EQ(judge(413), upload::Verdict::HalveForSize);
+    EXPECT_EQ(judge(302), upload::Verdict::Wait);
+    for (const long status : {429, 502, 503, 504})
+        EXPECT_EQ(judge(status), upload::Verdict::WaitThenHalve) << status;
 }
 
 TEST(RetryPolicy, TakesAnAnswerThatIsNoJsonForAnAcceptance) {

@@ -64,6 +64,33 @@ protected:
             ASSERT_TRUE(m_outbox.Append({"A759", "1", "default"}, "A759|1", NumberedPayload(m_next++)));
     }
 
+    /// The same by an answer that says nothing about the events.
+    void AnswerLaterTo(const std::set<int>& numbers, const otlp::HttpResult& result) {
+        m_sender.answer = [numbers, result](const std::vector<ReceivedEvent>& events) {
+            for (const auto& event : events)
+                if (numbers.contains(event.number))
+                    return result;
+            return Status(200);
+        };
+    }
+
+    /// Passes, with the pauses that the cycle wants, for so long by its own clock; `eachMinute` comes about once a minute.
+    void RunFor(
+        std::chrono::hours duration, const std::function<void()>& eachMinute = [] {}) {
+        RunFor(std::chrono::minutes(duration), eachMinute);
+    }
+    void RunFor(
+        std::chrono::minutes duration, const std::function<void()>& eachMinute = [] {}) {
+        const auto end = m_clock + duration;
+        for (auto minute = m_clock; m_clock < end;) {
+            m_clock += std::max(m_cycle.Pass(m_clock).duration, std::chrono::milliseconds(1));
+            if (m_clock - minute < 1min)
+                continue;
+            minute = m_clock;
+            eachMinute();
+        }
+    }
+
     /// Passes at a time when every event is old enough, until the cycle wants to wait.
     upload::Pause RunUntilPause(int maxPasses = 1000) {
         for (int i = 0; i < maxPasses; ++i)
@@ -80,6 +107,7 @@ protected:
     FakeSender m_sender;
     upload::UploadCycle m_cycle{m_outbox, m_sender, m_notifier, m_settings, [] { return 0.5; }};
     int m_next = 0;
+    WallTime m_clock = WallNow() + 1h; ///< Of RunFor.
 };
 
 TEST_F(UploadCycleTest, SleepsUntilAnEventComesWhenTheOutboxIsEmpty) {
@@ -169,6 +197,101 @@ TEST_F(UploadCycleTest, FindsSeveralPoisonousEvents) {
     RunUntilPause();
     EXPECT_EQ(m_outbox.Status().delivered, 496);
     EXPECT_EQ(m_outbox.Status().deadLettered, 4);
+}
+
+/// An answer that never came, though the request was on its way.
+otlp::HttpResult TimedOut() {
+    otlp::HttpResult result;
+    result.fault = "timed out";
+    result.began = true;
+    return result;
+}
+
+TEST_F(UploadCycleTest, LetsOthersGoPastAnEventToWhichTheCollectorSaysLaterForEver) {
+    Append(500);
+    AnswerLaterTo({321, 322}, Status(503));
+    RunFor(1h);
+    const auto status = m_outbox.Status();
+    EXPECT_EQ(status.delivered, 498);
+    EXPECT_EQ(status.waiting, 2) << "kept";
+    EXPECT_LE(m_sender.bodies.size(), 70U);
+    EXPECT_EQ(
+        Told::Failures().Count("events refused: An event is not taken while others are, and will be tried "
+                               "again from time to time: HTTP status 503"),
+        2);
+}
+
+TEST_F(UploadCycleTest, MovesSuchAnEventToTheDeadLettersAtLast) {
+    Append(20);
+    AnswerLaterTo({13}, TimedOut());
+    RunFor(6h, [&] { Append(1); });
+    RunFor(1min);
+    const auto status = m_outbox.Status();
+    EXPECT_EQ(status.deadLettered, 1);
+    EXPECT_EQ(status.waiting, 0);
+    SQLite::Database file(m_directory.Path() + "/MetrikOutbox.db");
+    EXPECT_EQ(file.execAndGet("SELECT reason FROM dead_letter").getString(),
+              "not taken at 10 tries, while others were: timed out");
+    EXPECT_EQ(file.execAndGet("SELECT payload FROM dead_letter").getString(), NumberedPayload(13));
+}
+
+TEST_F(UploadCycleTest, DeliversAnEventThatSteppedAsideOnceTheCollectorTakesIt) {
+    Append(20);
+    AnswerLaterTo({13}, Status(503));
+    RunFor(10min);
+    EXPECT_EQ(m_outbox.Status().waiting, 1);
+    AnswerAlways(Status(200));
+    RunFor(1h);
+    EXPECT_EQ(m_outbox.Status().delivered, 20);
+}
+
+TEST_F(UploadCycleTest, BlamesNoEventWhileACollectorIsAwayForADay) {
+    Append(600);
+    for (const auto& away : {Status(503), TimedOut()}) {
+        AnswerAlways(away);
+        RunFor(24h);
+        EXPECT_EQ(m_outbox.Status().deadLettered, 0);
+    }
+    const auto before = m_sender.bodies.size();
+    AnswerAlways(Status(200));
+    RunFor(10min);
+    EXPECT_EQ(m_outbox.Status().delivered, 600);
+    EXPECT_LE(m_sender.bodies.size() - before, 600U);
+}
+
+TEST_F(UploadCycleTest, KeepsItsBatchesWhileTheCollectorCannotBeReached) {
+    Append(600);
+    otlp::HttpResult unreachable;
+    unreachable.fault = "no route";
+    AnswerAlways(unreachable);
+    RunFor(2h);
+    const auto before = m_sender.bodies.size();
+    AnswerAlways(Status(200));
+    RunFor(10min);
+    EXPECT_EQ(m_sender.bodies.size() - before, 2U);
+}
+
+TEST_F(UploadCycleTest, GetsEverythingOverALineThatIsTooSlowForAFullBatch) {
+    Append(2000);
+    m_sender.answer = [&](const auto&) {
+        return m_sender.bodies.back().size() > 100'000 ? TimedOut() : Status(200);
+    };
+    RunFor(1h);
+    EXPECT_EQ(m_outbox.Status().delivered, 2000);
+    EXPECT_LE(m_sender.bodies.size(), 40U);
+}
+
+TEST_F(UploadCycleTest, StaysBelowTheLengthThatWasRefusedOnce) {
+    Append(2000);
+    int tooLarge = 0;
+    m_sender.answer = [&](const auto&) {
+        const bool isTooLarge = m_sender.bodies.back().size() > 150'000;
+        tooLarge += isTooLarge ? 1 : 0;
+        return Status(isTooLarge ? 413 : 200);
+    };
+    RunUntilPause();
+    EXPECT_EQ(m_outbox.Status().delivered, 2000);
+    EXPECT_LE(tooLarge, 3);
 }
 
 TEST_F(UploadCycleTest, SlowsDownWhenEverythingIsRefused) {

@@ -1,0 +1,62 @@
+#include "Modules/MetrikSdk/upload/AsideList.h"
+
+#include <algorithm>
+
+namespace MetrikSdk::upload {
+
+void AsideList::Add(const StoredEvent& event, WallTime now) {
+    m_keys[event.row] = event.uuid;
+    m_entries[event.row] = {now + m_settings.firstPause, 0, false};
+}
+
+void AsideList::Remove(std::int64_t row) {
+    m_keys.erase(row);
+    m_entries.erase(row);
+}
+
+void AsideList::OtherWasTaken() {
+    for (auto& [row, entry] : m_entries) {
+        if (entry.strikes == 0 && !entry.othersWereTaken)
+            entry.notBefore = {};
+        entry.othersWereTaken = true;
+    }
+}
+
+/// A clock that was set back must not hold an event for longer than the longest pause.
+bool AsideList::IsDue(const Entry& entry, WallTime now) const {
+    return entry.notBefore <= now || entry.notBefore - now > m_settings.maxPause;
+}
+
+std::optional<EventKey> AsideList::Due(WallTime now) const {
+    for (const auto& [row, entry] : m_entries)
+        if (IsDue(entry, now))
+            return EventKey{row, m_keys.at(row)};
+    return std::nullopt;
+}
+
+std::optional<std::chrono::milliseconds> AsideList::UntilDue(WallTime now) const {
+    std::optional<std::chrono::milliseconds> soonest;
+    for (const auto& [row, entry] : m_entries) {
+        const auto wait = IsDue(entry, now) ? std::chrono::milliseconds(0) : entry.notBefore - now;
+        soonest = std::min(soonest.value_or(wait), wait);
+    }
+    return soonest;
+}
+
+AsideList::Strikes AsideList::Failed(std::int64_t row, WallTime now) {
+    auto& entry = m_entries[row];
+    const bool isStrike = entry.othersWereTaken;
+    entry.othersWereTaken = false;
+    entry.strikes += isStrike ? 1 : 0;
+    entry.notBefore = now + PauseAfter(entry.strikes);
+    return {entry.strikes, isStrike, entry.strikes >= m_settings.strikes};
+}
+
+std::chrono::milliseconds AsideList::PauseAfter(int strikes) const {
+    auto pause = m_settings.firstPause;
+    for (int i = 1; i < strikes && pause < m_settings.maxPause; ++i)
+        pause *= 2;
+    return std::min(pause, m_settings.maxPause);
+}
+
+} // namespace MetrikSdk::upload

@@ -1,0 +1,73 @@
+#include "Modules/MetrikSdk/upload/AsideList.h"
+
+#include <gtest/gtest.h>
+
+using namespace MetrikSdk;
+using namespace std::chrono_literals;
+
+namespace {
+
+const WallTime NOW{1'700'000'000s};
+
+StoredEvent Event(std::int64_t row) {
+    StoredEvent event;
+    event.row = row;
+    event.uuid = "uuid-" + std::to_string(row);
+    return event;
+}
+
+class AsideListTest : public testing::Test {
+protected:
+    /// The row that is due.
+    std::int64_t Due(WallTime now) const { return m_list.Due(now).value_or(EventKey{}).row; }
+
+    AsideSettings m_settings;
+    upload::AsideList m_list{m_settings};
+};
+
+TEST_F(AsideListTest, TriesAnEventAtOnceWhenOthersWereTakenForTheFirstTime) {
+    m_list.Add(Event(7), NOW);
+    EXPECT_EQ(Due(NOW), 0);
+    EXPECT_EQ(m_list.UntilDue(NOW), 1min);
+    m_list.OtherWasTaken();
+    EXPECT_EQ(Due(NOW), 7);
+    EXPECT_EQ(m_list.Due(NOW)->uuid, "uuid-7");
+}
+
+TEST_F(AsideListTest, CountsNoStrikeWhileNothingIsTaken) {
+    m_list.Add(Event(7), NOW);
+    for (int i = 0; i < 1000; ++i)
+        EXPECT_EQ(m_list.Failed(7, NOW).count, 0);
+    m_list.OtherWasTaken();
+    EXPECT_EQ(m_list.Failed(7, NOW).count, 1);
+    EXPECT_EQ(m_list.Failed(7, NOW).count, 1) << "nothing was taken since the try before";
+}
+
+TEST_F(AsideListTest, DoublesThePauseUpToTheLongestAndIsOutAfterAllStrikes) {
+    m_list.Add(Event(7), NOW);
+    std::vector<std::chrono::milliseconds> pauses;
+    for (int strike = 1; strike <= m_settings.strikes; ++strike) {
+        m_list.OtherWasTaken();
+        EXPECT_EQ(m_list.Failed(7, NOW).areOut, strike == m_settings.strikes);
+        pauses.push_back(*m_list.UntilDue(NOW));
+    }
+    EXPECT_EQ(pauses,
+              (std::vector<std::chrono::milliseconds>{1min, 2min, 4min, 8min, 16min, 32min, 1h, 1h, 1h, 1h}));
+}
+
+TEST_F(AsideListTest, DoesNotHoldAnEventWhenTheClockIsSetBack) {
+    m_list.Add(Event(7), NOW);
+    EXPECT_EQ(Due(NOW - 24h), 7);
+}
+
+TEST_F(AsideListTest, ForgetsWhatIsRemoved) {
+    m_list.Add(Event(7), NOW);
+    m_list.Add(Event(8), NOW);
+    m_list.Remove(7);
+    EXPECT_EQ(Due(NOW + 1h), 8);
+    EXPECT_EQ(m_list.Keys().size(), 1U);
+    m_list.Remove(8);
+    EXPECT_FALSE(m_list.UntilDue(NOW));
+}
+
+} // namespace
