@@ -64,6 +64,7 @@ public:
     }
     void Abandon() override {}
     std::string Destination() const override { return "http://collector"; }
+    std::vector<std::string> HeaderNames() const override { return {}; }
 
     /// Shown by the modules.
     std::set<std::string> modules;

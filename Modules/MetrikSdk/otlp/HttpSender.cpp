@@ -127,6 +127,13 @@ HttpResult HttpSender::Post(const std::string& body) {
     return Finish(Perform(), answer);
 }
 
+std::vector<std::string> HttpSender::HeaderNames() const {
+    std::vector<std::string> names;
+    for (const auto& [name, value] : m_config.headers)
+        names.push_back(name);
+    return names;
+}
+
 bool HttpSender::MustEnd() const {
     return m_abandoned || g_abandonAll;
 }
@@ -156,13 +163,16 @@ HttpResult HttpSender::Finish(CURLcode code, Answer& answer) {
     const char* type = nullptr;
     if (::curl_easy_getinfo(m_easy.get(), CURLINFO_CONTENT_TYPE, &type) == CURLE_OK && type != nullptr)
         result.contentType = type;
-    if (code == CURLE_OK || (code == CURLE_WRITE_ERROR && answer.cut))
+    if (answer.headersEnded && (code == CURLE_OK || (code == CURLE_WRITE_ERROR && answer.cut)))
         return result;
     result.abandoned = MustEnd();
     curl_off_t sent = 0;
     ::curl_easy_getinfo(m_easy.get(), CURLINFO_SIZE_UPLOAD_T, &sent);
     result.began = sent > 0;
-    result.fault = m_error[0] != '\0' ? m_error : ::curl_easy_strerror(code);
+    if (code == CURLE_OK) // the library is content with a status line
+        result.fault = "the answer ended inside its headers";
+    else
+        result.fault = m_error[0] != '\0' ? m_error : ::curl_easy_strerror(code);
     return result;
 }
 
@@ -177,10 +187,15 @@ std::size_t HttpSender::OnBody(char* bytes, std::size_t size, std::size_t count,
 
 std::size_t HttpSender::OnHeader(char* bytes, std::size_t size, std::size_t count, void* data) {
     static constexpr std::string_view NAME = "retry-after:";
-    auto& result = static_cast<Answer*>(data)->result;
+    auto& answer = *static_cast<Answer*>(data);
+    auto& result = answer.result;
     const std::string_view line(bytes, size * count);
-    if (line.starts_with("HTTP/"))
-        result.retryAfter.clear(); // a new answer begins: the one before was interim
+    if (line.starts_with("HTTP/")) { // a new answer begins: the one before was interim
+        result.retryAfter.clear();
+        answer.headersEnded = false;
+    }
+    if (line == "\r\n" || line == "\n")
+        answer.headersEnded = true;
     if (line.size() > NAME.size() && ::strncasecmp(line.data(), NAME.data(), NAME.size()) == 0) {
         const auto first = line.find_first_not_of(" \t", NAME.size());
         const auto last = line.find_last_not_of(" \t\r\n");

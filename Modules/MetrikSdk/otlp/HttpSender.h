@@ -3,6 +3,7 @@
 #include <atomic>
 #include <memory>
 #include <string>
+#include <vector>
 
 #include <curl/curl.h>
 
@@ -23,6 +24,7 @@ public:
     HttpResult Post(const std::string& body) override;
     void Abandon() override { m_abandoned = true; }
     std::string Destination() const override { return WithoutSecrets(m_config.url); }
+    std::vector<std::string> HeaderNames() const override;
 
     /// Ends every request of the process, waits until none is under way, at most `patience`, and lets no new
     /// one begin. For exit(): the TLS library is about to clean itself up, and must not be in use then.
@@ -32,6 +34,7 @@ public:
 private:
     struct Answer {
         HttpResult result;
+        bool headersEnded = false;
         bool cut = false; ///< The body was longer than what is read of it.
     };
 

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <string>
+#include <vector>
 
 #include "Modules/MetrikSdk/otlp/HttpResult.h"
 
@@ -19,6 +20,9 @@ public:
 
     /// Where to, for people.
     virtual std::string Destination() const = 0;
+
+    /// The names of the headers that were configured, for people.
+    virtual std::vector<std::string> HeaderNames() const = 0;
 };
 
 } // namespace MetrikSdk::otlp

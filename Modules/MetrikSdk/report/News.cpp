@@ -22,6 +22,8 @@ const char* NameOf(Cause cause) {
         return "upload";
     case Cause::Refusal:
         return "events refused";
+    case Cause::Warning:
+        return "collector warning";
     case Cause::Init:
         return "init";
     case Cause::Count:

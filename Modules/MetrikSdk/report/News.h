@@ -15,6 +15,7 @@ enum class Cause {
     Drop,          ///< Events given up for a cap.
     Upload,        ///< The collector cannot be reached or asks to wait.
     Refusal,       ///< Events that the collector will never take.
+    Warning,       ///< What a collector has to say about events that it took.
     Init,          ///< A module could not be initialised for an unexpected reason.
     Count          ///< How many causes there are.
 };

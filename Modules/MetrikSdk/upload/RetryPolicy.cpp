@@ -1,6 +1,7 @@
 #include "Modules/MetrikSdk/upload/RetryPolicy.h"
 
 #include <algorithm>
+#include <array>
 #include <charconv>
 #include <cmath>
 #include <string_view>
@@ -32,6 +33,22 @@ bool AsksToWait(long status) {
     return status == 429 || status == 502 || status == 503 || status == 504;
 }
 
+/// Who sends them, and where to, is wrong, and not what they are. (A firewall that dislikes one event answers so,
+/// too; so one that is never taken while others are steps aside as with any other "later".)
+bool IsConfigurationsFault(long status) {
+    static constexpr std::array STATUSES{401L, 403L, 404L, 405L, 407L, 415L, 511L};
+    return std::find(STATUSES.begin(), STATUSES.end(), status) != STATUSES.end();
+}
+
+std::string Credentials(const std::vector<std::string>& headers) {
+    if (headers.empty())
+        return "look at the credentials: OTEL_EXPORTER_OTLP_HEADERS names no header";
+    std::string names;
+    for (const auto& name : headers)
+        names += (names.empty() ? "" : ", ") + name;
+    return "look at the credentials: OTEL_EXPORTER_OTLP_HEADERS sets " + names;
+}
+
 std::string OneLine(const std::string& text) {
     auto line = SystemTool::Text::ValidUtf8(SystemTool::Text::CutUtf8(text, MAX_QUOTED_BYTES));
     std::replace_if(
@@ -57,7 +74,7 @@ Verdict Judge(const otlp::HttpResult& result) {
     // credentials to another host.
     if (result.status < 400)
         return Verdict::Wait;
-    if (AsksToWait(result.status))
+    if (AsksToWait(result.status) || IsConfigurationsFault(result.status))
         return Verdict::WaitThenHalve;
     return result.status == 413 ? Verdict::HalveForSize : Verdict::Halve;
 }
@@ -67,11 +84,20 @@ PartialSuccess ReadPartialSuccess(const otlp::HttpResult& result, std::size_t se
     // A 64-bit integer, so a text by the protocol's rules; some collectors write a number.
     const auto text = partial.GetKeyValue("rejectedLogRecords").ToString();
     std::uint64_t rejected = 0;
-    const auto parsed = std::from_chars(text.data(), text.data() + text.size(), rejected);
-    if (parsed.ec != std::errc())
-        return {0, {}};
+    const auto end = text.data() + text.size();
+    const auto parsed = std::from_chars(text.data(), end, rejected);
+    const bool isNumber = parsed.ec == std::errc() && parsed.ptr == end;
+    if (parsed.ec != std::errc()) // a negative one, a word
+        rejected = 0;
     return {static_cast<std::size_t>(std::min<std::uint64_t>(rejected, sent)),
-            OneLine(partial.GetKeyValue("errorMessage").ToString())};
+            OneLine(partial.GetKeyValue("errorMessage").ToString()),
+            text.empty() || (isNumber && rejected <= sent) ? std::string() : OneLine(text)};
+}
+
+std::chrono::milliseconds WishedWait(const otlp::HttpResult& result, WallTime now,
+                                     const RetrySettings& settings) {
+    const auto wished = otlp::ParseRetryAfter(result.retryAfter, now).value_or(std::chrono::milliseconds(0));
+    return std::min(wished, settings.maxRetryAfter);
 }
 
 std::chrono::milliseconds WaitBefore(const otlp::HttpResult& result, int failures, double random,
@@ -79,8 +105,7 @@ std::chrono::milliseconds WaitBefore(const otlp::HttpResult& result, int failure
     const auto doubled = static_cast<double>(settings.firstWait.count()) * std::pow(2.0, failures - 1);
     const auto ceiling = std::min(doubled, static_cast<double>(settings.maxWait.count()));
     const std::chrono::milliseconds own(static_cast<std::int64_t>(random * ceiling));
-    const auto wished = otlp::ParseRetryAfter(result.retryAfter, now).value_or(std::chrono::milliseconds(0));
-    return std::max(own, std::min(wished, settings.maxRetryAfter));
+    return std::max(own, WishedWait(result, now, settings));
 }
 
 std::string Describe(const otlp::HttpResult& result) {
@@ -90,6 +115,22 @@ std::string Describe(const otlp::HttpResult& result) {
     const auto message = ParseAnswer(result.body).GetKeyValue("message").ToString();
     const auto text = OneLine(message.empty() ? result.body : message);
     return text.empty() ? status : status + ": " + text;
+}
+
+std::string LookAt(const otlp::HttpResult& result, const std::vector<std::string>& headers) {
+    if (!result.fault.empty())
+        return {};
+    if (result.status == 511 || (IsSuccess(result.status) && IsWebPage(result)))
+        return "this is a page: the network may want a log-in, or the address be no collector's";
+    if (result.status == 401 || result.status == 403)
+        return Credentials(headers);
+    if (result.status == 407)
+        return "look at the proxy and its credentials: https_proxy, http_proxy";
+    if (result.status == 415)
+        return "look at OTEL_EXPORTER_OTLP_COMPRESSION: the collector may not unpack, or take no JSON";
+    if (result.status == 404 || result.status == 405 || (result.status >= 300 && result.status < 400))
+        return "look at the address: OTEL_EXPORTER_OTLP_ENDPOINT";
+    return {};
 }
 
 } // namespace MetrikSdk::upload::RetryPolicy

@@ -2,6 +2,7 @@
 
 #include <chrono>
 #include <string>
+#include <vector>
 
 #include "Modules/MetrikSdk/Settings.h"
 #include "Modules/MetrikSdk/Time.h"
@@ -21,8 +22,9 @@ enum class Verdict {
 
 /// What a 2xx answer says about the events of its request.
 struct PartialSuccess {
-    std::size_t rejected = 0;
+    std::size_t rejected = 0; ///< At most as many as were sent.
     std::string message;
+    std::string impossible; ///< The count as it was written, when it is none or more than were sent.
 };
 
 /// The decisions behind docs/Outbox.md's table of answers. Pure.
@@ -30,7 +32,6 @@ namespace RetryPolicy {
 
 Verdict Judge(const otlp::HttpResult& result);
 
-/// How many events a 2xx answer counts as rejected (at most `sent`), and what it says about it.
 PartialSuccess ReadPartialSuccess(const otlp::HttpResult& result, std::size_t sent);
 
 /// How long to wait before the next attempt, after `failures` (at least 1) in a row. `random` is uniform in
@@ -39,8 +40,16 @@ PartialSuccess ReadPartialSuccess(const otlp::HttpResult& result, std::size_t se
 std::chrono::milliseconds WaitBefore(const otlp::HttpResult& result, int failures, double random,
                                      WallTime now, const RetrySettings& settings);
 
+/// How long the collector wishes us to wait, up to the bound; 0 when it says nothing. It may say so in any answer.
+std::chrono::milliseconds WishedWait(const otlp::HttpResult& result, WallTime now,
+                                     const RetrySettings& settings);
+
 /// One line about what went wrong, for people.
 std::string Describe(const otlp::HttpResult& result);
+
+/// What a person should look at, when the answer is one to a wrong configuration rather than to wrong events; else
+/// empty. `headers` are the names of the headers that were configured: among them are the credentials.
+std::string LookAt(const otlp::HttpResult& result, const std::vector<std::string>& headers);
 
 } // namespace RetryPolicy
 } // namespace MetrikSdk::upload

@@ -86,8 +86,10 @@ Pause UploadCycle::Idle(WallTime now) const {
 
 Pause UploadCycle::Send(Batch batch, bool isAside, WallTime now) {
     const auto body = EncodeWithinBound(batch);
-    auto result = m_sender.Post(body);
-    return Act({std::move(batch), isAside, body.size(), std::move(result)}, now);
+    const auto result = m_sender.Post(body);
+    const auto pause = Act({std::move(batch), isAside, body.size(), result}, now);
+    const auto wished = RetryPolicy::WishedWait(result, now, m_settings.retry);
+    return wished > pause.duration ? Pause{wished} : pause;
 }
 
 /// Leaves out the events for which the body would be too long.
@@ -123,13 +125,17 @@ Pause UploadCycle::NotTaken(const Exchange& exchange, Verdict verdict, WallTime 
     const bool isAboutTheBatch = verdict != Verdict::Wait;
     if (exchange.isAside && isAboutTheBatch)
         return AsideFailed(exchange, now);
-    m_notifier.TellFailure({report::Cause::Upload, m_sender.Destination() + ": " +
-                                                       RetryPolicy::Describe(exchange.result) +
+    m_notifier.TellFailure({report::Cause::Upload, m_sender.Destination() + ": " + Describe(exchange.result) +
                                                        "; the events stay in the outbox"});
     const auto blame = verdict == Verdict::WaitAndHalve ? Blame::NoAnswer : Blame::Later;
     if (!exchange.isAside && isAboutTheBatch && m_sizer.Failed(exchange.Size(), blame))
         StepAside(events.front(), now);
     return WaitAfter(exchange.result, now);
+}
+
+std::string UploadCycle::Describe(const otlp::HttpResult& result) const {
+    const auto lookAt = RetryPolicy::LookAt(result, m_sender.HeaderNames());
+    return RetryPolicy::Describe(result) + (lookAt.empty() ? "" : "; " + lookAt);
 }
 
 /// Lets the others go past an event that failed alone, if there are others.
@@ -179,13 +185,26 @@ Pause UploadCycle::Delivered(Exchange exchange) {
 }
 
 void UploadCycle::TellDelivery(std::size_t count, const PartialSuccess& partial) {
-    if (partial.rejected > 0)
-        m_notifier.TellFailure(
-            {report::Cause::Refusal, "The collector rejected " + std::to_string(partial.rejected) + " of " +
-                                         std::to_string(count) + " events for good: " + partial.message});
+    TellPartialSuccess(count, partial);
     m_notifier.TellSuccess("upload", std::to_string(count - partial.rejected) + " events");
     m_notifier.TellFailure({report::Cause::Upload, m_sender.Destination() + ": events are taken again",
                             report::News::Kind::End});
+}
+
+void UploadCycle::TellPartialSuccess(std::size_t count, const PartialSuccess& partial) {
+    const auto total = std::to_string(count);
+    if (!partial.impossible.empty())
+        m_notifier.TellFailure({report::Cause::Refusal,
+                                "The collector says that it rejected " + partial.impossible + " of " + total +
+                                    " events, which cannot be; " + std::to_string(partial.rejected) +
+                                    " count as refused: " + partial.message});
+    else if (partial.rejected > 0)
+        m_notifier.TellFailure({report::Cause::Refusal, "The collector rejected " +
+                                                            std::to_string(partial.rejected) + " of " +
+                                                            total + " events for good: " + partial.message});
+    else if (!partial.message.empty())
+        m_notifier.TellFailure(
+            {report::Cause::Warning, "The collector took " + total + " events and says: " + partial.message});
 }
 
 void UploadCycle::Settle() {

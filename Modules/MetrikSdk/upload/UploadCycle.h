@@ -58,8 +58,10 @@ private:
     Pause Send(Batch batch, bool isAside, WallTime now);
     std::string EncodeWithinBound(Batch& batch) const;
     Pause Act(Exchange exchange, WallTime now);
+    std::string Describe(const otlp::HttpResult& result) const;
     Pause Delivered(Exchange exchange);
     void TellDelivery(std::size_t count, const PartialSuccess& partial);
+    void TellPartialSuccess(std::size_t count, const PartialSuccess& partial);
     Pause NotTaken(const Exchange& exchange, Verdict verdict, WallTime now);
     void StepAside(const StoredEvent& event, WallTime now);
     Pause AsideFailed(const Exchange& exchange, WallTime now);

@@ -202,6 +202,26 @@ TEST_F(MisbehavingCollectorTest, ClosesHalfWayThroughTheBody) {
     EXPECT_EQ(m_server->RequestCount(), 3U) << "the second time in halves";
 }
 
+TEST_F(MisbehavingCollectorTest, ClosesInsideTheHeadersOfAnAcceptance) {
+    ReportBeforehand(1);
+    StartAgainst({Misbehave(Manner::CloseInHeaders)});
+    ExpectEverythingDelivered(1);
+    EXPECT_EQ(m_server->RequestCount(), 2U);
+}
+
+TEST_F(MisbehavingCollectorTest, WantsOtherCredentialsForAWhile) {
+    ReportBeforehand(10);
+    Configure("HEADERS", "api-key=secret%20word");
+    StartAgainst({Status(401)});
+    ExpectEverythingDelivered(10);
+    const auto told = Told::Failures().All();
+    ASSERT_EQ(told.size(), 2U);
+    EXPECT_EQ(told[0], "upload: " + m_server->Url() +
+                           "/v1/logs: HTTP status 401: {}; look at the credentials: "
+                           "OTEL_EXPORTER_OTLP_HEADERS sets api-key; the events stay in the outbox");
+    EXPECT_EQ(told[1], "upload: " + m_server->Url() + "/v1/logs: events are taken again");
+}
+
 TEST_F(MisbehavingCollectorTest, AnswersGarbage) {
     ReportBeforehand(10);
     StartAgainst({Misbehave(Manner::SpeakNonsense)});

@@ -139,6 +139,9 @@ bool LoopbackServer::Perform(Poco::Net::StreamSocket& socket, const Reply& reply
     case Reply::Manner::CloseHalfway:
         send(head + "Content-Length: 100\r\n\r\n" + std::string(50, ' '));
         return false;
+    case Reply::Manner::CloseInHeaders:
+        send(head + "Content-Le");
+        return false;
     case Reply::Manner::SpeakNonsense:
         send("\x01\x02 what? \xff\xfe\r\n\r\n");
         return false;

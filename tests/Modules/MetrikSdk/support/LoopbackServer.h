@@ -25,11 +25,12 @@ struct Request {
 struct Reply {
     enum class Manner {
         Answer,
-        Never,         ///< Keep the connection open and say nothing.
-        Close,         ///< Close without a word.
-        CloseHalfway,  ///< Announce a body, send half of it, close.
-        SpeakNonsense, ///< Send something that is no HTTP.
-        Flood          ///< Send a body without an end.
+        Never,          ///< Keep the connection open and say nothing.
+        Close,          ///< Close without a word.
+        CloseHalfway,   ///< Announce a body, send half of it, close.
+        CloseInHeaders, ///< Send a status line and half a header, close.
+        SpeakNonsense,  ///< Send something that is no HTTP.
+        Flood           ///< Send a body without an end.
     };
     int status = 200;
     std::string body = "{}";

@@ -28,12 +28,28 @@ TEST(RetryPolicy, KeepsTheBatchWhereTheCollectorAsksToWait) {
         EXPECT_EQ(Judge(Answer(status)), upload::Verdict::WaitThenHalve) << status;
 }
 
+TEST(RetryPolicy, BlamesNoEventForAWrongConfigurationAndSaysWhatToLookAt) {
+    const std::vector<std::string> headers{"api-key", "x-tenant"};
+    const auto lookAt = [&](long status) { return upload::RetryPolicy::LookAt(Answer(status), headers); };
+    for (const long status : {401, 403, 404, 405, 407, 415, 511}) {
+        EXPECT_EQ(Judge(Answer(status)), upload::Verdict::WaitThenHalve) << status;
+        EXPECT_NE(lookAt(status), "") << status;
+    }
+    EXPECT_EQ(lookAt(401), "look at the credentials: OTEL_EXPORTER_OTLP_HEADERS sets api-key, x-tenant");
+    EXPECT_EQ(upload::RetryPolicy::LookAt(Answer(403), {}),
+              "look at the credentials: OTEL_EXPORTER_OTLP_HEADERS names no header");
+    EXPECT_EQ(lookAt(404), "look at the address: OTEL_EXPORTER_OTLP_ENDPOINT");
+    EXPECT_EQ(lookAt(308), lookAt(404));
+    for (const long status : {200, 400, 413, 422, 429, 500, 503})
+        EXPECT_EQ(lookAt(status), "") << status;
+}
+
 TEST(RetryPolicy, LearnsALengthFromAnAnswerThatSaysTooLarge) {
     EXPECT_EQ(Judge(Answer(413)), upload::Verdict::HalveForSize);
 }
 
 TEST(RetryPolicy, HalvesOnEveryOtherError) {
-    for (const long status : {400, 401, 404, 408, 422, 499, 500, 501, 505, 599})
+    for (const long status : {400, 408, 422, 499, 500, 501, 505, 599})
         EXPECT_EQ(Judge(Answer(status)), upload::Verdict::Halve) << status;
 }
 
@@ -64,11 +80,11 @@ TEST(RetryPolicy, JudgesAnErrorByItsStatusAlsoWhenItsTextIsAPage) {
         page.contentType = "text/html";
         return Judge(page);
     };
-    for (const long status : {400, 401, 500})
+    for (const long status : {400, 500})
         EXPECT_EQ(judge(status), upload::Verdict::Halve) << status;
     EXPECT_EQ(judge(413), upload::Verdict::HalveForSize);
     EXPECT_EQ(judge(302), upload::Verdict::Wait);
-    for (const long status : {429, 502, 503, 504})
+    for (const long status : {401, 403, 429, 502, 503, 504})
         EXPECT_EQ(judge(status), upload::Verdict::WaitThenHalve) << status;
 }
 
@@ -88,6 +104,13 @@ TEST(RetryPolicy, ReadsThePartialSuccess) {
     for (const auto* nothing : {"", "{}", "ok", "[]", R"({"partialSuccess":{}})", R"({"partialSuccess":7})",
                                 R"({"partialSuccess":{"rejectedLogRecords":-1}})"})
         EXPECT_EQ(read(nothing).rejected, 0U) << nothing;
+    EXPECT_EQ(read(R"({"partialSuccess":{"errorMessage":"use v2"}})").message, "use v2");
+    for (const auto* possible : {"", "{}", "ok", R"({"partialSuccess":{"rejectedLogRecords":"10"}})",
+                                 R"({"partialSuccess":{"rejectedLogRecords":0}})"})
+        EXPECT_EQ(read(possible).impossible, "") << possible;
+    EXPECT_EQ(read(R"({"partialSuccess":{"rejectedLogRecords":"11"}})").impossible, "11");
+    EXPECT_EQ(read(R"({"partialSuccess":{"rejectedLogRecords":-1}})").impossible, "-1");
+    EXPECT_EQ(read(R"({"partialSuccess":{"rejectedLogRecords":"some"}})").impossible, "some");
 }
 
 TEST(RetryPolicy, WaitsExponentiallyWithFullJitterUpToTheBound) {

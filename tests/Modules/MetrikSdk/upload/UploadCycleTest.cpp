@@ -26,6 +26,7 @@ public:
     }
     void Abandon() override {}
     std::string Destination() const override { return "http://collector"; }
+    std::vector<std::string> HeaderNames() const override { return {"api-key"}; }
 
     std::function<otlp::HttpResult(const std::vector<ReceivedEvent>&)> answer;
     std::deque<std::string> bodies;
@@ -294,9 +295,66 @@ TEST_F(UploadCycleTest, StaysBelowTheLengthThatWasRefusedOnce) {
     EXPECT_LE(tooLarge, 3);
 }
 
+TEST_F(UploadCycleTest, LosesNoEventToAWrongConfigurationAndTellsWhatToLookAt) {
+    Append(100);
+    for (const long status : {401, 403, 404, 405, 407, 415}) {
+        AnswerAlways(Status(status));
+        RunFor(1h);
+        EXPECT_EQ(m_outbox.Status().waiting, 100) << status;
+    }
+    EXPECT_GE(
+        Told::Failures().Count("upload: http://collector: HTTP status 401; look at the credentials: "
+                               "OTEL_EXPORTER_OTLP_HEADERS sets api-key; the events stay in the outbox"),
+        1);
+    AnswerAlways(Status(200));
+    RunFor(1h);
+    EXPECT_EQ(m_outbox.Status().delivered, 100);
+    EXPECT_EQ(Told::Failures().All().back(), "upload: http://collector: events are taken again");
+}
+
+TEST_F(UploadCycleTest, LetsOthersGoPastAnEventThatAFirewallForbids) {
+    Append(100);
+    AnswerLaterTo({13}, Status(403));
+    RunFor(1h);
+    EXPECT_EQ(m_outbox.Status().delivered, 99);
+}
+
+TEST_F(UploadCycleTest, HeedsARetryAfterInEveryAnswer) {
+    for (const long status : {200, 400, 404, 413, 503}) {
+        Append(2);
+        auto answer = Status(status);
+        answer.retryAfter = "100";
+        AnswerAlways(answer);
+        const auto pause = m_cycle.Pass(WallNow() + 1h);
+        EXPECT_EQ(pause.duration, 100s) << status;
+        EXPECT_EQ(pause.untilWaiting, outbox::CountWaiter::NEVER) << status;
+        AnswerAlways(Status(200));
+        RunUntilPause();
+    }
+}
+
+TEST_F(UploadCycleTest, TellsWhatTheCollectorHasToSayAboutEventsThatItTook) {
+    const auto answer = [&](const std::string& partialSuccess) {
+        Append(10);
+        auto partial = Status(200);
+        partial.body = R"({"partialSuccess":)" + partialSuccess + "}";
+        AnswerAlways(partial);
+        RunUntilPause();
+    };
+    answer(R"({"errorMessage":"use v2"})");
+    answer(R"({"rejectedLogRecords":"77","errorMessage":"?"})");
+    EXPECT_EQ(Told::Failures().All(),
+              (std::vector<std::string>{
+                  "collector warning: The collector took 10 events and says: use v2",
+                  "events refused: The collector says that it rejected 77 of 10 events, which cannot be; "
+                  "10 count as refused: ?"}));
+    EXPECT_EQ(m_outbox.Status().delivered, 10);
+    EXPECT_EQ(m_outbox.Status().refused, 10);
+}
+
 TEST_F(UploadCycleTest, SlowsDownWhenEverythingIsRefused) {
     Append(500);
-    AnswerAlways(Status(401));
+    AnswerAlways(Status(400));
     EXPECT_EQ(RunUntilPause().duration, 500ms);
     EXPECT_EQ(m_outbox.Status().deadLettered, m_settings.retry.refusalsBeforeWaiting);
     EXPECT_EQ(RunUntilPause().duration, 1s);
