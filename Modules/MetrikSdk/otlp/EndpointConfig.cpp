@@ -1,6 +1,7 @@
 #include "Modules/MetrikSdk/otlp/EndpointConfig.h"
 
 #include <algorithm>
+#include <array>
 #include <charconv>
 #include <cstdint>
 #include <memory>
@@ -13,6 +14,16 @@ namespace {
 constexpr const char* SIGNAL_PREFIX = "OTEL_EXPORTER_OTLP_LOGS_";
 constexpr const char* COMMON_PREFIX = "OTEL_EXPORTER_OTLP_";
 constexpr const char* LOGS_PATH = "v1/logs";
+
+/// Of the same family: what our own rules decide, which docs/Outbox.md describes.
+constexpr std::array NOT_HONOURED{"OTEL_BLRP_SCHEDULE_DELAY",
+                                  "OTEL_BLRP_EXPORT_TIMEOUT",
+                                  "OTEL_BLRP_MAX_QUEUE_SIZE",
+                                  "OTEL_BLRP_MAX_EXPORT_BATCH_SIZE",
+                                  "OTEL_ATTRIBUTE_VALUE_LENGTH_LIMIT",
+                                  "OTEL_ATTRIBUTE_COUNT_LIMIT",
+                                  "OTEL_LOGRECORD_ATTRIBUTE_VALUE_LENGTH_LIMIT",
+                                  "OTEL_LOGRECORD_ATTRIBUTE_COUNT_LIMIT"};
 
 using Url = std::unique_ptr<CURLU, decltype(&::curl_url_cleanup)>;
 
@@ -76,7 +87,12 @@ public:
     Reader(const LookUp& lookUp, std::vector<std::string>& complaints)
         : m_lookUp(lookUp), m_complaints(complaints) {}
 
-    bool IsDisabled() const { return LowerCase(Value("OTEL_SDK_DISABLED")) == "true"; }
+    bool IsDisabled() {
+        const auto disabled = LowerCase(Value("OTEL_SDK_DISABLED"));
+        if (!disabled.empty() && disabled != "true" && disabled != "false")
+            m_complaints.emplace_back("OTEL_SDK_DISABLED is neither true nor false and counts as unset");
+        return disabled == "true" || IsExporterNone();
+    }
 
     std::optional<EndpointConfig> Read() {
         EndpointConfig config;
@@ -89,6 +105,7 @@ public:
         config.certificate = Pair("CERTIFICATE").value;
         config.clientKey = Pair("CLIENT_KEY").value;
         config.clientCertificate = Pair("CLIENT_CERTIFICATE").value;
+        ReadWhatIsNotHonoured();
         return config;
     }
 
@@ -121,6 +138,25 @@ private:
         }
     }
 
+    /// A list of exporters; ours is the only one that we have.
+    bool IsExporterNone() {
+        const auto exporters = LowerCase(Value("OTEL_LOGS_EXPORTER"));
+        if (!exporters.empty() && exporters != "none" && exporters != "otlp")
+            m_complaints.emplace_back("OTEL_LOGS_EXPORTER: only otlp and none are known, and otlp is used");
+        return exporters == "none";
+    }
+
+    /// A person who set one of these expects something to happen.
+    void ReadWhatIsNotHonoured() {
+        if (const auto protocol = Pair("PROTOCOL"); !protocol.value.empty() && protocol.value != "http/json")
+            m_complaints.push_back(protocol.name + ": only http/json is spoken, and is spoken all the same");
+        if (const auto insecure = Pair("INSECURE"); !insecure.value.empty())
+            m_complaints.push_back(insecure.name + " has no effect: the address says http or https");
+        for (const char* name : NOT_HONOURED)
+            if (!Value(name).empty())
+                m_complaints.push_back(std::string(name) + " has no effect");
+    }
+
     std::string ReadUrl() {
         std::string result;
         OfferPair("ENDPOINT", [&](const Variable& endpoint) {
@@ -147,24 +183,32 @@ private:
 
     void ReadHeaders(EndpointConfig& config) {
         const auto headers = Pair("HEADERS");
+        int number = 0;
         for (std::size_t start = 0; start < headers.value.size();) {
             const auto end = std::min(headers.value.find(',', start), headers.value.size());
-            ReadHeader(headers.name, Trimmed(headers.value.substr(start, end - start)), config);
+            const auto text = Trimmed(headers.value.substr(start, end - start));
+            const auto complaint = ReadHeader(text, ++number, config);
+            if (!complaint.empty())
+                m_complaints.push_back(headers.name + ": " + complaint + " and is not sent");
             start = end + 1;
         }
     }
 
-    void ReadHeader(const std::string& variable, const std::string& text, EndpointConfig& config) {
+    /// Returns what is wrong with it. What is no name may be a secret, and is not repeated.
+    static std::string ReadHeader(const std::string& text, int number, EndpointConfig& config) {
         if (text.empty())
-            return;
+            return {};
         const auto equals = text.find('=');
         const auto name = Trimmed(text.substr(0, equals));
-        const auto value =
-            equals == std::string::npos ? std::string() : PercentDecoded(Trimmed(text.substr(equals + 1)));
-        if (equals == std::string::npos || !IsToken(name) || !IsHeaderValue(value) || IsReserved(name))
-            m_complaints.push_back(variable + ": one header is ill-formed or not allowed, and is not sent");
-        else
-            config.headers.emplace_back(name, value);
+        if (equals == std::string::npos || !IsToken(name))
+            return "header " + std::to_string(number) + " has no name and '='";
+        const auto value = PercentDecoded(Trimmed(text.substr(equals + 1)));
+        if (!IsHeaderValue(value))
+            return "the value of header " + name + " has control characters";
+        if (IsReserved(name))
+            return "header " + name + " describes the body,";
+        config.headers.emplace_back(name, value);
+        return {};
     }
 
     void ReadTimeout(EndpointConfig& config) {

@@ -22,8 +22,8 @@ struct EndpointConfig {
     std::string clientCertificate;
 };
 
-/// What the environment asks for; nothing when events are to stay in the outbox: no endpoint is set, or
-/// OTEL_SDK_DISABLED is true. A variable that makes no sense is described in `complaints` and counts as unset, so
+/// What the environment asks for; nothing when events are to stay in the outbox: no endpoint is set,
+/// OTEL_SDK_DISABLED is true, or OTEL_LOGS_EXPORTER is none. What is set and has no effect is described, too. A variable that makes no sense is described in `complaints` and counts as unset, so
 /// that the common one of its pair holds; of a list of headers only the one that makes no sense is left out.
 /// `lookUp` returns the value of a variable, or null; empty counts as unset.
 using LookUp = std::function<const char*(const char*)>;

@@ -98,7 +98,10 @@ void HttpSender::ConfigureHeaders() {
     if (m_config.gzip)
         AddHeader("Content-Encoding: gzip");
     AddHeader("Expect:"); // no waiting for a "100 Continue" that many servers never send
-    AddHeader(std::string("User-Agent: MetrikSdk/") + SDK_VERSION);
+    if (std::none_of(m_config.headers.begin(), m_config.headers.end(), [](const auto& header) {
+            return ::strcasecmp(header.first.c_str(), "User-Agent") == 0;
+        }))
+        AddHeader(std::string("User-Agent: MetrikSdk/") + SDK_VERSION);
     for (const auto& [name, value] : m_config.headers) {
         std::string line = name;
         line += value.empty() ? ";" : ": " + value; // how the library writes an empty one

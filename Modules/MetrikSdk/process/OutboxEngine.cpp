@@ -50,7 +50,8 @@ void OutboxEngine::StartUploader(const otlp::EndpointConfig& endpoint) {
 }
 
 bool OutboxEngine::Open() {
-    if (!m_complaints.empty()) // one text: a second one would be kept back as a repetition of the first
+    if (!m_complaints.empty() && !m_complained.exchange(true))
+        // One text: a second one would be kept back as a repetition of the first.
         m_core->notifier.TellFailure({report::Cause::Configuration, Joined(m_complaints)});
     return m_core->outbox.Open();
 }

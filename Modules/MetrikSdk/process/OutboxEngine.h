@@ -1,5 +1,6 @@
 #pragma once
 
+#include <atomic>
 #include <memory>
 #include <optional>
 #include <string>
@@ -30,7 +31,8 @@ private:
     void StartUploader(const otlp::EndpointConfig& endpoint);
 
     std::shared_ptr<OutboxCore> m_core;
-    std::vector<std::string> m_complaints; ///< Constant after construction; the notifier knows what was told.
+    std::vector<std::string> m_complaints;        ///< Constant after construction.
+    std::atomic<bool> m_complained = false;       ///< They were told, to the first module.
     std::unique_ptr<upload::Uploader> m_uploader; ///< Null: events stay in the outbox.
 };
 

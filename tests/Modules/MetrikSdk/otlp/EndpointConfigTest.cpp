@@ -59,6 +59,44 @@ TEST_F(EndpointConfigTest, IsSwitchedOffInAnyLetterCase) {
         EXPECT_TRUE(Read({{"OTEL_EXPORTER_OTLP_ENDPOINT", "http://c"}, {"OTEL_SDK_DISABLED", word}})) << word;
 }
 
+TEST_F(EndpointConfigTest, IsSwitchedOffWhereNoLogsAreToBeExported) {
+    EXPECT_FALSE(Read({{"OTEL_EXPORTER_OTLP_ENDPOINT", "http://c"}, {"OTEL_LOGS_EXPORTER", "none"}}));
+    EXPECT_TRUE(Read({{"OTEL_EXPORTER_OTLP_ENDPOINT", "http://c"}, {"OTEL_LOGS_EXPORTER", "otlp"}}));
+    EXPECT_TRUE(m_complaints.empty());
+    EXPECT_TRUE(Read({{"OTEL_EXPORTER_OTLP_ENDPOINT", "http://c"}, {"OTEL_LOGS_EXPORTER", "console"}}));
+    EXPECT_EQ(m_complaints,
+              std::vector<std::string>{"OTEL_LOGS_EXPORTER: only otlp and none are known, and otlp is used"});
+}
+
+TEST_F(EndpointConfigTest, TellsWhatIsSetAndHasNoEffect) {
+    EXPECT_TRUE(Read({{"OTEL_EXPORTER_OTLP_ENDPOINT", "http://c"},
+                      {"OTEL_EXPORTER_OTLP_LOGS_PROTOCOL", "grpc"},
+                      {"OTEL_EXPORTER_OTLP_INSECURE", "true"},
+                      {"OTEL_BLRP_MAX_EXPORT_BATCH_SIZE", "10"},
+                      {"OTEL_SDK_DISABLED", "perhaps"}}));
+    EXPECT_EQ(m_complaints,
+              (std::vector<std::string>{
+                  "OTEL_SDK_DISABLED is neither true nor false and counts as unset",
+                  "OTEL_EXPORTER_OTLP_LOGS_PROTOCOL: only http/json is spoken, and is spoken all the same",
+                  "OTEL_EXPORTER_OTLP_INSECURE has no effect: the address says http or https",
+                  "OTEL_BLRP_MAX_EXPORT_BATCH_SIZE has no effect"}));
+    Read({{"OTEL_EXPORTER_OTLP_ENDPOINT", "http://c"}, {"OTEL_EXPORTER_OTLP_PROTOCOL", "http/json"}});
+    EXPECT_TRUE(m_complaints.empty());
+    Read({{"OTEL_EXPORTER_OTLP_PROTOCOL", "grpc"}});
+    EXPECT_TRUE(m_complaints.empty()) << "nothing is sent at all";
+}
+
+TEST_F(EndpointConfigTest, NamesTheHeaderThatIsIllFormed) {
+    Read({{"OTEL_EXPORTER_OTLP_ENDPOINT", "http://c"},
+          {"OTEL_EXPORTER_OTLP_HEADERS", "good=1,s3cr3t,api-key=s3cr3t%0d,content-type=x"}});
+    EXPECT_EQ(
+        m_complaints,
+        (std::vector<std::string>{
+            "OTEL_EXPORTER_OTLP_HEADERS: header 2 has no name and '=' and is not sent",
+            "OTEL_EXPORTER_OTLP_HEADERS: the value of header api-key has control characters and is not sent",
+            "OTEL_EXPORTER_OTLP_HEADERS: header content-type describes the body, and is not sent"}));
+}
+
 TEST_F(EndpointConfigTest, DecodesHeaders) {
     const auto config = Read({{"OTEL_EXPORTER_OTLP_ENDPOINT", "http://c"},
                               {"OTEL_EXPORTER_OTLP_HEADERS", "api-key=a%20b%2Cc , x = y=z,,empty="}});

@@ -85,6 +85,14 @@ TEST_F(MisbehavingCollectorTest, GetsWellFormedRequestsOverOneConnection) {
     EXPECT_EQ(Told::Failures().All().size(), 0U);
 }
 
+TEST_F(MisbehavingCollectorTest, GetsTheUserAgentOfTheConfiguration) {
+    ReportBeforehand(1);
+    Configure("HEADERS", "user-agent=Fleet%2F7");
+    StartAgainst({});
+    ExpectEverythingDelivered(1);
+    EXPECT_EQ(m_server->Requests().at(0).headers.at("user-agent"), "Fleet/7");
+}
+
 TEST_F(MisbehavingCollectorTest, GetsEveryEventOnceAndInOrder) {
     ReportBeforehand(1500);
     StartAgainst({});
