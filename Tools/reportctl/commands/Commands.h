@@ -23,9 +23,10 @@ Add AddStats; ///< `stats` counts reports.
 Add AddExport; ///< `export` writes the rows of the store as CSV or JSON Lines.
 Add AddBackup; ///< `backup` copies the databases.
 Add AddPrune;  ///< `prune` deletes old rows.
+Add AddPage;   ///< `page` writes a page to look at.
 
 /// In the order of the help.
 inline constexpr std::array ALL{&AddSetup, &AddRun,    &AddStatus, &AddMetrics, &AddSend,
-                                &AddStats, &AddExport, &AddBackup, &AddPrune};
+                                &AddStats, &AddExport, &AddBackup, &AddPrune,   &AddPage};
 
 } // namespace reportctl::commands

@@ -86,6 +86,17 @@ void CountRows(SQLite::Database& database, Grouping grouping, const ReportFilter
     });
 }
 
+QuarterHours CountByQuarterHour(SQLite::Database& database, const ReportFilter& filter) {
+    auto counts = SelectReports(database, KeyColumn(Grouping::Hour) + " as key, count(*)", filter,
+                                "and time is not null group by 1");
+    QuarterHours quarterHours;
+    InPieces(AllIds(database), IDS_AT_ONCE_TO_COUNT, [&](IdRange piece) {
+        for (BindPiece(counts, piece); counts.executeStep();)
+            quarterHours[counts.getColumn(0).getInt64()] += counts.getColumn(1).getInt64();
+    });
+    return quarterHours;
+}
+
 void CountEvents(SQLite::Database& database, Grouping grouping, const ReportFilter& filter, Zone zone,
                  Tally& tally) {
     SQLite::Statement counts(database, fmt::format("select {} as key, count(*) from ({}) where {} group by 1",

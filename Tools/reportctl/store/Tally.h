@@ -33,6 +33,12 @@ enum class Zone { Local, Utc };
 void CountRows(SQLite::Database& database, Grouping grouping, const ReportFilter& filter, Zone zone,
                Tally& tally);
 
+/// Rows by the number of their quarter-hour since 1970. A reader in any time zone can add them up to hours and days.
+using QuarterHours = std::map<std::int64_t, std::int64_t>;
+
+/// Counts the rows that have a time, in pieces.
+QuarterHours CountByQuarterHour(SQLite::Database& database, const ReportFilter& filter);
+
 /// Adds the events of an outbox: those that wait, and its dead letters. Their time is what the sender gave them, else when
 /// they were stored, as a collector is told it.
 void CountEvents(SQLite::Database& database, Grouping grouping, const ReportFilter& filter, Zone zone,

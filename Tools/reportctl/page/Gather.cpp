@@ -1,0 +1,92 @@
+#include "Tools/reportctl/page/Gather.h"
+
+#include <array>
+#include <utility>
+
+#include <SQLiteCpp/Exception.h>
+
+#include "Ledger/Reader.h"
+#include "Tools/reportctl/status/Status.h"
+#include "Tools/reportctl/store/Paths.h"
+#include "Tools/reportctl/store/Unchanged.h"
+
+namespace reportctl::page {
+namespace {
+
+using ReportLedger::Outcome;
+
+/// How far back the page shows hours and days, and how many events and modules.
+constexpr std::int64_t SHOWN_MS = 90LL * 24 * 3600 * 1000;
+constexpr std::size_t SHOWN_KEYS = 15;
+
+constexpr std::array<std::pair<Outcome, const char*>, 8> REASONS{{
+    {Outcome::NotJson, "notJson"},
+    {Outcome::Store, "store"},
+    {Outcome::NoStore, "noStore"},
+    {Outcome::ModuleNotInit, "moduleNotInit"},
+    {Outcome::EventIdWithoutBar, "eventIdWithoutBar"},
+    {Outcome::ValueNotJson, "valueNotJson"},
+    {Outcome::Analytics, "analytics"},
+    {Outcome::Exception, "exception"},
+}};
+
+/// What each reason grew by from one mark of the ledger to the next.
+std::vector<RefusedAt> RefusedByMark(const ReportLedger::Look& look) {
+    std::vector<RefusedAt> refused;
+    for (std::size_t i = 1; i < look.marks.size(); ++i) {
+        RefusedAt at{look.marks[i].atMs, {}};
+        for (const auto& [reason, name] : REASONS) {
+            const auto place = static_cast<unsigned>(reason);
+            at.byReason.emplace_back(name, look.marks[i].counts[place] - look.marks[i - 1].counts[place]);
+        }
+        refused.push_back(std::move(at));
+    }
+    return refused;
+}
+
+/// The tallies of a database that can be read; one that cannot be is told by the status.
+template <typename Count>
+void CountIn(const std::string& path, const Count& count) {
+    try {
+        auto database = store::OpenUnchanged(path);
+        count(database);
+    } catch (const std::exception&) { // the page shows what there is
+    }
+}
+
+void CountStore(PageData& data, store::Tally& events, store::Tally& modules) {
+    CountIn(store::StorePath(), [&](SQLite::Database& database) {
+        const store::ReportFilter recent{
+            .sinceMs = data.generatedAtMs - SHOWN_MS, .untilMs = {}, .eventPrefix = {}};
+        data.quarterHours = store::CountByQuarterHour(database, recent);
+        store::CountRows(database, store::Grouping::Event, {}, store::Zone::Utc, events);
+        store::CountRows(database, store::Grouping::Module, {}, store::Zone::Utc, modules);
+    });
+    for (const auto& [event, count] : events)
+        data.rowsBefore += count;
+    for (const auto& [quarterHour, count] : data.quarterHours)
+        data.rowsBefore -= count;
+}
+
+} // namespace
+
+PageData Gather(int reloadSeconds) {
+    const auto status = status::Gather();
+    PageData data;
+    data.generatedAtMs = status.atMs;
+    data.reloadSeconds = reloadSeconds;
+    data.statusJson = status::JsonOf(status, status::Judge(status));
+    data.refused = RefusedByMark(status.ledger);
+    store::Tally events;
+    store::Tally modules;
+    CountStore(data, events, modules);
+    CountIn(store::OutboxPath(), [&](SQLite::Database& outbox) {
+        store::CountEvents(outbox, store::Grouping::Event, {}, store::Zone::Utc, events);
+        store::CountEvents(outbox, store::Grouping::Module, {}, store::Zone::Utc, modules);
+    });
+    data.events = store::Ranked(events, store::Grouping::Event, SHOWN_KEYS);
+    data.modules = store::Ranked(modules, store::Grouping::Module, SHOWN_KEYS);
+    return data;
+}
+
+} // namespace reportctl::page

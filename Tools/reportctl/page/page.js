@@ -1,0 +1,279 @@
+// Fills the page of `reportctl page` from the data that the program has put into it. Every text of the data was written by
+// another program: it goes into the page as text (textContent), never as markup.
+"use strict";
+
+const data = JSON.parse(document.getElementById("data").textContent);
+const status = data.status;
+const zone = Intl.DateTimeFormat().resolvedOptions().timeZone;
+const number = new Intl.NumberFormat();
+const QUARTER_HOUR_MS = 15 * 60 * 1000;
+
+const byId = (id) => document.getElementById(id);
+const size = (bytes) => {
+    const units = ["bytes", "KiB", "MiB", "GiB"];
+    let unit = 0;
+    for (; bytes >= 1024 && unit < units.length - 1; ++unit)
+        bytes /= 1024;
+    return `${number.format(Math.round(bytes * 10) / 10)} ${units[unit]}`;
+};
+const orDash = (value) => (value === null || value === undefined ? "–" : String(value));
+const colour = (name) => getComputedStyle(document.documentElement).getPropertyValue(name).trim();
+
+function time(value) {
+    if (value === null || value === undefined)
+        return "–";
+    return new Date(value).toLocaleString(undefined, { dateStyle: "medium", timeStyle: "medium" });
+}
+
+function element(name, text, className) {
+    const made = document.createElement(name);
+    if (text !== undefined)
+        made.textContent = text;
+    if (className)
+        made.className = className;
+    return made;
+}
+
+/** A table with a caption. Columns of numbers are the ones whose cells are numbers. */
+function table(caption, headings, rows) {
+    const made = element("table");
+    made.append(element("caption", caption));
+    const head = element("tr");
+    const isNumber = headings.map((_, column) => rows.length > 0 && rows.every((row) => typeof row[column] === "number"));
+    headings.forEach((heading, column) => {
+        const cell = element("th", heading, isNumber[column] ? "number" : "");
+        cell.scope = "col";
+        head.append(cell);
+    });
+    made.append(element("thead"), element("tbody"));
+    made.tHead.append(head);
+    for (const row of rows) {
+        const line = element("tr");
+        row.forEach((cell, column) =>
+            line.append(element("td", typeof cell === "number" ? number.format(cell) : orDash(cell),
+                isNumber[column] ? "number" : "")));
+        made.tBodies[0].append(line);
+    }
+    return made;
+}
+
+/** The numbers of a chart, for those who cannot see it or want them. */
+function numbers(section, caption, headings, rows) {
+    const details = element("details");
+    details.append(element("summary", "The numbers"));
+    const scroll = element("div", undefined, "scroll");
+    scroll.append(table(caption, headings, rows));
+    details.append(scroll);
+    byId(section).append(details);
+}
+
+const charts = [];
+const MOST_LETTERS = 24;
+const short = (text) => (text.length > MOST_LETTERS ? text.slice(0, MOST_LETTERS - 1) + "…" : text);
+
+/** Draws a chart into the section's canvas; without anything to draw, says so. */
+function chart(section, type, labels, datasets, options) {
+    const holder = byId(section).querySelector(".chart");
+    if (labels.length === 0) {
+        holder.replaceWith(element("p", "Nothing yet.", "quiet"));
+        return;
+    }
+    charts.push(new Chart(holder.querySelector("canvas"), {
+        type,
+        data: { labels, datasets },
+        options: Object.assign({ responsive: true, maintainAspectRatio: false, animation: false }, options),
+    }));
+}
+
+function applyColours() {
+    Chart.defaults.color = colour("--ink");
+    Chart.defaults.borderColor = colour("--line");
+}
+
+function bars(label, values, name) {
+    return { label, data: values, backgroundColor: colour(name || "--accent"), maxBarThickness: 36 };
+}
+
+const WHOLE_NUMBERS = { ticks: { precision: 0 }, beginAtZero: true };
+
+function showVerdict() {
+    const verdict = byId("verdict");
+    verdict.classList.add(status.verdict);
+    verdict.querySelector("strong").textContent = status.verdict;
+    const reasons = verdict.querySelector("ul");
+    for (const reason of status.reasons)
+        reasons.append(element("li", reason));
+    if (status.reasons.length === 0)
+        reasons.append(element("li", "Nothing to do."));
+    const service = status.service;
+    byId("service").append(table("What it says of itself", ["", ""], [
+        ["running", service.running ? `yes, process ${service.pid}` : "no"],
+        ["since", time(service.startedAt)],
+        ["version", orDash(service.version)],
+        ["listening", service.listening ? "yes" : "no"],
+        ["log plug-in", service.plugins.logger ? "there" : "missing"],
+        ["store plug-in", service.plugins.store ? "there" : "missing"],
+        ["analytics plug-in", service.plugins.sdk ? "there" : "missing"],
+        ["last report", time(status.ledger && status.ledger.lastReceivedAt)],
+        ["free disk", status.disk.freeBytes === null ? "–" : size(status.disk.freeBytes)],
+    ]));
+}
+
+const OUTCOMES = [
+    ["stored", "in the store"],
+    ["toAnalytics", "to analytics"],
+    ["control", "control messages"],
+    ["otherControl", "other control messages"],
+    ["empty", "empty datagrams"],
+    ["waiting", "waiting now"],
+    ["lostAtEnds", "lost when a process ended"],
+    ["droppedByKernel", "dropped by the system before the service saw them"],
+];
+
+const REASONS = {
+    notJson: "refused: no JSON",
+    store: "refused: by the store",
+    noStore: "refused: no store",
+    moduleNotInit: "refused: module did not announce itself",
+    eventIdWithoutBar: "refused: event id without a bar",
+    valueNotJson: "refused: value is no JSON",
+    analytics: "refused: by analytics",
+    exception: "refused: an exception",
+};
+
+function showFlow() {
+    if (!status.ledger) {
+        byId("flow").append(element("p", "There is no ledger: the service has not counted yet.", "quiet"));
+        return;
+    }
+    const total = status.ledger.total;
+    const steps = [["received", total.received]];
+    for (const [key, text] of OUTCOMES)
+        steps.push([text, total[key]]);
+    for (const [key, text] of Object.entries(REASONS))
+        steps.push([text, total.refused[key]]);
+    const most = Math.max(1, ...steps.map((step) => step[1]));
+    const list = element("ol", undefined, "flow");
+    steps.forEach(([text, count], index) => {
+        if (index > 0 && count === 0)
+            return;
+        const item = element("li");
+        const meter = element("meter");
+        meter.max = most;
+        meter.value = count;
+        meter.setAttribute("aria-label", `${text}: ${count}`);
+        item.append(element("span", index === 0 ? text : `→ ${text}`), meter, element("span", number.format(count), "number"));
+        list.append(item);
+    });
+    byId("flow").append(list);
+    byId("flow").append(element("p", status.ledger.balanced ? "Every report is accounted for."
+        : "The numbers do not add up: see `reportctl status`.", "quiet"));
+    numbers("flow", "The ledger since it was begun", ["what", "reports"], steps);
+}
+
+/** Adds the counts of quarter-hours up to whole hours or days of the viewer's zone. */
+function collect(quarterHours, keyOf) {
+    const sums = new Map();
+    for (const [quarterHour, count] of quarterHours) {
+        const key = keyOf(new Date(quarterHour * QUARTER_HOUR_MS));
+        sums.set(key, (sums.get(key) || 0) + count);
+    }
+    return [...sums.entries()];
+}
+
+function showTimes() {
+    const day = (date) => date.toLocaleDateString();
+    const hour = (date) => `${date.toLocaleDateString()} ${String(date.getHours()).padStart(2, "0")}:00`;
+    const days = collect(data.quarterHours, day);
+    const since = data.generatedAt - 48 * 3600 * 1000;
+    const hours = collect(data.quarterHours.filter(([quarterHour]) => quarterHour * QUARTER_HOUR_MS >= since), hour);
+    const scales = { scales: { y: WHOLE_NUMBERS }, plugins: { legend: { display: false } } };
+    chart("hours", "bar", hours.map((entry) => entry[0]), [bars("reports", hours.map((entry) => entry[1]))], scales);
+    numbers("hours", `Reports by hour, ${zone}`, ["hour", "reports"], hours);
+    chart("days", "bar", days.map((entry) => entry[0]), [bars("reports", days.map((entry) => entry[1]))], scales);
+    numbers("days", `Reports by day, ${zone}`, ["day", "reports"], days);
+    let sum = data.rowsBefore;
+    const growth = days.map(([key, count]) => [key, (sum += count)]);
+    chart("growth", "line", growth.map((entry) => entry[0]), [{
+        label: "rows", data: growth.map((entry) => entry[1]), borderColor: colour("--accent"), pointRadius: 2,
+    }], { scales: { y: { ticks: { precision: 0 } } }, plugins: { legend: { display: false } } });
+    numbers("growth", "Rows of the store at the end of each day, by the time of the report", ["day", "rows"], growth);
+}
+
+function showTop(section, counts, noKey) {
+    const rows = counts.map(({ key, count }) => [key === null ? noKey : key, count]);
+    const horizontal = { indexAxis: "y", scales: { x: WHOLE_NUMBERS }, plugins: { legend: { display: false } } };
+    chart(section, "bar", rows.map((row) => short(row[0])), [bars("reports", rows.map((row) => row[1]))], horizontal);
+    numbers(section, "The most frequent first", ["which", "reports"], rows);
+}
+
+const REASON_COLOURS = ["#d55e00", "#0072b2", "#009e73", "#cc79a7", "#e69f00", "#56b4e9", "#999999", "#6a3d9a"];
+
+function showRefused() {
+    const labels = data.refused.map((mark) => new Date(mark.at).toLocaleTimeString());
+    const reasons = Object.keys(REASONS);
+    chart("refused", "bar", labels, reasons.map((reason, index) => ({
+        label: REASONS[reason].replace("refused: ", ""),
+        data: data.refused.map((mark) => mark[reason]),
+        backgroundColor: REASON_COLOURS[index],
+        stack: "refused",
+    })), { scales: { x: { stacked: true }, y: Object.assign({ stacked: true }, WHOLE_NUMBERS) } });
+    numbers("refused", `Refused in the ten seconds before each time, ${zone}`, ["time", ...reasons],
+        data.refused.map((mark) => [new Date(mark.at).toLocaleTimeString(), ...reasons.map((reason) => mark[reason])]));
+}
+
+function showOutbox() {
+    const outbox = status.outbox;
+    const modules = outbox.present ? outbox.modules : [];
+    chart("outbox", "bar", modules.map((module) => short(module.id)), [bars("waiting", modules.map((module) => module.waiting))],
+        { indexAxis: "y", scales: { x: WHOLE_NUMBERS }, plugins: { legend: { display: false } } });
+    byId("outbox").append(table("The outbox as a whole", ["", ""], [
+        ["collector", outbox.endpoint === null ? "none configured: events stay here" : outbox.endpoint],
+        ["waiting", outbox.waiting], ["waiting, size", outbox.present ? size(outbox.waitingBytes) : "–"],
+        ["delivered", outbox.delivered], ["refused by the collector", outbox.refused],
+        ["dead letters", outbox.deadLetters], ["dropped", outbox.dropped], ["last failure", outbox.lastFailure],
+    ].map(([what, value]) => [what, typeof value === "number" ? number.format(value) : orDash(value)])));
+    numbers("outbox", "By module", ["module", "waiting", "last sequence"],
+        modules.map((module) => [module.id, module.waiting, module.lastSequence]));
+}
+
+function showLog() {
+    const holder = element("div", undefined, "scroll");
+    const rows = status.log.last.map((line) => [time(line.time), line.level, line.site, line.text]);
+    holder.append(rows.length === 0 ? element("p", "No warnings and no errors.", "quiet")
+        : table(`Warnings and errors of the log, ${zone}`, ["time", "level", "from", "text"], rows));
+    byId("log").append(holder);
+}
+
+function keepFresh() {
+    if (!data.reloadSeconds)
+        return;
+    let timer = 0;
+    const button = byId("pause");
+    const start = () => { timer = setTimeout(() => location.reload(), data.reloadSeconds * 1000); };
+    button.hidden = false;
+    button.addEventListener("click", () => {
+        const isPaused = button.getAttribute("aria-pressed") === "true";
+        button.setAttribute("aria-pressed", String(!isPaused));
+        button.textContent = isPaused ? "Stop reloading" : "Go on reloading";
+        if (isPaused)
+            start();
+        else
+            clearTimeout(timer);
+    });
+    start();
+}
+
+byId("generated").textContent = `As of ${time(data.generatedAt)}. Times are those of ${zone}.`;
+applyColours();
+showVerdict();
+showFlow();
+showTimes();
+showTop("events", data.events, "–");
+showTop("modules", data.modules, "(no bar in the event id)");
+showRefused();
+showOutbox();
+showLog();
+keepFresh();
+matchMedia("(prefers-color-scheme: dark)").addEventListener("change", () => location.reload());
+document.documentElement.dataset.ready = "yes";
