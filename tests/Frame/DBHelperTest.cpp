@@ -108,6 +108,29 @@ TEST_F(DBHelperTest, PercentSignsOfErrorAndStatementAreLoggedAsTheyAre) {
     EXPECT_THAT(FakeLogger().Records(), ElementsAre(Error("ExecSql", "near \"%d\"-select '%s'")));
 }
 
+TEST_F(DBHelperTest, AFailureThatIsTooLongForTheLogIsFalseAndMarked) {
+    m_db.answer = false;
+    const std::string statement(1024 * 1024, 'x');
+    EXPECT_FALSE(m_helper.ExecSql(statement));
+    EXPECT_THAT(
+        FakeLogger().Records(),
+        ElementsAre(Error("ExecSql", "[BoostLogError]the text would have 1048591 bytes, more than the "
+                                     "1048576 of a log record")));
+}
+
+TEST_F(DBHelperTest, AFailureThatTheLoggerDoesNotTakeIsFalseAllTheSame) {
+    m_db.answer = false;
+    FakeLogger().throws = Throws::Std;
+    Rows rows;
+    int count = 0;
+    EXPECT_FALSE(m_helper.CreateTable("a"));
+    EXPECT_FALSE(m_helper.ExecSql("a"));
+    EXPECT_FALSE(m_helper.QuerySql("a", rows));
+    EXPECT_FALSE(m_helper.GetTotalCount("a", count));
+    EXPECT_FALSE(m_helper.BatExecSql({"a"}));
+    EXPECT_EQ(m_db.calls.size(), 8U) << "each was tried, the batch three times";
+}
+
 TEST_F(DBHelperTest, AQueryIsTrueWhenARowCameBack) {
     m_db.rows = {{"OpenID", "u1"}, {"HubLinkVersion", "5.1.0.2"}};
     Rows rows = {{"left", "over"}};

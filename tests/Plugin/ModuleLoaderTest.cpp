@@ -127,6 +127,18 @@ TEST(ModuleLoader, APluginsOwnExceptionCanBeReadByWhoCatchesIt) {
     }
 }
 
+TEST(ModuleLoader, HasNothingToLoadOrUnloadOnceThePluginsFactoryHasThrown) {
+    const TemporaryDirectory directory;
+    const std::string path = directory.Path() + "/libLate.dylib";
+    Loader loader(path);
+    std::filesystem::copy_file(PathOf("libModuleThrows.dylib"), path);
+    EXPECT_THROW(loader.Load(), std::exception);
+    EXPECT_FALSE(loader.Load());
+    EXPECT_EQ(loader.GetLastError(), "Dll loader is null when loading:" + path);
+    EXPECT_EQ(loader.GetModule(), nullptr);
+    EXPECT_FALSE(loader.Unload());
+}
+
 TEST(ModuleLoader, LoadingTwiceMakesOneObject) {
     Loader loader(PathOf(MODULE));
     IFakeModule* const first = loader.GetModule();
