@@ -70,7 +70,7 @@ ReportRow RowOf(SQLite::Statement& row) {
 
 /// Writes the rows and returns how many they were.
 std::int64_t WriteRows(const ExportOptions& options, terminal::Result& output) {
-    auto database = store::OpenStoreToLook(store::StorePath());
+    auto database = store::OpenToRead(store::StorePath());
     auto ids = store::AllIds(database);
     if (options.afterId >= ids.first)
         ids.first = std::min(options.afterId, ids.end - 1) + 1;

@@ -75,11 +75,11 @@ Stats CountReports(const StatsOptions& options) {
     const auto filter = options.filter.Read();
     const auto zone = options.isUtc ? store::Zone::Utc : store::Zone::Local;
     store::Tally tally;
-    auto database = store::OpenStoreToLook(store::StorePath());
+    auto database = store::OpenToRead(store::StorePath());
     store::CountRows(database, grouping, filter, zone, tally);
     const auto rows = Sum(tally);
     if (std::filesystem::exists(store::OutboxPath())) {
-        auto outbox = store::OpenStoreToLook(store::OutboxPath());
+        auto outbox = store::OpenToRead(store::OutboxPath());
         store::CountEvents(outbox, grouping, filter, zone, tally);
     }
     return {store::Ranked(tally, grouping, options.top),

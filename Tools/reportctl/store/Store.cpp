@@ -12,12 +12,15 @@
 #include <SQLiteCpp/Exception.h>
 #include <fmt/format.h>
 #include <sqlite3.h>
+#include <sys/stat.h>
+#include <unistd.h>
 
 #include "Modules/Sqlite/ErrorKind.h"
 #include "Modules/Sqlite/SideFiles.h"
 #include "SystemTool/Errno.h"
 #include "SystemTool/IO/Descriptor.h"
 #include "Tools/reportctl/store/Schema.h"
+#include "Tools/reportctl/store/Unchanged.h"
 
 namespace reportctl::store {
 namespace {
@@ -196,6 +199,12 @@ SQLite::Database OpenStoreToLook(const std::string& path) {
     if (hasRows)
         sqlite3_db_config(database.getHandle(), SQLITE_DBCONFIG_NO_CKPT_ON_CLOSE, 1, nullptr);
     return database;
+}
+
+SQLite::Database OpenToRead(const std::string& path) {
+    struct stat file {};
+    const bool isOwner = ::stat(path.c_str(), &file) != 0 || file.st_uid == ::geteuid();
+    return isOwner ? OpenStoreToLook(path) : OpenUnchanged(path);
 }
 
 bool EnsureStore(terminal::Worklog& log, const std::string& path, bool compact) {

@@ -29,4 +29,8 @@ SQLite::Database OpenStore(const std::string& path);
 /// Otherwise the last one to close the store merges them into Report.db, and that would be a change.
 SQLite::Database OpenStoreToLook(const std::string& path);
 
+/// For commands that read much. The owner reads with SQLite's own locks, so that a long read is sound beside any writer. Another
+/// user, an administrator, reads as OpenUnchanged does, and leaves no file that the owner could not use.
+SQLite::Database OpenToRead(const std::string& path);
+
 } // namespace reportctl::store

@@ -1,5 +1,7 @@
 #include <algorithm>
 
+#include <unistd.h>
+
 #include "tests/Tools/reportctl/support/RowsFixture.h"
 
 namespace {
@@ -102,6 +104,19 @@ TEST_F(Export, SaysThatTheStoreIsMissing) {
     EXPECT_EQ(outcome.exitCode, 1);
     EXPECT_TRUE(outcome.Says("error: " + Store() + " is missing. `reportctl setup` makes it."))
         << outcome.output;
+}
+
+TEST_F(Export, LeavesNoFileOfAnAdministratorWhoReads) {
+    if (::geteuid() != 0)
+        GTEST_SKIP() << "only root can be another user";
+    InsertMany(3);
+    constexpr uid_t OWNER = 12345;
+    for (const auto& entry : std::filesystem::recursive_directory_iterator(Data()))
+        ASSERT_EQ(::chown(entry.path().c_str(), OWNER, OWNER), 0);
+    const auto before = Everything();
+    EXPECT_EQ(Reportctl("export").exitCode, 0);
+    EXPECT_EQ(Reportctl("stats").exitCode, 0);
+    EXPECT_EQ(Everything(), before);
 }
 
 TEST_F(Export, SaysThatTheOutputIsFull) {
