@@ -24,16 +24,16 @@ void CapKeeper::Recount(OutboxStore& store) {
 }
 
 void CapKeeper::KeepWithinCaps(OutboxStore& store, SteadyTime now, std::vector<report::News>& news) {
+    TellIfOver(now, news);
     const auto excess = PruneRule::ExcessBytes(m_waitingBytes, m_caps);
     if (excess == 0 && now < m_nextAgeCheck)
         return;
     const auto maxRows = m_caps.maxDropsAtOnce;
     const auto dropped = store.DropOldest(m_underWayUpTo, OldestAllowed(now), excess, maxRows);
     Recount(store);
-    if (dropped < maxRows) // else more may be due: the next event goes on
+    if (dropped.events < maxRows) // else more may be due: the next event goes on
         m_nextAgeCheck = now + m_caps.ageCheckInterval;
-    if (dropped > 0)
-        TellDrop(dropped, now, news);
+    CountDrops(dropped, now, news);
 }
 
 WallTime CapKeeper::OldestAllowed(SteadyTime now) {
@@ -45,12 +45,25 @@ WallTime CapKeeper::OldestAllowed(SteadyTime now) {
     return PruneRule::OldestAllowed(wall, m_clocks.openedAt, elapsed, m_caps);
 }
 
-void CapKeeper::TellDrop(std::size_t dropped, SteadyTime now, std::vector<report::News>& news) {
-    if (PruneRule::BeginsRun(m_lastDrop, now, m_caps))
-        news.push_back({report::Cause::Drop,
-                        "The outbox is over its bounds: the oldest events are being dropped, " +
-                            std::to_string(dropped) + " of them just now; the outbox counts the others"});
-    m_lastDrop = now;
+void CapKeeper::CountDrops(const OutboxStore::Dropped& dropped, SteadyTime now,
+                           std::vector<report::News>& news) {
+    bool begins = false;
+    for (const auto& [module, count] : dropped.modules)
+        begins = m_drops.Add(module, count, now, WallNow()) || begins;
+    if (begins)
+        news.push_back({report::Cause::Drop, "The outbox is over its bounds: old events are being dropped, " +
+                                                 std::to_string(dropped.events) +
+                                                 " of them just now; the total is told when that is over"});
+}
+
+void CapKeeper::TellEndOfRun(const std::optional<std::string>& totals, std::vector<report::News>& news) {
+    if (totals)
+        news.push_back({report::Cause::Drop, "No events are dropped any more; lost are " + *totals,
+                        report::News::Kind::End});
+}
+
+void CapKeeper::EndRun(std::vector<report::News>& news) {
+    TellEndOfRun(m_drops.Take(), news);
 }
 
 void CapKeeper::KeepDeadLettersWithinCaps(OutboxStore& store, std::vector<report::News>& news) const {

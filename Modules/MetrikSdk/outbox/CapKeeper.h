@@ -8,6 +8,7 @@
 #include "Modules/MetrikSdk/outbox/CountWaiter.h"
 #include "Modules/MetrikSdk/outbox/OutboxStore.h"
 #include "Modules/MetrikSdk/outbox/PruneRule.h"
+#include "Modules/MetrikSdk/report/LossRun.h"
 #include "Modules/MetrikSdk/report/News.h"
 
 namespace MetrikSdk::outbox {
@@ -19,7 +20,8 @@ namespace MetrikSdk::outbox {
 class CapKeeper {
 public:
     /// `waiting` is told how many events wait. It outlives this object.
-    CapKeeper(const CapSettings& caps, CountWaiter& waiting) : m_caps(caps), m_waiting(waiting) {}
+    CapKeeper(const CapSettings& caps, CountWaiter& waiting)
+        : m_caps(caps), m_waiting(waiting), m_drops(caps.dropRunEnds) {}
 
     /// Another file is open now: what was known of the one before is no longer true.
     void FileOpened(OutboxStore& store, SteadyTime now);
@@ -34,7 +36,15 @@ public:
     /// what is to be told.
     void KeepWithinCaps(OutboxStore& store, SteadyTime now, std::vector<report::News>& news);
 
-    /// The same for the events that were refused for good.
+    /// Tells the totals of a run of drops that is over.
+    void TellIfOver(SteadyTime now, std::vector<report::News>& news) {
+        TellEndOfRun(m_drops.TakeEnded(now), news);
+    }
+
+    /// Tells the totals of a run of drops now, because nothing can be told later.
+    void EndRun(std::vector<report::News>& news);
+
+    /// Drops the oldest of the events that were refused for good.
     void KeepDeadLettersWithinCaps(OutboxStore& store, std::vector<report::News>& news) const;
 
     /// Events up to this row are under way to the collector, and are not dropped; 0: none.
@@ -49,7 +59,8 @@ private:
     };
 
     WallTime OldestAllowed(SteadyTime now);
-    void TellDrop(std::size_t dropped, SteadyTime now, std::vector<report::News>& news);
+    void CountDrops(const OutboxStore::Dropped& dropped, SteadyTime now, std::vector<report::News>& news);
+    static void TellEndOfRun(const std::optional<std::string>& totals, std::vector<report::News>& news);
 
     const CapSettings m_caps;
     CountWaiter& m_waiting;
@@ -58,7 +69,7 @@ private:
     std::int64_t m_underWayUpTo = 0;
     Clocks m_clocks;
     SteadyTime m_nextAgeCheck{};
-    std::optional<SteadyTime> m_lastDrop;
+    report::LossRun m_drops;
 };
 
 } // namespace MetrikSdk::outbox

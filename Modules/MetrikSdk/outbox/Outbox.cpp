@@ -9,7 +9,7 @@ namespace MetrikSdk::outbox {
 
 Outbox::Outbox(const std::string& directory, const OutboxSettings& settings, report::Notifier& notifier)
     : m_settings(settings), m_notifier(notifier), m_file(directory, settings.file),
-      m_caps(settings.caps, m_waitingCount) {}
+      m_caps(settings.caps, m_waitingCount), m_deadLetters(settings.caps.dropRunEnds) {}
 
 /// Runs `operation` on the open store, a second time on a new or reopened file when the first one turns out
 /// to be unusable.
@@ -110,7 +110,9 @@ Batch Outbox::TakeOne(const EventKey& key) {
 }
 
 Batch Outbox::Take(std::size_t maxEvents, const EventKeys& without) {
-    return WithStore(Caller::Uploader, [&](OutboxStore& store, Call&) {
+    return WithStore(Caller::Uploader, [&](OutboxStore& store, Call& call) {
+        m_caps.TellIfOver(call.now, call.news);
+        TellDeadLetters(m_deadLetters.TakeEnded(call.now), call.news);
         auto batch = store.Oldest(maxEvents, m_settings.batch.maxBytes, without);
         if (batch.events.empty())
             m_caps.Recount(store);
@@ -134,7 +136,9 @@ void Outbox::RemoveDelivered(const Batch& batch, std::size_t refused) {
 
 void Outbox::MoveToDeadLetters(const StoredEvent& event, const Refusal& refusal) {
     WithStore(Caller::Uploader, [&](OutboxStore& store, Call& call) {
-        store.MoveToDeadLetters(event, refusal, WallNow());
+        const auto module = store.MoveToDeadLetters(event, refusal, WallNow());
+        if (!module.empty())
+            m_deadLetters.Add(module, 1, call.now, WallNow());
         try {
             m_caps.KeepDeadLettersWithinCaps(store, call.news);
         } catch (const StoreError& error) { // the event itself was moved, which is what is to be told next
@@ -142,6 +146,24 @@ void Outbox::MoveToDeadLetters(const StoredEvent& event, const Refusal& refusal)
         }
         m_caps.Recount(store);
     });
+}
+
+void Outbox::TellDeadLetters(const std::optional<std::string>& totals, std::vector<report::News>& news) {
+    if (totals)
+        news.push_back(
+            {report::Cause::Refusal, "Moved to the dead letters were " + *totals, report::News::Kind::End});
+}
+
+void Outbox::EndRuns() {
+    std::vector<report::News> news;
+    {
+        const std::unique_lock lock(m_mutex, std::try_to_lock);
+        if (!lock)
+            return;
+        m_caps.EndRun(news);
+        TellDeadLetters(m_deadLetters.Take(), news);
+    }
+    m_notifier.TellFailures(news);
 }
 
 OutboxStatus Outbox::Status() {

@@ -45,6 +45,10 @@ public:
     void RemoveDelivered(const Batch& batch, std::size_t refused);
     void MoveToDeadLetters(const StoredEvent& event, const Refusal& refusal);
 
+    /// Tells the totals of what is being lost, because a listener is about to go. Not if another thread hangs in the file
+    /// system with the lock: going must not wait for it.
+    void EndRuns();
+
     OutboxStatus Status();
 
     /// How many events wait, as far as this process knows: it learns within a minute what another process does to the
@@ -68,6 +72,7 @@ private:
     auto AttemptTwice(Call& call, Operation operation);
 
     void StoreEvent(OutboxStore& store, const ModuleIdentity& module, const NewEvent& event, Call& call);
+    static void TellDeadLetters(const std::optional<std::string>& totals, std::vector<report::News>& news);
     void TellEndOfFailures(Call& call);
     void LearnAbout(OutboxStore& store, SteadyTime now);
 
@@ -84,6 +89,7 @@ private:
     LiveFile m_file;
     unsigned m_knownGeneration = 0; ///< Of m_file, that m_caps knows.
     CapKeeper m_caps;
+    report::LossRun m_deadLetters;
 };
 
 } // namespace MetrikSdk::outbox

@@ -14,7 +14,8 @@ CREATE TABLE module(
     module_id     TEXT    NOT NULL UNIQUE,
     last_sequence INTEGER NOT NULL DEFAULT 0,
     stored_bytes  INTEGER NOT NULL DEFAULT 0,
-    last_event    INTEGER NOT NULL DEFAULT 0);
+    last_event    INTEGER NOT NULL DEFAULT 0,
+    removed_bytes INTEGER NOT NULL DEFAULT 0);
 CREATE TABLE module_release(
     id      INTEGER PRIMARY KEY,
     module  INTEGER NOT NULL REFERENCES module(id),
@@ -63,6 +64,11 @@ CREATE TABLE totals(
 constexpr const char* MIGRATION = R"sql(
 ALTER TABLE module ADD COLUMN last_event INTEGER NOT NULL DEFAULT 0;
 UPDATE module SET last_event = (SELECT coalesce(max(id), 0) FROM event);
+ALTER TABLE module ADD COLUMN removed_bytes INTEGER NOT NULL DEFAULT 0;
+UPDATE module SET removed_bytes = stored_bytes;
+UPDATE module SET removed_bytes = stored_bytes - waiting.bytes
+    FROM (SELECT module, sum(bytes) AS bytes FROM event GROUP BY module) AS waiting
+    WHERE waiting.module = module.id;
 ALTER TABLE totals ADD COLUMN forgotten_stored INTEGER NOT NULL DEFAULT 0;
 ALTER TABLE totals ADD COLUMN forgotten_bytes INTEGER NOT NULL DEFAULT 0;
 DROP TRIGGER event_stored;
@@ -80,6 +86,9 @@ CREATE TRIGGER event_stored AFTER INSERT ON event BEGIN
     UPDATE module SET last_sequence = NEW.sequence, stored_bytes = stored_bytes + NEW.bytes,
                       last_event = NEW.id
         WHERE id = NEW.module;
+END;
+CREATE TRIGGER event_removed AFTER DELETE ON event BEGIN
+    UPDATE module SET removed_bytes = removed_bytes + OLD.bytes WHERE id = OLD.module;
 END;
 CREATE VIEW outbox_status AS
     SELECT outbox_id, stored, delivered, refused, dead_lettered, dropped,

@@ -292,9 +292,10 @@ void OutboxStore::RemoveDelivered(const Batch& batch, std::size_t refused) {
     });
 }
 
-void OutboxStore::MoveToDeadLetters(const StoredEvent& event, const Refusal& refusal, WallTime now) {
-    Guarded("Cannot move an event to the dead letters", [&] {
+std::string OutboxStore::MoveToDeadLetters(const StoredEvent& event, const Refusal& refusal, WallTime now) {
+    return Guarded("Cannot move an event to the dead letters", [&] {
         auto transaction = WriteTransaction(m_database);
+        std::string module;
         SQLite::Statement copy(
             m_database,
             "INSERT INTO dead_letter(uuid, module, release, sequence, event_id, payload, stored_ms, bytes, "
@@ -313,9 +314,11 @@ void OutboxStore::MoveToDeadLetters(const StoredEvent& event, const Refusal& ref
                                                "dead_letter_bytes = dead_letter_bytes + ?1");
             held.bind(1, bytes);
             held.exec();
+            module = IdentityOf(event.release).id;
             ForgetIdleModules();
         }
         transaction.commit();
+        return module;
     });
 }
 
@@ -347,34 +350,74 @@ std::size_t OutboxStore::TrimDeadLetters(std::size_t maxRows, std::size_t maxByt
     });
 }
 
-std::size_t OutboxStore::DropOldest(std::int64_t afterRow, WallTime before, std::int64_t excessBytes,
-                                    std::size_t maxRows) {
+/// Deletes the oldest events behind `afterRow`, of one module or (0) of all, as long as `goesOn` says so for the next one.
+template <typename GoesOn>
+void OutboxStore::DropWhile(std::int64_t afterRow, std::int64_t module, std::size_t maxRows, Removed& removed,
+                            Dropped& dropped, GoesOn goesOn) {
+    SQLite::Statement candidates(m_database, "SELECT e.id, e.uuid, e.stored_ms, e.bytes, m.module_id "
+                                             "FROM event AS e CROSS JOIN module AS m ON m.id = e.module "
+                                             "WHERE e.id > ?1 AND (?3 = 0 OR e.module = ?3) "
+                                             "ORDER BY e.id LIMIT ?2");
+    candidates.bind(1, afterRow);
+    candidates.bind(2, static_cast<std::int64_t>(maxRows));
+    candidates.bind(3, module);
+    std::vector<StoredEvent> doomed;
+    while (candidates.executeStep()) {
+        StoredEvent event;
+        event.storedAt = WallTime(std::chrono::milliseconds(candidates.getColumn(2).getInt64()));
+        if (!goesOn(event.storedAt, removed.bytes))
+            break;
+        event.row = candidates.getColumn(0).getInt64();
+        event.uuid = candidates.getColumn(1).getString();
+        removed.bytes += candidates.getColumn(3).getInt64();
+        ++dropped.modules[candidates.getColumn(4).getString()];
+        doomed.push_back(std::move(event));
+    }
+    candidates.reset();
+    for (const auto& event : doomed)
+        Delete(event);
+    if (module != 0 && !doomed.empty())
+        m_lastVictimRow = doomed.back().row;
+    dropped.events += doomed.size();
+    removed.events += static_cast<std::int64_t>(doomed.size());
+}
+
+/// Of those that have at least so many bytes waiting; 0 when no module has, so that none of them fills the outbox.
+std::int64_t OutboxStore::LargestModule(std::int64_t minBytes) {
+    SQLite::Statement query(m_database, "SELECT coalesce((SELECT id FROM module "
+                                        "WHERE stored_bytes - removed_bytes >= ?1 "
+                                        "ORDER BY stored_bytes - removed_bytes DESC, id LIMIT 1), 0)");
+    query.bind(1, minBytes);
+    query.executeStep();
+    return query.getColumn(0).getInt64();
+}
+
+OutboxStore::Dropped OutboxStore::DropOldest(std::int64_t afterRow, WallTime before, std::int64_t excessBytes,
+                                             std::size_t maxRows) {
     return Guarded("Cannot drop old events", [&] {
         auto transaction = WriteTransaction(m_database);
-        SQLite::Statement candidates(
-            m_database, "SELECT id, uuid, stored_ms, bytes FROM event WHERE id > ?1 ORDER BY id LIMIT ?2");
-        candidates.bind(1, afterRow);
-        candidates.bind(2, static_cast<std::int64_t>(maxRows));
-        std::vector<StoredEvent> doomed;
+        Dropped dropped;
         Removed removed;
-        while (candidates.executeStep()) {
-            const WallTime storedAt(std::chrono::milliseconds(candidates.getColumn(2).getInt64()));
-            if (storedAt >= before && removed.bytes >= excessBytes)
-                break;
-            StoredEvent event;
-            event.row = candidates.getColumn(0).getInt64();
-            event.uuid = candidates.getColumn(1).getString();
-            removed.bytes += candidates.getColumn(3).getInt64();
-            doomed.push_back(std::move(event));
+        DropWhile(afterRow, 0, maxRows, removed, dropped,
+                  [&](WallTime storedAt, std::int64_t) { return storedAt < before; });
+        const auto tooMuch = [&](WallTime, std::int64_t bytes) { return bytes < excessBytes; };
+        if (removed.bytes < excessBytes) {
+            const auto victim = LargestModule(excessBytes);
+            const bool goesOn = victim != 0 && victim == m_lastVictim;
+            const auto from = goesOn ? std::max(afterRow, m_lastVictimRow) : afterRow;
+            const auto droppedForAge = dropped.events;
+            m_lastVictim = victim;
+            DropWhile(from, victim, maxRows - dropped.events, removed, dropped, tooMuch);
+            if (dropped.events == droppedForAge) { // all of its events are under way
+                m_lastVictim = 0;
+                DropWhile(afterRow, 0, maxRows - dropped.events, removed, dropped, tooMuch);
+            }
         }
-        candidates.reset();
-        for (const auto& event : doomed)
-            removed.events += Delete(event) ? 1 : 0;
         if (removed.events > 0)
             CountRemoved("dropped", removed);
         ForgetIdleModules();
         transaction.commit();
-        return static_cast<std::size_t>(removed.events);
+        return dropped;
     });
 }
 

@@ -84,16 +84,22 @@ public:
     /// Deletes what is still there of `batch`. `refused` of them count as refused, the others as delivered.
     void RemoveDelivered(const Batch& batch, std::size_t refused);
 
-    /// Moves the event, if it is still there, to the dead-letter table.
-    void MoveToDeadLetters(const StoredEvent& event, const Refusal& refusal, WallTime now);
+    /// Moves the event, if it is still there, to the dead-letter table. Returns its module's id; empty if it is not there.
+    std::string MoveToDeadLetters(const StoredEvent& event, const Refusal& refusal, WallTime now);
 
     /// Deletes the oldest dead letters until both bounds hold. Returns how many.
     std::size_t TrimDeadLetters(std::size_t maxRows, std::size_t maxBytes);
 
-    /// Deletes the oldest events behind row `afterRow`, at most `maxRows`, that were stored before `before`,
-    /// or until `excessBytes` are gone. Returns how many.
-    std::size_t DropOldest(std::int64_t afterRow, WallTime before, std::int64_t excessBytes,
-                           std::size_t maxRows);
+    /// What a cap cost, by module.
+    struct Dropped {
+        std::size_t events = 0;
+        std::map<std::string, std::size_t> modules; ///< By id.
+    };
+
+    /// Deletes events behind row `afterRow`, at most `maxRows`: those that were stored before `before`, and then, until
+    /// `excessBytes` are gone, the oldest ones of the module with the most waiting bytes. So a module that reports without
+    /// end loses its own events and not the others'. When no module has so many, the oldest of all go.
+    Dropped DropOldest(std::int64_t afterRow, WallTime before, std::int64_t excessBytes, std::size_t maxRows);
 
     /// So many modules are remembered when nothing of theirs waits. A suite has some tens, whose numbers so go on.
     static constexpr std::int64_t MAX_IDLE_MODULES = 1000;
@@ -119,6 +125,10 @@ private:
     ReleaseKeys AddRelease(const ModuleIdentity& module);
     ModuleIdentity IdentityOf(std::int64_t release);
     void ForgetIdleModules();
+    std::int64_t LargestModule(std::int64_t minBytes);
+    template <typename GoesOn>
+    void DropWhile(std::int64_t afterRow, std::int64_t module, std::size_t maxRows, Removed& removed,
+                   Dropped& dropped, GoesOn goesOn);
     std::size_t AddTo(Batch& batch, const SQLite::Statement& row);
     bool Delete(const StoredEvent& event);
     void CountRemoved(const char* counter, const Removed& removed);
@@ -128,6 +138,9 @@ private:
     std::unique_ptr<SQLite::Statement> m_insert;
     std::unique_ptr<SQLite::Statement> m_oldest;
     std::unique_ptr<SQLite::Statement> m_delete;
+    std::int64_t m_lastVictim = 0; ///< The module whose events were dropped last for the bytes,
+    std::int64_t m_lastVictimRow =
+        0; ///< up to this one: the next look need not begin at the first row again.
     std::map<ModuleIdentity, ReleaseKeys> m_keys; ///< What the file already knows of the modules in use.
 };
 

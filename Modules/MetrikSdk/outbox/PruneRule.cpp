@@ -31,8 +31,4 @@ bool MayDropByAge(const ClockWatch& watch, const CapSettings& caps) {
     return watch.lastSteady - watch.agreeingSince >= caps.clockAgreement;
 }
 
-bool BeginsRun(std::optional<SteadyTime> lastDrop, SteadyTime now, const CapSettings& caps) {
-    return !lastDrop || now - *lastDrop > caps.dropRunEnds;
-}
-
 } // namespace MetrikSdk::outbox::PruneRule

@@ -1,7 +1,6 @@
 #pragma once
 
 #include <cstdint>
-#include <optional>
 
 #include "Modules/MetrikSdk/Settings.h"
 #include "Modules/MetrikSdk/Time.h"
@@ -38,8 +37,5 @@ ClockWatch LookAgain(const ClockWatch& watch, WallTime wall, SteadyTime steady);
 /// Whether the clocks have agreed for long enough that events may be called old. Until then none is dropped by
 /// age: a board without a battery begins in whatever year it likes, and is corrected by the network later.
 bool MayDropByAge(const ClockWatch& watch, const CapSettings& caps);
-
-/// Whether a drop now is the first of a run of drops, which is the one that is told.
-bool BeginsRun(std::optional<SteadyTime> lastDrop, SteadyTime now, const CapSettings& caps);
 
 } // namespace MetrikSdk::outbox::PruneRule

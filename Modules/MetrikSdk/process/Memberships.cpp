@@ -48,6 +48,7 @@ void Memberships::Leave(std::shared_ptr<const Membership>& membership) {
     if (found == m_memberships.end() || found->use_count() > 1)
         return;
     auto engine = (*found)->engine;
+    engine->Events().EndRuns();
     engine->Listeners().Unsubscribe((*found)->onFailure, (*found)->onSuccess);
     m_memberships.erase(found);
     m_registry.Release(engine);

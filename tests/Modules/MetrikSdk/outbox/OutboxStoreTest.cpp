@@ -122,6 +122,9 @@ TEST_F(OutboxStoreTest, TakesAnOutboxOfTheFirstVersionOver) {
     EXPECT_EQ(status.waiting, 2);
     Store(A759, "next");
     EXPECT_EQ(m_store->Oldest(10, ANY_BYTES).events.back().sequence, 4);
+    SQLite::Database file(m_path);
+    EXPECT_EQ(file.execAndGet("SELECT stored_bytes - removed_bytes FROM module").getInt64(),
+              m_store->Status().waitingBytes);
     m_store->RemoveDelivered(m_store->Oldest(10, ANY_BYTES), 0);
     EXPECT_EQ(m_store->Status().waiting, 0);
 }
@@ -145,7 +148,7 @@ TEST_F(OutboxStoreTest, CountsEveryEventInExactlyOnePlace) {
         Store(A759, std::to_string(i), NOW + std::chrono::hours(i));
     m_store->RemoveDelivered(m_store->Oldest(5, ANY_BYTES), 2);
     m_store->MoveToDeadLetters(m_store->Oldest(1, ANY_BYTES).events[0], {400, "bad"}, NOW);
-    EXPECT_EQ(m_store->DropOldest(0, NOW + std::chrono::hours(9), 0, 100), 3U);
+    EXPECT_EQ(m_store->DropOldest(0, NOW + std::chrono::hours(9), 0, 100).events, 3U);
     const auto status = m_store->Status();
     EXPECT_EQ(status.stored, 20);
     EXPECT_EQ(status.delivered, 3);
@@ -175,17 +178,17 @@ TEST_F(OutboxStoreTest, DoesNotRemoveWhatIsNotTheSameEventAnyMore) {
 TEST_F(OutboxStoreTest, DropsTheOldestFirstAndNoMoreThanAsked) {
     for (int i = 0; i < 10; ++i)
         Store(A759, std::to_string(i));
-    EXPECT_EQ(m_store->DropOldest(0, NEVER_TOO_OLD, 1, 100), 1U);
-    EXPECT_EQ(m_store->DropOldest(0, NEVER_TOO_OLD, 1'000'000, 4), 4U);
+    EXPECT_EQ(m_store->DropOldest(0, NEVER_TOO_OLD, 1, 100).events, 1U);
+    EXPECT_EQ(m_store->DropOldest(0, NEVER_TOO_OLD, 1'000'000, 4).events, 4U);
     EXPECT_EQ(m_store->Oldest(1, ANY_BYTES).events.at(0).payload, "5");
-    EXPECT_EQ(m_store->DropOldest(0, NEVER_TOO_OLD, 0, 100), 0U);
+    EXPECT_EQ(m_store->DropOldest(0, NEVER_TOO_OLD, 0, 100).events, 0U);
 }
 
 TEST_F(OutboxStoreTest, DoesNotDropWhatIsUnderWay) {
     for (int i = 0; i < 4; ++i)
         Store(A759, std::to_string(i));
     const auto underWay = m_store->Oldest(2, ANY_BYTES);
-    EXPECT_EQ(m_store->DropOldest(underWay.events.back().row, NEVER_TOO_OLD, 1, 100), 1U);
+    EXPECT_EQ(m_store->DropOldest(underWay.events.back().row, NEVER_TOO_OLD, 1, 100).events, 1U);
     const auto left = m_store->Oldest(10, ANY_BYTES);
     ASSERT_EQ(left.events.size(), 3U);
     EXPECT_EQ(left.events[0].payload, "0");

@@ -122,6 +122,70 @@ TEST_F(OutboxTest, StaysWithinItsCapTellsARunOfDropsOnceAndCountsEveryOne) {
     EXPECT_EQ(Told::Failures().Count("events dropped: "), 1);
 }
 
+TEST_F(OutboxTest, TakesItsCapFromTheModuleThatFillsIt) {
+    m_settings.caps.maxWaitingBytes = 100'000;
+    Open();
+    const ModuleIdentity quiet{"QUIET", "1", "quiet"};
+    for (int i = 0; i < 1000; ++i) {
+        ASSERT_TRUE(Append(std::string(500, 'x')));
+        const bool isQuietsTurn = i % 100 == 0;
+        EXPECT_TRUE(!isQuietsTurn || m_outbox->Append(quiet, "QUIET|1", "{}"));
+    }
+    std::vector<std::int64_t> quietSequences;
+    std::vector<std::int64_t> loudSequences;
+    const auto all = m_outbox->Take(1000);
+    for (const auto& event : all.events)
+        (all.releases.at(event.release) == quiet ? quietSequences : loudSequences).push_back(event.sequence);
+    EXPECT_EQ(quietSequences, (std::vector<std::int64_t>{1, 2, 3, 4, 5, 6, 7, 8, 9, 10}));
+    EXPECT_EQ(loudSequences.back(), 1000);
+    EXPECT_EQ(loudSequences.back() - loudSequences.front() + 1,
+              static_cast<std::int64_t>(loudSequences.size()))
+        << "its oldest went, and no other";
+}
+
+TEST_F(OutboxTest, DropsTheOthersWhenAllOfTheLargestModuleIsUnderWay) {
+    m_settings.caps.maxWaitingBytes = 10'000;
+    Open();
+    ASSERT_TRUE(m_outbox->Append({"LARGE", "1", ""}, "LARGE|1", std::string(8000, 'x')));
+    EXPECT_EQ(m_outbox->Take(1).events.size(), 1U);
+    for (int i = 0; i < 10; ++i)
+        ASSERT_TRUE(Append(std::string(500, 'x')));
+    EXPECT_LE(m_outbox->Status().waitingBytes, 10'000);
+    EXPECT_EQ(m_outbox->Take(1).events.at(0).payload.size(), 8000U);
+}
+
+TEST_F(OutboxTest, TellsTheTotalsOfItsLosses) {
+    m_settings.caps.maxWaitingBytes = 100'000;
+    Open();
+    for (int i = 0; i < 1000; ++i)
+        ASSERT_TRUE(Append(std::string(500, 'x')));
+    m_notifier.TellFailure({report::Cause::Refusal, "not this one"});
+    for (int i = 0; i < 3; ++i)
+        m_outbox->MoveToDeadLetters(m_outbox->Take(1).events.at(0), {400, "bad"});
+    m_outbox->EndRuns();
+    const auto dropped = std::to_string(m_outbox->Status().dropped);
+    const auto told = Told::Failures().All();
+    const auto& drops = told.at(told.size() - 2);
+    EXPECT_TRUE(drops.starts_with("events dropped: No events are dropped any more; lost are " + dropped +
+                                  " events from 20"))
+        << drops;
+    EXPECT_TRUE(drops.ends_with("Z: A759 " + dropped)) << drops;
+    EXPECT_TRUE(told.back().starts_with("events refused: Moved to the dead letters were 3 events from 20"))
+        << told.back();
+    m_outbox->EndRuns();
+    EXPECT_EQ(Told::Failures().All().size(), told.size()) << "once";
+}
+
+TEST_F(OutboxTest, TellsTheTotalsOnceARunOfDropsIsOver) {
+    m_settings.caps.maxWaitingBytes = 10'000;
+    m_settings.caps.dropRunEnds = 0ms;
+    Open();
+    for (int i = 0; i < 100; ++i)
+        ASSERT_TRUE(Append(std::string(500, 'x')));
+    m_outbox->Take(1);
+    EXPECT_GE(Told::Failures().Count("events dropped: No events are dropped any more; lost are "), 1);
+}
+
 TEST_F(OutboxTest, DropsNothingByAgeBeforeItsClockHasProvedItself) {
     Open();
     Append();

@@ -13,7 +13,6 @@ CapSettings Caps() {
     CapSettings caps;
     caps.maxWaitingBytes = 10'000;
     caps.maxAge = std::chrono::days(30);
-    caps.dropRunEnds = 10min;
     return caps;
 }
 
@@ -69,13 +68,6 @@ TEST(PruneRule, TakesSlewingOverAMonthForAgreement) {
     const auto watch = outbox::PruneRule::LookAgain(outbox::PruneRule::BeginWatch(OPENED, start),
                                                     OPENED + month + 20min, start + month);
     EXPECT_TRUE(outbox::PruneRule::MayDropByAge(watch, Caps()));
-}
-
-TEST(PruneRule, TellsTheFirstDropOfARunOnly) {
-    const SteadyTime now{100h};
-    EXPECT_TRUE(outbox::PruneRule::BeginsRun(std::nullopt, now, Caps()));
-    EXPECT_FALSE(outbox::PruneRule::BeginsRun(now - 10min, now, Caps()));
-    EXPECT_TRUE(outbox::PruneRule::BeginsRun(now - 11min, now, Caps()));
 }
 
 } // namespace
