@@ -58,7 +58,7 @@ public:
         std::size_t events = 0;
         for (const auto& resource : request["resourceLogs"].GetArray())
             for (const auto& scope : resource["scopeLogs"].GetArray())
-                events += Read(TextOf(resource["resource"], "service.instance.id"), scope["logRecords"]);
+                events += Read(scope["logRecords"]);
         Require(events > 0 && events <= 512, "a request has some events", std::to_string(events));
         return answer;
     }
@@ -83,7 +83,8 @@ private:
         return {text.GetString(), text.GetStringLength()};
     }
 
-    std::size_t Read(const std::string& module, const rapidjson::Value& records) {
+    std::size_t Read(const rapidjson::Value& records) {
+        const auto module = TextOf(records[0], "metrik.module");
         Require(modules.contains(module), "an event is of a module that announced itself", module);
         std::int64_t before = 0;
         for (const auto& record : records.GetArray()) {
@@ -176,6 +177,7 @@ private:
     static otlp::HttpResult NoAnswer(const std::string& reason) {
         otlp::HttpResult answer;
         answer.fault = "no answer: " + reason;
+        answer.began = reason.starts_with("late");
         return answer;
     }
 

@@ -4,6 +4,8 @@
 #include <cstddef>
 #include <string>
 
+#include "Modules/MetrikSdk/otlp/ResourceConfig.h"
+
 // What production runs with, and why. Tests hand in their own.
 namespace MetrikSdk {
 
@@ -89,6 +91,7 @@ struct OutboxSettings {
     RetrySettings retry;
     AsideSettings aside;
     FileSettings file;
+    otlp::ResourceConfig resource; ///< From the environment.
     /// The failure callback ends in the service's log: the same cause is told this often at most.
     std::chrono::milliseconds tellInterval = std::chrono::minutes(1);
     /// How long releasing an outbox waits for its uploader.

@@ -59,6 +59,9 @@ void WriteScalar(JsonWriter& writer, const JsonValue& value) {
     } else if (value.IsInt64()) {
         writer.Key("intValue");
         WriteText(writer, std::to_string(value.GetInt64()));
+    } else if (value.IsUint64()) { // a double would lose its last digits
+        writer.Key("stringValue");
+        WriteText(writer, std::to_string(value.GetUint64()));
     } else if (value.IsNumber()) {
         writer.Key("doubleValue");
         writer.Double(value.GetDouble());

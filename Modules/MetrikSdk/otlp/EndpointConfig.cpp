@@ -8,6 +8,8 @@
 
 #include <curl/curl.h>
 
+#include "Modules/MetrikSdk/otlp/VariableText.h"
+
 namespace MetrikSdk::otlp {
 namespace {
 
@@ -43,26 +45,6 @@ Url ParseUrl(const std::string& text) {
     if (scheme != "http" && scheme != "https")
         url.reset();
     return url;
-}
-
-std::string Trimmed(const std::string& text) {
-    const auto first = text.find_first_not_of(" \t");
-    if (first == std::string::npos)
-        return {};
-    return text.substr(first, text.find_last_not_of(" \t") - first + 1);
-}
-
-std::string LowerCase(std::string text) {
-    std::transform(text.begin(), text.end(), text.begin(),
-                   [](unsigned char c) { return static_cast<char>(c >= 'A' && c <= 'Z' ? c + 32 : c); });
-    return text;
-}
-
-std::string PercentDecoded(const std::string& text) {
-    int length = 0;
-    const std::unique_ptr<char, decltype(&::curl_free)> decoded(
-        ::curl_easy_unescape(nullptr, text.c_str(), static_cast<int>(text.size()), &length), &::curl_free);
-    return decoded ? std::string(decoded.get(), static_cast<std::size_t>(length)) : std::string();
 }
 
 bool IsToken(const std::string& name) {

@@ -2,7 +2,6 @@
 
 #include <charconv>
 #include <cstdint>
-#include <string_view>
 
 #include "SystemTool/IO/JsonParse.h"
 
@@ -16,24 +15,42 @@ constexpr std::int64_t MAX_CREATE_TIME_MS = 9'223'372'036'854;
 
 /// Read by the service's own rules, and iteratively: what follows may use the call stack freely, since the depth is known.
 Payload::Payload(const std::string& text) {
-    SystemTool::IO::JsonParse parse(text, MAX_DEPTH);
+    Parse(text, MAX_DEPTH);
+    m_isShallow = m_isObject;
+    if (!m_isObject) // what the service takes as a report's value is one level deeper in its payload
+        Parse(text, SystemTool::IO::JsonDocument::MAX_DEPTH + 1);
+}
+
+void Payload::Parse(const std::string& text, int maxDepth) {
+    SystemTool::IO::JsonParse parse(text, maxDepth);
     m_document.Populate(parse);
     m_isObject = parse.Error().empty() && m_document.IsObject();
 }
 
-std::optional<WallTime> Payload::CreateTime() const {
+const SystemTool::IO::JsonValue* Payload::ObjectIn(const char* name) const {
     if (!m_isObject)
+        return nullptr;
+    const auto member = m_document.FindMember(name);
+    return member != m_document.MemberEnd() && member->value.IsObject() ? &member->value : nullptr;
+}
+
+std::optional<std::string> Payload::TextIn(const char* outer, const char* name) const {
+    const auto* object = ObjectIn(outer);
+    if (object == nullptr)
         return std::nullopt;
-    const auto extend = m_document.FindMember("extend");
-    if (extend == m_document.MemberEnd() || !extend->value.IsObject())
+    const auto member = object->FindMember(name);
+    if (member == object->MemberEnd() || !member->value.IsString())
         return std::nullopt;
-    const auto time = extend->value.FindMember("createTime");
-    if (time == extend->value.MemberEnd() || !time->value.IsString())
+    return std::string(member->value.GetString(), member->value.GetStringLength());
+}
+
+std::optional<WallTime> Payload::CreateTime() const {
+    const auto text = TextIn("extend", "createTime");
+    if (!text)
         return std::nullopt;
-    const std::string_view text(time->value.GetString(), time->value.GetStringLength());
     std::int64_t milliseconds = 0;
-    const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), milliseconds);
-    const bool whole = error == std::errc() && end == text.data() + text.size();
+    const auto [end, error] = std::from_chars(text->data(), text->data() + text->size(), milliseconds);
+    const bool whole = error == std::errc() && end == text->data() + text->size();
     if (!whole || milliseconds <= 0 || milliseconds > MAX_CREATE_TIME_MS)
         return std::nullopt;
     return WallTime(std::chrono::milliseconds(milliseconds));

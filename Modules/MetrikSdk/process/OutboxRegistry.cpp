@@ -50,6 +50,8 @@ std::shared_ptr<OutboxEngine> OutboxRegistry::Acquire(const std::string& directo
     if (!engine) {
         std::vector<std::string> complaints;
         const auto endpoint = otlp::ReadEndpoint(m_lookUp, complaints);
+        if (endpoint)
+            settings.resource = otlp::ReadResource(m_lookUp, complaints);
         engine =
             std::make_shared<OutboxEngine>(chosen, settings, endpoint, std::move(complaints), m_reporter);
         known = engine;

@@ -94,11 +94,11 @@ Pause UploadCycle::Send(Batch batch, bool isAside, WallTime now) {
 
 /// Leaves out the events for which the body would be too long.
 std::string UploadCycle::EncodeWithinBound(Batch& batch) const {
-    auto body = otlp::EncodeOtlp(batch);
+    auto body = otlp::EncodeOtlp(batch, m_settings.resource);
     while (body.size() > m_sizer.MaxBodyBytes() && batch.events.size() > 1) {
         const auto fitting = batch.events.size() * m_sizer.MaxBodyBytes() / body.size();
         batch.events.resize(std::max<std::size_t>(1, fitting));
-        body = otlp::EncodeOtlp(batch);
+        body = otlp::EncodeOtlp(batch, m_settings.resource);
     }
     return body;
 }

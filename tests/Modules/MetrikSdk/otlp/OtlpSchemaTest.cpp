@@ -43,9 +43,12 @@ protected:
 };
 
 TEST_F(OtlpSchemaTest, AcceptsThePluginsRequests) {
+    SetVariable("OTEL_SERVICE_NAME", "desk");
+    SetVariable("OTEL_RESOURCE_ATTRIBUTES", "host.name=desk%207,deployment.environment.name=test");
     const auto bodies = BodiesOf({
         NumberedPayload(1),
         R"({"extend":{"createTime":"1700000000123"},"eventData":{"a":[1,-2.5,"x",null,true,{"b":{}},[]]}})",
+        R"({"extend":{"hublinkVersion":"5.1"},"eventData":{"openid":"u1","n":18446744073709551615,"r":0.5}})",
         R"({"big":9223372036854775807,"small":-9223372036854775808,"over":18446744073709551615})",
         R"({"twice":1,"twice":2,"":"empty key","nul":"\u0000","e":"\u20ac\ud83d\ude00"})",
         "not json at all",
@@ -56,11 +59,12 @@ TEST_F(OtlpSchemaTest, AcceptsThePluginsRequests) {
     std::size_t events = 0;
     for (const auto& body : bodies) {
         EXPECT_TRUE(Passes(body));
+        EXPECT_NE(body.find(R"({"key":"host.name","value":{"stringValue":"desk 7"}})"), std::string::npos);
         for (auto at = body.find("\"eventName\":"); at != std::string::npos;
              at = body.find("\"eventName\":", at + 1))
             ++events;
     }
-    EXPECT_EQ(events, 8U);
+    EXPECT_EQ(events, 9U);
 }
 
 TEST_F(OtlpSchemaTest, NoticesABodyThatIsWrong) {
@@ -71,6 +75,9 @@ TEST_F(OtlpSchemaTest, NoticesABodyThatIsWrong) {
     EXPECT_FALSE(Passes(Replaced(good, R"("timeUnixNano":"1700000000123000000")", R"("timeUnixNano":1.5)")));
     EXPECT_FALSE(Passes(Replaced(good, R"("intValue":"1")", R"("intValue":1)"))) << "a number for a text";
     EXPECT_FALSE(Passes(Replaced(good, R"("intValue":"1")", R"("intValue":"one")")));
+    EXPECT_FALSE(Passes(Replaced(good, R"("severityNumber":9)", R"("severityNumber":"nine")")));
+    EXPECT_FALSE(Passes(Replaced(good, "schemaUrl", "schemaURL")));
+    EXPECT_FALSE(Passes(Replaced(good, R"("metrik.module")", "7"))) << "a key that is no text";
     EXPECT_FALSE(Passes(Replaced(good, "kvlistValue", "kvListValue"))) << "a body of no type";
     EXPECT_FALSE(Passes(Replaced(good, R"({"stringValue":"u1"})", R"("u1")"))) << "a value without its type";
 }

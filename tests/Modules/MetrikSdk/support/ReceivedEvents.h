@@ -9,7 +9,7 @@
 /// An event as a collector sees it.
 struct ReceivedEvent {
     std::string uuid;
-    std::string service; ///< The resource's service.instance.id: the module.
+    std::string module;
     std::int64_t sequence = 0;
     int number = -1; ///< The payload's own: see NumberedPayload.
 };
@@ -31,9 +31,9 @@ inline const rapidjson::Value& Find(const rapidjson::Value& list, const char* ke
     return none;
 }
 
-inline ReceivedEvent Read(const rapidjson::Value& resource, const rapidjson::Value& record) {
+inline ReceivedEvent Read(const rapidjson::Value& record) {
     ReceivedEvent event;
-    event.service = Find(resource["attributes"], "service.instance.id")["stringValue"].GetString();
+    event.module = Find(record["attributes"], "metrik.module")["stringValue"].GetString();
     event.uuid = Find(record["attributes"], "log.record.uid")["stringValue"].GetString();
     event.sequence = std::stoll(Find(record["attributes"], "metrik.sequence")["intValue"].GetString());
     if (record["body"].HasMember("kvlistValue")) {
@@ -54,6 +54,6 @@ inline std::vector<ReceivedEvent> EventsOf(const std::string& body) {
     for (const auto& resource : document["resourceLogs"].GetArray())
         for (const auto& scope : resource["scopeLogs"].GetArray())
             for (const auto& record : scope["logRecords"].GetArray())
-                events.push_back(ReceivedEventsDetail::Read(resource["resource"], record));
+                events.push_back(ReceivedEventsDetail::Read(record));
     return events;
 }

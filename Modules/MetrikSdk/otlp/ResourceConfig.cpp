@@ -1,0 +1,75 @@
+#include "Modules/MetrikSdk/otlp/ResourceConfig.h"
+
+#include <algorithm>
+#include <optional>
+
+#include <sys/utsname.h>
+
+#include "Modules/MetrikSdk/otlp/VariableText.h"
+#include "SystemTool/CommonTool.h"
+
+namespace MetrikSdk::otlp {
+namespace {
+
+using Attributes = std::vector<std::pair<std::string, std::string>>;
+
+/// Nothing when the list is ill-formed.
+std::optional<Attributes> Parsed(const std::string& list) {
+    Attributes attributes;
+    for (std::size_t start = 0; start < list.size();) {
+        const auto end = std::min(list.find(',', start), list.size());
+        const auto text = Trimmed(list.substr(start, end - start));
+        start = end + 1;
+        if (text.empty())
+            continue;
+        const auto equals = text.find('=');
+        const auto key = PercentDecoded(Trimmed(text.substr(0, equals)));
+        if (equals == std::string::npos || key.empty())
+            return std::nullopt;
+        const auto value = PercentDecoded(Trimmed(text.substr(equals + 1)));
+        const auto same = [&key](const auto& attribute) { return attribute.first == key; };
+        if (std::none_of(attributes.begin(), attributes.end(), same))
+            attributes.emplace_back(key, value);
+    }
+    return attributes;
+}
+
+/// Takes service.name out of the list, where it is only a default.
+std::string TakeServiceName(Attributes& attributes) {
+    const auto found = std::find_if(attributes.begin(), attributes.end(),
+                                    [](const auto& attribute) { return attribute.first == "service.name"; });
+    if (found == attributes.end())
+        return {};
+    auto name = std::move(found->second);
+    attributes.erase(found);
+    return name;
+}
+
+std::string OsType() {
+    struct utsname system {};
+    return ::uname(&system) == 0 ? LowerCase(system.sysname) : std::string();
+}
+
+} // namespace
+
+ResourceConfig ReadResource(const std::function<const char*(const char*)>& lookUp,
+                            std::vector<std::string>& complaints) {
+    const auto read = [&](const char* name) {
+        const char* value = lookUp(name);
+        return value == nullptr ? std::string() : Trimmed(value);
+    };
+    ResourceConfig config;
+    auto attributes = Parsed(read("OTEL_RESOURCE_ATTRIBUTES"));
+    if (!attributes)
+        complaints.emplace_back("OTEL_RESOURCE_ATTRIBUTES is no list of key=value and counts as unset");
+    config.attributes = std::move(attributes).value_or(Attributes());
+    const auto listed = TakeServiceName(config.attributes);
+    config.serviceName = read("OTEL_SERVICE_NAME");
+    if (config.serviceName.empty())
+        config.serviceName = listed;
+    config.osType = OsType();
+    config.osDescription = SystemTool::CommonTool::GetOSVersionString();
+    return config;
+}
+
+} // namespace MetrikSdk::otlp
