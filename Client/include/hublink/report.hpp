@@ -57,7 +57,7 @@ enum class Result {
 [[nodiscard]] HUBLINK_EXPORT const char* ToString(Result result) noexcept;
 
 /// A program of the suite that reports to analytics. The id is what stands before the bar in its event ids, and so begins
-/// with a capital A. The service keeps 256 bytes of each.
+/// with a capital A. The service keeps 64 bytes of the id and 256 of the others.
 struct Module {
     std::string id = {};
     std::string version = {};
