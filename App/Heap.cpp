@@ -7,7 +7,7 @@
 
 // Memory that has been free for a second goes back to the system: a backlog may have needed gigabytes, and it is rare. A
 // thread of the heap's own sees to that, which sleeps while there is nothing to give back. Without it, memory goes back only
-// in passing, when the heap is used much, and a service that nobody sends to would keep a backlog's.
+// when the program uses the heap much, and a service that gets no reports would keep a backlog's memory.
 //
 // All threads share one arena. A report's memory then serves the next report as soon as it is stored, which is when there is
 // least to spare; with an arena for each thread, it came back to the receiving thread's. And a thread's first allocation

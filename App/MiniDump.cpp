@@ -42,7 +42,7 @@ struct BackTrace {
 };
 
 /// Locks the file; true, with the reason in errno, when another process holds the lock. One that fails for another
-/// reason (a file system without locks) stops nobody, deliberately.
+/// reason (a file system without locks) does not stop the service, deliberately.
 bool IsLockedElsewhere(int file) {
     struct flock lock {};
     lock.l_type = F_WRLCK;
@@ -68,7 +68,7 @@ void MiniDump::EnableAutoStack(const std::string& logPath, const std::string& lo
     ::signal(SIGSEGV, OnStackCallBack);
 }
 
-// exit is meant, whatever the other threads do meanwhile, and this library's strerror keeps each thread its own text.
+// exit is intended, also while other threads run, and this library's strerror has a text of its own for each thread.
 // NOLINTBEGIN(concurrency-mt-unsafe)
 
 void MiniDump::OnStackCallBack(int signal) {

@@ -60,7 +60,7 @@ public:
     /// The bytes up to the first zero byte.
     std::string Text() const { return m_bytes.data(); }
 
-    Poco::Net::SocketAddress m_sender; ///< Not looked at: whoever sends from this machine is welcome.
+    Poco::Net::SocketAddress m_sender; ///< Not checked: every program of this machine may send.
 
 private:
     std::array<char, Wire::MAX_BYTES + 1> m_bytes{};

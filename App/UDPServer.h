@@ -84,5 +84,5 @@ private:
     /// Whether the last poll failed, so that a socket that stays broken is reported once.
     bool m_pollFailed = false;
 
-    DatagramWatch* m_watch = nullptr; ///< Not owned; without one, nobody is told.
+    DatagramWatch* m_watch = nullptr; ///< Not owned; may be null.
 };

@@ -108,7 +108,7 @@ public:
         : m_format(format), m_text(std::min(format.size() + MAX_LOG_TEXT_GROWTH_BYTES, MAX_LOG_TEXT_BYTES)) {}
 
     std::string Text() {
-        // The count refuses a text that ends in a percent sign, whatever that belongs to.
+        // The count refuses every text that ends in a percent sign, also in a doubled one.
         boost::io::detail::upper_bound_from_fstring(m_format, '%', m_characters, boost::io::all_error_bits);
         ReadAll();
         if (m_takesNext && m_highestArgument >= 0) // the two ways to ask for arguments do not mix

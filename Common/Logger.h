@@ -26,7 +26,7 @@ namespace SyncServiceReport {
 
 enum class LogLevel : int {
     Info = 2,    ///< What arrived, and what was done on a control message.
-    Warning = 3, ///< Exceptions that were caught, and reports that nobody takes.
+    Warning = 3, ///< Exceptions that were caught, and reports that no destination takes.
     Error = 4,   ///< Failures, the crash trace, and texts that could not be built.
 };
 
@@ -53,7 +53,7 @@ struct LogSite {
 /// it, where boost::format cannot make sense of it, gives an Error line of "[BoostLogError]" and the reason
 /// instead. People search the log for that mark to find datagrams with percent signs.
 ///
-/// Never throws, whatever the logger does, also where the report of a failed write fails itself: a log line is not worth
+/// Never throws, also when the logger throws, and also where the report of a failed write fails itself: a log line is not worth
 /// a report. False when such an Error line took the text's place.
 template <typename... Arguments>
 static bool WriteLog(const LogSite& site, const std::string& format, const Arguments&... arguments) noexcept {
@@ -73,7 +73,7 @@ static bool WriteLog(const LogSite& site, const std::string& format, const Argum
             write(LogLevel::Error, std::string("[BoostLogError]") + error.what());
             return false;
         }
-    } catch (...) { // the logger itself is failing: there is nobody left to tell
+    } catch (...) { // the logger itself is failing: no place is left to report it
     }
     return true;
 }

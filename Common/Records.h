@@ -31,7 +31,7 @@ struct ST_InitMsg {
 /// default on.
 struct ST_BaseInfo {
     std::string userDataDir;              ///< The root of the suite's log and database folders.
-    std::string openID = "visitor";       ///< The signed-in user; "visitor" when nobody is.
+    std::string openID = "visitor";       ///< The signed-in user; "visitor" when no user is.
     std::string suiteVersion = "3.0.0.0"; ///< The installed suite's version.
     std::string osVersion;                ///< The operating system with its version, for people.
 };

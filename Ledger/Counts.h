@@ -12,7 +12,7 @@ namespace ReportLedger {
 using Counts = std::array<std::uint64_t, COUNTERS>;
 
 /// Copies them one by one, the last first: how a datagram ended is copied before what was received, so that no copy has more
-/// ends than datagrams, whatever is counted meanwhile.
+/// ends than datagrams, also when the service counts meanwhile.
 Counts CopyOf(const Counters& counters);
 
 /// Datagrams that have ended while a process ran: what was ignored, stored, handed on, understood or refused.

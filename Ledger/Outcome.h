@@ -18,8 +18,8 @@ enum class Outcome : unsigned {
     Exception,         ///< An exception cost the report.
 };
 
-/// Names how the report under way on this thread ends, at the place that knows it. The first word counts: whoever stands
-/// nearest to the failure names it, and what its callers conclude from its result comes later. Names nothing that lasts
+/// Names how the report under way on this thread ends, at the place that knows it. The first call counts: the code
+/// nearest to the failure calls first, and its callers, which see only its result, call later. Has no lasting effect
 /// while no report is under way.
 void Ended(Outcome outcome) noexcept;
 

@@ -92,7 +92,7 @@ void TakeProcess(const File& content, Look& look) {
         look.atStart = CopyOf(content.atStart);
         if (before % 2 == 0 && header.starts.load(std::memory_order_acquire) == before)
             return;
-        if (!look.counting) // it was killed while it started: nobody will finish what it wrote
+        if (!look.counting) // it was killed while it started: no process will finish what it wrote
             return;
         std::this_thread::sleep_for(BETWEEN_LOOKS);
     }

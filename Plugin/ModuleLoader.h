@@ -105,7 +105,7 @@ public:
 
 private:
     /// A plug-in that throws stays open for the rest of the process: its exception may be of a class of its own, whose
-    /// code must be there for as long as somebody holds the exception.
+    /// code must be there for as long as the exception exists.
     T* Create() {
         try {
             return m_pDllLoader->template get<T*()>("CreateModule")();

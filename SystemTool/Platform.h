@@ -41,7 +41,7 @@ bool AllocateFile(int file, std::int64_t bytes);
 /// another one holds the lock, or the file system has no locks.
 bool TryLockFile(int file);
 
-/// Whether another opening of the file holds its lock. Takes no lock itself, so it is in nobody's way.
+/// Whether another opening of the file holds its lock. Takes no lock itself, so it disturbs no other process.
 bool IsFileLocked(int file);
 
 /// How many datagrams the system has dropped at this socket since it was made, most of them for want of room; counts modulo

@@ -16,7 +16,7 @@
 
 // What reporting costs the program that reports, beside the least that any program could do (a bare sendto of the same
 // bytes), and beside what programs do in its place: a counter for a metrics daemon, a line for the local syslog. In
-// processor time of the sending thread. Somebody listens to each, with room for all. bench/client runs it.
+// processor time of the sending thread. A socket listens to each, with room for all. bench/client runs it.
 namespace {
 
 constexpr int BATCH = 50; // datagrams that wait in the listener's socket, as many as fit with room to spare
@@ -29,7 +29,7 @@ sockaddr_in Loopback(std::uint16_t port) {
     return address;
 }
 
-/// A socket that somebody sends to.
+/// A socket that receives what the benchmark sends.
 class Listener {
 public:
     template <typename Address>

@@ -3,7 +3,7 @@
 #include "App/PocoTasker.h"
 #include "bench/Report.h"
 
-// One text through the queue: produced and consumed on one thread, without anybody waiting for anybody.
+// One text through the queue: produced and consumed on one thread, so that no thread waits for another.
 namespace {
 
 class Tasker final : public PocoTasker<std::string> {

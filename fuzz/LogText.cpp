@@ -1,5 +1,5 @@
-// A text from outside as the log's format string, and on into the log's line: one record whatever the text, what
-// boost::format makes of it, within its size, and one line that nobody can break out of.
+// A text from outside as the log's format string, and on into the log's line: one record for any text, what
+// boost::format makes of it, within its size, and one line that the text cannot break.
 
 #include <algorithm>
 #include <chrono>

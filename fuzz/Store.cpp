@@ -1,4 +1,4 @@
-// Datagrams through the server into the real store: whatever a report's text makes of the statement that it lands in,
+// Datagrams through the server into the real store: with any text of a report in the statement,
 // the database gets one row of its table at most, and nothing else of it changes.
 
 #include <filesystem>

@@ -19,7 +19,7 @@ bool IsForAnalytics(std::string_view eventId) {
     return eventId.front() == 'A';
 }
 
-/// A time as the service keeps it: milliseconds since 1970. It takes ten characters for seconds, whatever they are, so such
+/// A time as the service keeps it: milliseconds since 1970. It treats any ten characters as seconds, so such
 /// a number is written as a text with a zero in front, which makes it eleven.
 class TimeText {
 public:
@@ -51,7 +51,7 @@ private:
 };
 
 /// JSON goes to the store as an object where the service prints it again as it was. Everything else would come out
-/// different (numbers of more digits than the service keeps, deep nesting), and goes as a text, which nobody touches.
+/// different (numbers of more digits than the service keeps, deep nesting), and goes as a text, which the service does not change.
 wire::ValueForm FormForStore(const wire::JsonFacts& facts) {
     return facts.isObject && facts.fate == wire::Fate::Exact && facts.levels <= MAX_LEVELS
                ? wire::ValueForm::Json

@@ -8,7 +8,7 @@
 
 namespace BoostLogger {
 
-/// Makes the directory and its missing parents, each with mode 0700 whatever the umask. What exists keeps its
+/// Makes the directory and its missing parents, each with mode 0700 under any umask. What exists keeps its
 /// mode: it may hold other things than this log.
 FileFailure MakeDirectory(const std::string& path);
 
@@ -21,7 +21,7 @@ public:
     LiveFile(const LiveFile&) = delete;
     LiveFile& operator=(const LiveFile&) = delete;
 
-    /// Opens, or makes, the file with mode 0600 whatever the umask; one with a wider mode is narrowed, since
+    /// Opens, or makes, the file with mode 0600 under any umask; one with a wider mode is narrowed, since
     /// the records hold what users do. Symbolic links and anything but a regular file are refused. What was
     /// open before is closed, its lock given up, whether this succeeds or not.
     FileFailure Open(const std::string& path);

@@ -11,7 +11,7 @@
 namespace BoostLogger {
 
 struct RotatedFile {
-    std::uint64_t number = 0; ///< Rises with every rotation; the age, whatever the clock does.
+    std::uint64_t number = 0; ///< Rises with every rotation; shows the age, also when the clock jumps.
     std::int64_t sizeBytes = 0;
 };
 

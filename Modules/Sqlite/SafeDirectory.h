@@ -17,7 +17,7 @@ namespace Sqlite {
 /// replace the user's programs as well.
 ///
 /// Each component is opened from the descriptor of the one before, without following links, and looked at through its own
-/// descriptor. So what was checked is what is held, whatever is renamed meanwhile.
+/// descriptor. So the checked directory is the open one, also when another program renames it meanwhile.
 ///
 /// Threads: any. Failure: UnsafePath when the rule is broken or there is no such directory; std::system_error when the
 /// system cannot make or open it for now.

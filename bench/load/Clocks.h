@@ -14,7 +14,7 @@ inline std::int64_t NowNs(clockid_t clock) {
     return std::int64_t{now.tv_sec} * 1'000'000'000 + now.tv_nsec;
 }
 
-/// The clock that all programs of a machine share and nobody sets.
+/// The clock that all programs of a machine share and no program sets.
 inline std::int64_t MonotonicNs() {
     return NowNs(CLOCK_MONOTONIC);
 }

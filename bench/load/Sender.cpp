@@ -1,5 +1,5 @@
 // Sends numbered reports over UDP, paced or as fast as the kernel takes them, and prints what it did as JSON.
-// The same for whatever receives them: the service, the bare loop, another daemon.
+// It does the same for each receiver: the service, the bare loop, another daemon.
 
 #include <chrono>
 #include <cstring>

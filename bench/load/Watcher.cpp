@@ -1,5 +1,5 @@
 // Sees rows appear as another program that reads the same database does: looks again and again whether
-// somebody committed, and then reads the numbers of the new rows. What it prints as JSON tells, beside the
+// another program committed, and then reads the numbers of the new rows. What it prints as JSON tells, beside the
 // latencies, how often it looked, which is how exact they are.
 
 #include <algorithm>
@@ -35,7 +35,7 @@ public:
         : m_plan(plan), m_database(plan.database, SQLite::OPEN_READONLY, 10'000),
           m_version(m_database, "pragma data_version"), m_rows(m_database, plan.query),
           m_seen(static_cast<std::size_t>(plan.count)) {
-        Version(); // from here on, a change is somebody's commit
+        Version(); // from here on, a change is another program's commit
     }
 
     void Watch() {

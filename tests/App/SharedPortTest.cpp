@@ -44,7 +44,7 @@ private:
     std::atomic<int> m_received = 0;
 };
 
-/// How somebody may ask for a port that is taken.
+/// How a program may ask for a port that is taken.
 struct Attempt {
     const char* what;
     std::vector<int> options; ///< Of SOL_SOCKET, each set to 1.

@@ -77,7 +77,7 @@ public:
 
     void Join() { m_thread.join(); }
 
-    /// What the socket's descriptor stood for is another file from here on, as after somebody's close too many. By bare
+    /// From here on, the socket's descriptor is another file, as after a wrong second close by other code. By bare
     /// system calls: a sanitizer takes it for the mistake that it is.
     void LoseTheSocket() {
         const int other = ::open("/dev/null", O_RDWR | O_CLOEXEC);
@@ -88,7 +88,7 @@ public:
     int ReceiveBufferBytes() { return m_socket.getReceiveBufferSize(); }
 
 private:
-    /// Sends to a port where nobody is, which the kernel answers with an error for the next receive.
+    /// Sends to a port where no program listens, which the kernel answers with an error for the next receive.
     void SendToNobody() {
         Poco::Net::DatagramSocket nobody(SocketAddress(LOOPBACK, 0));
         const SocketAddress address = nobody.address();

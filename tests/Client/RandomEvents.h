@@ -4,7 +4,7 @@
 #include <random>
 #include <string>
 
-/// An event as nobody would think of it.
+/// A random event, of a kind that no written test covers.
 struct RandomEvent {
     enum class Kind { Nothing, Text, Json };
 

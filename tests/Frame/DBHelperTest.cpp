@@ -26,7 +26,7 @@ protected:
     DBHelperTest() { m_helper.Init(m_loader.GetModule()); }
     ~DBHelperTest() override { m_helper.Init(nullptr); }
 
-    /// A record of DBHelper, whatever its line.
+    /// A record of DBHelper, with any line number.
     static auto Error(const std::string& function, const std::string& message) {
         return AllOf(Field(&LogRecord::level, 4), Field(&LogRecord::file, "Frame/DBHelper"),
                      Field(&LogRecord::function, function), Field(&LogRecord::message, message),

@@ -42,7 +42,7 @@ protected:
         return m_service.LogLines("App/ReportServer:111 SetBaseInfo").back().thread;
     }
 
-    /// The process ended with 0, and the crashed thread left its trace, and nobody else.
+    /// The process ended with 0, and the crashed thread left its trace, and no other thread did.
     void ExpectATraceOf(pid_t thread) {
         ExpectATrace();
         for (const auto& signal : m_service.LogLines("App/MiniDump:240 OnStackCallBack"))

@@ -8,7 +8,7 @@
 #include "tests/e2e/support/HostileDatagrams.h"
 #include "tests/e2e/support/HostileFixture.h"
 
-// What anybody on the machine may send: whatever it is, the service lives, keeps to its files and takes the next
+// What any user of the machine may send: the service goes on, writes only its own files and takes the next
 // report.
 
 namespace {
@@ -41,7 +41,8 @@ const Barrage BARRAGES[] = {
     {"ForgedRecords", Hostile::ForgedRecords, 0, 0},
     {"EscapedForgedRecords", Hostile::EscapedForgedRecords, 4 * 6, 4 * 9},
     {"TerminalEscapes", Hostile::TerminalEscapes, 8 * 6, 8 * 9},
-    {"Sql", Hostile::Sql, 25 * 2, 25 * 9}, // no statement holds the day mark, or a member that nobody reads
+    {"Sql", Hostile::Sql, 25 * 2,
+     25 * 9}, // no statement holds the day mark, or a member that the service does not read
     {"SqlThatFits", Hostile::SqlThatFits, ALL, 0},
 };
 

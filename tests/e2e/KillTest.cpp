@@ -52,7 +52,7 @@ std::string ValueOf(std::int64_t number) {
     return R"({"button":"save","count":)" + std::to_string(number) + "}";
 }
 
-/// Sends numbered reports at the rate, whether or not somebody listens.
+/// Sends numbered reports at the rate, whether or not the service listens.
 class Load {
 public:
     Load() : m_thread([this] { Run(); }) {}
@@ -171,7 +171,7 @@ protected:
             return Clock::now() >= moment;
         });
         m_events = EventCount();
-        if (!readerStays) // then the next start finds a log that nobody has open, and recovers it
+        if (!readerStays) // then the next start finds a log that no process has open, and recovers it
             m_reader.Close();
         End(load);
     }

@@ -5,7 +5,7 @@
 #include <stdexcept>
 #include <string>
 
-/// A fresh directory that goes with this object, with whatever is in it.
+/// A fresh directory that is removed with this object, with all its content.
 class TemporaryDirectory {
 public:
     TemporaryDirectory() : m_path((std::filesystem::temp_directory_path() / "ssr-test-XXXXXX").string()) {

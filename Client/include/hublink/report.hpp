@@ -21,13 +21,13 @@
 ///     reporter.Event("B100|10001", "it's a text as it is");
 ///
 /// An event whose id begins with a capital A goes to analytics, any other to the user's local store. A text arrives in the
-/// store exactly as it was given, whatever is in it; JSON arrives as the same value.
+/// store exactly as it was given, with any characters; JSON arrives as the same value.
 namespace hublink {
 
 /// What happened to an event, or to a user that was set. The same names as in C and in Python.
 enum class Result {
-    /// The system took it, and somebody listens on the service's port. No more is known: the service answers nobody. Linux
-    /// drops a datagram without a word when the listener's buffer is full, which takes some thousand reports that come
+    /// The system took it, and a program listens on the service's port. No more is known: the service never answers. Linux
+    /// drops a datagram silently when the listener's buffer is full, which happens after some thousand reports that come
     /// faster than the service reads them.
     Sent,
     /// The service does not run. The event is lost; nothing is kept for later. The next event tries again.

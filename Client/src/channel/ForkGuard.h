@@ -4,7 +4,7 @@
 
 namespace hublink {
 
-/// A lock that is whole in the child of a fork, whatever other threads did at that moment: each fork takes the locks of all
+/// A lock that is usable in the child of a fork, also when other threads held it then: each fork takes the locks of all
 /// guards first and gives them back on both sides.
 ///
 /// Threads: any. Destroy it when no thread uses it any more.

@@ -4,14 +4,14 @@
 
 namespace hublink {
 
-/// A socket that is connected to the service's port, so that the system tells when nobody has bound it.
+/// A socket that is connected to the service's port, so that the system tells when no program has bound it.
 ///
 /// Threads: one at a time.
 class Socket {
 public:
     enum class Outcome {
         Sent,
-        Refused,        ///< Nobody listens: this datagram is lost.
+        Refused,        ///< No program listens: this datagram is lost.
         RefusedEarlier, ///< The system told it now of an earlier datagram. This one was not sent.
         Full,           ///< The send buffer is.
         TooLong,

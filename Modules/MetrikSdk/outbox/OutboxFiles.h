@@ -10,11 +10,11 @@
 /// are StoreErrors, with the system's words.
 namespace MetrikSdk::outbox::OutboxFiles {
 
-/// Opens the directory at `path`, by the rule of SafeDirectory; what is missing below `home` is made, 0700 whatever the
+/// Opens the directory at `path`, by the rule of SafeDirectory; missing directories below `home` are made, 0700 under any
 /// umask. A directory that breaks the rule is a StoreError of the kind Unsafe.
 Sqlite::SafeDirectory OpenDirectory(const std::string& path, const std::string& home);
 
-/// Makes the file `name`, or narrows it: 0600 whatever the umask, and never wider in between. SQLite gives its side
+/// Makes the file `name`, or narrows it: 0600 under any umask, and never wider in between. SQLite gives its side
 /// files the mode of the database. What is there already, beside it too, must be this user's alone. Must not be called
 /// while this process has the database open: closing any descriptor of a file drops the process's POSIX locks on it.
 Sqlite::Identity Prepare(const Sqlite::SafeDirectory& directory, const std::string& name);

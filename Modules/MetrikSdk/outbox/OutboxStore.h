@@ -52,7 +52,7 @@ struct Refusal {
 /// seconds (the log is synced at checkpoints, not at each commit) and never damages the file.
 /// Cost: no operation depends on how many events wait.
 /// Threads: one at a time. Several processes may have the same file open; removal is by row and uuid, so that
-/// nobody removes what another has put in the same place.
+/// no process removes what another has put in the same place.
 /// Failure: StoreError.
 class OutboxStore {
 public:

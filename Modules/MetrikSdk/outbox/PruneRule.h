@@ -35,7 +35,7 @@ ClockWatch BeginWatch(WallTime wall, SteadyTime steady);
 ClockWatch LookAgain(const ClockWatch& watch, WallTime wall, SteadyTime steady);
 
 /// Whether the clocks have agreed for long enough that events may be called old. Until then none is dropped by
-/// age: a board without a battery begins in whatever year it likes, and is corrected by the network later.
+/// age: a board without a battery starts in a wrong year, and the network corrects its clock later.
 bool MayDropByAge(const ClockWatch& watch, const CapSettings& caps);
 
 } // namespace MetrikSdk::outbox::PruneRule

@@ -11,7 +11,7 @@ enum class Cause {
     File,          ///< The outbox file cannot be used for now.
     Damage,        ///< The outbox file was set aside.
     Vanished,      ///< The outbox file was deleted or replaced.
-    Event,         ///< An event that cannot be stored whatever the file's state.
+    Event,         ///< An event that cannot be stored in any state of the file.
     Drop,          ///< Events given up for a cap.
     Upload,        ///< The collector cannot be reached or asks to wait.
     Refusal,       ///< Events that the collector will never take.

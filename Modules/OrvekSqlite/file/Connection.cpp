@@ -39,7 +39,7 @@ void RequireOurFiles(const std::string& path) {
 }
 
 /// Takes the right to read the file away from everybody but its owner, before SQLite first looks at its mode:
-/// SQLite gives the side files that it makes the mode of the database, whatever the process's umask.
+/// SQLite gives the side files that it makes the mode of the database, under any umask of the process.
 const std::string& MadePrivate(const std::string& path) {
     RequireOurFiles(path);
     SetMode(path, ModeOf(path) & PRIVATE);
@@ -88,7 +88,7 @@ Connection::Connection(const std::string& path, const Settings& settings)
 }
 
 /// SQLite checkpoints on closing, unless the file has lost its name. Then the write-ahead log keeps its own
-/// name and its rows, and whatever database is put at the path next would be read through it and be damaged.
+/// name and its rows, and SQLite would read the next database at that path through it and damage that database.
 /// Emptying the log into the file that it belongs to keeps both databases whole. A file that kept its name
 /// and was damaged gets its rows, too, for the same reason.
 Connection::~Connection() {

@@ -20,7 +20,7 @@ struct Options {
     double seconds = 2;
 };
 
-/// A terminal that knows colours, and nobody who does not want them.
+/// True on a terminal that knows colours, unless the user does not want them.
 bool WantsColours() {
     // NOLINTBEGIN(concurrency-mt-unsafe): one thread
     const char* const noColour = std::getenv("NO_COLOR");
@@ -63,7 +63,7 @@ int Watch(const Options& options) {
             options.isJson ? JsonOf(status, judgement) : ScreenOf(status, judgement, WantsColours());
         fmt::print("{}", isTerminal && !options.isJson ? InPlace(text) : text);
         if (std::fflush(stdout) != 0)
-            return 1; // whoever read it is gone
+            return 1; // the reader has closed the pipe
         std::this_thread::sleep_for(std::chrono::duration<double>(options.seconds));
     }
 }

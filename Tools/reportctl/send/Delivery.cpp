@@ -47,7 +47,7 @@ void PrintText(const std::string& text) {
     std::fputc('\n', stdout);
 }
 
-/// One that is too long for a datagram is none, whatever is in it.
+/// A line that is too long for a datagram is not blank, with any content.
 bool IsBlank(const LineReader& lines) {
     return lines.IsWhole() && lines.Text().find_first_not_of(BLANK) == std::string::npos;
 }

@@ -25,7 +25,7 @@ Descriptor Opened(int number) {
     return Descriptor(number);
 }
 
-/// With its whole mode from the first moment on, whatever the umask; never one that is there already.
+/// With its whole mode from the start, under any umask; never replaces an existing file.
 int CreateIn(int directory) {
     const mode_t mask = ::umask(0);
     const int file = ::openat(directory, NAME, O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC | O_NOFOLLOW, MODE);

@@ -111,7 +111,7 @@ public:
     }
 
 private:
-    /// By size, it ends when the rest fits, whatever the estimate was.
+    /// By size, it ends when the rest fits, also when the estimate was wrong.
     bool IsEnough() { return m_rule.keepBytes && BytesInUse(m_database) <= *m_rule.keepBytes; }
 
     /// No more than has to go, when all that are left are alike.

@@ -69,7 +69,7 @@ TEST_F(RotatedFilesTest, NumberTheFilesInTheOrderOfRotation) {
 TEST_F(RotatedFilesTest, GoOnWithTheHighestNumberOfAnEarlierRun) {
     WriteFile(At("Report_9.log"), "");
     WriteFile(At("Report_10.log"), "");
-    std::filesystem::create_directory(At("Report_12.log")); // somebody else's, but its name is taken
+    std::filesystem::create_directory(At("Report_12.log")); // not a log file, but its name is taken
     TakeIn("x");
     EXPECT_EQ(ContentOf(At("Report_13.log")), "x");
 }

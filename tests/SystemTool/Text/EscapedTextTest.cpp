@@ -105,7 +105,7 @@ TEST(EscapedText, CanBeTurnedBackIntoTheSameBytesAndEscapingItAgainChangesOnlyBa
             byte = static_cast<char>(random() % 3 == 0 ? random() % 256 : 0x80 + random() % 128);
         const std::string escaped = Escaped(bytes);
         EXPECT_EQ(Unescaped(escaped), bytes);
-        std::string again = Escaped(escaped); // whatever is no valid, harmless UTF-8 would be escaped now
+        std::string again = Escaped(escaped); // text that is not valid, harmless UTF-8 would be escaped now
         for (auto at = again.find("\\\\"); at != std::string::npos; at = again.find("\\\\", at + 1))
             again.erase(at, 1);
         EXPECT_EQ(again, escaped);

@@ -16,7 +16,7 @@ public:
     void Fill() const;
     void MakeRoom() const;
 
-    /// Nobody may write any more. Refused by the kernel while a file is open for writing.
+    /// No process may write any more. Refused by the kernel while a file is open for writing.
     void ForbidWriting() const;
     void AllowWriting() const;
 

@@ -9,7 +9,7 @@
 
 #include "tests/e2e/support/Service.h"
 
-/// The real service in an empty working directory, and what must still be so after somebody sent it the worst.
+/// The real service in an empty working directory, and what must still be true after the hostile datagrams.
 class HostileFixture : public ::testing::Test {
 protected:
     HostileFixture();

@@ -74,7 +74,7 @@ Service::~Service() {
         ADD_FAILURE() << output;
 }
 
-/// Whatever happened to the service: what it received has ended, waits, or was lost. There is no ledger where the disk took
+/// After any fault, each received report has ended, waits, or was lost. There is no ledger where the disk took
 /// none.
 void Service::ExpectBalance() {
     const auto isBalanced = [this] {

@@ -30,7 +30,7 @@ protected:
         SetVariable("XDG_DATA_HOME", m_directory.Path()); // below which the plug-in may make what is missing
     }
 
-    /// Whatever a test did: what the counters say is what the tables hold.
+    /// After every test, the counters must agree with the tables.
     void TearDown() override {
         Stop();
         if (std::filesystem::is_regular_file(File()))

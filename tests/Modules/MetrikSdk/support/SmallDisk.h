@@ -4,6 +4,6 @@
 #include <string>
 
 /// Runs `test` in a child process that sees a file system of `bytes` bytes mounted at `directory`, which
-/// nobody else sees. Without the right to mount (some containers) it returns Unavailable.
+/// no other process sees. Without the right to mount (some containers) it returns Unavailable.
 enum class SmallDiskResult { Passed, Failed, Unavailable };
 SmallDiskResult RunOnSmallDisk(const std::string& directory, int bytes, const std::function<void()>& test);

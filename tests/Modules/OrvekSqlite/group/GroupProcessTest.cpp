@@ -187,7 +187,7 @@ TEST_F(AnotherProgram, IsNotLockedOutForLongerThanAGroup) {
     EXPECT_LT(taken.back(), 10ms + 1s);
 }
 
-/// As anybody writes one: SQLite's own busy timeout, one insert after the other.
+/// As an ordinary program writes one: SQLite's own busy timeout, one insert after the other.
 TEST_F(AnotherProgram, HasItsTurnUnderConstantLoad) {
     SQLite::Database other(Store(), SQLite::OPEN_READWRITE, 5000);
     std::vector<Clock::duration> waits;

@@ -6,7 +6,7 @@
 #include "tests/Modules/OrvekSqlite/SqliteFixture.h"
 
 // What a report may try: its text ends the literal that it was put into and goes on in SQL. Each attack is
-// tried through each of the six values of the statement. Whatever it is, it adds at most its own row or
+// tried through each of the six values of the statement. Each attack adds at most its own row or
 // leaves an error, and it is over at once.
 namespace {
 

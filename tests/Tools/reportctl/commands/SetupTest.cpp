@@ -120,7 +120,7 @@ TEST_F(Setup, RefusesAnEmptyOpenId) {
 }
 
 TEST_F(Setup, TellsHowToGetTheRightToThePreferencesDirectoryAndDoesTheRest) {
-    // Nobody, not even root, can make a directory there.
+    // No user, not even root, can make a directory there.
     const auto outcome = Reportctl("setup --preferences-dir /sys/reportctl-test/hublink");
     EXPECT_EQ(outcome.exitCode, 1);
     EXPECT_TRUE(outcome.Says("Run: sudo install -d -m 1777 /sys/reportctl-test/hublink && "

@@ -22,7 +22,7 @@ protected:
 
     void TearDown() override { m_service.Stop(); }
 
-    /// Sends these lines, with whatever is wrong with them, and waits until the service is through with them.
+    /// Sends these lines with all their errors, and waits until the service has handled them.
     void SendAnyway(const std::string& lines) {
         const auto outcome = Send(FileOf(lines + AN_END) + "--anyway");
         ASSERT_EQ(outcome.exitCode, 0) << outcome.output;

@@ -61,7 +61,7 @@ protected:
         return all;
     }
 
-    /// A database that somebody made by hand, where set-up looks for one.
+    /// A database that a user made by hand, where set-up looks for one.
     void MakeStore(const std::string& sql) const {
         std::filesystem::create_directories(Database());
         SQLite::Database(Store(), SQLite::OPEN_READWRITE | SQLite::OPEN_CREATE).exec(sql);
