@@ -55,7 +55,7 @@ bool Sdk::InitSdk(std::string moduleId, std::string moduleVersion, std::string m
 
 void Sdk::TellInitFailure(Callback onFailure, const char* reason) noexcept {
     try {
-        if (const auto text = m_registry.Report(report::Cause::Init, reason))
+        if (const auto text = m_registry.RecordFailure(report::Cause::Init, reason))
             Call(onFailure, report::NameOf(report::Cause::Init), *text);
     } catch (...) { // no memory to tell it with
     }
@@ -78,11 +78,12 @@ bool Sdk::Attach(const std::string& dbDir, process::Membership module) {
 void Sdk::TellDirectory(Callback onFailure, bool hasOutbox, const std::string& refusal) {
     if (hasOutbox && refusal.empty())
         return;
-    const auto text = refusal.empty()
-                          ? m_registry.ReportNoDirectory()
-                          : m_registry.Report(report::Cause::Directory,
-                                              refusal + (hasOutbox ? "; the module uses the first outbox"
-                                                                   : "; events of this module are refused"));
+    const auto text =
+        refusal.empty()
+            ? m_registry.ReportNoDirectory()
+            : m_registry.RecordFailure(report::Cause::Directory,
+                                       refusal + (hasOutbox ? "; the module uses the first outbox"
+                                                            : "; events of this module are refused"));
     if (text)
         Call(onFailure, NameOf(report::Cause::Directory), *text);
 }

@@ -95,14 +95,14 @@ void OutboxRegistry::Release(std::shared_ptr<OutboxEngine>& engine) {
 }
 
 std::optional<std::string> OutboxRegistry::ReportNoDirectory() {
-    return Report(report::Cause::Directory,
-                  "No absolute database directory was given, neither now nor before: events of "
-                  "this module are refused");
+    return RecordFailure(report::Cause::Directory,
+                         "No absolute database directory was given, neither now nor before: events of "
+                         "this module are refused");
 }
 
-std::optional<std::string> OutboxRegistry::Report(report::Cause cause, const std::string& text) {
+std::optional<std::string> OutboxRegistry::RecordFailure(report::Cause cause, const std::string& text) {
     const std::lock_guard lock(m_mutex);
-    return m_reporter->Report(cause, text, std::chrono::steady_clock::now());
+    return m_reporter->RecordFailure(cause, text, std::chrono::steady_clock::now());
 }
 
 } // namespace MetrikSdk::process

@@ -50,7 +50,7 @@ public:
     /// What to tell a module that got no outbox, if it is time to tell: the limit on what is told holds for the
     /// process. It begins anew when the last outbox in use was released, whose users have heard it all.
     std::optional<std::string> ReportNoDirectory();
-    std::optional<std::string> Report(report::Cause cause, const std::string& text);
+    std::optional<std::string> RecordFailure(report::Cause cause, const std::string& text);
 
 private:
     static std::string Accepted(const std::string& directory, const std::string& dataDirectory,

@@ -4,7 +4,8 @@
 
 namespace MetrikSdk::report {
 
-std::optional<std::string> FailureReporter::Report(Cause cause, const std::string& text, SteadyTime now) {
+std::optional<std::string> FailureReporter::RecordFailure(Cause cause, const std::string& text,
+                                                          SteadyTime now) {
     const std::lock_guard lock(m_mutex);
     auto& history = m_histories[static_cast<std::size_t>(cause)];
     if (history.lastTold && now - *history.lastTold < m_interval) {

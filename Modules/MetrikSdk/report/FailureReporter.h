@@ -20,7 +20,7 @@ public:
     explicit FailureReporter(std::chrono::milliseconds interval) : m_interval(interval) {}
 
     /// The text to tell now, or nothing.
-    std::optional<std::string> Report(Cause cause, const std::string& text, SteadyTime now);
+    std::optional<std::string> RecordFailure(Cause cause, const std::string& text, SteadyTime now);
 
     /// Whether the end of failures of this cause is to be told.
     bool ReportEnd(Cause cause);

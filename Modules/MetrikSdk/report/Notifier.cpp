@@ -45,7 +45,7 @@ void Notifier::TellFailure(News news) noexcept {
 bool Notifier::IsTold(News& news) {
     if (news.kind == News::Kind::End)
         return m_reporter->ReportEnd(news.cause);
-    const auto text = m_reporter->Report(news.cause, news.text, std::chrono::steady_clock::now());
+    const auto text = m_reporter->RecordFailure(news.cause, news.text, std::chrono::steady_clock::now());
     news.text = text.value_or("");
     return text.has_value();
 }

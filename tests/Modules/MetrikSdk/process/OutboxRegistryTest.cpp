@@ -57,8 +57,8 @@ TEST_F(OutboxRegistryTest, TellsTheSameCauseOnceForAllOutboxes) {
         EXPECT_FALSE(engine->Open());
     }
     EXPECT_EQ(Told::Failures().All().size(), 1U);
-    EXPECT_TRUE(m_registry.Report(report::Cause::Init, "why"));
-    EXPECT_FALSE(m_registry.Report(report::Cause::Init, "why"));
+    EXPECT_TRUE(m_registry.RecordFailure(report::Cause::Init, "why"));
+    EXPECT_FALSE(m_registry.RecordFailure(report::Cause::Init, "why"));
 }
 
 TEST_F(OutboxRegistryTest, BoundsTheOutboxesOfAProcess) {
