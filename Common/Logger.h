@@ -53,7 +53,7 @@ struct LogSite {
 /// it, where boost::format cannot make sense of it, gives an Error line of "[BoostLogError]" and the reason
 /// instead. People search the log for that mark to find datagrams with percent signs.
 ///
-/// Never throws, also when the logger throws, and also where the report of a failed write fails itself: a log line is not worth
+/// Never throws, also when the logger throws or the report of a failed write fails: a log line is not worth
 /// a report. False when such an Error line took the text's place.
 template <typename... Arguments>
 static bool WriteLog(const LogSite& site, const std::string& format, const Arguments&... arguments) noexcept {

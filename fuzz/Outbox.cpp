@@ -1,4 +1,4 @@
-// Modules, events and a collector's answers through the analytics SDK and an outbox of its own: with any content, what was
+// Modules, events and a collector's answers through the analytics SDK and its own outbox: with any content, what was
 // accepted is counted in exactly one place, and what is sent is a request that a collector can read, with each event under
 // one id and one number.
 //

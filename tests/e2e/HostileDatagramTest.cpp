@@ -41,8 +41,7 @@ const Barrage BARRAGES[] = {
     {"ForgedRecords", Hostile::ForgedRecords, 0, 0},
     {"EscapedForgedRecords", Hostile::EscapedForgedRecords, 4 * 6, 4 * 9},
     {"TerminalEscapes", Hostile::TerminalEscapes, 8 * 6, 8 * 9},
-    {"Sql", Hostile::Sql, 25 * 2,
-     25 * 9}, // no statement holds the day mark, or a member that the service does not read
+    {"Sql", Hostile::Sql, 25 * 2, 25 * 9}, // no statement holds the day mark, or a member that is not read
     {"SqlThatFits", Hostile::SqlThatFits, ALL, 0},
 };
 

@@ -23,8 +23,7 @@ using namespace std::chrono_literals;
 
 class OutboxFault : public ::testing::Test {
 protected:
-    static constexpr auto COLLECTOR =
-        "127.0.0.1:4318"; ///< The sandbox's; no program listens until a test does.
+    static constexpr auto COLLECTOR = "127.0.0.1:4318"; ///< The sandbox's; a test starts the listener.
 
     void InstallAndStart() {
         m_service.Install();

@@ -26,8 +26,8 @@ namespace hublink {
 
 /// What happened to an event, or to a user that was set. The same names as in C and in Python.
 enum class Result {
-    /// The system took it, and a program listens on the service's port. No more is known: the service never answers. Linux
-    /// drops a datagram silently when the listener's buffer is full, which happens after some thousand reports that come
+    /// The system took it, and a program listens on the service's port. No more is known: there is no answer. Linux
+    /// drops a datagram silently when the listener's buffer is full, after some thousand reports that come
     /// faster than the service reads them.
     Sent,
     /// The service does not run. The event is lost; nothing is kept for later. The next event tries again.

@@ -103,7 +103,7 @@ bool Channel::IsOthersService(Clock::time_point now) noexcept {
     return m_isOthers && !m_allowsOthers;
 }
 
-/// The system may not report a refusal: another flood can fill the buffer for such messages. So where no program was seen
+/// The system may not report a refusal: a flood can fill the buffer for such messages. So where no program was seen
 /// to listen, a second look decides.
 bool Channel::IsNobodyThere() noexcept {
     if (!m_isServiceKnown)

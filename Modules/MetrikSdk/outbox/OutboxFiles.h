@@ -10,7 +10,7 @@
 /// are StoreErrors, with the system's words.
 namespace MetrikSdk::outbox::OutboxFiles {
 
-/// Opens the directory at `path`, by the rule of SafeDirectory; missing directories below `home` are made, 0700 under any
+/// Opens the directory at `path`, by the rule of SafeDirectory; makes missing directories below `home`, 0700 under any
 /// umask. A directory that breaks the rule is a StoreError of the kind Unsafe.
 Sqlite::SafeDirectory OpenDirectory(const std::string& path, const std::string& home);
 

@@ -19,7 +19,7 @@ class FailureReporter {
 public:
     explicit FailureReporter(std::chrono::milliseconds interval) : m_interval(interval) {}
 
-    /// The text to tell now, or nothing.
+    /// Counts the failure. Returns the text to tell now, or nothing when its cause was told too recently.
     std::optional<std::string> RecordFailure(Cause cause, const std::string& text, SteadyTime now);
 
     /// Whether the end of failures of this cause is to be told.

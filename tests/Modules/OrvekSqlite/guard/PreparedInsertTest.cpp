@@ -2,7 +2,7 @@
 
 #include "tests/Modules/OrvekSqlite/SqliteFixture.h"
 
-// Inserts that differ in their literals only are compiled once. A caller sees no difference: the rows that they store and the
+// Inserts that differ in their literals only are compiled once. No caller sees a difference: the stored rows and the
 // errors they give are those of SQLite running the same texts.
 namespace {
 
