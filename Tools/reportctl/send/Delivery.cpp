@@ -1,14 +1,21 @@
 #include "Tools/reportctl/send/Delivery.h"
 
 #include <cstdio>
+#include <optional>
 #include <thread>
+#include <vector>
 
 #include <Poco/Exception.h>
 #include <fmt/format.h>
 
+#include "Common/ServiceConstants.h"
+#include "Tools/reportctl/log/Files.h"
+#include "Tools/reportctl/message/Message.h"
+#include "Tools/reportctl/send/Announced.h"
 #include "Tools/reportctl/send/Judgement.h"
 #include "Tools/reportctl/send/LineReader.h"
 #include "Tools/reportctl/send/Sender.h"
+#include "Tools/reportctl/terminal/ShellQuoted.h"
 
 namespace reportctl::send {
 namespace {
@@ -41,6 +48,36 @@ bool MaySend(const Origin& origin, const Judgement& judgement, bool anyway) {
     return anyway || judgement.errors.empty();
 }
 
+/// What only the running service can tell: whether it knows the module. Asked for events alone, since it reads the log.
+class ServiceState {
+public:
+    void Judge(Judgement& judgement, const std::string& text) {
+        const auto message = message::Read(text);
+        if (!message.fault.empty() || message.module.empty())
+            return;
+        if (message.kind == message::Kind::Event && Known().Lacks(message.module))
+            judgement.warnings.push_back(fmt::format(
+                "the module \"{}\" has not announced itself to the running service, which drops its "
+                "events until then: reportctl send init --module {}",
+                message.module, terminal::ShellQuoted(message.module)));
+        if (message.kind == message::Kind::Control &&
+            message.control == SyncServiceReport::ORVEK_REPORT_MODULEINIT)
+            m_announced.push_back(message.module);
+    }
+
+private:
+    Announced& Known() {
+        if (!m_known)
+            m_known.emplace(log::LogDirectory());
+        for (; !m_announced.empty(); m_announced.pop_back())
+            m_known->Add(m_announced.back());
+        return *m_known;
+    }
+
+    std::optional<Announced> m_known;
+    std::vector<std::string> m_announced; ///< by messages of this command
+};
+
 /// The text alone on standard output, so that it can be piped into a file or another program.
 void PrintText(const std::string& text) {
     std::fwrite(text.data(), 1, text.size(), stdout);
@@ -65,7 +102,10 @@ public:
     bool Deliver(std::size_t number, const LineReader& lines) {
         const auto origin = fmt::format("line {}: ", number);
         const auto& line = lines.Text();
-        if (!MaySend(origin, lines.IsWhole() ? Judge(line) : JudgeLonger(lines.Bytes()), m_settings.anyway)) {
+        auto judgement = lines.IsWhole() ? Judge(line) : JudgeLonger(lines.Bytes());
+        if (lines.IsWhole())
+            m_service.Judge(judgement, line);
+        if (!MaySend(origin, judgement, m_settings.anyway)) {
             ++m_bad;
             return true;
         }
@@ -125,6 +165,7 @@ private:
     }
 
     const DeliverySettings& m_settings;
+    ServiceState m_service;
     Sender m_sender;
     std::chrono::steady_clock::time_point m_due;
     std::size_t m_sent = 0;
@@ -136,7 +177,8 @@ private:
 } // namespace
 
 int DeliverOne(const std::string& text, const DeliverySettings& settings) {
-    const auto judgement = Judge(text);
+    auto judgement = Judge(text);
+    ServiceState().Judge(judgement, text);
     if (!MaySend("", judgement, settings.anyway)) {
         TellError("", "nothing was sent. With --anyway it is sent as it is");
         return 1;

@@ -3,10 +3,12 @@
 #include <algorithm>
 
 #include <fmt/format.h>
+#include <rapidjson/document.h>
 
 #include "Common/ServiceConstants.h"
 #include "Common/Wire.h"
 #include "SystemTool/IO/JsonDocument.h"
+#include "Tools/reportctl/terminal/Printable.h"
 
 namespace reportctl::send {
 namespace {
@@ -103,6 +105,34 @@ void JudgeForAnalytics(Judgement& judgement, const std::string& eventID, const s
     JudgeAnalyticsValue(judgement, value);
 }
 
+/// Letters alone and small: what two spellings of one name share.
+std::string Bare(std::string_view name) {
+    std::string bare;
+    for (const char c : name)
+        if (c >= 'A' && c <= 'Z')
+            bare += static_cast<char>(c - 'A' + 'a');
+        else if (c >= 'a' && c <= 'z')
+            bare += c;
+    return bare;
+}
+
+/// A member whose name is almost one that the service reads, and which it does not see.
+void JudgeNames(Judgement& judgement, const std::string& text) {
+    rapidjson::Document document;
+    document.Parse<rapidjson::kParseIterativeFlag>(text.data(), text.size());
+    if (!document.IsObject())
+        return;
+    for (const auto& member : document.GetObject()) {
+        const std::string name(member.name.GetString(), member.name.GetStringLength());
+        for (const auto* right : {Wire::REPORT_MARK, "value", "createTime", "isDayReport", Wire::MESSAGE_KIND,
+                                  Wire::MESSAGE_DATA})
+            if (name != right && Bare(name) == Bare(right) && !document.HasMember(right))
+                judgement.warnings.push_back(fmt::format(
+                    "it has a member {}, which the service does not see: the name is \"{}\", to the letter",
+                    terminal::Printable(name), right));
+    }
+}
+
 void JudgeReport(Judgement& judgement, const JsonDocument& report) {
     const auto eventID = report.GetKeyValue(Wire::REPORT_MARK).ToString();
     const auto value = ValueText(report.GetKeyValue("value"));
@@ -115,6 +145,10 @@ void JudgeReport(Judgement& judgement, const JsonDocument& report) {
             "it has no event id (no \"eventID\" at the top level, or an empty one): "
             "the service would store a report that belongs to no event");
     JudgeTime(judgement, time);
+    if (eventID.starts_with("a") && Contains(eventID, "|"))
+        judgement.warnings.emplace_back(
+            "its event id begins with a small \"a\", so it goes to the store; those for "
+            "analytics begin with \"A\"");
     if (isForAnalytics) {
         JudgeForAnalytics(judgement, eventID, value);
         return;
@@ -231,6 +265,7 @@ Judgement Judge(const std::string& text) {
         judgement.warnings.emplace_back(
             "it holds a percent sign: the log may show a line with \"[BoostLogError]\" in "
             "place of it. It is processed all the same");
+    JudgeNames(judgement, text);
     JudgeMessage(judgement, text, message);
     return judgement;
 }

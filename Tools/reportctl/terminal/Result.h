@@ -24,13 +24,15 @@ public:
 
     void Write(std::string_view text);
 
+    /// Hands over what was written so far, for a result that grows while it is read.
+    void Flush();
+
     /// Everything is written when this returns. Without it, nothing of a file is left.
     void Finish();
 
     bool IsStandardOutput() const { return m_path.empty(); }
 
 private:
-    void Flush();
     void OpenFile();
 
     std::string m_path;

@@ -195,4 +195,26 @@ TEST_F(SendJudgement, NamesEverythingThatIsWrong) {
         "it is, and the database would reject the report. Write the quote twice: ''\n");
 }
 
+TEST_F(SendJudgement, WarnsOfASmallAThatLeadsToTheStore) {
+    ExpectWarning(
+        R"({"eventID":"a100|1")" + TIME,
+        "its event id begins with a small \"a\", so it goes to the store; those for analytics begin "
+        "with \"A\"");
+    ExpectGood(R"({"eventID":"a100")" + TIME);
+}
+
+TEST_F(SendJudgement, WarnsOfANameThatIsAlmostRight) {
+    const std::string notSeen = ", which the service does not see: the name is ";
+    ExpectWarning(R"({"eventID":"B1","Value":1)" + TIME,
+                  "it has a member Value" + notSeen + "\"value\", to the letter");
+    ExpectWarning(R"({"eventID":"B1","is_day_report":1)" + TIME,
+                  "it has a member is_day_report" + notSeen + "\"isDayReport\", to the letter");
+    EXPECT_NE(Said(R"({"eventID":"B1","createtime":1700000000})")
+                  .find("it has a member createtime" + notSeen + "\"createTime\", to the letter"),
+              std::string::npos);
+    EXPECT_NE(Said(R"({"eventid":"B1")" + TIME).find("it has a member eventid" + notSeen + "\"eventID\""),
+              std::string::npos);
+    ExpectGood(R"({"eventID":"B1","Createtime":1)" + TIME);
+}
+
 } // namespace

@@ -1,0 +1,125 @@
+#include "Tools/reportctl/bundle/Redaction.h"
+
+#include <algorithm>
+
+#include <fmt/format.h>
+
+#include "Common/Wire.h"
+#include "SystemTool/IO/JsonDocument.h"
+#include "Tools/reportctl/log/Line.h"
+#include "Tools/reportctl/message/Message.h"
+#include "Tools/reportctl/terminal/Printable.h"
+
+namespace reportctl::bundle {
+namespace {
+
+using SystemTool::IO::JsonDocument;
+
+std::string Sizes(std::string_view what, std::size_t bytes) {
+    return fmt::format("[{}, {} bytes]", what, bytes);
+}
+
+/// What a database quotes in its error is a piece of the statement, and may be one of a value.
+std::string WithoutQuoted(const std::string& text) {
+    std::string out;
+    bool isInside = false;
+    for (const char c : text) {
+        if (c == '"' && !isInside)
+            out += "\"...";
+        if (c == '"') {
+            isInside = !isInside;
+            out += isInside ? "" : "\"";
+        } else if (!isInside || c == '\n') {
+            out += c;
+        }
+    }
+    return out;
+}
+
+/// The last error of the log may be quoted anywhere, with the statement of the report that the store refused.
+std::string WithoutStatements(const std::string& text) {
+    std::string out;
+    for (std::size_t begin = 0; begin < text.size();) {
+        const auto end = std::min(text.find('\n', begin), text.size() - 1) + 1;
+        const auto line = text.substr(begin, end - begin);
+        const auto sql = line.find("insert into OperLog");
+        const bool hasPiece =
+            line.find("near \"") != std::string::npos; // the rest of the line may have been cut off
+        if (sql != std::string::npos)
+            out += WithoutQuoted(line.substr(0, sql)) + "[statement]\n";
+        else
+            out += hasPiece ? WithoutQuoted(line) : line;
+        begin = end;
+    }
+    return out;
+}
+
+std::string RedactedControl(const message::Message& message, const JsonDocument& data) {
+    JsonDocument kept;
+    for (const auto* name :
+         {"moduleID", "moduleVersion", "moduleName", "hublinkVersion", "logPath", "dbPath"})
+        if (const auto text = data.GetKeyValue(name).ToString(); !text.empty())
+            kept.SetKeyValue(name, text);
+    if (const auto openID = data.GetKeyValue("openID").ToString(); !openID.empty())
+        kept.SetKeyValue("openID", Sizes("open id", openID.size()));
+    JsonDocument redacted;
+    redacted.SetKeyValue(Wire::MESSAGE_KIND, message.control);
+    redacted.SetKeyValue(Wire::MESSAGE_DATA, kept);
+    return redacted.ToJson();
+}
+
+std::string RedactedReport(const message::Message& message) {
+    JsonDocument redacted;
+    redacted.SetKeyValue(Wire::REPORT_MARK, message.eventID);
+    redacted.SetKeyValue("value", Sizes("value", message.value.size()));
+    redacted.SetKeyValue("createTime", message.createTime);
+    return redacted.ToJson();
+}
+
+/// The message of a record, by where it comes from.
+std::string Redacted(const log::Line& line) {
+    if (line.site == "App/ReportServer" && line.function == "Recv")
+        return line.message.starts_with("[BoostLogError]") ? line.message : RedactedDatagram(line.message);
+    if (line.site == "App/ReportServer" && line.function == "SetBaseInfo")
+        return "SetBaseInfo [open id and version]";
+    if (line.site == "Frame/DBHelper") {
+        const auto sql = line.message.find("-insert ");
+        return WithoutQuoted(line.message.substr(0, sql)) + (sql == std::string::npos ? "" : "-[statement]");
+    }
+    return line.message;
+}
+
+} // namespace
+
+std::string RedactedDatagram(const std::string& text) {
+    const auto message = message::Read(text);
+    if (!message.fault.empty())
+        return Sizes("a text that is no JSON", text.size());
+    if (message.kind != message::Kind::Control)
+        return RedactedReport(message);
+    std::string ignored;
+    return RedactedControl(message, JsonDocument().FromJson(text, ignored).GetKeyValue(Wire::MESSAGE_DATA));
+}
+
+std::string Redaction::OfLogLine(const std::string& text) const {
+    if (m_withValues)
+        return text;
+    const auto line = log::ReadLine(text);
+    if (!line)
+        return Sizes("half a line", text.size());
+    const auto begin = text.find("] ", text.find("] [") + 2) + 2; // of the message
+    return OfText(text.substr(0, begin) + terminal::Printable(Redacted(*line)));
+}
+
+std::string Redaction::OfText(std::string text) const {
+    if (m_withValues)
+        return text;
+    text = WithoutStatements(text);
+    if (m_home.size() < 2)
+        return text;
+    for (auto at = text.find(m_home); at != std::string::npos; at = text.find(m_home, at + 1))
+        text.replace(at, m_home.size(), "~");
+    return text;
+}
+
+} // namespace reportctl::bundle

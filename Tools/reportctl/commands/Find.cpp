@@ -1,0 +1,284 @@
+#include <deque>
+#include <filesystem>
+#include <functional>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include <CLI/CLI.hpp>
+#include <fmt/format.h>
+#include <rapidjson/stringbuffer.h>
+#include <rapidjson/writer.h>
+
+#include "SystemTool/Text/Utf8.h"
+#include "Tools/reportctl/commands/Commands.h"
+#include "Tools/reportctl/log/Files.h"
+#include "Tools/reportctl/log/Show.h"
+#include "Tools/reportctl/log/Stream.h"
+#include "Tools/reportctl/outbox/Database.h"
+#include "Tools/reportctl/outbox/Events.h"
+#include "Tools/reportctl/store/Paths.h"
+#include "Tools/reportctl/store/Search.h"
+#include "Tools/reportctl/store/Store.h"
+#include "Tools/reportctl/terminal/Output.h"
+#include "Tools/reportctl/terminal/Printable.h"
+#include "Tools/reportctl/terminal/Result.h"
+#include "Tools/reportctl/terminal/Watch.h"
+
+namespace reportctl::commands {
+namespace {
+
+using Writer = rapidjson::Writer<rapidjson::StringBuffer>;
+
+constexpr auto HELP =
+    "Examples:\n"
+    "  reportctl find 'opened the door'\n"
+    "  reportctl find 'B100|10001'\n"
+    "  reportctl find 1700000000123 --json\n"
+    "\n"
+    "The text is searched as it is, upper and lower case apart: in the log for datagrams, in the store for "
+    "rows, "
+    "in the\n"
+    "outbox for events that wait or are dead letters. An event that was delivered is in the log alone.\n"
+    "Exit code 1: it was found nowhere, or something could not be read.\n"
+    "\n";
+
+constexpr std::chrono::milliseconds LOOK_AGAIN{100};
+constexpr std::size_t SHOWN_UNASKED = 1000;
+
+struct FindOptions {
+    std::string text;
+    std::size_t limit = SHOWN_UNASKED;
+    bool isJson = false;
+};
+
+/// The last ones of what was found in one place.
+struct Place {
+    std::size_t found = 0;
+    std::string since; ///< how far back the place reaches; empty when nothing tells
+    std::deque<std::string> lines;
+    std::string error;
+};
+
+class Search {
+public:
+    explicit Search(const FindOptions& options) : m_options(options) {}
+
+    void Run() {
+        Try(m_log, [this] { SearchLog(); });
+        Try(m_store, [this] { SearchStore(); });
+        Try(m_outbox, [this] { SearchOutbox(); });
+    }
+
+    void Print() const {
+        terminal::Result output("");
+        m_options.isJson ? PrintJson(output) : PrintText(output);
+        output.Finish();
+    }
+
+    /// 0 when something was found and every place could be read.
+    int ExitCode() const {
+        const bool isFound = m_log.found + m_store.found + m_outbox.found > 0;
+        return isFound && m_log.error.empty() && m_store.error.empty() && m_outbox.error.empty() ? 0 : 1;
+    }
+
+private:
+    static void Try(Place& place, const std::function<void()>& search) {
+        try {
+            search();
+        } catch (const std::exception& error) {
+            place.error = error.what();
+        }
+    }
+
+    void Add(Place& place, std::string line) const {
+        ++place.found;
+        place.lines.push_back(std::move(line));
+        if (place.lines.size() > m_options.limit)
+            place.lines.pop_front();
+    }
+
+    bool Holds(const std::string& text) const { return text.find(m_options.text) != std::string::npos; }
+
+    bool IsHit(const log::Entry& entry) const {
+        return entry.isDatagram && (Holds(entry.line.message) || Holds(entry.message.eventID) ||
+                                    Holds(entry.message.value) || Holds(entry.message.createTime));
+    }
+
+    void SearchLog() {
+        const auto directory = log::LogDirectory();
+        if (const auto reason = log::ReasonAgainst(log::LiveFile(directory)); !reason.empty())
+            throw std::runtime_error(fmt::format("{}: {}", log::LiveFile(directory), reason));
+        log::Stream stream(directory, log::RotatedFiles(directory));
+        auto left = stream.Read();
+        const auto take = [&](const log::Entry& entry) {
+            if (m_log.since.empty())
+                m_log.since = log::IsoTime(entry.line.time);
+            if (left > 0 && IsHit(entry))
+                Add(m_log, m_options.isJson ? log::JsonOf(entry) : log::TextOf(entry));
+            left -= left > 0 ? 1 : 0;
+        };
+        terminal::Watch watch;
+        for (stream.TakeFinished(take); left > 0 && watch.Wait(LOOK_AGAIN); stream.TakeFinished(take))
+            stream.Read();
+    }
+
+    void SearchStore() {
+        auto database = store::OpenToRead(store::StorePath());
+        m_store.since = store::OldestTime(database);
+        store::Search(database, m_options.text, [this](const store::FoundRow& row) {
+            Add(m_store, m_options.isJson ? JsonOf(row) : TextOf(row));
+        });
+    }
+
+    void SearchOutbox() {
+        if (!std::filesystem::exists(store::OutboxPath()))
+            return; // no event was ever stored
+        auto database = outbox::OpenToLook(store::OutboxPath());
+        const auto take = [this](const outbox::Event& event) {
+            if (Holds(event.eventID) || Holds(event.payload) || Holds(event.uuid))
+                Add(m_outbox, m_options.isJson ? JsonOf(event) : TextOf(event));
+        };
+        outbox::ForEach(database, outbox::Where::Waiting, 0, take);
+        outbox::ForEach(database, outbox::Where::Dead, 0, take);
+    }
+
+    static std::string TextOf(const store::FoundRow& row) {
+        return fmt::format("row {}  {}  {:<14} {}", row.id, row.at.empty() ? "(no time)" : row.at,
+                           terminal::Printable(row.event), terminal::Printable(row.value));
+    }
+
+    static std::string TextOf(const outbox::Event& event) {
+        return fmt::format("{}  {:<14} {}{}", event.uuid, terminal::Printable(event.eventID),
+                           terminal::Printable(event.payload),
+                           event.isDead ? fmt::format("  -> dead letter: {}: {}", event.status,
+                                                      terminal::Printable(event.reason))
+                                        : "  -> waiting");
+    }
+
+    static void Write(Writer& writer, const char* key, const std::string& text) {
+        const auto utf8 = SystemTool::Text::ValidUtf8(text);
+        writer.Key(key);
+        writer.String(utf8.data(), static_cast<rapidjson::SizeType>(utf8.size()));
+    }
+
+    static std::string JsonOf(const store::FoundRow& row) {
+        rapidjson::StringBuffer text;
+        Writer writer(text);
+        writer.StartObject();
+        writer.Key("id");
+        writer.Int64(row.id);
+        Write(writer, "at", row.at);
+        Write(writer, "eventID", row.event);
+        Write(writer, "value", row.value);
+        Write(writer, "openid", row.openid);
+        Write(writer, "createTime", row.createTime);
+        Write(writer, "outcome", "stored");
+        writer.EndObject();
+        return text.GetString();
+    }
+
+    static std::string JsonOf(const outbox::Event& event) {
+        rapidjson::StringBuffer text;
+        Writer writer(text);
+        writer.StartObject();
+        Write(writer, "id", event.uuid);
+        Write(writer, "module", event.module);
+        writer.Key("sequence");
+        writer.Int64(event.sequence);
+        Write(writer, "eventID", event.eventID);
+        Write(writer, "state", event.isDead ? "dead" : "waiting");
+        Write(writer, "reason", event.reason);
+        Write(writer, "payload", event.payload);
+        writer.EndObject();
+        return text.GetString();
+    }
+
+    void PrintText(terminal::Result& output) const {
+        const auto print = [&output](const std::string& title, const Place& place) {
+            output.Write(
+                fmt::format("{}{}: {} found{}\n", title,
+                            place.since.empty() ? "" : fmt::format(" (since {})", place.since), place.found,
+                            place.lines.size() < place.found
+                                ? fmt::format(", the last {} of them (see --limit)", place.lines.size())
+                                : ""));
+            if (!place.error.empty())
+                output.Write(fmt::format("  could not be read: {}\n", place.error));
+            for (const auto& line : place.lines)
+                output.Write("  " + line + "\n");
+        };
+        print("Log", m_log);
+        print("Store", m_store);
+        print("Outbox", m_outbox);
+    }
+
+    void PrintJson(terminal::Result& output) const {
+        const auto print = [&output](const char* name, const Place& place) {
+            output.Write(fmt::format("\"{}\":[", name));
+            for (std::size_t i = 0; i < place.lines.size(); ++i)
+                output.Write((i == 0 ? "" : ",\n") + place.lines[i]);
+            output.Write("],\n");
+        };
+        output.Write("{");
+        print("datagrams", m_log);
+        print("rows", m_store);
+        print("events", m_outbox);
+        rapidjson::StringBuffer text;
+        Writer writer(text);
+        writer.StartObject();
+        WriteOrNull(writer, "logSince", m_log.since);
+        WriteOrNull(writer, "storeSince", m_store.since);
+        WriteOrNull(writer, "logError", m_log.error);
+        WriteOrNull(writer, "storeError", m_store.error);
+        WriteOrNull(writer, "outboxError", m_outbox.error);
+        writer.EndObject();
+        output.Write(fmt::format("\"reach\":{}}}\n", text.GetString()));
+    }
+
+    static void WriteOrNull(Writer& writer, const char* key, const std::string& text) {
+        if (!text.empty())
+            return Write(writer, key, text);
+        writer.Key(key);
+        writer.Null();
+    }
+
+    const FindOptions& m_options;
+    Place m_log;
+    Place m_store;
+    Place m_outbox;
+};
+
+int RunFind(const FindOptions& options) {
+    try {
+        Search search(options);
+        search.Run();
+        search.Print();
+        return search.ExitCode();
+    } catch (const std::exception& error) {
+        terminal::TellLastError(error.what());
+        return 1;
+    }
+}
+
+} // namespace
+
+void AddFind(CLI::App& app, int& exitCode) {
+    auto options = std::make_shared<FindOptions>();
+    auto* command =
+        app.add_subcommand("find", "Find where a report ended: in the log, the store and the outbox.");
+    const CLI::Validator notEmpty(
+        [](const std::string& text) { return text.empty() ? "an empty text is in everything" : ""; }, "TEXT");
+    command->add_option("TEXT", options->text, "A part of the datagram, the event id, the value or the time")
+        ->required()
+        ->check(notEmpty);
+    command->add_option("--limit", options->limit, "Show so many of each place, the last ones")
+        ->capture_default_str();
+    command->add_flag(
+        "--json", options->isJson,
+        "A JSON object with the arrays datagrams, rows and events, and reach, which says since when "
+        "log and store tell");
+    command->footer(HELP + app.get_footer());
+    command->callback([options, &exitCode] { exitCode = RunFind(*options); });
+}
+
+} // namespace reportctl::commands

@@ -1,0 +1,212 @@
+#include <memory>
+#include <string>
+#include <vector>
+
+#include <CLI/CLI.hpp>
+#include <fmt/format.h>
+#include <rapidjson/stringbuffer.h>
+#include <rapidjson/writer.h>
+
+#include "SystemTool/Text/Utf8.h"
+#include "Tools/reportctl/commands/Commands.h"
+#include "Tools/reportctl/log/Show.h"
+#include "Tools/reportctl/outbox/CollectorTest.h"
+#include "Tools/reportctl/outbox/Database.h"
+#include "Tools/reportctl/outbox/DeadLetters.h"
+#include "Tools/reportctl/outbox/Events.h"
+#include "Tools/reportctl/service/Environment.h"
+#include "Tools/reportctl/store/Paths.h"
+#include "Tools/reportctl/terminal/Output.h"
+#include "Tools/reportctl/terminal/Printable.h"
+#include "Tools/reportctl/terminal/Result.h"
+
+namespace reportctl::commands {
+namespace {
+
+using outbox::Event;
+using outbox::Where;
+using Writer = rapidjson::Writer<rapidjson::StringBuffer>;
+
+constexpr auto HELP =
+    "Examples:\n"
+    "  reportctl outbox list --dead\n"
+    "  reportctl outbox retry --all\n"
+    "  reportctl outbox test\n"
+    "\n"
+    "An event waits until the collector has taken it; one that the collector refuses for good becomes a dead "
+    "letter.\n"
+    "All of this may be done while the service runs. It notices what is put back within a minute, unless it "
+    "waits "
+    "for a\n"
+    "collector that is away or refuses everything; then within five.\n"
+    "\n";
+
+struct OutboxOptions {
+    std::string path;
+    bool onlyDead = false;
+    bool isJson = false;
+    bool all = false;
+    std::vector<std::string> ids;
+};
+
+void Write(Writer& writer, const char* key, const std::string& text) {
+    writer.Key(key);
+    const auto utf8 = SystemTool::Text::ValidUtf8(text);
+    writer.String(utf8.data(), static_cast<rapidjson::SizeType>(utf8.size()));
+}
+
+void Write(Writer& writer, const char* key, std::int64_t number) {
+    writer.Key(key);
+    writer.Int64(number);
+}
+
+std::string StoredAt(const Event& event) {
+    return log::IsoTime(terminal::TimePoint(std::chrono::milliseconds(event.storedMs)));
+}
+
+std::string JsonOf(const Event& event) {
+    rapidjson::StringBuffer text;
+    Writer writer(text);
+    writer.StartObject();
+    Write(writer, "id", event.uuid);
+    Write(writer, "module", event.module);
+    Write(writer, "sequence", event.sequence);
+    Write(writer, "eventID", event.eventID);
+    Write(writer, "storedAt", StoredAt(event));
+    Write(writer, "bytes", event.bytes);
+    Write(writer, "state", event.isDead ? "dead" : "waiting");
+    if (event.isDead) {
+        Write(writer, "status", event.status);
+        Write(writer, "reason", event.reason);
+    } else {
+        writer.Key("status");
+        writer.Null();
+        writer.Key("reason");
+        writer.Null();
+    }
+    writer.EndObject();
+    return {text.GetString(), text.GetSize()};
+}
+
+std::string TextOf(const Event& event) {
+    auto text = fmt::format("{}  {:<7}  {}  {:>8} bytes  {}", event.uuid, event.isDead ? "dead" : "waiting",
+                            StoredAt(event), event.bytes, terminal::Printable(event.eventID));
+    if (event.isDead)
+        text += fmt::format("  -> {}: {}", event.status, terminal::Printable(event.reason));
+    return text;
+}
+
+void List(const OutboxOptions& options) {
+    auto database = outbox::OpenToLook(options.path);
+    terminal::Result output("");
+    std::int64_t count = 0;
+    const auto print = [&](const Event& event) {
+        if (options.isJson)
+            output.Write((count == 0 ? "[" : ",\n") + JsonOf(event));
+        else
+            output.Write(TextOf(event) + "\n");
+        ++count;
+    };
+    database.exec("begin"); // both tables of one moment: an event is in one of them
+    if (!options.onlyDead)
+        outbox::ForEach(database, Where::Waiting, 0, print);
+    outbox::ForEach(database, Where::Dead, 0, print);
+    database.exec("commit");
+    if (options.isJson)
+        output.Write(count == 0 ? "[]\n" : "]\n");
+    else if (count == 0)
+        output.Write(options.onlyDead ? "no dead letters\n"
+                                      : "nothing waits, and there are no dead letters\n");
+    output.Finish();
+}
+
+int Retry(const OutboxOptions& options) {
+    auto database = outbox::OpenToChange(options.path);
+    if (options.all) {
+        fmt::print("{} put back\n", outbox::RetryAll(database));
+        return 0;
+    }
+    const auto retried = outbox::Retry(database, options.ids);
+    fmt::print("{} put back\n", retried.events);
+    for (const auto& id : retried.unknown)
+        fmt::print(stderr, "error: no dead letter has the id {}\n", terminal::Printable(id));
+    return retried.unknown.empty() ? 0 : 1;
+}
+
+int Purge(const OutboxOptions& options) {
+    auto database = outbox::OpenToChange(options.path);
+    fmt::print("{} deleted\n", outbox::Purge(database));
+    return 0;
+}
+
+template <typename Command>
+int RunAndTell(Command command) {
+    try {
+        return command();
+    } catch (const std::exception& error) {
+        terminal::TellLastError(error.what());
+        return 1;
+    }
+}
+
+void AddList(CLI::App& outbox, const std::shared_ptr<OutboxOptions>& options, int& exitCode) {
+    auto* list =
+        outbox.add_subcommand("list", "List the events that wait and the dead letters, oldest first")
+            ->fallthrough();
+    list->add_flag("--dead", options->onlyDead, "Only dead letters");
+    list->add_flag("--json", options->isJson, "A JSON array");
+    list->callback([options, &exitCode] {
+        exitCode = RunAndTell([&] {
+            List(*options);
+            return 0;
+        });
+    });
+}
+
+void AddRetry(CLI::App& outbox, const std::shared_ptr<OutboxOptions>& options, int& exitCode) {
+    auto* retry =
+        outbox.add_subcommand("retry", "Put dead letters back, to be sent again under their old ids")
+            ->fallthrough();
+    auto* all = retry->add_flag("--all", options->all, "All of them");
+    retry->add_option("ID", options->ids, "The ids, as `list` shows them")->excludes(all);
+    retry->callback([options, &exitCode] {
+        if (!options->all && options->ids.empty())
+            throw CLI::RequiredError("Say which: --all, or ids", CLI::ExitCodes::RequiredError);
+        exitCode = RunAndTell([&] { return Retry(*options); });
+    });
+}
+
+void AddTest(CLI::App& outbox, int& exitCode) {
+    auto* test =
+        outbox.add_subcommand("test", "Send one marked test event to the collector that the running service "
+                                      "uses, and tell what it answers");
+    test->callback([&exitCode] {
+        exitCode = RunAndTell([] { return outbox::TestCollector(service::OfTheService()) ? 0 : 1; });
+    });
+}
+
+void AddPurge(CLI::App& outbox, const std::shared_ptr<OutboxOptions>& options, int& exitCode) {
+    auto* purge = outbox.add_subcommand("purge", "Delete dead letters")->fallthrough();
+    purge->add_flag("--dead", options->onlyDead, "All dead letters; there is nothing else to delete")
+        ->required();
+    purge->callback([options, &exitCode] { exitCode = RunAndTell([&] { return Purge(*options); }); });
+}
+
+} // namespace
+
+void AddOutbox(CLI::App& app, int& exitCode) {
+    auto options = std::make_shared<OutboxOptions>();
+    options->path = store::OutboxPath();
+    auto* outbox = app.add_subcommand(
+        "outbox", "Look at the events for analytics, send the refused ones again, test the collector.");
+    outbox->require_subcommand(1);
+    outbox->add_option("--file", options->path,
+                       "Another MetrikOutbox.db: that of a module with a directory of its own");
+    AddList(*outbox, options, exitCode);
+    AddRetry(*outbox, options, exitCode);
+    AddTest(*outbox, exitCode);
+    AddPurge(*outbox, options, exitCode);
+    outbox->footer(HELP + app.get_footer());
+}
+
+} // namespace reportctl::commands

@@ -1,0 +1,173 @@
+#include <cstdio>
+#include <deque>
+#include <memory>
+#include <optional>
+#include <string>
+
+#include <CLI/CLI.hpp>
+#include <fmt/format.h>
+
+#include "Tools/reportctl/commands/Commands.h"
+#include "Tools/reportctl/commands/FilterOptions.h"
+#include "Tools/reportctl/log/Files.h"
+#include "Tools/reportctl/log/Show.h"
+#include "Tools/reportctl/log/Stream.h"
+#include "Tools/reportctl/terminal/Output.h"
+#include "Tools/reportctl/terminal/Result.h"
+#include "Tools/reportctl/terminal/Watch.h"
+
+namespace reportctl::commands {
+namespace {
+
+using std::chrono::milliseconds;
+
+constexpr auto HELP = "Examples:\n"
+                      "  reportctl tail\n"
+                      "  reportctl tail --module B100 --since 10m\n"
+                      "  reportctl tail --refused --since 2026-11-20 --no-follow\n"
+                      "  reportctl tail --json | jq -r .eventID\n"
+                      "\n"
+                      "Each line: the time of arrival, \"report\" for the store, \"event\" for analytics or "
+                      "\"control\", the event "
+                      "id, the\n"
+                      "beginning of the value, and where it ended: \"stored\" when its row was found in the "
+                      "store, \"toAnalytics\" "
+                      "when the\n"
+                      "outbox has it or has counted it, \"refused\" with the reason, else \"unknown\". A "
+                      "line waits up to a second "
+                      "for that.\n"
+                      "Ctrl-C ends it.\n"
+                      "\n";
+
+constexpr milliseconds LOOK_AGAIN{200};
+constexpr std::size_t LINES_UNASKED = 10;
+/// Without --since: two files are at least 10 MiB, which is tens of thousands of lines.
+constexpr std::size_t ROTATED_FILES_UNASKED = 1;
+
+struct TailOptions {
+    std::string event;
+    std::string module;
+    bool onlyRefused = false;
+    std::string level;
+    std::string since;
+    std::optional<std::size_t> lines;
+    bool isJson = false;
+    bool noFollow = false;
+};
+
+bool IsWanted(const log::Entry& entry, const TailOptions& options) {
+    const auto level = std::max(entry.line.level, entry.refusedLevel);
+    return (options.event.empty() ||
+            (!entry.message.eventID.empty() && entry.message.eventID.starts_with(options.event))) &&
+           (options.module.empty() || entry.message.module == options.module) &&
+           (!options.onlyRefused || entry.outcome == log::Outcome::Refused) &&
+           (options.level.empty() || level >= log::LevelOf(options.level));
+}
+
+/// Prints entries: of those that were in the log at the start only the last ones, of the others each.
+class Tail {
+public:
+    Tail(const TailOptions& options, std::size_t before)
+        : m_options(options), m_output(""), m_before(before), m_kept(options.lines           ? *options.lines
+                                                                     : options.since.empty() ? LINES_UNASKED
+                                                                                             : SIZE_MAX) {}
+
+    void Take(const log::Entry& entry) {
+        const bool isBefore = m_before > 0;
+        m_before -= isBefore ? 1 : 0;
+        if (IsWanted(entry, m_options))
+            m_lines.push_back((m_options.isJson ? log::JsonOf(entry) : log::TextOf(entry)) + '\n');
+        if (isBefore && m_lines.size() > m_kept)
+            m_lines.pop_front();
+    }
+
+    /// Whether all of the entries that were there at the start are through.
+    bool HasAllOfBefore() const { return m_before == 0; }
+
+    void Print() {
+        if (!HasAllOfBefore())
+            return;
+        for (; !m_lines.empty(); m_lines.pop_front())
+            m_output.Write(m_lines.front());
+        m_output.Flush();
+    }
+
+private:
+    const TailOptions& m_options;
+    terminal::Result m_output;
+    std::size_t m_before;
+    std::size_t m_kept;
+    std::deque<std::string> m_lines;
+};
+
+void TellComplaints(log::Stream& stream) {
+    for (const auto& complaint : stream.TakeComplaints())
+        fmt::print(stderr, "note: some outcomes stay unknown: {}\n", complaint);
+}
+
+int Follow(const TailOptions& options, log::Stream& stream) {
+    terminal::Watch watch;
+    Tail tail(options, stream.Read());
+    for (;;) {
+        TellComplaints(stream);
+        stream.TakeFinished([&](const log::Entry& entry) { tail.Take(entry); });
+        tail.Print();
+        if (options.noFollow && tail.HasAllOfBefore())
+            return 0;
+        if (!watch.Wait(LOOK_AGAIN))
+            return 0;
+        stream.Read();
+    }
+}
+
+int RunTail(const TailOptions& options) {
+    const auto directory = log::LogDirectory();
+    const auto live = log::LiveFile(directory);
+    const bool isSince = !options.since.empty();
+    const auto since = isSince ? terminal::TimePoint(milliseconds(MillisecondsOf(options.since)))
+                               : terminal::TimePoint::min();
+    log::Stream stream(directory, isSince ? log::RotatedFilesSince(directory, since)
+                                          : log::LastRotatedFiles(directory, ROTATED_FILES_UNASKED));
+    stream.SetSince(since);
+    if (const auto reason = log::ReasonAgainst(live); !reason.empty()) {
+        fmt::print(stderr, "{}: {}: {}\n", options.noFollow ? "error" : "waiting for the log", live, reason);
+        if (options.noFollow)
+            return 1;
+    }
+    return Follow(options, stream);
+}
+
+int RunTailAndTell(const TailOptions& options) {
+    try {
+        return RunTail(options);
+    } catch (const std::exception& error) {
+        terminal::TellLastError(error.what());
+        return 1;
+    }
+}
+
+} // namespace
+
+void AddTail(CLI::App& app, int& exitCode) {
+    auto options = std::make_shared<TailOptions>();
+    auto* command = app.add_subcommand(
+        "tail", "Follow the log: what arrives, where it ends, and why something is refused.");
+    command->add_option("--event", options->event, "Only events whose id begins with this");
+    command->add_option("--module", options->module,
+                        "Only this module: what stands before an event id's first bar");
+    command->add_flag("--refused", options->onlyRefused, "Only what was refused");
+    command->add_option("--level", options->level, "Only lines of this level or a higher one")
+        ->check(CLI::IsMember({"DEBUG", "INFO", "WARN", "ERROR", "FATAL"}));
+    command
+        ->add_option("--since", options->since,
+                     std::string("Begin with the lines of this time: ") + terminal::TIME_FORMS)
+        ->check(IsTime());
+    command->add_option("--lines", options->lines,
+                        "Begin with so many lines of before. Without it, 10, or all since --since");
+    command->add_flag("--json", options->isJson, "One JSON object a line");
+    command->add_flag("--no-follow", options->noFollow, "End after the lines that are there");
+    command->footer(HELP + app.get_footer());
+    command->callback([options, &exitCode] { exitCode = RunTailAndTell(*options); });
+}
+
+} // namespace reportctl::commands

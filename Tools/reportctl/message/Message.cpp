@@ -1,0 +1,60 @@
+#include "Tools/reportctl/message/Message.h"
+
+#include "Common/Wire.h"
+#include "SystemTool/IO/JsonDocument.h"
+
+namespace reportctl::message {
+namespace {
+
+using SystemTool::IO::JsonDocument;
+
+std::string ValueText(const JsonDocument& value) {
+    return value.IsObject() ? value.ToJson() : value.ToString();
+}
+
+/// The service tells seconds from milliseconds by the length alone.
+std::string TimeText(const JsonDocument& createTime) {
+    auto text = createTime.ToString();
+    return text.size() == Wire::SECONDS_LENGTH ? text + "000" : text;
+}
+
+void ReadReport(Message& message, const JsonDocument& report) {
+    message.eventID = report.GetKeyValue(Wire::REPORT_MARK).ToString();
+    message.value = ValueText(report.GetKeyValue("value"));
+    message.createTime = TimeText(report.GetKeyValue("createTime"));
+    message.kind = message.eventID.starts_with(Wire::ANALYTICS_PREFIX) ? Kind::Event : Kind::Report;
+    if (const auto bar = message.eventID.find('|'); bar != std::string::npos)
+        message.module = message.eventID.substr(0, bar);
+}
+
+} // namespace
+
+const char* WordFor(Kind kind) {
+    switch (kind) {
+    case Kind::Report:
+        return "report";
+    case Kind::Event:
+        return "event";
+    case Kind::Control:
+        return "control";
+    default:
+        return "other";
+    }
+}
+
+Message Read(const std::string& text) {
+    Message message;
+    JsonDocument document;
+    document.FromJson(text, message.fault);
+    // The service searches the raw text, before it parses anything.
+    if (text.find(Wire::REPORT_MARK) != std::string::npos) {
+        ReadReport(message, document);
+        return message;
+    }
+    message.kind = Kind::Control;
+    message.control = document.GetKeyValue(Wire::MESSAGE_KIND).ToString();
+    message.module = document.GetKeyValue(Wire::MESSAGE_DATA).GetKeyValue("moduleID").ToString();
+    return message;
+}
+
+} // namespace reportctl::message

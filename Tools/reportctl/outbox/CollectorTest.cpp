@@ -1,0 +1,151 @@
+#include "Tools/reportctl/outbox/CollectorTest.h"
+
+#include <array>
+#include <cstdlib>
+#include <memory>
+#include <vector>
+
+#include <Poco/URI.h>
+#include <Poco/UUIDGenerator.h>
+#include <fmt/format.h>
+#include <netdb.h>
+
+#include "Modules/MetrikSdk/otlp/HttpSender.h"
+#include "Modules/MetrikSdk/otlp/OtlpEncoder.h"
+#include "SystemTool/IO/JsonDocument.h"
+#include "SystemTool/Text/Utf8.h"
+#include "SystemTool/Version.h"
+#include "Tools/reportctl/terminal/Printable.h"
+
+namespace reportctl::outbox {
+namespace {
+
+using MetrikSdk::otlp::EndpointConfig;
+using MetrikSdk::otlp::HttpResult;
+
+constexpr std::size_t BODY_BYTES = 500;
+
+/// libcurl looks these up in its own process.
+constexpr std::array PROXIES{"http_proxy", "https_proxy", "HTTPS_PROXY", "all_proxy",
+                             "ALL_PROXY",  "no_proxy",    "NO_PROXY"};
+
+void TakeOverProxies(const service::Environment& environment) {
+    for (const auto* name : PROXIES)
+        if (const auto* value = environment.Find(name))
+            ::setenv(name, value, 1); // NOLINT(concurrency-mt-unsafe): this program has one thread
+        else
+            ::unsetenv(name); // NOLINT(concurrency-mt-unsafe)
+}
+
+bool HasProxy(const service::Environment& environment) {
+    for (std::size_t i = 0; i < PROXIES.size() - 2; ++i)
+        if (environment.Find(PROXIES[i]) != nullptr)
+            return true;
+    return false;
+}
+
+std::string TestEvent() {
+    const auto now = MetrikSdk::WallNow();
+    SystemTool::IO::JsonDocument extend;
+    extend.SetKeyValue("createTime", std::to_string(now.time_since_epoch().count()));
+    SystemTool::IO::JsonDocument data;
+    data.SetKeyValue("test", "sent by `reportctl outbox test`; no report");
+    SystemTool::IO::JsonDocument payload;
+    payload.SetKeyValue("extend", extend);
+    payload.SetKeyValue("eventData", data);
+    return MetrikSdk::otlp::EncodeOtlp(
+        {.outboxId = "reportctl-test",
+         .events = {{.row = 1,
+                     .uuid = Poco::UUIDGenerator::defaultGenerator().createRandom().toString(),
+                     .release = 1,
+                     .sequence = 1,
+                     .eventId = "reportctl.test",
+                     .payload = payload.ToJson(),
+                     .storedAt = now,
+                     .bytes = 0}},
+         .releases = {{1, {"reportctl", SystemTool::Version::Number(), "reportctl"}}}});
+}
+
+/// False when the collector's name has no address. With a proxy the proxy looks it up.
+bool TellNameResolution(const EndpointConfig& config, const service::Environment& environment) {
+    const auto host = Poco::URI(config.url).getHost();
+    if (HasProxy(environment)) {
+        fmt::print("name resolution: by the proxy\n");
+        return true;
+    }
+    addrinfo hints{};
+    hints.ai_socktype = SOCK_STREAM;
+    addrinfo* found = nullptr;
+    const int code = ::getaddrinfo(host.c_str(), nullptr, &hints, &found);
+    const std::unique_ptr<addrinfo, decltype(&::freeaddrinfo)> owner(found, &::freeaddrinfo);
+    if (code != 0) {
+        fmt::print("name resolution: failed: {}: {}\n", host, ::gai_strerror(code));
+        return false;
+    }
+    std::array<char, NI_MAXHOST> address{};
+    ::getnameinfo(found->ai_addr, found->ai_addrlen, address.data(), address.size(), nullptr, 0,
+                  NI_NUMERICHOST);
+    fmt::print("name resolution: {} is {}\n", host, address.data());
+    return true;
+}
+
+std::string Beginning(const std::string& body) {
+    const auto text = SystemTool::Text::CutUtf8(body, BODY_BYTES);
+    return terminal::Printable(text) + (text.size() < body.size() ? "..." : "");
+}
+
+const char* Verdict(const HttpResult& result) {
+    if (result.status >= 200 && result.status < 300)
+        return result.contentType.starts_with("text/html")
+                   ? "a page, such as the log-in page of a network: events would wait in the outbox"
+                   : "taken";
+    if (result.status == 401 || result.status == 403)
+        return "refused: the collector does not accept the credentials (OTEL_EXPORTER_OTLP_HEADERS)";
+    if (result.status == 404)
+        return "refused: the collector does not know this path";
+    if (result.status == 429 || (result.status >= 502 && result.status <= 504))
+        return "not now: events would wait in the outbox";
+    if (result.status >= 300 && result.status < 400)
+        return "sent elsewhere, which is not followed: events would wait in the outbox";
+    return "refused: events would become dead letters";
+}
+
+bool TellAnswer(const EndpointConfig& config, const HttpResult& result) {
+    const bool isTls = config.url.starts_with("https:");
+    if (!result.fault.empty()) {
+        const bool isFaultOfTls = isTls && (result.fault.find("SSL") != std::string::npos ||
+                                            result.fault.find("certificate") != std::string::npos);
+        fmt::print("{}: {}\n", isFaultOfTls ? "TLS: failed" : "no answer", terminal::Printable(result.fault));
+        return false;
+    }
+    fmt::print("TLS: {}\n",
+               isTls ? "the collector's certificate is trusted" : "none, the address begins with http:");
+    fmt::print("status: {}, {}\n", result.status, Verdict(result));
+    if (!result.body.empty())
+        fmt::print("body: {}\n", Beginning(result.body));
+    return std::string(Verdict(result)) == "taken";
+}
+
+} // namespace
+
+bool TestCollector(const service::Environment& environment) {
+    std::vector<std::string> complaints;
+    const auto config =
+        MetrikSdk::otlp::ReadEndpoint([&](const char* name) { return environment.Find(name); }, complaints);
+    fmt::print("settings: {}\n",
+               environment.process == 0
+                   ? "of this environment; no service of this user runs"
+                   : fmt::format("of the running service, process {}", environment.process));
+    for (const auto& complaint : complaints)
+        fmt::print("settings: {}\n", terminal::Printable(complaint));
+    if (!config) {
+        fmt::print("No collector is configured (OTEL_EXPORTER_OTLP_ENDPOINT): events stay in the outbox.\n");
+        return false;
+    }
+    TakeOverProxies(environment);
+    MetrikSdk::otlp::HttpSender sender(*config);
+    fmt::print("collector: {}\n", terminal::Printable(sender.Destination()));
+    return TellNameResolution(*config, environment) && TellAnswer(*config, sender.Post(TestEvent()));
+}
+
+} // namespace reportctl::outbox

@@ -1,0 +1,163 @@
+#include <gmock/gmock.h>
+
+#include "Modules/MetrikSdk/outbox/OutboxSchema.h"
+#include "SystemTool/IO/JsonDocument.h"
+#include "tests/Modules/MetrikSdk/support/LoopbackServer.h"
+#include "tests/Tools/reportctl/support/ReportctlFixture.h"
+
+namespace {
+
+using ::testing::HasSubstr;
+
+/// An outbox as the service leaves it: one event waits, two were refused.
+class OutboxCommand : public ReportctlFixture {
+protected:
+    void SetUp() override {
+        std::filesystem::create_directories(Database());
+        SQLite::Database outbox(Path(), SQLite::OPEN_READWRITE | SQLite::OPEN_CREATE);
+        outbox.exec("pragma journal_mode = wal");
+        outbox.exec(MetrikSdk::outbox::TABLES);
+        outbox.exec(MetrikSdk::outbox::TRIGGER_AND_VIEW);
+        outbox.exec("pragma application_id = " + std::to_string(MetrikSdk::outbox::APPLICATION_ID));
+        outbox.exec("pragma user_version = " + std::to_string(MetrikSdk::outbox::SCHEMA_VERSION));
+        outbox.exec(R"sql(
+            insert into totals(id, outbox_id, dead_lettered, removed_bytes, dead_letters, dead_letter_bytes)
+                values(1, 'o', 2, 200, 2, 200);
+            insert into module(module_id) values('A100');
+            insert into module_release(module, version, name) values(1, '1', 'n');
+            update module set last_sequence = 2, stored_bytes = 200;
+            insert into event(uuid, module, release, sequence, event_id, payload, stored_ms, bytes)
+                values('u-3', 1, 1, 3, 'A100|3', '{}', 1700000000000, 100);
+            insert into dead_letter(uuid, module, release, sequence, event_id, payload, stored_ms, bytes, refused_ms,
+                    status, reason)
+                values('u-1', 1, 1, 1, 'A100|1', '{"a":1}', 1700000000000, 100, 1700000001000, 400, 'too odd'),
+                      ('u-2', 1, 1, 2, 'A100|2', '{}', 1700000000000, 100, 1700000001000, 413, char(27) || '[31mred');
+        )sql");
+    }
+
+    std::string Path() const { return Database() + "/MetrikOutbox.db"; }
+
+    std::string AskOutbox(const std::string& query) const {
+        SQLite::Database database(Path(), SQLite::OPEN_READWRITE);
+        return database.execAndGet(query).getString();
+    }
+
+    std::string Status() const {
+        return AskOutbox(
+            "select stored || ' ' || waiting || ' ' || waiting_bytes || ' ' || dead_lettered || ' ' || "
+            "dead_letters || ' ' || dead_letter_bytes from outbox_status");
+    }
+
+    static std::string EventsOfModule() {
+        return "select group_concat(uuid || '=' || sequence, ' ') from (select * from event order by id)";
+    }
+};
+
+TEST_F(OutboxCommand, ListsWhatWaitsAndWhatWasRefused) {
+    const auto outcome = Reportctl("outbox list", "TZ=UTC");
+    EXPECT_EQ(outcome.exitCode, 0);
+    EXPECT_EQ(outcome.output,
+              "u-3  waiting  2023-11-14T22:13:20.000+00:00       100 bytes  A100|3\n"
+              "u-1  dead     2023-11-14T22:13:20.000+00:00       100 bytes  A100|1  -> 400: too odd\n"
+              "u-2  dead     2023-11-14T22:13:20.000+00:00       100 bytes  A100|2  -> 413: \\x1b[31mred\n");
+}
+
+TEST_F(OutboxCommand, ListsAsJson) {
+    EXPECT_EQ(
+        Reportctl("outbox list --dead --json", "TZ=UTC").output,
+        R"([{"id":"u-1","module":"A100","sequence":1,"eventID":"A100|1","storedAt":"2023-11-14T22:13:20.000+00:00",)"
+        R"("bytes":100,"state":"dead","status":400,"reason":"too odd"},)"
+        "\n"
+        R"({"id":"u-2","module":"A100","sequence":2,"eventID":"A100|2","storedAt":"2023-11-14T22:13:20.000+00:00",)"
+        R"("bytes":100,"state":"dead","status":413,"reason":"\u001B[31mred"}])"
+        "\n");
+    Reportctl("outbox purge --dead");
+    EXPECT_EQ(Reportctl("outbox list --dead --json").output, "[]\n");
+}
+
+TEST_F(OutboxCommand, PutsDeadLettersBackUnderTheirIdsAndNewSequenceNumbers) {
+    const auto outcome = Reportctl("outbox retry --all");
+    EXPECT_EQ(outcome.exitCode, 0);
+    EXPECT_EQ(outcome.output, "2 put back\n");
+    EXPECT_EQ(AskOutbox(EventsOfModule()), "u-3=3 u-1=4 u-2=5");
+    EXPECT_EQ(Status(), "5 3 300 2 0 0");
+    EXPECT_EQ(AskOutbox("select payload from event where uuid = 'u-1'"), "{\"a\":1}");
+    EXPECT_EQ(AskOutbox("select abs(stored_ms / 1000 - unixepoch()) < 60 from event where uuid = 'u-1'"),
+              "1");
+    EXPECT_EQ(Reportctl("outbox retry --all").output, "0 put back\n");
+}
+
+TEST_F(OutboxCommand, PutsBackTheOnesThatAreNamed) {
+    const auto outcome = Reportctl("outbox retry u-2 u-9");
+    EXPECT_EQ(outcome.exitCode, 1);
+    EXPECT_TRUE(outcome.Says("1 put back")) << outcome.output;
+    EXPECT_TRUE(outcome.Says("error: no dead letter has the id u-9")) << outcome.output;
+    EXPECT_EQ(AskOutbox(EventsOfModule()), "u-3=3 u-2=4");
+    EXPECT_EQ(Status(), "4 2 200 2 1 100");
+}
+
+TEST_F(OutboxCommand, DeletesDeadLettersWhenItIsAskedTo) {
+    EXPECT_GE(Reportctl("outbox purge").exitCode, 100);
+    EXPECT_EQ(AskOutbox("select count(*) from dead_letter"), "2");
+    EXPECT_EQ(Reportctl("outbox purge --dead").output, "2 deleted\n");
+    EXPECT_EQ(Status(), "3 1 100 2 0 0");
+}
+
+TEST_F(OutboxCommand, ChangesNothingWhileItLooks) {
+    Reportctl("outbox list"); // whatever opening it for the first time brings
+    const auto before = Everything();
+    Reportctl("outbox list --json");
+    EXPECT_TRUE(Everything() == before);
+}
+
+TEST_F(OutboxCommand, SaysWhatIsWrongWithTheFile) {
+    SQLite::Database(Path(), SQLite::OPEN_READWRITE).exec("pragma user_version = 77");
+    const auto odd = Reportctl("outbox retry --all");
+    EXPECT_EQ(odd.exitCode, 1);
+    EXPECT_TRUE(odd.Says("is no outbox of schema version")) << odd.output;
+    const auto missing = Reportctl("outbox list --file '" + Data() + "/none.db'");
+    EXPECT_EQ(missing.exitCode, 1);
+    EXPECT_TRUE(missing.Says("there is no outbox")) << missing.output;
+    EXPECT_FALSE(std::filesystem::exists(Data() + "/none.db"));
+}
+
+TEST_F(OutboxCommand, SendsATestEventAndTellsTheAnswer) {
+    LoopbackServer collector(
+        [](const Request&) { return Reply{.status = 200, .body = "{\"ok\":1}", .headers = {}}; });
+    const auto outcome =
+        Reportctl("outbox test",
+                  "OTEL_EXPORTER_OTLP_HEADERS=key=secret OTEL_EXPORTER_OTLP_ENDPOINT=" + collector.Url());
+    EXPECT_EQ(outcome.exitCode, 0) << outcome.output;
+    EXPECT_THAT(outcome.output, HasSubstr("name resolution: 127.0.0.1 is 127.0.0.1\n"));
+    EXPECT_THAT(outcome.output, HasSubstr("TLS: none"));
+    EXPECT_THAT(outcome.output, HasSubstr("status: 200, taken\nbody: {\"ok\":1}\n"));
+    EXPECT_FALSE(outcome.Says("secret"));
+    ASSERT_EQ(collector.RequestCount(), 1U);
+    EXPECT_THAT(collector.Requests()[0].body, HasSubstr("reportctl.test"));
+    EXPECT_EQ(collector.Requests()[0].headers.at("key"), "secret");
+    EXPECT_EQ(Status(), "3 1 100 2 2 200") << "it does not go through the outbox";
+}
+
+TEST_F(OutboxCommand, TellsWhyTheTestEventWasNotTaken) {
+    LoopbackServer collector(
+        [](const Request&) { return Reply{.status = 401, .body = "who are you?", .headers = {}}; });
+    const auto refused = Reportctl("outbox test", "OTEL_EXPORTER_OTLP_ENDPOINT=" + collector.Url());
+    EXPECT_EQ(refused.exitCode, 1);
+    EXPECT_TRUE(refused.Says("status: 401, refused: the collector does not accept the credentials"))
+        << refused.output;
+    EXPECT_TRUE(refused.Says("body: who are you?")) << refused.output;
+
+    const auto unnamed =
+        Reportctl("outbox test", "OTEL_EXPORTER_OTLP_ENDPOINT=http://no-such-host.invalid:1");
+    EXPECT_EQ(unnamed.exitCode, 1);
+    EXPECT_TRUE(unnamed.Says("name resolution: failed: no-such-host.invalid: ")) << unnamed.output;
+
+    const auto away = Reportctl("outbox test", "OTEL_EXPORTER_OTLP_ENDPOINT=http://127.0.0.1:1");
+    EXPECT_TRUE(away.Says("no answer: ")) << away.output;
+
+    const auto none = Reportctl("outbox test", "env -u OTEL_EXPORTER_OTLP_ENDPOINT");
+    EXPECT_EQ(none.exitCode, 1);
+    EXPECT_TRUE(none.Says("No collector is configured")) << none.output;
+}
+
+} // namespace
