@@ -2,6 +2,7 @@
 
 #include <charconv>
 #include <cstdint>
+#include <utility>
 
 #include "SystemTool/IO/JsonParse.h"
 
@@ -14,24 +15,27 @@ constexpr std::int64_t MAX_CREATE_TIME_MS = 9'223'372'036'854;
 } // namespace
 
 /// Read by the service's own rules, and iteratively: what follows may use the call stack freely, since the depth is known.
-Payload::Payload(const std::string& text) {
-    Parse(text, MAX_DEPTH);
-    m_isShallow = m_isObject;
-    if (!m_isObject) // what the service takes as a report's value is one level deeper in its payload
-        Parse(text, SystemTool::IO::JsonDocument::MAX_DEPTH + 1);
+///
+/// What the service takes as a report's value is one level deeper in its payload.
+Payload::Payload(const std::string& text)
+    : m_document(Parsed(text, MAX_DEPTH)), m_isShallow(m_document != nullptr) {
+    if (!m_isShallow)
+        m_document = Parsed(text, SystemTool::IO::JsonDocument::MAX_DEPTH + 1);
 }
 
-void Payload::Parse(const std::string& text, int maxDepth) {
+std::unique_ptr<SystemTool::IO::JsonTree> Payload::Parsed(const std::string& text, int maxDepth) {
     SystemTool::IO::JsonParse parse(text, maxDepth);
-    m_document.Populate(parse);
-    m_isObject = parse.Error().empty() && m_document.IsObject();
+    auto document = std::make_unique<SystemTool::IO::JsonTree>();
+    document->Populate(parse);
+    const bool isObject = parse.Error().empty() && document->IsObject();
+    return isObject ? std::move(document) : nullptr;
 }
 
 const SystemTool::IO::JsonValue* Payload::ObjectIn(const char* name) const {
-    if (!m_isObject)
+    if (!m_document)
         return nullptr;
-    const auto member = m_document.FindMember(name);
-    return member != m_document.MemberEnd() && member->value.IsObject() ? &member->value : nullptr;
+    const auto member = m_document->FindMember(name);
+    return member != m_document->MemberEnd() && member->value.IsObject() ? &member->value : nullptr;
 }
 
 std::optional<std::string> Payload::TextIn(const char* outer, const char* name) const {

@@ -20,7 +20,7 @@ public:
 
     /// The payload as a JSON object; null when it is none, or one that is not sent as one: deeper than
     /// MAX_DEPTH, or not UTF-8.
-    const SystemTool::IO::JsonValue* Object() const { return m_isShallow ? &m_document : nullptr; }
+    const SystemTool::IO::JsonValue* Object() const { return m_isShallow ? m_document.get() : nullptr; }
 
     /// When the event happened, by the module's word: extend.createTime, decimal milliseconds as a text.
     /// Nothing when there is none or it makes no sense. Deep payloads have one, too.
@@ -33,12 +33,11 @@ public:
     std::optional<std::string> TextIn(const char* outer, const char* name) const;
 
 private:
-    void Parse(const std::string& text, int maxDepth);
+    static std::unique_ptr<SystemTool::IO::JsonTree> Parsed(const std::string& text, int maxDepth);
     const SystemTool::IO::JsonValue* ObjectIn(const char* name) const;
 
-    SystemTool::IO::JsonTree m_document;
-    bool m_isObject = false;
-    bool m_isShallow = false; ///< An object, and not deeper than MAX_DEPTH.
+    std::unique_ptr<SystemTool::IO::JsonTree> m_document; ///< Null: the text is no JSON object.
+    bool m_isShallow;                                     ///< The object is not deeper than MAX_DEPTH.
 };
 
 } // namespace MetrikSdk::otlp

@@ -44,7 +44,8 @@ std::optional<std::string> LossRun::Take() {
 }
 
 std::string LossRun::Text(const Run& run) {
-    auto text = std::to_string(run.events) + " events from " + Utc(run.from) + " to " + Utc(run.to) + ":";
+    auto text = std::to_string(run.events) + (run.events == 1 ? " event from " : " events from ") +
+                Utc(run.from) + " to " + Utc(run.to) + ":";
     auto others = run.events;
     for (const auto& [module, count] : run.modules) {
         text += " " + module + " " + std::to_string(count) + ",";

@@ -175,7 +175,7 @@ TEST_F(MisbehavingCollectorTest, RefusesOnePoisonousEventAmong500) {
     EXPECT_EQ(outbox.execAndGet("SELECT reason FROM dead_letter").getString(),
               "HTTP status 400: event 321 is bad");
     EXPECT_EQ(Told::Failures().Count("events refused: An event was refused for good"), 1);
-    EXPECT_EQ(Told::Failures().Count("events refused: Moved to the dead letters were 1 events from "), 1);
+    EXPECT_EQ(Told::Failures().Count("events refused: Moved to the dead letters: 1 event from "), 1);
 }
 
 TEST_F(MisbehavingCollectorTest, RejectsSomeEventsOfARequest) {

@@ -166,11 +166,11 @@ TEST_F(OutboxTest, TellsTheTotalsOfItsLosses) {
     const auto dropped = std::to_string(m_outbox->Status().dropped);
     const auto told = Told::Failures().All();
     const auto& drops = told.at(told.size() - 2);
-    EXPECT_TRUE(drops.starts_with("events dropped: No events are dropped any more; lost are " + dropped +
+    EXPECT_TRUE(drops.starts_with("events dropped: No events are dropped any more; lost: " + dropped +
                                   " events from 20"))
         << drops;
     EXPECT_TRUE(drops.ends_with("Z: A759 " + dropped)) << drops;
-    EXPECT_TRUE(told.back().starts_with("events refused: Moved to the dead letters were 3 events from 20"))
+    EXPECT_TRUE(told.back().starts_with("events refused: Moved to the dead letters: 3 events from 20"))
         << told.back();
     m_outbox->EndRuns();
     EXPECT_EQ(Told::Failures().All().size(), told.size()) << "once";
@@ -183,7 +183,7 @@ TEST_F(OutboxTest, TellsTheTotalsOnceARunOfDropsIsOver) {
     for (int i = 0; i < 100; ++i)
         ASSERT_TRUE(Append(std::string(500, 'x')));
     m_outbox->Take(1);
-    EXPECT_GE(Told::Failures().Count("events dropped: No events are dropped any more; lost are "), 1);
+    EXPECT_GE(Told::Failures().Count("events dropped: No events are dropped any more; lost: "), 1);
 }
 
 TEST_F(OutboxTest, DropsNothingByAgeBeforeItsClockHasProvedItself) {
