@@ -104,4 +104,14 @@ TEST_F(StoreInUse, IsExportedCountedAndCopiedWithoutAReportLost) {
               OLD_ROWS);
 }
 
+TEST_F(StoreInUse, IsCountedByOutcome) {
+    Service::Send(R"({"eventID":"new|1","value":"x","createTime":1900000000})");
+    Service::Send("no JSON");
+    m_service.AwaitQuiet(); // sends a report itself
+    ASSERT_EQ(m_service.Reportctl({"stats", "--by", "outcome", "--json"}), 0);
+    EXPECT_NE(m_service.Output().find(R"([{"key":"stored","count":2},{"key":"refused.notJson","count":1}])"),
+              std::string::npos)
+        << m_service.Output();
+}
+
 } // namespace

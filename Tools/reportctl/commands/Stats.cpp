@@ -2,6 +2,7 @@
 #include <filesystem>
 #include <map>
 #include <memory>
+#include <stdexcept>
 #include <string>
 #include <vector>
 
@@ -11,8 +12,11 @@
 #include <rapidjson/stringbuffer.h>
 #include <rapidjson/writer.h>
 
+#include "Ledger/Reader.h"
 #include "Tools/reportctl/commands/Commands.h"
 #include "Tools/reportctl/commands/FilterOptions.h"
+#include "Tools/reportctl/status/Names.h"
+#include "Tools/reportctl/status/Status.h"
 #include "Tools/reportctl/store/Csv.h"
 #include "Tools/reportctl/store/Paths.h"
 #include "Tools/reportctl/store/Store.h"
@@ -87,6 +91,42 @@ Stats CountReports(const StatsOptions& options) {
                         Sum(tally) - rows)};
 }
 
+constexpr auto OUTCOME = "outcome";
+
+/// The ledger counts no event by its id, and keeps its counters of the last ten minutes only.
+void RequireNoFilter(const FilterOptions& filter) {
+    if (!filter.since.empty() || !filter.until.empty() || !filter.event.empty())
+        throw CLI::ValidationError("--by outcome",
+                                   "the ledger counts since it was begun, and all events together: leave "
+                                   "--since, --until and --event out");
+}
+
+/// How the datagrams ended that the service received, and those that the system dropped before. The keys are the names in
+/// `reportctl status --json`.
+Stats CountOutcomes(const StatsOptions& options) {
+    const auto look = ReportLedger::LookAt(store::LedgerPath());
+    if (look.sight != ReportLedger::Sight::Sound)
+        throw std::runtime_error(store::LedgerPath() + " cannot be read: `reportctl status` says more");
+    store::Tally tally;
+    const auto add = [&](const std::string& key, unsigned place) {
+        if (look.total[place] > 0)
+            tally[key] = static_cast<std::int64_t>(look.total[place]);
+    };
+    for (const auto place :
+         {status::Place(ReportLedger::Outcome::Stored), status::Place(ReportLedger::Outcome::ToAnalytics),
+          status::Place(ReportLedger::Outcome::Control), status::Place(ReportLedger::Outcome::OtherControl),
+          unsigned{ReportLedger::EMPTY}, unsigned{ReportLedger::LOST_AT_ENDS},
+          unsigned{ReportLedger::DROPPED_BY_KERNEL}})
+        for (const auto& name : status::COUNTERS)
+            if (name.place == place)
+                add(name.json, place);
+    for (const auto& reason : status::REASONS)
+        add(std::string("refused.") + reason.json, reason.place);
+    return {store::Ranked(tally, Grouping::Event, options.top),
+            fmt::format("{} datagrams of the ledger since {}", look.total[ReportLedger::RECEIVED],
+                        status::IsoTime(look.begunAtMs))};
+}
+
 void PrintJson(const Stats& stats, terminal::Result& output) {
     rapidjson::StringBuffer text;
     rapidjson::Writer<rapidjson::StringBuffer> writer(text);
@@ -149,8 +189,10 @@ void Print(const Stats& stats, const StatsOptions& options) {
 }
 
 int RunStats(const StatsOptions& options) {
+    if (options.by == OUTCOME)
+        RequireNoFilter(options.filter);
     try {
-        Print(CountReports(options), options);
+        Print(options.by == OUTCOME ? CountOutcomes(options) : CountReports(options), options);
         return 0;
     } catch (const std::exception& error) {
         terminal::TellLastError(error.what());
@@ -164,7 +206,7 @@ void AddStats(CLI::App& app, int& exitCode) {
     auto options = std::make_shared<StatsOptions>();
     auto* command = app.add_subcommand("stats", "Count reports by hour, day, event, module or outcome.");
     command->add_option("--by", options->by, "What to count by")
-        ->check(CLI::IsMember({"hour", "day", "event", "module"}))
+        ->check(CLI::IsMember({"hour", "day", "event", "module", OUTCOME}))
         ->capture_default_str();
     options->filter.AddTo(*command);
     command->add_option("--top", options->top, "Only so many, the most frequent ones")

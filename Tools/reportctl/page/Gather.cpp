@@ -1,11 +1,11 @@
 #include "Tools/reportctl/page/Gather.h"
 
-#include <array>
 #include <utility>
 
 #include <SQLiteCpp/Exception.h>
 
 #include "Ledger/Reader.h"
+#include "Tools/reportctl/status/Names.h"
 #include "Tools/reportctl/status/Status.h"
 #include "Tools/reportctl/store/Paths.h"
 #include "Tools/reportctl/store/Unchanged.h"
@@ -13,32 +13,18 @@
 namespace reportctl::page {
 namespace {
 
-using ReportLedger::Outcome;
-
 /// How far back the page shows hours and days, and how many events and modules.
 constexpr std::int64_t SHOWN_MS = 90LL * 24 * 3600 * 1000;
 constexpr std::size_t SHOWN_KEYS = 15;
-
-constexpr std::array<std::pair<Outcome, const char*>, 8> REASONS{{
-    {Outcome::NotJson, "notJson"},
-    {Outcome::Store, "store"},
-    {Outcome::NoStore, "noStore"},
-    {Outcome::ModuleNotInit, "moduleNotInit"},
-    {Outcome::EventIdWithoutBar, "eventIdWithoutBar"},
-    {Outcome::ValueNotJson, "valueNotJson"},
-    {Outcome::Analytics, "analytics"},
-    {Outcome::Exception, "exception"},
-}};
 
 /// What each reason grew by from one mark of the ledger to the next.
 std::vector<RefusedAt> RefusedByMark(const ReportLedger::Look& look) {
     std::vector<RefusedAt> refused;
     for (std::size_t i = 1; i < look.marks.size(); ++i) {
         RefusedAt at{look.marks[i].atMs, {}};
-        for (const auto& [reason, name] : REASONS) {
-            const auto place = static_cast<unsigned>(reason);
-            at.byReason.emplace_back(name, look.marks[i].counts[place] - look.marks[i - 1].counts[place]);
-        }
+        for (const auto& reason : status::REASONS)
+            at.byReason.emplace_back(reason.json, look.marks[i].counts[reason.place] -
+                                                      look.marks[i - 1].counts[reason.place]);
         refused.push_back(std::move(at));
     }
     return refused;

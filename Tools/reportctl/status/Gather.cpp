@@ -40,7 +40,7 @@ uid_t OwnerOfData(const std::string& data) {
 Status Gather() {
     const std::string data = SystemTool::CommonTool::GetUserDataDir();
     Status status;
-    status.ledger = ReportLedger::LookAt(Paths::Run(data) + "/" + ReportLedger::FILE_NAME);
+    status.ledger = ReportLedger::LookAt(store::LedgerPath());
     status.atMs = SystemTool::Platform::CoarseTimeMs();
     status.lastMinute = ledger::OfTheLastMinute(status.ledger);
     status.lastSecond = ledger::OfTheLastSecond(status.ledger);

@@ -1,6 +1,7 @@
 #include "Tools/reportctl/store/Paths.h"
 
 #include "Common/Paths.h"
+#include "Ledger/Layout.h"
 #include "SystemTool/CommonTool.h"
 
 namespace reportctl::store {
@@ -13,6 +14,10 @@ std::string StorePath() {
 
 std::string OutboxPath() {
     return Paths::Databases(SystemTool::CommonTool::GetUserDataDir()) + "/MetrikOutbox.db";
+}
+
+std::string LedgerPath() {
+    return Paths::Run(SystemTool::CommonTool::GetUserDataDir()) + "/" + ReportLedger::FILE_NAME;
 }
 
 } // namespace reportctl::store

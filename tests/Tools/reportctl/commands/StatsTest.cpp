@@ -86,6 +86,14 @@ TEST_F(Stats, ShowNoEscapeSequenceOfAnEventId) {
                         "\n");
 }
 
+TEST_F(Stats, OfOutcomesTakeNoFilterAndSayThatThereIsNoLedger) {
+    EXPECT_GE(Reportctl("stats --by outcome --since 1h").exitCode, 100);
+    const auto outcome = Reportctl("stats --by outcome");
+    EXPECT_EQ(outcome.exitCode, 1);
+    EXPECT_TRUE(outcome.Says("hublink/run/Report.ledger cannot be read: `reportctl status` says more"))
+        << outcome.output;
+}
+
 TEST_F(Stats, RefuseAnUnknownGrouping) {
     EXPECT_GE(Reportctl("stats --by week").exitCode, 100);
 }
