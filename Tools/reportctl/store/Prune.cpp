@@ -140,6 +140,20 @@ void GiveSpaceBack(SQLite::Database& database, const PruneSettings& settings) {
     }
 }
 
+/// Merges the write-ahead log, which cuts the file. That takes a moment in which no other program writes: without one, the
+/// service's own next merge does it. A checkpoint that waits for the writers would keep them waiting for the disk.
+void MergeLog(SQLite::Database& database) {
+    constexpr auto PATIENCE = std::chrono::seconds(2);
+    constexpr auto BETWEEN_TRIES = std::chrono::milliseconds(20);
+    for (const auto end = Clock::now() + PATIENCE; Clock::now() < end;
+         std::this_thread::sleep_for(BETWEEN_TRIES)) {
+        SQLite::Statement checkpoint(database, "pragma wal_checkpoint(passive)");
+        checkpoint.executeStep();
+        if (checkpoint.getColumn(1).getInt() == checkpoint.getColumn(2).getInt())
+            return; // all of the log's pages are in the file
+    }
+}
+
 } // namespace
 
 PrunePlan PlanPrune(SQLite::Database& database, const PruneRule& rule) {
@@ -170,7 +184,7 @@ PruneResult Prune(SQLite::Database& database, const PruneRule& rule, const Prune
             Deletion(database, rule, settings).Run({AllIds(database).first, plan.endId}, progress);
     if (result.canShrink)
         GiveSpaceBack(database, settings);
-    database.exec("pragma wal_checkpoint(passive)");
+    MergeLog(database);
     result.bytesAfter = BytesOfFile(database);
     return result;
 }

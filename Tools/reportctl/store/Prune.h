@@ -36,7 +36,8 @@ struct PruneSettings {
 struct PruneResult {
     std::int64_t removed = 0;
     std::int64_t bytesBefore = 0; ///< of Report.db
-    std::int64_t bytesAfter = 0;
+    std::int64_t bytesAfter =
+        0; ///< Once the write-ahead log is merged, which a busy service may do a little later.
     bool canShrink = true; ///< false: the file keeps its size, and the space is used by the rows to come
 };
 
