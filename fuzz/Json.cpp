@@ -2,6 +2,7 @@
 // got.
 
 #include <charconv>
+#include <cmath>
 #include <cstring>
 #include <vector>
 
@@ -110,6 +111,15 @@ void RequireAnyTextCanBeSet(const std::string& bytes) {
     RequireEqual(again.ToJson(), document.ToJson(), "any text can be set, printed and read");
 }
 
+/// A number is refused as too big only where it is.
+void RequireTooBig(const std::string& text, const std::string& error) {
+    const std::string refusal = "Number too big to be stored in double. At byte ";
+    if (!error.starts_with(refusal))
+        return;
+    const auto at = static_cast<std::size_t>(std::stoul(error.substr(refusal.size())));
+    Require(std::isinf(std::strtod(text.c_str() + at, nullptr)), "what is refused as too big is so", error);
+}
+
 } // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
@@ -120,6 +130,7 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     const std::string json = document.ToJson();
     if (!error.empty()) {
         RequireEqual(json, "null", "what cannot be read is null");
+        RequireTooBig(text, error);
         return 0;
     }
     RequireEqual(Readable(json).ToJson(), json, "what was printed prints the same again");

@@ -41,9 +41,7 @@ JsonDocument::JsonDocument(std::shared_ptr<Tree> tree, const Value* value)
 
 JsonDocument JsonDocument::FromJson(const std::string& text, std::string& error) {
     auto tree = std::make_shared<Tree>();
-    JsonParse parse(text);
-    tree->document.Populate(parse);
-    error = parse.Error();
+    error = ReadJson(text, tree->document);
     *this = error.empty() ? JsonDocument(tree, &tree->document) : JsonDocument();
     return *this;
 }

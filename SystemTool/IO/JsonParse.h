@@ -14,6 +14,7 @@
 
 #include "SystemTool/IO/JsonDocument.h"
 #include "SystemTool/IO/JsonMemory.h"
+#include "SystemTool/IO/JsonNumbers.h"
 #include "SystemTool/Text/Utf8.h"
 
 // How a JSON text is read: JsonDocument and the encoder of analytics events use it, so that both read numbers alike.
@@ -129,8 +130,13 @@ public:
             return {};
         const bool refused = m_result.Code() == rapidjson::kParseErrorTermination;
         const std::string what = refused ? m_refusal : rapidjson::GetParseError_En(m_result.Code());
-        return what + " At byte " + std::to_string(m_start + m_result.Offset()) + ".";
+        return what + " At byte " + std::to_string(ErrorByte()) + ".";
     }
+
+    std::size_t ErrorByte() const { return m_start + m_result.Offset(); }
+
+    /// Whether the parser itself refused a number, which may be one that RewriteNumbers helps with.
+    bool IsNumberRefused() const { return m_result.Code() == rapidjson::kParseErrorNumberTooBig; }
 
 private:
     static constexpr std::string_view BYTE_ORDER_MARK = "\xef\xbb\xbf";
@@ -141,5 +147,20 @@ private:
     rapidjson::ParseResult m_result;
     const char* m_refusal = "";
 };
+
+/// Fills `tree` with the value of `text`. Returns what is wrong with the text and at which byte; empty when it is JSON, and
+/// only then the tree has a value.
+inline std::string ReadJson(const std::string& text, JsonTree& tree, int maxDepth = JsonDocument::MAX_DEPTH) {
+    JsonParse parse(text, maxDepth);
+    tree.Populate(parse);
+    if (!parse.IsNumberRefused())
+        return parse.Error();
+    std::string rewritten = text;
+    if (!RewriteNumbers(rewritten, parse.ErrorByte()))
+        return parse.Error();
+    JsonParse second(rewritten, maxDepth);
+    tree.Populate(second);
+    return second.Error();
+}
 
 } // namespace SystemTool::IO

@@ -24,10 +24,8 @@ Payload::Payload(const std::string& text)
 }
 
 std::unique_ptr<SystemTool::IO::JsonTree> Payload::Parsed(const std::string& text, int maxDepth) {
-    SystemTool::IO::JsonParse parse(text, maxDepth);
     auto document = std::make_unique<SystemTool::IO::JsonTree>();
-    document->Populate(parse);
-    const bool isObject = parse.Error().empty() && document->IsObject();
+    const bool isObject = SystemTool::IO::ReadJson(text, *document, maxDepth).empty() && document->IsObject();
     return isObject ? std::move(document) : nullptr;
 }
 

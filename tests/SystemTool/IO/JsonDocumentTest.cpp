@@ -184,6 +184,33 @@ TEST(JsonDocument, ANumberIsTheDoubleNearestToItsText) {
         EXPECT_EQ(number(text), std::strtod(text.c_str(), nullptr)) << text;
 }
 
+TEST(JsonDocument, ZeroIsANumberWhateverItsExponent) {
+    for (const std::string text : {"0e309", "0.0e999", "0E+309", "0.000e99999999999999999999"})
+        EXPECT_EQ(Parsed("[" + text + "]").ToJson(), "[0.0]") << text;
+    EXPECT_EQ(Parsed("-0e400").ToJson(), "-0.0");
+    EXPECT_EQ(Parsed(R"({"0e309":"0e309 \" 0e309\\","a":[1,-0.0e309,"\\"],"ü":0e309})").ToJson(),
+              R"({"0e309":"0e309 \" 0e309\\","a":[1,-0.0,"\\"],"ü":0.0})");
+}
+
+TEST(JsonDocument, ANumberOfThreeHundredDigitsIsReadWhenADoubleHoldsIt) {
+    EXPECT_EQ(Parsed("[17976931348623157" + std::string(292, '0') + "]").ToJson(),
+              "[1.7976931348623157e308]");
+    EXPECT_EQ(Parsed("[-1" + std::string(400, '0') + ".5e-400,18446744073709551615]").ToJson(),
+              "[-1.0,18446744073709551615]");
+}
+
+TEST(JsonDocument, AnErrorBehindANumberThatTheParserRefusesIsToldWithItsByte) {
+    EXPECT_EQ(ErrorOf("[0e309,1e309]"), "Number too big to be stored in double. At byte 7.");
+    EXPECT_EQ(ErrorOf("[0e309,-0.0e400,]"), "Invalid value. At byte 16.");
+    EXPECT_EQ(ErrorOf("\xef\xbb\xbf[0e309,nul]"), "Invalid value. At byte 13.");
+    EXPECT_EQ(ErrorOf("[0e309.5]"), ErrorOf("[0e300.5]"));
+    EXPECT_NE(ErrorOf("[0e309e5]"), "");
+    EXPECT_NE(ErrorOf("[0e309,\"0e309"), "");
+    EXPECT_NE(ErrorOf("[0e309,-"), "");
+    EXPECT_NE(ErrorOf("[0e309,\"\\"), "");
+    EXPECT_NE(ErrorOf("0e309 0e309"), "");
+}
+
 TEST(JsonDocument, OfMembersWithTheSameKeyTheFirstIsRead) {
     EXPECT_EQ(Parsed(R"({"a":1,"a":2})").GetKeyValue("a").ToInt(), 1);
 }

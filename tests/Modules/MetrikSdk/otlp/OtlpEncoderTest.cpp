@@ -205,6 +205,11 @@ TEST(OtlpEncoder, KeepsEveryDigitOfA64BitInteger) {
               std::string::npos);
 }
 
+TEST(OtlpEncoder, ReadsZeroWhateverItsExponent) {
+    EXPECT_EQ(Body(R"({"a":0e309})"),
+              R"({"kvlistValue":{"values":[{"key":"a","value":{"doubleValue":0.0}}]}})");
+}
+
 TEST(OtlpEncoder, KeepsTheFirstOfSeveralMembersWithOneKey) {
     EXPECT_EQ(Body(R"({"a":1,"a":2,"":3})"),
               R"({"kvlistValue":{"values":[{"key":"a","value":{"intValue":"1"}},)"
