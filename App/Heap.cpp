@@ -11,11 +11,13 @@
 //
 // All threads share one arena. A report's memory then serves the next report as soon as it is stored, which is when there is
 // least to spare; with an arena for each thread, it came back to the receiving thread's. And a thread's first allocation
-// makes no new arena: without memory for one, jemalloc 5.3 ends the process. Measured, one arena is no slower
-// (poco_tasker_bench).
+// makes no new arena: without memory for one, jemalloc 5.3 ends the process.
 //
 // What goes back, goes back with its addresses. Else a process with a limit of those (ulimit -v) keeps what a backlog needed
 // for ever, and SQLite's own mappings find no room until a restart.
+//
+// What the two cost: a queue of a million items takes 134 ms to fill and empty, where it took 109 with an arena for each
+// thread and addresses kept (poco_tasker_bench); that is 25 ns a report.
 extern "C" {
 extern __attribute__((visibility("default"))) const char* malloc_conf;
 const char* malloc_conf =

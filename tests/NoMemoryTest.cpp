@@ -2,6 +2,7 @@
 #include <atomic>
 #include <functional>
 #include <optional>
+#include <ostream>
 #include <string>
 
 #include <Poco/Event.h>
@@ -75,6 +76,8 @@ struct Kind {
     std::function<std::string(int n)> text;
     std::function<std::size_t(const ReportServer&)>
         effect; ///< Grows, or is another one, with each that is handled.
+
+    friend std::ostream& operator<<(std::ostream& out, const Kind& kind) { return out << kind.name; }
 };
 
 std::vector<Kind> Kinds() {

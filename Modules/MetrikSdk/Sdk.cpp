@@ -43,31 +43,46 @@ std::int64_t Sdk::GetPendingCount() {
 bool Sdk::InitSdk(std::string moduleId, std::string moduleVersion, std::string moduleName,
                   std::string /*logDir*/, std::string dbDir, Callback onFailure, Callback onSuccess) {
     try {
+        if (!m_announcement)
+            m_announcement = std::make_unique<Announcement>();
         Detach();
-        m_id = Cut(moduleId, MAX_ID_BYTES);
-        return Attach(dbDir, {nullptr, onFailure, onSuccess, Cut(moduleVersion, MAX_TEXT_BYTES),
-                              Cut(moduleName, MAX_TEXT_BYTES)});
+        *m_announcement = {true,
+                           std::move(moduleId),
+                           std::move(dbDir),
+                           {nullptr, onFailure, onSuccess, std::move(moduleVersion), std::move(moduleName)}};
+        return Attach();
     } catch (const std::exception& error) {
-        TellInitFailure(onFailure, error.what());
+        Tell(report::Cause::Init, error.what());
         return false;
     }
 }
 
-void Sdk::TellInitFailure(Callback onFailure, const char* reason) noexcept {
+void Sdk::Tell(report::Cause cause, const char* reason) noexcept {
+    const auto onFailure = m_membership     ? m_membership->onFailure
+                           : m_announcement ? m_announcement->module.onFailure
+                                            : nullptr;
     try {
-        if (const auto text = m_registry.RecordFailure(report::Cause::Init, reason))
-            Call(onFailure, report::NameOf(report::Cause::Init), *text);
+        if (const auto text = m_registry.RecordFailure(cause, reason))
+            Call(onFailure, report::NameOf(cause), *text);
     } catch (...) { // no memory to tell it with
     }
 }
 
-bool Sdk::Attach(const std::string& dbDir, process::Membership module) {
+/// Gives the announcement up once it has served, or told that it cannot.
+bool Sdk::Attach() {
+    const auto& given = *m_announcement;
+    m_id = Cut(given.id, MAX_ID_BYTES);
+    process::Membership module{nullptr, given.module.onFailure, given.module.onSuccess,
+                               Cut(given.module.version, MAX_TEXT_BYTES),
+                               Cut(given.module.name, MAX_TEXT_BYTES)};
     std::string refusal;
-    module.engine = m_registry.Acquire(dbDir, refusal);
+    module.engine = m_registry.Acquire(given.dbDir, refusal);
     TellDirectory(module.onFailure, module.engine != nullptr, refusal);
-    if (!module.engine)
+    if (module.engine)
+        m_membership = m_registry.Members().Join(std::move(module));
+    m_announcement.reset();
+    if (!m_membership)
         return false;
-    m_membership = m_registry.Members().Join(std::move(module));
     if (!m_membership->engine->Open() && !MovesToTheFirst())
         return false;
     Call(m_membership->onSuccess, "init", m_id);
@@ -99,8 +114,10 @@ bool Sdk::MovesToTheFirst() {
     }
     auto module = *m_membership;
     module.engine = std::move(first);
+    // Before it leaves the old one, which it may have to keep.
+    auto moved = m_registry.Members().Join(std::move(module));
     Detach();
-    m_membership = m_registry.Members().Join(std::move(module));
+    m_membership = std::move(moved);
     return m_membership->engine->Open();
 }
 
@@ -116,8 +133,11 @@ bool Sdk::Store(const std::string& eventId, const std::string& eventJson) {
 
 bool Sdk::ReportEvent(std::string eventId, std::string eventJson) {
     try {
+        if (m_announcement && m_announcement->isGiven)
+            Attach();
         return Store(eventId, eventJson) || (MovesToTheFirst() && Store(eventId, eventJson));
-    } catch (const std::exception&) { // out of memory: nothing was stored, and there is none to tell it with
+    } catch (const std::exception& error) { // out of memory: nothing was stored
+        Tell(report::Cause::Event, error.what());
         return false;
     }
 }

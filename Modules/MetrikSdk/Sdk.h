@@ -18,10 +18,11 @@ namespace MetrikSdk {
 /// and how many events.
 ///
 /// A second InitSdk begins anew with its arguments, and ends what the first began. One that returns false for
-/// a file that cannot be opened is not final: a later event tries again.
+/// a file that cannot be opened, or for want of memory, is not final: a later event tries again.
 class Sdk final : public IMetrikSdk {
 public:
-    explicit Sdk(process::OutboxRegistry& registry) : m_registry(registry) {}
+    explicit Sdk(process::OutboxRegistry& registry)
+        : m_registry(registry), m_announcement(std::make_unique<Announcement>()) {}
     ~Sdk() { Detach(); }
     Sdk(const Sdk&) = delete;
     Sdk& operator=(const Sdk&) = delete;
@@ -33,18 +34,28 @@ public:
     bool ReportEvent(std::string eventId, std::string eventJson) override;
 
 private:
-    bool Attach(const std::string& dbDir, process::Membership module);
+    /// What InitSdk was given, its texts uncut.
+    struct Announcement {
+        bool isGiven = false;
+        std::string id;
+        std::string dbDir;
+        process::Membership module; ///< Without its engine.
+    };
+
+    bool Attach();
     void TellDirectory(Callback onFailure, bool hasOutbox, const std::string& refusal);
     bool MovesToTheFirst();
     void Detach();
     bool Store(const std::string& eventId, const std::string& eventJson);
     outbox::Outbox& Events() const { return m_membership->engine->Events(); }
-    void TellInitFailure(Callback onFailure, const char* reason) noexcept;
+    void Tell(report::Cause cause, const char* reason) noexcept;
 
     process::OutboxRegistry& m_registry;
     std::shared_ptr<const process::Membership>
         m_membership; ///< Null before InitSdk, and without any directory.
     std::string m_id;
+    /// Kept until the module has been attached, for the next event to try again. Made beforehand: to fill it takes no memory.
+    std::unique_ptr<Announcement> m_announcement;
 };
 
 } // namespace MetrikSdk

@@ -145,11 +145,23 @@ bool Database::KeepError(Action action) {
         action();
         return true;
     } catch (const std::bad_alloc&) {
-        m_lastError = "out of memory"; // short enough to need none itself
+        TellNoMemory();
     } catch (const std::exception& error) {
-        m_lastError = error.what();
+        Tell(error);
     }
     return false;
+}
+
+void Database::Tell(const std::exception& error) noexcept {
+    try {
+        m_lastError = error.what();
+    } catch (const std::bad_alloc&) {
+        TellNoMemory();
+    }
+}
+
+void Database::TellNoMemory() noexcept {
+    m_lastError = "out of memory"; // short enough to need none itself
 }
 
 /// By looking again and again: a mutex that can be waited for with a deadline is a slower one, and this is

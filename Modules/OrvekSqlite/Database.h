@@ -1,6 +1,7 @@
 #pragma once
 
 #include <atomic>
+#include <exception>
 #include <mutex>
 #include <string>
 #include <thread>
@@ -92,6 +93,8 @@ private:
     bool RunAfterCommit(const file::LiveFile::Operation& operation);
     template <typename Action>
     bool KeepError(Action action);
+    void Tell(const std::exception& error) noexcept;
+    void TellNoMemory() noexcept;
     bool LockBefore(group::Clock::time_point deadline);
 
     const Settings m_settings;

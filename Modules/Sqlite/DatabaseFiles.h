@@ -39,6 +39,8 @@ public:
     explicit SideFileWatch(std::string path);
 
     bool LogIsInPlace() { return IsInPlace(m_log, m_logIdentity); }
+    /// When the log is not in place: whether another file has its name.
+    bool HasOtherLog() const { return IdentityOf(m_log).has_value(); }
     bool AreInPlace() { return LogIsInPlace() && IsInPlace(m_index, m_indexIdentity); }
 
 private:

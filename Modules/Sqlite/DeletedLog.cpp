@@ -10,11 +10,11 @@ void LeaveTheFilesOnClose(sqlite3* connection) {
 
 } // namespace
 
-bool RescueDeletedLog(sqlite3* connection, const std::string& path, SideFileWatch& files) {
+bool RescueDeletedLog(sqlite3* connection, SideFileWatch& files) noexcept {
     LeaveTheFilesOnClose(connection);
     if (files.LogIsInPlace()) // the index alone is gone: the log is read when it is opened again
         return true;
-    if (IdentityOf(path + "-wal"))
+    if (files.HasOtherLog())
         return false;
     int frames = -1;
     int merged = -1;

@@ -22,6 +22,8 @@ OutboxStore& LiveFile::Ready(SteadyTime now, std::chrono::milliseconds patience,
     }
     if (m_store && !m_store->IsWhole())
         Rescue(news);
+    if (m_store && m_store->InTransaction()) // its end found no memory; closing is one, and undoes it
+        m_store.reset();
     if (m_store) {
         m_store->SetLockPatience(patience);
         return *m_store;

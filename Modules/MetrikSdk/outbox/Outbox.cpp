@@ -1,6 +1,7 @@
 #include "Modules/MetrikSdk/outbox/Outbox.h"
 
 #include <algorithm>
+#include <new>
 #include <utility>
 
 #include "Modules/MetrikSdk/outbox/Uuid.h"
@@ -51,7 +52,7 @@ bool Outbox::Open() {
     } catch (const StoreError& error) {
         m_patienceUsedUp = true; // thousands of modules may announce themselves while the lock is held
         m_isUnsafe = error.fault == StoreFault::Unsafe;
-        m_notifier.TellFailure({CauseOf(error), error.what()});
+        m_notifier.TellFailure(CauseOf(error), error.what());
         return false;
     }
 }
@@ -70,16 +71,30 @@ bool Outbox::Append(const ModuleIdentity& module, std::string eventId, std::stri
         return true;
     } catch (const StoreError& error) {
         m_patienceUsedUp = true;
-        ++m_refused;
         m_isUnsafe = error.fault == StoreFault::Unsafe;
-        m_notifier.TellFailure({CauseOf(error), error.what()});
-        return false;
+        Refuse(CauseOf(error), error.what());
+    } catch (const std::bad_alloc&) {
+        Refuse(report::Cause::File, "Cannot store an event: out of memory");
     }
+    return false;
+}
+
+void Outbox::Refuse(report::Cause cause, const char* reason) noexcept {
+    ++m_refused;
+    m_notifier.TellFailure(cause, reason);
 }
 
 void Outbox::StoreEvent(OutboxStore& store, const ModuleIdentity& module, const NewEvent& event, Call& call) {
     m_caps.EventStored(store.Store(module, event));
-    if (m_patienceUsedUp.exchange(false))
+    try {
+        FollowEvent(store, call);
+    } catch (const std::bad_alloc&) { // the event itself is safe, and the next one comes here, too
+    }
+}
+
+/// What an event that was stored leads to.
+void Outbox::FollowEvent(OutboxStore& store, Call& call) {
+    if (m_patienceUsedUp.exchange(false) || m_refused > 0)
         TellEndOfFailures(call);
     try {
         m_caps.KeepWithinCaps(store, call.now, call.news);
@@ -89,10 +104,11 @@ void Outbox::StoreEvent(OutboxStore& store, const ModuleIdentity& module, const 
 }
 
 void Outbox::TellEndOfFailures(Call& call) {
-    call.news.push_back(
-        {report::Cause::File,
-         "Events are stored again; " + std::to_string(m_refused.exchange(0)) + " were refused meanwhile",
-         report::News::Kind::End});
+    const unsigned long refused = m_refused;
+    call.news.push_back({report::Cause::File,
+                         "Events are stored again; " + std::to_string(refused) + " were refused meanwhile",
+                         report::News::Kind::End});
+    m_refused -= refused; // once it is sure to be told
 }
 
 void Outbox::LearnAbout(OutboxStore& store, SteadyTime now) {

@@ -73,6 +73,8 @@ private:
 
     void StoreEvent(OutboxStore& store, const ModuleIdentity& module, const NewEvent& event, Call& call);
     static void TellDeadLetters(const std::optional<std::string>& totals, std::vector<report::News>& news);
+    void FollowEvent(OutboxStore& store, Call& call);
+    void Refuse(report::Cause cause, const char* reason) noexcept;
     void TellEndOfFailures(Call& call);
     void LearnAbout(OutboxStore& store, SteadyTime now);
 

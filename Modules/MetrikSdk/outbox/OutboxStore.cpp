@@ -69,8 +69,12 @@ OutboxStore::OutboxStore(const std::string& path, std::chrono::milliseconds lock
     m_sideFiles = Sqlite::SideFileWatch(path);
 }
 
+bool OutboxStore::InTransaction() {
+    return ::sqlite3_get_autocommit(m_database.getHandle()) == 0;
+}
+
 bool OutboxStore::Rescue() {
-    return Sqlite::RescueDeletedLog(m_database.getHandle(), m_database.getFilename(), m_sideFiles);
+    return Sqlite::RescueDeletedLog(m_database.getHandle(), m_sideFiles);
 }
 
 void OutboxStore::Configure() {
@@ -94,7 +98,7 @@ bool OutboxStore::IsOutbox() {
 void OutboxStore::CreateOrCheckSchema() {
     if (IsOutbox()) // known by reading: another process's write lock does not keep us from opening
         return;
-    auto transaction = WriteTransaction(m_database);
+    WriteTransaction transaction(m_database);
     const auto version = Number(m_database, "PRAGMA user_version");
     const auto objects = Number(m_database, "SELECT count(*) FROM sqlite_schema");
     if (version == 0 && objects == 0) {
@@ -105,12 +109,12 @@ void OutboxStore::CreateOrCheckSchema() {
         SQLite::Statement totals(m_database, "INSERT INTO totals(id, outbox_id) VALUES(1, ?1)");
         totals.bind(1, NewUuid(WallNow()));
         totals.exec();
-        transaction.commit();
+        transaction.Commit();
     } else if (Number(m_database, "PRAGMA application_id") == APPLICATION_ID && version == 1) {
         m_database.exec(MIGRATION);
         m_database.exec(TRIGGER_AND_VIEW);
         m_database.exec("PRAGMA user_version = " + std::to_string(SCHEMA_VERSION));
-        transaction.commit();
+        transaction.Commit();
     } else if (Number(m_database, "PRAGMA application_id") != APPLICATION_ID || version != SCHEMA_VERSION) {
         throw StoreError(StoreFault::SetAside, "The file is a database, but no outbox of this version");
     } else if (Number(m_database, "SELECT count(*) FROM totals") != 1) {
@@ -156,7 +160,7 @@ OutboxStore::ReleaseKeys OutboxStore::KeysOf(const ModuleIdentity& module) {
 }
 
 OutboxStore::ReleaseKeys OutboxStore::AddRelease(const ModuleIdentity& module) {
-    auto transaction = WriteTransaction(m_database);
+    WriteTransaction transaction(m_database);
     const auto newest = Number(m_database, NEWEST_RELEASE);
     SQLite::Statement addModule(m_database, "INSERT INTO module(module_id) VALUES(?1) "
                                             "ON CONFLICT DO UPDATE SET module_id = ?1 RETURNING id");
@@ -173,7 +177,7 @@ OutboxStore::ReleaseKeys OutboxStore::AddRelease(const ModuleIdentity& module) {
     addRelease.executeStep();
     keys.release = addRelease.getColumn(0).getInt64();
     addRelease.reset();
-    transaction.commit();
+    transaction.Commit();
     if (keys.release > newest)
         keys.newBytes = BytesOf(module);
     return keys;
@@ -276,7 +280,7 @@ void OutboxStore::CountRemoved(const char* counter, const Removed& removed) {
 
 void OutboxStore::RemoveDelivered(const Batch& batch, std::size_t refused) {
     Guarded("Cannot remove delivered events", [&] {
-        auto transaction = WriteTransaction(m_database);
+        WriteTransaction transaction(m_database);
         Removed removed;
         for (const auto& event : batch.events) {
             if (!Delete(event))
@@ -288,13 +292,13 @@ void OutboxStore::RemoveDelivered(const Batch& batch, std::size_t refused) {
         CountRemoved("refused", {rejected, 0});
         CountRemoved("delivered", {removed.events - rejected, removed.bytes});
         ForgetIdleModules();
-        transaction.commit();
+        transaction.Commit();
     });
 }
 
 std::string OutboxStore::MoveToDeadLetters(const StoredEvent& event, const Refusal& refusal, WallTime now) {
     return Guarded("Cannot move an event to the dead letters", [&] {
-        auto transaction = WriteTransaction(m_database);
+        WriteTransaction transaction(m_database);
         std::string module;
         SQLite::Statement copy(
             m_database,
@@ -317,7 +321,7 @@ std::string OutboxStore::MoveToDeadLetters(const StoredEvent& event, const Refus
             module = IdentityOf(event.release).id;
             ForgetIdleModules();
         }
-        transaction.commit();
+        transaction.Commit();
         return module;
     });
 }
@@ -331,7 +335,7 @@ std::size_t OutboxStore::TrimDeadLetters(std::size_t maxRows, std::size_t maxByt
         excess.bind(2, static_cast<std::int64_t>(maxBytes));
         while (excess.executeStep()) {
             excess.reset();
-            auto transaction = WriteTransaction(m_database);
+            WriteTransaction transaction(m_database);
             const auto oldest =
                 m_database.execAndGet("SELECT coalesce(min(id), 0) FROM dead_letter").getInt64();
             SQLite::Statement held(m_database,
@@ -344,7 +348,7 @@ std::size_t OutboxStore::TrimDeadLetters(std::size_t maxRows, std::size_t maxByt
             SQLite::Statement remove(m_database, "DELETE FROM dead_letter WHERE id = ?1");
             remove.bind(1, oldest);
             trimmed += remove.exec() == 1 ? 1U : 0U;
-            transaction.commit();
+            transaction.Commit();
         }
         return trimmed;
     });
@@ -395,7 +399,7 @@ std::int64_t OutboxStore::LargestModule(std::int64_t minBytes) {
 OutboxStore::Dropped OutboxStore::DropOldest(std::int64_t afterRow, WallTime before, std::int64_t excessBytes,
                                              std::size_t maxRows) {
     return Guarded("Cannot drop old events", [&] {
-        auto transaction = WriteTransaction(m_database);
+        WriteTransaction transaction(m_database);
         Dropped dropped;
         Removed removed;
         DropWhile(afterRow, 0, maxRows, removed, dropped,
@@ -416,7 +420,7 @@ OutboxStore::Dropped OutboxStore::DropOldest(std::int64_t afterRow, WallTime bef
         if (removed.events > 0)
             CountRemoved("dropped", removed);
         ForgetIdleModules();
-        transaction.commit();
+        transaction.Commit();
         return dropped;
     });
 }

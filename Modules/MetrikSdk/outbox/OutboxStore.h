@@ -68,6 +68,9 @@ public:
     /// Whether the files beside the database still have their names. Two system calls.
     bool IsWhole() { return m_sideFiles.AreInPlace(); }
 
+    /// Whether a transaction of an operation that failed is still open. What is stored then, would be undone with it.
+    bool InTransaction();
+
     /// When it is not whole, before it is closed: whether all events are in the file all the same.
     bool Rescue();
 

@@ -49,9 +49,29 @@ private:
     SQLite::Statement& m_statement;
 };
 
-inline SQLite::Transaction WriteTransaction(SQLite::Database& database) {
-    // A deferred one could fail in its middle when another process writes between its read and its write.
-    return SQLite::Transaction(database, SQLite::TransactionBehavior::IMMEDIATE);
-}
+/// A transaction that has the write lock from its beginning: a deferred one could fail in its middle when another process
+/// writes between its read and its write. Undone unless it is committed, but for want of memory: then it stays open, and
+/// its connection is to be closed. (The library's own ends the process then: its destructor throws.)
+class WriteTransaction {
+public:
+    explicit WriteTransaction(SQLite::Database& database) : m_database(database) {
+        m_database.exec("BEGIN IMMEDIATE");
+    }
+    ~WriteTransaction() {
+        if (!m_isCommitted)
+            ::sqlite3_exec(m_database.getHandle(), "ROLLBACK", nullptr, nullptr, nullptr);
+    }
+    WriteTransaction(const WriteTransaction&) = delete;
+    WriteTransaction& operator=(const WriteTransaction&) = delete;
+
+    void Commit() {
+        m_database.exec("COMMIT");
+        m_isCommitted = true;
+    }
+
+private:
+    SQLite::Database& m_database;
+    bool m_isCommitted = false;
+};
 
 } // namespace MetrikSdk::outbox

@@ -36,8 +36,14 @@ std::shared_ptr<const Membership> Memberships::Join(Membership wanted) {
     }
     if (found != m_memberships.end())
         return *found;
-    m_memberships.insert(membership);
-    membership->engine->Listeners().Subscribe(membership->onFailure, membership->onSuccess);
+    auto& listeners = membership->engine->Listeners();
+    listeners.Subscribe(membership->onFailure, membership->onSuccess);
+    try {
+        m_memberships.insert(membership);
+    } catch (...) { // a later module would find it, and another Unsubscribe
+        listeners.Unsubscribe(membership->onFailure, membership->onSuccess);
+        throw;
+    }
     return membership;
 }
 

@@ -1,6 +1,7 @@
 #include "Modules/MetrikSdk/process/OutboxRegistry.h"
 
 #include <cstdlib>
+#include <new>
 #include <utility>
 
 #include "Modules/Sqlite/SafeDirectory.h"
@@ -65,6 +66,8 @@ std::string OutboxRegistry::Accepted(const std::string& directory, const std::st
     try {
         if (!directory.empty())
             return Sqlite::SafeDirectory::Resolve(directory, dataDirectory);
+    } catch (const std::bad_alloc&) { // which says nothing of the directory
+        throw;
     } catch (const std::exception& error) {
         refusal = "The directory " + Shown(directory) + " is not used: " + Shown(error.what());
     }
@@ -91,7 +94,15 @@ void OutboxRegistry::Release(std::shared_ptr<OutboxEngine>& engine) {
     engine.reset();
     ForgetReleased();
     if (m_engines.empty())
+        ForgetWhatWasTold();
+}
+
+/// What comes next is a new beginning, which tells anew. Part of the modules' destruction, so it does without memory.
+void OutboxRegistry::ForgetWhatWasTold() noexcept {
+    try {
         m_reporter = std::make_shared<report::FailureReporter>(m_settings.tellInterval);
+    } catch (const std::bad_alloc&) { // then the limit on what is told goes on
+    }
 }
 
 std::optional<std::string> OutboxRegistry::ReportNoDirectory() {

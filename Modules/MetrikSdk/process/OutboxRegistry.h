@@ -57,6 +57,7 @@ private:
                                 std::string& refusal);
     std::string Choose(const std::string& canonical);
     void ForgetReleased();
+    void ForgetWhatWasTold() noexcept;
 
     const OutboxSettings m_settings;
     const otlp::LookUp m_lookUp;

@@ -23,7 +23,12 @@ void Take(std::map<IMetrikSdk::Callback, int>& subscribers, IMetrikSdk::Callback
 void Notifier::Subscribe(IMetrikSdk::Callback onFailure, IMetrikSdk::Callback onSuccess) {
     const std::lock_guard lock(m_mutex);
     Add(m_onFailure, onFailure);
-    Add(m_onSuccess, onSuccess);
+    try {
+        Add(m_onSuccess, onSuccess);
+    } catch (...) { // both or neither
+        Take(m_onFailure, onFailure);
+        throw;
+    }
 }
 
 void Notifier::Unsubscribe(IMetrikSdk::Callback onFailure, IMetrikSdk::Callback onSuccess) {
@@ -32,22 +37,27 @@ void Notifier::Unsubscribe(IMetrikSdk::Callback onFailure, IMetrikSdk::Callback 
     Take(m_onSuccess, onSuccess);
 }
 
-void Notifier::TellFailure(News news) noexcept {
+void Notifier::TellFailure(const News& news) noexcept {
     try {
         const std::lock_guard lock(m_mutex);
-        if (IsTold(news))
-            Tell(m_onFailure, NameOf(news.cause), news.text);
+        if (const auto words = Words(news))
+            Tell(m_onFailure, NameOf(news.cause), *words);
     } catch (...) { // no memory for the text
     }
 }
 
-/// Whether it is told now, and then in which words.
-bool Notifier::IsTold(News& news) {
-    if (news.kind == News::Kind::End)
-        return m_reporter->ReportEnd(news.cause);
-    const auto text = m_reporter->RecordFailure(news.cause, news.text, std::chrono::steady_clock::now());
-    news.text = text.value_or("");
-    return text.has_value();
+void Notifier::TellFailure(Cause cause, const char* text) noexcept {
+    try {
+        TellFailure(News{cause, text});
+    } catch (...) { // as above
+    }
+}
+
+/// In which words it is told, if it is told now.
+std::optional<std::string> Notifier::Words(const News& news) {
+    if (news.kind == News::Kind::Failure)
+        return m_reporter->RecordFailure(news.cause, news.text, std::chrono::steady_clock::now());
+    return m_reporter->ReportEnd(news.cause) ? std::optional(news.text) : std::nullopt;
 }
 
 void Notifier::TellFailures(const std::vector<News>& news) noexcept {

@@ -3,6 +3,7 @@
 #include <map>
 #include <memory>
 #include <mutex>
+#include <optional>
 #include <string>
 #include <utility>
 #include <vector>
@@ -33,7 +34,8 @@ public:
     void Subscribe(IMetrikSdk::Callback onFailure, IMetrikSdk::Callback onSuccess);
     void Unsubscribe(IMetrikSdk::Callback onFailure, IMetrikSdk::Callback onSuccess);
 
-    void TellFailure(News news) noexcept;
+    void TellFailure(const News& news) noexcept;
+    void TellFailure(Cause cause, const char* text) noexcept;
     void TellFailures(const std::vector<News>& news) noexcept;
     void TellSuccess(const std::string& what, const std::string& detail);
 
@@ -44,7 +46,7 @@ public:
 private:
     using Subscribers = std::map<IMetrikSdk::Callback, int>;
 
-    bool IsTold(News& news);
+    std::optional<std::string> Words(const News& news);
     static void Tell(const Subscribers& subscribers, const std::string& what, const std::string& detail);
 
     /// Guards all below. Recursive, because a callback may come back with an event that fails in its turn.

@@ -112,10 +112,7 @@ Connection::Rescue Connection::RescueRows() noexcept {
     RollBack();
     if (HasLostItsName() || m_sideFiles->AreInPlace()) // the destructor knows what to do
         return Rescue::NotNeeded;
-    auto* connection = m_database.getHandle();
-    return Sqlite::RescueDeletedLog(connection, sqlite3_db_filename(connection, "main"), *m_sideFiles)
-               ? Rescue::Done
-               : Rescue::Failed;
+    return Sqlite::RescueDeletedLog(m_database.getHandle(), *m_sideFiles) ? Rescue::Done : Rescue::Failed;
 }
 
 void Connection::RequireInPlace() {

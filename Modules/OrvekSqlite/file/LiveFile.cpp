@@ -20,6 +20,8 @@ bool IsAboutTheFile(const SQLite::Exception& error) {
 /// store.
 constexpr int MAX_ATTEMPTS = 3;
 
+constexpr std::size_t PATH_ROOM_BYTES = 4096; ///< The longest path that the system takes.
+
 /// A later change of the working directory must not lead to another file, and no name is special to SQLite
 /// (":memory:") once it starts with a slash. An empty path stays empty.
 std::string AsAbsolute(const std::string& path) {
@@ -30,9 +32,16 @@ std::string AsAbsolute(const std::string& path) {
 
 } // namespace
 
+LiveFile::LiveFile(const Settings& settings) : m_settings(settings) {
+    // The path comes once, when the program begins: no memory for it then must not cost every row until a restart.
+    m_path.reserve(PATH_ROOM_BYTES);
+}
+
 void LiveFile::Set(const std::string& path) {
     LetGo();
-    m_path = AsAbsolute(path);
+    m_path = path; // for which there is room
+    const std::string absolute = AsAbsolute(path);
+    m_path = absolute; // copied, so that the room stays
 }
 
 /// A connection that was opened for this very operation and fails has nothing newer to offer.

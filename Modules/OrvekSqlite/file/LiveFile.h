@@ -19,7 +19,7 @@ class LiveFile {
 public:
     using Operation = std::function<void(Connection&)>;
 
-    explicit LiveFile(const Settings& settings) : m_settings(settings) {}
+    explicit LiveFile(const Settings& settings);
 
     /// Lets go of the file that is open, and leads all later operations to `path`.
     void Set(const std::string& path);

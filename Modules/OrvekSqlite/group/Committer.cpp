@@ -4,8 +4,6 @@
 
 namespace OrvekSqlite::group {
 
-thread_local const Committer* Committer::s_self = nullptr;
-
 void Committer::Notice() {
     if (!m_isResting || !m_group.Due())
         return;
@@ -35,7 +33,7 @@ void Committer::Stop() {
 }
 
 void Committer::Run() {
-    s_self = this;
+    m_self = std::this_thread::get_id();
     std::unique_lock lock(m_mutex);
     while (!m_stop) {
         const auto due = m_group.Due();

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <atomic>
 #include <condition_variable>
 #include <mutex>
 #include <thread>
@@ -32,18 +33,18 @@ public:
     void Stop();
 
     /// Whether the caller is the thread. Callable from any thread, with or without the mutex.
-    bool IsThisThread() const { return s_self == this; }
+    bool IsThisThread() const { return m_self == std::this_thread::get_id(); }
 
 private:
     void Start();
     void Run();
 
-    static thread_local const Committer* s_self;
-
     std::mutex& m_mutex;
     Group& m_group;
     std::condition_variable m_wake;
     std::thread m_thread;
+    /// No thread-local variable tells: the C library ends the process where it finds no memory for a plug-in's.
+    std::atomic<std::thread::id> m_self;
     bool m_isResting = true; ///< waits without a deadline, or has not been started
     bool m_stop = false;
 };

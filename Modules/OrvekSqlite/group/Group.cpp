@@ -7,9 +7,11 @@
 namespace OrvekSqlite::group {
 namespace {
 
-bool IsALock(const std::exception& error) {
+/// A lock, which is waited for, or memory, which may be there again for the next statement.
+bool MaySoonPass(const std::exception& error) {
     const auto* refusal = dynamic_cast<const SQLite::Exception*>(&error);
-    return refusal != nullptr && refusal->getErrorCode() == SQLITE_BUSY;
+    return refusal == nullptr || refusal->getErrorCode() == SQLITE_BUSY ||
+           refusal->getErrorCode() == SQLITE_NOMEM;
 }
 
 } // namespace
@@ -30,7 +32,7 @@ void Group::Execute(const std::string& sql) {
 void Group::RefuseWhileUncommitted(Clock::time_point now) {
     if (m_state != State::Uncommitted)
         return;
-    if (!m_policy.MayTry(m_lastTry, m_metALock, now))
+    if (!m_policy.MayTry(m_lastTry, m_maySoonPass, now))
         std::rethrow_exception(m_reason);
     Commit();
 }
@@ -89,7 +91,7 @@ void Group::Commit() {
         m_state = State::Uncommitted;
         m_lastTry = Clock::now();
         m_reason = std::current_exception();
-        m_metALock = IsALock(error);
+        m_maySoonPass = MaySoonPass(error);
         throw;
     }
     m_kept.Clear();

@@ -74,7 +74,7 @@ private:
     // While Uncommitted: the last try to commit.
     Clock::time_point m_lastTry;
     std::exception_ptr m_reason; ///< why it failed
-    bool m_metALock = false;     ///< whether that is another program's lock
+    bool m_maySoonPass = false;  ///< whether that is another program's lock, or no memory
 };
 
 } // namespace OrvekSqlite::group

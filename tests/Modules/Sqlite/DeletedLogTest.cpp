@@ -28,7 +28,7 @@ protected:
     void Remove(const std::string& suffix) const { ASSERT_TRUE(fs::remove(m_path + suffix)); }
 
     bool Rescue() {
-        const bool rescued = RescueDeletedLog(m_database->getHandle(), m_path, *m_files);
+        const bool rescued = RescueDeletedLog(m_database->getHandle(), *m_files);
         m_database.reset();
         return rescued;
     }
