@@ -37,7 +37,9 @@ constexpr std::size_t LOG_LINES = 2000;
 std::string OutputOf(const std::string& command) {
     const auto program = SystemTool::IO::Directory::GetExcutableDirectory() + "reportctl";
     const auto line = fmt::format("{} {} 2>&1", terminal::ShellQuoted(program), command);
-    const std::unique_ptr<FILE, int (*)(FILE*)> pipe(::popen(line.c_str(), "r"), &::pclose);
+    const std::unique_ptr<FILE, int (*)(FILE*)> pipe(
+        ::popen(line.c_str(), "r"), // NOLINT(cert-env33-c): a fixed command of this program
+        &::pclose);
     if (!pipe)
         return "could not be run\n";
     std::string output;

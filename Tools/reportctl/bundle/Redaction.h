@@ -13,7 +13,7 @@ public:
 
     /// A line of the service's log. Of a datagram, the members that the service reads are left, without the value and the
     /// open id; a datagram that is no JSON is left out, and so is the statement of a report that the store refused.
-    std::string OfLogLine(const std::string& line) const;
+    std::string OfLogLine(const std::string& text) const;
 
     /// Any other text: paths below the home directory begin with "~".
     std::string OfText(std::string text) const;

@@ -61,6 +61,7 @@ std::vector<std::string> RotatedFiles(const std::string& directory) {
         if (const auto number = NumberOf(entry->path().filename()))
             byNumber[*number] = entry->path();
     std::vector<std::string> files;
+    files.reserve(byNumber.size());
     for (auto& [number, path] : byNumber)
         files.push_back(std::move(path));
     return files;

@@ -39,7 +39,7 @@ bool Follower::TakeLine(std::string& line) {
 bool Follower::Fill() {
     if (!m_file.IsOpen())
         return false;
-    std::array<char, std::size_t{64} * 1024> buffer;
+    std::array<char, std::size_t{64} * 1024> buffer{};
     const auto size = ::read(m_file.Number(), buffer.data(), buffer.size());
     if (size <= 0)
         return false;

@@ -1,11 +1,11 @@
 #include "Tools/reportctl/send/Announced.h"
 
 #include <cerrno>
+#include <csignal>
 #include <cstdlib>
 #include <fstream>
 #include <optional>
 
-#include <signal.h>
 #include <sys/types.h>
 
 #include "Common/ServiceConstants.h"
