@@ -127,8 +127,10 @@ void Sdk::Detach() {
 }
 
 bool Sdk::Store(const std::string& eventId, const std::string& eventJson) {
-    return m_membership &&
-           Events().Append({m_id, m_membership->version, m_membership->name}, eventId, eventJson);
+    if (!m_membership)
+        return false;
+    const ModuleIdentity module{m_id, m_membership->version, m_membership->name};
+    return Events().Append(module, eventId, eventJson);
 }
 
 bool Sdk::ReportEvent(std::string eventId, std::string eventJson) {

@@ -41,6 +41,16 @@ int FailingMemory::Failed() {
 }
 
 #if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
+#define HAS_HEAP_OF_A_SANITIZER // as gcc tells it
+#elif defined(__has_feature)
+#if __has_feature(address_sanitizer) || __has_feature(thread_sanitizer)
+#define HAS_HEAP_OF_A_SANITIZER // as clang does
+#endif
+#endif
+
+#ifdef HAS_HEAP_OF_A_SANITIZER
+
+const bool FailingMemory::FAILS_IN_C = false;
 
 // What takes memory from operator new gives it back by operator delete, which these replace, too.
 void* operator new(std::size_t bytes) {
@@ -59,6 +69,8 @@ void operator delete(void* memory, std::size_t) noexcept {
 }
 
 #else
+
+const bool FailingMemory::FAILS_IN_C = true;
 
 // The program's own come before the C library's, for the libraries that it loads, too. What they return is the C library's
 // memory, which its free takes back.

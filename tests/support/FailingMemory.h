@@ -12,6 +12,9 @@ public:
     FailingMemory(const FailingMemory&) = delete;
     FailingMemory& operator=(const FailingMemory&) = delete;
 
+    /// Whether allocations of the C library fail, too: SQLite's, for one.
+    static const bool FAILS_IN_C;
+
     /// How many have failed.
     static int Failed();
 };

@@ -114,7 +114,7 @@ TEST_P(StoreWithoutMemory, KeepsTheGroupWhoseCommitFoundNone) {
             << database->GetLastErrorMsg() << " after " << first;
         ASSERT_EQ(count, 2 * first) << "allocation " << first;
     }
-    EXPECT_GT(first, 3) << "allocations were made to fail";
+    EXPECT_TRUE(first > 3 || !FailingMemory::FAILS_IN_C) << "allocations were made to fail";
 }
 
 TEST_P(StoreWithoutMemory, OpensWithTheNextStatement) {
