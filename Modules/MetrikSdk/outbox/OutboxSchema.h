@@ -56,7 +56,8 @@ CREATE TABLE totals(
     dead_letters         INTEGER NOT NULL DEFAULT 0,
     dead_letter_bytes    INTEGER NOT NULL DEFAULT 0,
     forgotten_stored     INTEGER NOT NULL DEFAULT 0,
-    forgotten_bytes      INTEGER NOT NULL DEFAULT 0);
+    forgotten_bytes      INTEGER NOT NULL DEFAULT 0,
+    last_delivered_ms    INTEGER);
 )sql";
 
 /// From version 1, whose modules were kept for ever. Which of them have an event waiting is not known: until the last that
@@ -71,6 +72,7 @@ UPDATE module SET removed_bytes = stored_bytes - waiting.bytes
     WHERE waiting.module = module.id;
 ALTER TABLE totals ADD COLUMN forgotten_stored INTEGER NOT NULL DEFAULT 0;
 ALTER TABLE totals ADD COLUMN forgotten_bytes INTEGER NOT NULL DEFAULT 0;
+ALTER TABLE totals ADD COLUMN last_delivered_ms INTEGER;
 DROP TRIGGER event_stored;
 DROP VIEW outbox_status;
 )sql";
@@ -89,6 +91,9 @@ CREATE TRIGGER event_stored AFTER INSERT ON event BEGIN
 END;
 CREATE TRIGGER event_removed AFTER DELETE ON event BEGIN
     UPDATE module SET removed_bytes = removed_bytes + OLD.bytes WHERE id = OLD.module;
+END;
+CREATE TRIGGER delivered AFTER UPDATE OF delivered ON totals WHEN NEW.delivered > OLD.delivered BEGIN
+    UPDATE totals SET last_delivered_ms = CAST((julianday('now') - 2440587.5) * 86400000 + 0.5 AS INTEGER);
 END;
 CREATE VIEW outbox_status AS
     SELECT outbox_id, stored, delivered, refused, dead_lettered, dropped,

@@ -44,8 +44,8 @@ std::string OutputOf(const std::string& command) {
         return "could not be run\n";
     std::string output;
     std::array<char, 4096> piece{};
-    while (const auto size = std::fread(piece.data(), 1, piece.size(), pipe.get()))
-        output.append(piece.data(), size);
+    for (ssize_t size = 0; (size = ::read(::fileno(pipe.get()), piece.data(), piece.size())) > 0;)
+        output.append(piece.data(), static_cast<std::size_t>(size));
     return output;
 }
 

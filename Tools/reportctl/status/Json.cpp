@@ -183,6 +183,8 @@ void Add(Writer& json, const Outbox& outbox) {
     json.EndList();
     json.Add("endpoint", outbox.endpoint);
     json.Add("lastFailure", outbox.lastFailure);
+    json.Add("lastDeliveredAt",
+             outbox.lastDeliveredAtMs ? std::optional(IsoTime(*outbox.lastDeliveredAtMs)) : std::nullopt);
     json.End();
 }
 

@@ -1,6 +1,8 @@
 #include <algorithm>
 #include <filesystem>
 
+#include <fmt/format.h>
+
 #include "Modules/MetrikSdk/otlp/EndpointConfig.h"
 #include "Tools/reportctl/service/Processes.h"
 #include "Tools/reportctl/status/Parts.h"
@@ -17,10 +19,15 @@ constexpr auto TAKEN_AGAIN = "events are taken again";
 constexpr auto STORED_AGAIN = "Events are stored again";
 
 void ReadTotals(SQLite::Database& database, Outbox& outbox) {
+    // An outbox of version 1 forgets no module, and does not know when it delivered last.
+    const bool isOld = database.execAndGet("pragma user_version").getInt() < 2;
     SQLite::Statement totals(
-        database, "select delivered, refused, dead_lettered, dropped, dead_letters, removed_bytes, "
-                  "(select coalesce(sum(last_sequence), 0) from module), "
-                  "(select coalesce(sum(stored_bytes), 0) from module) from totals");
+        database,
+        fmt::format("select delivered, refused, dead_lettered, dropped, dead_letters, removed_bytes, "
+                    "(select coalesce(sum(last_sequence), 0) from module) + {}, "
+                    "(select coalesce(sum(stored_bytes), 0) from module) + {}, {} from totals",
+                    isOld ? "0" : "forgotten_stored", isOld ? "0" : "forgotten_bytes",
+                    isOld ? "null" : "last_delivered_ms"));
     if (!totals.executeStep())
         return;
     const auto number = [&](int column) { return totals.getColumn(column).getInt64(); };
@@ -30,6 +37,8 @@ void ReadTotals(SQLite::Database& database, Outbox& outbox) {
     outbox.deadLetters = number(4);
     outbox.waiting = number(6) - number(0) - number(1) - number(2) - number(3);
     outbox.waitingBytes = number(7) - number(5);
+    if (!totals.getColumn(8).isNull())
+        outbox.lastDeliveredAtMs = number(8);
 }
 
 void ReadModules(SQLite::Database& database, Outbox& outbox) {

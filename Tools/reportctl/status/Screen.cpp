@@ -183,6 +183,9 @@ private:
             fmt::format("{} {}; {}", outbox.modules.size(), outbox.modules.size() == 1 ? "module" : "modules",
                         outbox.endpoint ? "sent to " + Shown(*outbox.endpoint)
                                         : std::string("no collector is set: events stay here")));
+        if (outbox.endpoint || outbox.lastDeliveredAtMs)
+            Row("", "last delivery " + (outbox.lastDeliveredAtMs ? IsoTime(*outbox.lastDeliveredAtMs) : "-") +
+                        ", last failure " + (outbox.lastFailure ? Shown(*outbox.lastFailure) : "-"));
     }
 
     /// The last lines, equal ones counted.

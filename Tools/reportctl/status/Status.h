@@ -62,6 +62,7 @@ struct Outbox {
     std::optional<std::int64_t> refused;
     std::optional<std::int64_t> deadLetters;
     std::optional<std::int64_t> dropped;
+    std::optional<std::int64_t> lastDeliveredAtMs;
     std::vector<Module> modules;
     std::optional<std::string> endpoint;    ///< Without secrets.
     std::optional<std::string> lastFailure; ///< Its line of the log, unless events are taken again since.

@@ -57,6 +57,27 @@ TEST_F(OutboxStoreTest, GivesEventsBackAsTheyCameInTheirOrder) {
     EXPECT_FALSE(batch.outboxId.empty());
 }
 
+TEST_F(OutboxStoreTest, KnowsWhenItsCollectorTookEventsLast) {
+    const auto last = [this] {
+        return SQLite::Database(m_path)
+            .execAndGet("SELECT coalesce(last_delivered_ms, 0) FROM totals")
+            .getInt64();
+    };
+    const auto now = [] {
+        return std::chrono::duration_cast<std::chrono::milliseconds>(
+                   std::chrono::system_clock::now().time_since_epoch())
+            .count();
+    };
+    Store(A759, "refused");
+    m_store->RemoveDelivered(m_store->Oldest(1, ANY_BYTES), 1);
+    EXPECT_EQ(last(), 0) << "what the collector refuses it has not taken";
+    Store(A759, "taken");
+    const auto before = now();
+    m_store->RemoveDelivered(m_store->Oldest(1, ANY_BYTES), 0);
+    EXPECT_GE(last(), before);
+    EXPECT_LE(last(), now());
+}
+
 TEST_F(OutboxStoreTest, CountsEachModulesEventsFromOneAcrossRestartsDeletionsAndVersions) {
     const ModuleIdentity other{"B'; --", "1", "x"};
     Store(A759, "1");
