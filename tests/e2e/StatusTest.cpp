@@ -221,6 +221,8 @@ TEST_F(Status, ChangesNoFileOfAServiceThatWasKilled) {
     Service::Send(R"({"eventID":"B1"})");
     Service::Send(R"({"eventID":"A759|1"})");
     ASSERT_TRUE(WaitUntil([&] { return m_service.RowCount() == 1; }));
+    ASSERT_TRUE(WaitUntil(
+        [&] { return m_service.Count(m_service.OutboxFile(), "select count(*) from event") == 1; }));
     m_service.Kill();
     ASSERT_GT(std::filesystem::file_size(m_service.DatabaseFile() + "-wal"), 0U);
     const auto before = Files();
