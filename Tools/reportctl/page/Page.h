@@ -31,7 +31,7 @@ struct PageData {
 };
 
 /// The page. `nonce` is what its style and scripts are known by: a random text of letters and digits, another one for each
-/// page. Every text of the data stays a text, whatever is in it.
+/// page. Every text of the data stays a text and never becomes markup.
 std::string ComposePage(const PageData& data, const std::string& nonce);
 
 /// Such a text, from the system's random numbers.
