@@ -89,6 +89,7 @@ private:
 /// One pass over a text, which does not recurse however deep its levels are.
 class Reader {
 public:
+    // NOLINTNEXTLINE(cppcoreguidelines-pro-type-member-init): the levels' words, as above
     explicit Reader(std::string_view text) : m_rest(text) {}
 
     JsonFacts Read() {

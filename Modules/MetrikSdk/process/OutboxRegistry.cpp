@@ -25,11 +25,10 @@ OutboxRegistry::OutboxRegistry(const OutboxSettings& settings, otlp::LookUp look
       m_reporter(std::make_shared<report::FailureReporter>(settings.tellInterval)) {}
 
 OutboxRegistry& OutboxRegistry::Instance() {
+    // NOLINTNEXTLINE(concurrency-mt-unsafe): nothing here changes the environment
+    const auto environment = [](const char* name) { return std::getenv(name); };
     static auto& instance =
-        // NOLINTNEXTLINE(concurrency-mt-unsafe): nothing here changes the environment
-        *new OutboxRegistry(
-            OutboxSettings{}, [](const char* name) { return std::getenv(name); },
-            &SystemTool::CommonTool::GetUserDataDir);
+        *new OutboxRegistry(OutboxSettings{}, environment, &SystemTool::CommonTool::GetUserDataDir);
     return instance;
 }
 

@@ -21,6 +21,7 @@ public:
         m_repaired = SystemTool::Text::ValidUtf8(text);
         m_text = m_repaired;
     }
+    ~Utf8() = default;
     Utf8(const Utf8&) = delete;
     Utf8& operator=(const Utf8&) = delete;
 

@@ -17,7 +17,7 @@ constexpr auto BETWEEN_DRAWINGS = std::chrono::milliseconds(100);
 constexpr auto ERASE_LINE = "\r\x1b[K";
 
 bool IsTerminalThatMovesItsCursor() {
-    const char* terminal = std::getenv("TERM");
+    const char* terminal = std::getenv("TERM"); // NOLINT(concurrency-mt-unsafe): this program has one thread
     return ::isatty(STDERR_FILENO) != 0 && terminal != nullptr && std::string_view(terminal) != "dumb";
 }
 
