@@ -41,11 +41,15 @@ def bare_sqlite(_, plan, tell):
         tell(tables.baseline(kind))
         rows_per_commit, _, prepared = kind.partition(" ")
         with subjects.EmptyStore() as store:
-            command = [PROGRAMS / "bench_inserter", store.database(), "--rows", str(rows),
-                       "--rows-per-commit", rows_per_commit, *(["--prepared"] if prepared else [])]
-            run = json.loads(subprocess.run(command, capture_output=True, text=True, check=True).stdout)
+            run = _inserted(store, rows, rows_per_commit, prepared)
         result[kind] = {"rows_per_second": run["rows"] / run["seconds"], "cpu_ns": run["cpu_ns"] / run["rows"]}
     return result
+
+
+def _inserted(store, rows, rows_per_commit, prepared):
+    command = [PROGRAMS / "bench_inserter", store.database(), "--rows", str(rows), "--rows-per-commit", rows_per_commit,
+               *(["--prepared"] if prepared else [])]
+    return json.loads(subprocess.run(command, capture_output=True, text=True, check=True).stdout)
 
 
 def growth(_, plan, tell):
@@ -69,6 +73,19 @@ def queue(_, plan, tell):
     tell("the queue alone")
     full["item_ns"] = {name.split("/")[1]: ns for name, ns in _item_ns("poco_tasker_bench", "^Item/").items()}
     return full
+
+
+def floor(_, plan, tell):
+    """The least that each part of a report's way costs, in nanoseconds. All of it here, so that no part is another run's."""
+    tell("a bare receive")
+    received = runs.measure(subjects.BareReceiver, plan.flood_reports)["cpu"]["receiving"]
+    tell("bare inserts")
+    with subjects.EmptyStore() as store:
+        rows = plan.baselines[-1][1]
+        insert = _inserted(store, rows, "1000", True)["cpu_ns"] / rows
+    tell("a bare write, parse and queue")
+    return {"receive": received, "insert": insert,
+            **{part.split("/")[0].lower(): ns for part, ns in _item_ns("floor_bench", ".", 5).items()}}
 
 
 def ledger(*_):
@@ -106,6 +123,7 @@ MEASURES = {  # name: of what, seconds for one, how
     "latencies": (STORES, lambda plan: len(plan.latency_rates) * (plan.latency_seconds + 1), latencies),
     "queue": (("service",), lambda plan: plan.queued_reports / 40_000 + 5, queue),
     "ledger": (("service",), lambda plan: 20, ledger),
+    "floor": (("service",), lambda plan: plan.flood_reports / 60_000 + 15, floor),
     "growth": (("service",), lambda plan: plan.growth_rounds * (sum(plan.rows_before) / 3e5
                + len(plan.rows_before) * (plan.growth_reports / 40_000 + 2)), growth),
 }

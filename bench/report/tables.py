@@ -9,6 +9,8 @@ def sections(report):
     """Name to text. A result that is missing has no section."""
     results = report["results"]
     written = {"machine": machine(report), "targets": verdicts(results)}
+    if "floor" in results:
+        written["floor"] = floor(results)
     for name, write in SECTIONS.items():
         if name in results:
             written[name] = write(results[name])
@@ -140,6 +142,20 @@ def ledger(found):
                  [("what both threads count of it, alone", f"{times['CountedReport']:.1f} ns"),
                   ("into the queue and out of it, without the ledger", f"{without:.1f} ns"),
                   ("the same with the ledger", f"{with_it:.1f} ns"), ("difference", f"{with_it - without:.1f} ns")])
+
+
+def floor(results):
+    """The service's own figure is that of the flood, in which it has the least reason to wait."""
+    parts = results["floor"]["service"]
+    names = {"receive": "receive of a datagram", "write": "write of its log line", "parse": "parse of its JSON",
+             "queue": "way through a queue", "insert": "insert, prepared once, 1,000 rows to a commit"}
+    least = sum(parts.values())
+    rows = [(f"a bare {name}", _us(parts[part])) for part, name in names.items()]
+    rows.append(("the floor: all of these", _us(least)))
+    if "service" in results.get("floods", {}):
+        whole = sum(results["floods"]["service"]["cpu"].values())
+        rows.append(("the service, in a flood", f"{_us(whole)}, {whole / least:.2f} × the floor"))
+    return table(["processor time for a report", ""], rows)
 
 
 def rest(found):

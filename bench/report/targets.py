@@ -36,6 +36,10 @@ def _storing_ratio(results):
     return per_row / results["baselines"]["sqlite"]["1000"]["cpu_ns"]
 
 
+def _floor_ratio(results):
+    return sum(results["floods"]["service"]["cpu"].values()) / sum(results["floor"]["service"].values())
+
+
 def _growth_ratio(results):
     sizes = results["growth"]["service"]
     return sizes[max(sizes, key=int)]["rows_per_second"] / sizes["0"]["rows_per_second"]
@@ -56,6 +60,7 @@ TARGETS = (
            3, False, _receiving_ratio),
     Target("storing thread's processor time for a row, against bare SQLite with 1,000 rows to a commit", 2, False,
            _storing_ratio),
+    Target("whole processor time for a report in a flood, against the floor", 1.5, False, _floor_ratio),
     Target("rows a second into the largest table, against an empty one", 0.9, True, _growth_ratio),
     Target("memory of a queued report of 180 bytes", 400, False,
            lambda r: r["queue"]["service"]["bytes_per_item"], " bytes"),

@@ -178,6 +178,22 @@ class Baseline(unittest.TestCase):
                          ["1 row to a commit", "1,000 rows to a commit", "1,000 rows to a commit, prepared once"])
 
 
+class Floor(unittest.TestCase):
+    PARTS = {"receive": 700, "write": 400, "parse": 100, "queue": 100, "insert": 700}
+
+    def results(self, **more):
+        return {"floor": {"service": self.PARTS}} | more
+
+    def test_is_the_sum_of_its_parts_and_the_service_a_multiple_of_it(self):
+        results = self.results(floods={"service": run(0)})  # 8 µs
+        self.assertIn("| the floor: all of these | 2.00 µs |", tables.floor(results))
+        self.assertIn("| the service, in a flood | 8.00 µs, 4.00 × the floor |", tables.floor(results))
+        self.assertEqual(targets._floor_ratio(results), 4)
+
+    def test_names_each_part_that_it_adds(self):
+        self.assertEqual(tables.floor(self.results()).count("| a bare "), len(self.PARTS))
+
+
 class Quantile(unittest.TestCase):
     def test_is_the_smallest_value_that_so_many_are_not_above(self):
         self.assertEqual(latency.quantile(list(range(1, 101)), 0.99), 99)
