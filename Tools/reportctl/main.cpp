@@ -1,4 +1,5 @@
 #include <exception>
+#include <system_error>
 
 #include <CLI/CLI.hpp>
 #include <sys/stat.h>
@@ -27,6 +28,11 @@ int main(int argc, char** argv) {
 
     try {
         return reportctl::terminal::FinishOutput(Run(argc, argv));
+    } catch (const std::system_error& error) {
+        if (error.code() == std::errc::broken_pipe) // the reader of a long output has seen enough
+            return 0;
+        reportctl::terminal::TellLastError(error.what());
+        return 1;
     } catch (const std::exception& error) { // such as a disk that is full in the middle of a long output
         reportctl::terminal::TellLastError(error.what());
         return 1;

@@ -16,7 +16,6 @@
 #include "Tools/reportctl/store/Copy.h"
 #include "Tools/reportctl/store/Paths.h"
 #include "Tools/reportctl/store/Store.h"
-#include "Tools/reportctl/terminal/Output.h"
 #include "Tools/reportctl/terminal/Progress.h"
 
 namespace reportctl::commands {
@@ -71,15 +70,15 @@ private:
 void Copy(const std::string& from, const std::string& to) {
     {
         terminal::Progress progress("copying " + fs::path(from).filename().string());
-        store::CopyDatabase(from, to, [&](int done, int total) { progress.Show(done, total); });
+        store::Naming(from, [&] {
+            store::CopyDatabase(from, to, [&](int done, int total) { progress.Show(done, total); });
+        });
     }
     fmt::print("{} ({} bytes)\n", to, fs::file_size(to));
 }
 
 void Backup(const std::string& path) {
-    if (!fs::exists(store::StorePath()))
-        throw std::runtime_error(fmt::format(
-            "{} is missing: there is nothing to back up. `reportctl setup` makes it.", store::StorePath()));
+    store::RequireStore(store::StorePath()); // before a directory is made for it
     NewDirectory directory(path);
     Copy(store::StorePath(), path + "/Report.db");
     if (fs::exists(store::OutboxPath()))
@@ -87,16 +86,6 @@ void Backup(const std::string& path) {
     else
         fmt::print("No outbox: {} is not there, so it has no events.\n", store::OutboxPath());
     directory.Keep();
-}
-
-int RunBackup(const std::string& path) {
-    try {
-        Backup(path);
-        return 0;
-    } catch (const std::exception& error) {
-        terminal::TellLastError(error.what());
-        return 1;
-    }
 }
 
 } // namespace
@@ -110,7 +99,10 @@ void AddBackup(CLI::App& app, int& exitCode) {
     command->add_option("DIRECTORY", *path, "The directory to make (mode 0700); it must not exist")
         ->required();
     command->footer(HELP + app.get_footer());
-    command->callback([path, &exitCode] { exitCode = RunBackup(*path); });
+    command->callback([path, &exitCode] {
+        Backup(*path);
+        exitCode = 0;
+    });
 }
 
 } // namespace reportctl::commands

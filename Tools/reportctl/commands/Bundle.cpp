@@ -9,7 +9,6 @@
 #include "Tools/reportctl/bundle/Parts.h"
 #include "Tools/reportctl/bundle/Redaction.h"
 #include "Tools/reportctl/commands/Commands.h"
-#include "Tools/reportctl/terminal/Output.h"
 
 namespace reportctl::commands {
 namespace {
@@ -59,16 +58,6 @@ void WriteBundle(const BundleOptions& options) {
                    : "without values of reports, open ids and the home directory's path");
 }
 
-int RunBundle(const BundleOptions& options) {
-    try {
-        WriteBundle(options);
-        return 0;
-    } catch (const std::exception& error) {
-        terminal::TellLastError(error.what());
-        return 1;
-    }
-}
-
 } // namespace
 
 void AddBundle(CLI::App& app, int& exitCode) {
@@ -79,7 +68,10 @@ void AddBundle(CLI::App& app, int& exitCode) {
         ->required();
     command->add_flag("--with-values", options->withValues, "Leave values, open ids and paths as they are");
     command->footer(HELP + app.get_footer());
-    command->callback([options, &exitCode] { exitCode = RunBundle(*options); });
+    command->callback([options, &exitCode] {
+        WriteBundle(*options);
+        exitCode = 0;
+    });
 }
 
 } // namespace reportctl::commands

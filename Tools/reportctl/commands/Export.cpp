@@ -5,7 +5,6 @@
 #include <string>
 
 #include <CLI/CLI.hpp>
-#include <SQLiteCpp/Exception.h>
 #include <fmt/format.h>
 
 #include "Tools/reportctl/commands/Commands.h"
@@ -14,7 +13,6 @@
 #include "Tools/reportctl/store/RowText.h"
 #include "Tools/reportctl/store/Rows.h"
 #include "Tools/reportctl/store/Store.h"
-#include "Tools/reportctl/terminal/Output.h"
 #include "Tools/reportctl/terminal/Progress.h"
 #include "Tools/reportctl/terminal/Result.h"
 
@@ -94,18 +92,11 @@ std::int64_t WriteRows(const ExportOptions& options, terminal::Result& output) {
 }
 
 int RunExport(const ExportOptions& options) {
-    try {
-        terminal::Result output(options.output);
-        const auto count = WriteRows(options, output);
-        if (!output.IsStandardOutput())
-            fmt::print(stderr, "{} rows written to {}\n", count, options.output);
-        return 0;
-    } catch (const SQLite::Exception& error) {
-        terminal::TellLastError(fmt::format("{}: {}", store::StorePath(), error.what()));
-    } catch (const std::exception& error) {
-        terminal::TellLastError(error.what());
-    }
-    return 1;
+    terminal::Result output(options.output);
+    const auto count = store::Naming(store::StorePath(), [&] { return WriteRows(options, output); });
+    if (!output.IsStandardOutput())
+        fmt::print(stderr, "{} rows written to {}\n", count, options.output);
+    return 0;
 }
 
 } // namespace

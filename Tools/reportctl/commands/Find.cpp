@@ -7,10 +7,7 @@
 
 #include <CLI/CLI.hpp>
 #include <fmt/format.h>
-#include <rapidjson/stringbuffer.h>
-#include <rapidjson/writer.h>
 
-#include "SystemTool/Text/Utf8.h"
 #include "Tools/reportctl/commands/Commands.h"
 #include "Tools/reportctl/log/Files.h"
 #include "Tools/reportctl/log/Show.h"
@@ -20,15 +17,13 @@
 #include "Tools/reportctl/store/Paths.h"
 #include "Tools/reportctl/store/Search.h"
 #include "Tools/reportctl/store/Store.h"
-#include "Tools/reportctl/terminal/Output.h"
+#include "Tools/reportctl/terminal/Json.h"
 #include "Tools/reportctl/terminal/Printable.h"
 #include "Tools/reportctl/terminal/Result.h"
 #include "Tools/reportctl/terminal/Watch.h"
 
 namespace reportctl::commands {
 namespace {
-
-using Writer = rapidjson::Writer<rapidjson::StringBuffer>;
 
 constexpr auto HELP =
     "Examples:\n"
@@ -66,8 +61,8 @@ public:
 
     void Run() {
         Try(m_log, [this] { SearchLog(); });
-        Try(m_store, [this] { SearchStore(); });
-        Try(m_outbox, [this] { SearchOutbox(); });
+        Try(m_store, [this] { store::Naming(store::StorePath(), [this] { SearchStore(); }); });
+        Try(m_outbox, [this] { store::Naming(store::OutboxPath(), [this] { SearchOutbox(); }); });
     }
 
     void Print() const {
@@ -132,7 +127,8 @@ private:
     }
 
     void SearchOutbox() {
-        if (!std::filesystem::exists(store::OutboxPath()))
+        std::error_code error;
+        if (!std::filesystem::exists(store::OutboxPath(), error) && !error)
             return; // no event was ever stored
         auto database = outbox::OpenToLook(store::OutboxPath());
         const auto take = [this](const outbox::Event& event) {
@@ -156,42 +152,28 @@ private:
                                         : "  -> waiting");
     }
 
-    static void Write(Writer& writer, const char* key, const std::string& text) {
-        const auto utf8 = SystemTool::Text::ValidUtf8(text);
-        writer.Key(key);
-        writer.String(utf8.data(), static_cast<rapidjson::SizeType>(utf8.size()));
-    }
-
     static std::string JsonOf(const store::FoundRow& row) {
-        rapidjson::StringBuffer text;
-        Writer writer(text);
-        writer.StartObject();
-        writer.Key("id");
-        writer.Int64(row.id);
-        Write(writer, "at", row.at);
-        Write(writer, "eventID", row.event);
-        Write(writer, "value", row.value);
-        Write(writer, "openid", row.openid);
-        Write(writer, "createTime", row.createTime);
-        Write(writer, "outcome", "stored");
-        writer.EndObject();
-        return text.GetString();
+        terminal::JsonObject json;
+        json.Add("id", row.id);
+        json.Add("at", row.at);
+        json.Add("eventID", row.event);
+        json.Add("value", row.value);
+        json.Add("openid", row.openid);
+        json.Add("createTime", row.createTime);
+        json.Add("outcome", "stored");
+        return json.Take();
     }
 
     static std::string JsonOf(const outbox::Event& event) {
-        rapidjson::StringBuffer text;
-        Writer writer(text);
-        writer.StartObject();
-        Write(writer, "id", event.uuid);
-        Write(writer, "module", event.module);
-        writer.Key("sequence");
-        writer.Int64(event.sequence);
-        Write(writer, "eventID", event.eventID);
-        Write(writer, "state", event.isDead ? "dead" : "waiting");
-        Write(writer, "reason", event.reason);
-        Write(writer, "payload", event.payload);
-        writer.EndObject();
-        return text.GetString();
+        terminal::JsonObject json;
+        json.Add("id", event.uuid);
+        json.Add("module", event.module);
+        json.Add("sequence", event.sequence);
+        json.Add("eventID", event.eventID);
+        json.Add("state", event.isDead ? "dead" : "waiting");
+        json.Add("reason", event.reason);
+        json.Add("payload", event.payload);
+        return json.Take();
     }
 
     void PrintText(terminal::Result& output) const {
@@ -223,23 +205,13 @@ private:
         print("datagrams", m_log);
         print("rows", m_store);
         print("events", m_outbox);
-        rapidjson::StringBuffer text;
-        Writer writer(text);
-        writer.StartObject();
-        WriteOrNull(writer, "logSince", m_log.since);
-        WriteOrNull(writer, "storeSince", m_store.since);
-        WriteOrNull(writer, "logError", m_log.error);
-        WriteOrNull(writer, "storeError", m_store.error);
-        WriteOrNull(writer, "outboxError", m_outbox.error);
-        writer.EndObject();
-        output.Write(fmt::format("\"reach\":{}}}\n", text.GetString()));
-    }
-
-    static void WriteOrNull(Writer& writer, const char* key, const std::string& text) {
-        if (!text.empty())
-            return Write(writer, key, text);
-        writer.Key(key);
-        writer.Null();
+        terminal::JsonObject reach;
+        reach.AddOrNull("logSince", m_log.since);
+        reach.AddOrNull("storeSince", m_store.since);
+        reach.AddOrNull("logError", m_log.error);
+        reach.AddOrNull("storeError", m_store.error);
+        reach.AddOrNull("outboxError", m_outbox.error);
+        output.Write(fmt::format("\"reach\":{}}}\n", reach.Take()));
     }
 
     const FindOptions& m_options;
@@ -249,15 +221,10 @@ private:
 };
 
 int RunFind(const FindOptions& options) {
-    try {
-        Search search(options);
-        search.Run();
-        search.Print();
-        return search.ExitCode();
-    } catch (const std::exception& error) {
-        terminal::TellLastError(error.what());
-        return 1;
-    }
+    Search search(options);
+    search.Run();
+    search.Print();
+    return search.ExitCode();
 }
 
 } // namespace

@@ -4,10 +4,7 @@
 
 #include <CLI/CLI.hpp>
 #include <fmt/format.h>
-#include <rapidjson/stringbuffer.h>
-#include <rapidjson/writer.h>
 
-#include "SystemTool/Text/Utf8.h"
 #include "Tools/reportctl/commands/Commands.h"
 #include "Tools/reportctl/log/Show.h"
 #include "Tools/reportctl/outbox/CollectorTest.h"
@@ -16,7 +13,8 @@
 #include "Tools/reportctl/outbox/Events.h"
 #include "Tools/reportctl/service/Environment.h"
 #include "Tools/reportctl/store/Paths.h"
-#include "Tools/reportctl/terminal/Output.h"
+#include "Tools/reportctl/store/Store.h"
+#include "Tools/reportctl/terminal/Json.h"
 #include "Tools/reportctl/terminal/Printable.h"
 #include "Tools/reportctl/terminal/Result.h"
 
@@ -25,7 +23,6 @@ namespace {
 
 using outbox::Event;
 using outbox::Where;
-using Writer = rapidjson::Writer<rapidjson::StringBuffer>;
 
 constexpr auto HELP =
     "Examples:\n"
@@ -49,43 +46,27 @@ struct OutboxOptions {
     std::vector<std::string> ids;
 };
 
-void Write(Writer& writer, const char* key, const std::string& text) {
-    writer.Key(key);
-    const auto utf8 = SystemTool::Text::ValidUtf8(text);
-    writer.String(utf8.data(), static_cast<rapidjson::SizeType>(utf8.size()));
-}
-
-void Write(Writer& writer, const char* key, std::int64_t number) {
-    writer.Key(key);
-    writer.Int64(number);
-}
-
 std::string StoredAt(const Event& event) {
     return log::IsoTime(terminal::TimePoint(std::chrono::milliseconds(event.storedMs)));
 }
 
 std::string JsonOf(const Event& event) {
-    rapidjson::StringBuffer text;
-    Writer writer(text);
-    writer.StartObject();
-    Write(writer, "id", event.uuid);
-    Write(writer, "module", event.module);
-    Write(writer, "sequence", event.sequence);
-    Write(writer, "eventID", event.eventID);
-    Write(writer, "storedAt", StoredAt(event));
-    Write(writer, "bytes", event.bytes);
-    Write(writer, "state", event.isDead ? "dead" : "waiting");
+    terminal::JsonObject json;
+    json.Add("id", event.uuid);
+    json.Add("module", event.module);
+    json.Add("sequence", event.sequence);
+    json.Add("eventID", event.eventID);
+    json.Add("storedAt", StoredAt(event));
+    json.Add("bytes", event.bytes);
+    json.Add("state", event.isDead ? "dead" : "waiting");
     if (event.isDead) {
-        Write(writer, "status", event.status);
-        Write(writer, "reason", event.reason);
+        json.Add("status", event.status);
+        json.Add("reason", event.reason);
     } else {
-        writer.Key("status");
-        writer.Null();
-        writer.Key("reason");
-        writer.Null();
+        json.AddNull("status");
+        json.AddNull("reason");
     }
-    writer.EndObject();
-    return {text.GetString(), text.GetSize()};
+    return json.Take();
 }
 
 std::string TextOf(const Event& event) {
@@ -139,16 +120,6 @@ int Purge(const OutboxOptions& options) {
     return 0;
 }
 
-template <typename Command>
-int RunAndTell(Command command) {
-    try {
-        return command();
-    } catch (const std::exception& error) {
-        terminal::TellLastError(error.what());
-        return 1;
-    }
-}
-
 void AddList(CLI::App& outbox, const std::shared_ptr<OutboxOptions>& options, int& exitCode) {
     auto* list =
         outbox.add_subcommand("list", "List the events that wait and the dead letters, oldest first")
@@ -156,10 +127,8 @@ void AddList(CLI::App& outbox, const std::shared_ptr<OutboxOptions>& options, in
     list->add_flag("--dead", options->onlyDead, "Only dead letters");
     list->add_flag("--json", options->isJson, "A JSON array");
     list->callback([options, &exitCode] {
-        exitCode = RunAndTell([&] {
-            List(*options);
-            return 0;
-        });
+        store::Naming(options->path, [&] { List(*options); });
+        exitCode = 0;
     });
 }
 
@@ -172,7 +141,7 @@ void AddRetry(CLI::App& outbox, const std::shared_ptr<OutboxOptions>& options, i
     retry->callback([options, &exitCode] {
         if (!options->all && options->ids.empty())
             throw CLI::RequiredError("Say which: --all, or ids", CLI::ExitCodes::RequiredError);
-        exitCode = RunAndTell([&] { return Retry(*options); });
+        exitCode = store::Naming(options->path, [&] { return Retry(*options); });
     });
 }
 
@@ -180,16 +149,15 @@ void AddTest(CLI::App& outbox, int& exitCode) {
     auto* test =
         outbox.add_subcommand("test", "Send one marked test event to the collector that the running service "
                                       "uses, and tell what it answers");
-    test->callback([&exitCode] {
-        exitCode = RunAndTell([] { return outbox::TestCollector(service::OfTheService()) ? 0 : 1; });
-    });
+    test->callback([&exitCode] { exitCode = outbox::TestCollector(service::OfTheService()) ? 0 : 1; });
 }
 
 void AddPurge(CLI::App& outbox, const std::shared_ptr<OutboxOptions>& options, int& exitCode) {
     auto* purge = outbox.add_subcommand("purge", "Delete dead letters")->fallthrough();
     purge->add_flag("--dead", options->onlyDead, "All dead letters; there is nothing else to delete")
         ->required();
-    purge->callback([options, &exitCode] { exitCode = RunAndTell([&] { return Purge(*options); }); });
+    purge->callback(
+        [options, &exitCode] { exitCode = store::Naming(options->path, [&] { return Purge(*options); }); });
 }
 
 } // namespace

@@ -2,7 +2,6 @@
 #include <exception>
 #include <memory>
 #include <string>
-#include <thread>
 
 #include <CLI/CLI.hpp>
 #include <fmt/format.h>
@@ -10,8 +9,8 @@
 #include "Tools/reportctl/commands/Commands.h"
 #include "Tools/reportctl/page/Gather.h"
 #include "Tools/reportctl/page/Page.h"
-#include "Tools/reportctl/terminal/Output.h"
 #include "Tools/reportctl/terminal/Result.h"
+#include "Tools/reportctl/terminal/Watch.h"
 
 namespace reportctl::commands {
 namespace {
@@ -41,17 +40,13 @@ void WritePage(const PageOptions& options) {
 }
 
 int RunPage(const PageOptions& options) {
-    try {
-        WritePage(options);
-        while (options.watchSeconds > 0) {
-            std::this_thread::sleep_for(std::chrono::seconds(options.watchSeconds));
-            WritePage(options);
-        }
+    WritePage(options);
+    if (options.watchSeconds == 0)
         return 0;
-    } catch (const std::exception& error) {
-        terminal::TellLastError(error.what());
-        return 1;
-    }
+    terminal::Watch watch;
+    while (watch.Wait(std::chrono::seconds(options.watchSeconds)))
+        WritePage(options);
+    return 0;
 }
 
 } // namespace

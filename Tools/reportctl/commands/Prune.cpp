@@ -1,10 +1,8 @@
-#include <filesystem>
 #include <memory>
 #include <optional>
 #include <string>
 
 #include <CLI/CLI.hpp>
-#include <SQLiteCpp/Exception.h>
 #include <fmt/format.h>
 
 #include "Tools/reportctl/commands/Commands.h"
@@ -12,7 +10,6 @@
 #include "Tools/reportctl/store/Paths.h"
 #include "Tools/reportctl/store/Prune.h"
 #include "Tools/reportctl/store/Store.h"
-#include "Tools/reportctl/terminal/Output.h"
 #include "Tools/reportctl/terminal/Progress.h"
 #include "Tools/reportctl/terminal/TimeArgument.h"
 
@@ -74,30 +71,27 @@ void RequireRule(const PruneOptions& options) {
                                  CLI::ExitCodes::RequiredError);
 }
 
+store::PruneResult Delete(SQLite::Database& database, const store::PruneRule& rule,
+                          const store::PrunePlan& plan) {
+    terminal::Progress progress("deleting");
+    return store::Prune(database, rule, plan, {},
+                        [&](std::int64_t done, std::int64_t total) { progress.Show(done, total); });
+}
+
+void Prune(const PruneOptions& options) {
+    const auto rule = RuleOf(options);
+    auto database = (options.isAllowed ? store::OpenStore : store::OpenToRead)(store::StorePath());
+    const auto plan = store::PlanPrune(database, rule);
+    if (options.isAllowed)
+        TellResult(Delete(database, rule, plan), plan);
+    else
+        TellPlan(plan, options);
+}
+
 int RunPrune(const PruneOptions& options) {
     RequireRule(options);
-    try {
-        const auto rule = RuleOf(options);
-        auto database = store::OpenStore(store::StorePath());
-        const auto plan = store::PlanPrune(database, rule);
-        if (!options.isAllowed) {
-            TellPlan(plan, options);
-            return 0;
-        }
-        store::PruneResult result;
-        {
-            terminal::Progress progress("deleting");
-            result = store::Prune(database, rule, plan, {},
-                                  [&](std::int64_t done, std::int64_t total) { progress.Show(done, total); });
-        }
-        TellResult(result, plan);
-        return 0;
-    } catch (const SQLite::Exception& error) {
-        terminal::TellLastError(fmt::format("{}: {}", store::StorePath(), error.what()));
-    } catch (const std::exception& error) {
-        terminal::TellLastError(error.what());
-    }
-    return 1;
+    store::Naming(store::StorePath(), [&] { Prune(options); });
+    return 0;
 }
 
 } // namespace

@@ -7,10 +7,7 @@
 #include <vector>
 
 #include <CLI/CLI.hpp>
-#include <SQLiteCpp/Exception.h>
 #include <fmt/format.h>
-#include <rapidjson/stringbuffer.h>
-#include <rapidjson/writer.h>
 
 #include "Ledger/Reader.h"
 #include "Tools/reportctl/commands/Commands.h"
@@ -21,7 +18,7 @@
 #include "Tools/reportctl/store/Paths.h"
 #include "Tools/reportctl/store/Store.h"
 #include "Tools/reportctl/store/Tally.h"
-#include "Tools/reportctl/terminal/Output.h"
+#include "Tools/reportctl/terminal/Json.h"
 #include "Tools/reportctl/terminal/Printable.h"
 #include "Tools/reportctl/terminal/Result.h"
 
@@ -79,13 +76,17 @@ Stats CountReports(const StatsOptions& options) {
     const auto filter = options.filter.Read();
     const auto zone = options.isUtc ? store::Zone::Utc : store::Zone::Local;
     store::Tally tally;
-    auto database = store::OpenToRead(store::StorePath());
-    store::CountRows(database, grouping, filter, zone, tally);
+    store::Naming(store::StorePath(), [&] {
+        auto database = store::OpenToRead(store::StorePath());
+        store::CountRows(database, grouping, filter, zone, tally);
+    });
     const auto rows = Sum(tally);
-    if (std::filesystem::exists(store::OutboxPath())) {
-        auto outbox = store::OpenToRead(store::OutboxPath());
-        store::CountEvents(outbox, grouping, filter, zone, tally);
-    }
+    std::error_code error;
+    if (std::filesystem::exists(store::OutboxPath(), error) || error)
+        store::Naming(store::OutboxPath(), [&] {
+            auto outbox = store::OpenToRead(store::OutboxPath());
+            store::CountEvents(outbox, grouping, filter, zone, tally);
+        });
     return {store::Ranked(tally, grouping, options.top),
             fmt::format("{} rows of the store, {} events of the outbox (waiting, or dead letters)", rows,
                         Sum(tally) - rows)};
@@ -128,23 +129,15 @@ Stats CountOutcomes(const StatsOptions& options) {
 }
 
 void PrintJson(const Stats& stats, terminal::Result& output) {
-    rapidjson::StringBuffer text;
-    rapidjson::Writer<rapidjson::StringBuffer> writer(text);
-    writer.StartArray();
-    for (const auto& [key, count] : stats.counts) {
-        writer.StartObject();
-        writer.Key("key");
-        if (key)
-            writer.String(key->data(), static_cast<rapidjson::SizeType>(key->size()));
-        else
-            writer.Null();
-        writer.Key("count");
-        writer.Int64(count);
-        writer.EndObject();
+    output.Write("[");
+    for (std::size_t i = 0; i < stats.counts.size(); ++i) {
+        const auto& [key, count] = stats.counts[i];
+        terminal::JsonObject json;
+        key ? json.Add("key", *key) : json.AddNull("key");
+        json.Add("count", count);
+        output.Write((i == 0 ? "" : ",") + json.Take());
     }
-    writer.EndArray();
-    output.Write({text.GetString(), text.GetSize()});
-    output.Write("\n");
+    output.Write("]\n");
 }
 
 void PrintCsv(const Stats& stats, terminal::Result& output) {
@@ -191,13 +184,8 @@ void Print(const Stats& stats, const StatsOptions& options) {
 int RunStats(const StatsOptions& options) {
     if (options.by == OUTCOME)
         RequireNoFilter(options.filter);
-    try {
-        Print(options.by == OUTCOME ? CountOutcomes(options) : CountReports(options), options);
-        return 0;
-    } catch (const std::exception& error) {
-        terminal::TellLastError(error.what());
-        return 1;
-    }
+    Print(options.by == OUTCOME ? CountOutcomes(options) : CountReports(options), options);
+    return 0;
 }
 
 } // namespace

@@ -2,7 +2,6 @@
 #include <cstdlib>
 #include <memory>
 #include <string_view>
-#include <thread>
 
 #include <CLI/CLI.hpp>
 #include <fmt/format.h>
@@ -10,6 +9,8 @@
 
 #include "Tools/reportctl/commands/Commands.h"
 #include "Tools/reportctl/status/Status.h"
+#include "Tools/reportctl/terminal/Result.h"
+#include "Tools/reportctl/terminal/Watch.h"
 
 namespace reportctl::commands {
 namespace {
@@ -45,11 +46,15 @@ std::string InPlace(std::string screen) {
     return "\x1b[H" + screen + "\x1b[J";
 }
 
-/// Until a signal ends it. The rates of now are those between two looks.
+/// Until a signal or the end of its reader ends it. The rates of now are those between two looks.
 int Watch(const Options& options) {
+    terminal::Watch watch;
+    const auto pause =
+        std::chrono::round<std::chrono::milliseconds>(std::chrono::duration<double>(options.seconds));
     const bool isTerminal = ::isatty(STDOUT_FILENO) == 1;
+    terminal::Result output("");
     if (isTerminal)
-        fmt::print("\x1b[2J");
+        output.Write("\x1b[2J");
     ReportLedger::Look before;
     for (;;) {
         auto status = status::Gather();
@@ -61,10 +66,10 @@ int Watch(const Options& options) {
         const auto judgement = Judge(status);
         const auto text =
             options.isJson ? JsonOf(status, judgement) : ScreenOf(status, judgement, WantsColours());
-        fmt::print("{}", isTerminal && !options.isJson ? InPlace(text) : text);
-        if (std::fflush(stdout) != 0)
-            return 1; // the reader has closed the pipe
-        std::this_thread::sleep_for(std::chrono::duration<double>(options.seconds));
+        output.Write(isTerminal && !options.isJson ? InPlace(text) : text);
+        output.Flush();
+        if (!watch.Wait(pause))
+            return 0;
     }
 }
 

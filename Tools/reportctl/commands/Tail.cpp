@@ -12,7 +12,6 @@
 #include "Tools/reportctl/log/Files.h"
 #include "Tools/reportctl/log/Show.h"
 #include "Tools/reportctl/log/Stream.h"
-#include "Tools/reportctl/terminal/Output.h"
 #include "Tools/reportctl/terminal/Result.h"
 #include "Tools/reportctl/terminal/Watch.h"
 
@@ -137,15 +136,6 @@ int RunTail(const TailOptions& options) {
     return Follow(options, stream);
 }
 
-int RunTailAndTell(const TailOptions& options) {
-    try {
-        return RunTail(options);
-    } catch (const std::exception& error) {
-        terminal::TellLastError(error.what());
-        return 1;
-    }
-}
-
 } // namespace
 
 void AddTail(CLI::App& app, int& exitCode) {
@@ -167,7 +157,7 @@ void AddTail(CLI::App& app, int& exitCode) {
     command->add_flag("--json", options->isJson, "One JSON object a line");
     command->add_flag("--no-follow", options->noFollow, "End after the lines that are there");
     command->footer(HELP + app.get_footer());
-    command->callback([options, &exitCode] { exitCode = RunTailAndTell(*options); });
+    command->callback([options, &exitCode] { exitCode = RunTail(*options); });
 }
 
 } // namespace reportctl::commands

@@ -50,7 +50,10 @@ std::string LiveFile(const std::string& directory) {
 }
 
 std::string ReasonAgainst(const std::string& path) {
-    return ::access(path.c_str(), R_OK) == 0 ? std::string() : SystemTool::ErrnoText(errno);
+    struct stat status {};
+    if (::access(path.c_str(), R_OK) != 0 || ::stat(path.c_str(), &status) != 0)
+        return SystemTool::ErrnoText(errno);
+    return S_ISREG(status.st_mode) ? "" : "it is no file";
 }
 
 std::vector<std::string> RotatedFiles(const std::string& directory) {

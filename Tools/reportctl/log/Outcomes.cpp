@@ -4,6 +4,8 @@
 #include <map>
 #include <utility>
 
+#include "Tools/reportctl/store/Store.h"
+
 namespace reportctl::log {
 namespace {
 
@@ -37,12 +39,12 @@ std::vector<std::string> Outcomes::TakeComplaints() {
 
 void Outcomes::Read(const Backlog& backlog) {
     try {
-        m_rows.ReadNew(backlog.reports + SLACK);
+        store::Naming(m_storePath, [&] { m_rows.ReadNew(backlog.reports + SLACK); });
     } catch (const std::exception& error) {
         Complain(error.what());
     }
     try {
-        m_events.ReadNew(backlog.events + SLACK);
+        store::Naming(m_outboxPath, [&] { m_events.ReadNew(backlog.events + SLACK); });
     } catch (const std::exception& error) {
         Complain(error.what());
     }

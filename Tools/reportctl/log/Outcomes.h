@@ -28,7 +28,7 @@ struct Backlog {
 class Outcomes {
 public:
     Outcomes(const std::string& storePath, const std::string& outboxPath)
-        : m_rows(storePath), m_events(outboxPath) {}
+        : m_storePath(storePath), m_outboxPath(outboxPath), m_rows(storePath), m_events(outboxPath) {}
 
     /// Reads what came since; the first time, what the backlog needs.
     void Read(const Backlog& backlog);
@@ -45,6 +45,8 @@ private:
     void CountBefore(Pairing& pairing);
     void CountSince(Pairing& pairing);
 
+    std::string m_storePath;
+    std::string m_outboxPath;
     store::RecentRows m_rows;
     outbox::RecentEvents m_events;
     bool m_isFirst = true;

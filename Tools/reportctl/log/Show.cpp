@@ -4,10 +4,9 @@
 #include <ctime>
 
 #include <fmt/format.h>
-#include <rapidjson/stringbuffer.h>
-#include <rapidjson/writer.h>
 
 #include "SystemTool/Text/Utf8.h"
+#include "Tools/reportctl/terminal/Json.h"
 #include "Tools/reportctl/terminal/Printable.h"
 
 namespace reportctl::log {
@@ -15,8 +14,6 @@ namespace {
 
 /// So much of a value says what it is about, and leaves room on the line for where it ended.
 constexpr std::size_t VALUE_BYTES = 48;
-
-using Writer = rapidjson::Writer<rapidjson::StringBuffer>;
 
 std::string Short(const std::string& text) {
     const auto beginning = SystemTool::Text::CutUtf8(text, VALUE_BYTES);
@@ -30,19 +27,6 @@ std::string Subject(const Entry& entry) {
     if (message.kind == message::Kind::Control)
         return terminal::Printable(message.control + (message.module.empty() ? "" : " " + message.module));
     return fmt::format("{:<14} {}", terminal::Printable(message.eventID), Short(message.value));
-}
-
-void Write(Writer& writer, const char* key, const std::string& text) {
-    writer.Key(key);
-    const auto utf8 = SystemTool::Text::ValidUtf8(text);
-    writer.String(utf8.data(), static_cast<rapidjson::SizeType>(utf8.size()));
-}
-
-void WriteOrNull(Writer& writer, const char* key, const std::string& text) {
-    if (!text.empty())
-        return Write(writer, key, text);
-    writer.Key(key);
-    writer.Null();
 }
 
 } // namespace
@@ -73,17 +57,14 @@ std::string TextOf(const Entry& entry) {
 }
 
 std::string JsonOf(const Entry& entry) {
-    rapidjson::StringBuffer text;
-    Writer writer(text);
-    writer.StartObject();
-    Write(writer, "time", IsoTime(entry.line.time));
-    Write(writer, "kind", message::WordFor(entry.message.kind));
-    WriteOrNull(writer, "eventID", entry.message.eventID);
-    Write(writer, "outcome", WordFor(entry.outcome));
-    WriteOrNull(writer, "reason", entry.reason);
-    Write(writer, "text", entry.line.message);
-    writer.EndObject();
-    return {text.GetString(), text.GetSize()};
+    terminal::JsonObject json;
+    json.Add("time", IsoTime(entry.line.time));
+    json.Add("kind", message::WordFor(entry.message.kind));
+    json.AddOrNull("eventID", entry.message.eventID);
+    json.Add("outcome", WordFor(entry.outcome));
+    json.AddOrNull("reason", entry.reason);
+    json.Add("text", entry.line.message);
+    return json.Take();
 }
 
 } // namespace reportctl::log

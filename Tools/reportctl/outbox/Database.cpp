@@ -12,11 +12,15 @@ namespace reportctl::outbox {
 namespace {
 
 void RequireFile(const std::string& path) {
-    if (!std::filesystem::exists(path))
-        throw std::runtime_error(
-            fmt::format("there is no outbox: {} is missing. The service makes it when a module is "
-                        "announced with that directory, its own at its start.",
-                        path));
+    std::error_code error;
+    if (std::filesystem::exists(path, error))
+        return;
+    if (error)
+        throw std::runtime_error(path + ": " + error.message());
+    throw std::runtime_error(
+        fmt::format("there is no outbox: {} is missing. The service makes it when a module is "
+                    "announced with that directory, its own at its start.",
+                    path));
 }
 
 SQLite::Database Checked(const std::string& path, SQLite::Database database) {

@@ -10,6 +10,7 @@
 #include "SystemTool/Text/Utf8.h"
 #include "Tools/reportctl/status/Names.h"
 #include "Tools/reportctl/status/Status.h"
+#include "Tools/reportctl/terminal/Json.h"
 
 namespace reportctl::status {
 namespace {
@@ -56,7 +57,7 @@ public:
     /// Null for never.
     void AddTime(const char* key, std::int64_t ms) { ms == 0 ? AddNull(key) : Add(key, IsoTime(ms)); }
 
-    std::string Text() const { return std::string(m_text.GetString(), m_text.GetSize()) + "\n"; }
+    std::string Text() const { return terminal::ShownJson({m_text.GetString(), m_text.GetSize()}) + "\n"; }
 
 private:
     void Key(const char* key) {

@@ -90,8 +90,7 @@ Outbox LookAtOutbox(const std::string& path, const Service& service, const Log& 
     outbox.path = path;
     outbox.endpoint = EndpointOf(service);
     outbox.lastFailure = LastFailureIn(log);
-    std::error_code error;
-    outbox.isPresent = std::filesystem::is_regular_file(path, error);
+    outbox.isPresent = IsFile(path, outbox.problem);
     if (!outbox.isPresent)
         return outbox;
     try {

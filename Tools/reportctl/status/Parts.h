@@ -11,6 +11,9 @@ namespace reportctl::status {
 /// The service of the user `owner`, whose ledger was looked at.
 Service LookAtService(const ReportLedger::Look& ledger, uid_t owner);
 
+/// Whether there is a file; `problem` says why not, unless there is nothing at all.
+bool IsFile(const std::string& path, std::string& problem);
+
 Store LookAtStore(const std::string& path);
 
 /// `service` has the settings, `log` what went wrong last.

@@ -157,10 +157,14 @@ private:
                               name, rates.received, rates.stored, rates.refused);
     }
 
+    static std::string Missing(const std::string& problem) {
+        return problem.empty() ? "missing: " : "cannot be read: ";
+    }
+
     void ShowStore() {
         const Store& store = m_status.store;
         if (!store.isPresent)
-            return Row("store", "missing: " + terminal::Printable(store.path));
+            return Row("store", Missing(store.problem) + terminal::Printable(store.path));
         Row("store", fmt::format("{}{} rows, {}, -wal {}, schema version {}, newest createTime {}",
                                  store.areRowsCounted ? "" : "up to ", Number(store.rows), Bytes(store.bytes),
                                  Bytes(store.walBytes),
@@ -172,7 +176,7 @@ private:
     void ShowOutbox() {
         const Outbox& outbox = m_status.outbox;
         if (!outbox.isPresent)
-            return Row("outbox", "missing: " + terminal::Printable(outbox.path));
+            return Row("outbox", Missing(outbox.problem) + terminal::Printable(outbox.path));
         Row("outbox",
             fmt::format("{} waiting ({}), {} delivered, {} refused, {} dead letters, {} dropped",
                         Number(outbox.waiting),

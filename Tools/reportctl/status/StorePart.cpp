@@ -41,11 +41,20 @@ void Read(SQLite::Database& database, Store& store) {
 
 } // namespace
 
+bool IsFile(const std::string& path, std::string& problem) {
+    std::error_code error;
+    const bool isThere = fs::exists(path, error);
+    if (error)
+        problem = error.message();
+    else if (isThere && !fs::is_regular_file(path, error))
+        problem = "it is no file";
+    return isThere && problem.empty();
+}
+
 Store LookAtStore(const std::string& path) {
     Store store;
     store.path = path;
-    std::error_code error;
-    store.isPresent = fs::is_regular_file(path, error);
+    store.isPresent = IsFile(path, store.problem);
     if (!store.isPresent)
         return store;
     store.bytes = SizeOf(path);

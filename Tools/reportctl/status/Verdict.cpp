@@ -129,14 +129,14 @@ private:
 
     void JudgeStore() {
         const Store& store = m_status.store;
-        if (!store.isPresent)
-            Add(Verdict::Degraded,
-                fmt::format("The store {} is missing. Make it: `reportctl setup`.", store.path));
-        else if (!store.problem.empty())
+        if (!store.problem.empty())
             Add(Verdict::Degraded,
                 fmt::format("The store {} cannot be read: {}. docs/Database.md tells how to repair "
                             "it.",
                             store.path, store.problem));
+        else if (!store.isPresent)
+            Add(Verdict::Degraded,
+                fmt::format("The store {} is missing. Make it: `reportctl setup`.", store.path));
         else if (!store.hasTables)
             Add(Verdict::Degraded,
                 fmt::format("The store {} has not its tables. Make them: `reportctl setup`.", store.path));

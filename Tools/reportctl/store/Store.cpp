@@ -183,15 +183,40 @@ bool EnsureExistingStore(terminal::Worklog& log, const std::string& path, bool c
     return true;
 }
 
+bool IsOwner(const std::string& path) {
+    struct stat file {};
+    return ::stat(path.c_str(), &file) != 0 || file.st_uid == ::geteuid();
+}
+
+/// What a full disk, and one that may only be read, answer to SQLite when it makes the -wal and the -shm.
+bool IsForWantOfSideFiles(const SQLite::Exception& error) {
+    switch (error.getErrorCode() & 0xff) {
+    case SQLITE_IOERR:
+    case SQLITE_CANTOPEN:
+    case SQLITE_FULL:
+    case SQLITE_READONLY:
+        return true;
+    default:
+        return false;
+    }
+}
+
 } // namespace
 
+void RequireStore(const std::string& path) {
+    std::error_code error;
+    if (!fs::exists(path, error))
+        throw std::runtime_error(
+            path + (error ? ": " + error.message() : " is missing. `reportctl setup` makes it."));
+}
+
 SQLite::Database OpenStore(const std::string& path) {
-    if (!fs::exists(path))
-        throw std::runtime_error(path + " is missing. `reportctl setup` makes it.");
+    RequireStore(path);
     return SQLite::Database(path, SQLite::OPEN_READWRITE, BUSY_TIMEOUT_MS);
 }
 
 SQLite::Database OpenStoreToLook(const std::string& path) {
+    RequireStore(path);
     const auto log = path + "-wal";
     const bool hasRows = fs::exists(log) && fs::file_size(log) > 0;
     auto database = OpenStore(path);
@@ -202,9 +227,19 @@ SQLite::Database OpenStoreToLook(const std::string& path) {
 }
 
 SQLite::Database OpenToRead(const std::string& path) {
-    struct stat file {};
-    const bool isOwner = ::stat(path.c_str(), &file) != 0 || file.st_uid == ::geteuid();
-    return isOwner ? OpenStoreToLook(path) : OpenUnchanged(path);
+    RequireStore(path);
+    if (!IsOwner(path))
+        return OpenUnchanged(path);
+    try {
+        auto database = OpenStoreToLook(path);
+        database.execAndGet("pragma schema_version"); // reads, and so makes the side files
+        return database;
+    } catch (const SQLite::Exception& error) {
+        if (!IsForWantOfSideFiles(error))
+            throw;
+        // No service can write beside this reader then, either.
+        return OpenUnchanged(path);
+    }
 }
 
 bool EnsureStore(terminal::Worklog& log, const std::string& path, bool compact) {

@@ -3,6 +3,7 @@
 #include <string>
 
 #include <SQLiteCpp/Database.h>
+#include <SQLiteCpp/Exception.h>
 
 #include "Tools/reportctl/terminal/Worklog.h"
 
@@ -20,6 +21,19 @@ namespace reportctl::store {
 ///
 /// False when there is no store to go on with; the log has the reason. True in a dry run that would make it.
 bool EnsureStore(terminal::Worklog& log, const std::string& path, bool compact);
+
+/// Throws std::runtime_error, with what to do about it, when there is no store at the path, or the user may not see it.
+void RequireStore(const std::string& path);
+
+/// Does the work, and puts the name of the database before the words of SQLite, which name none.
+template <typename Work>
+auto Naming(const std::string& path, const Work& work) {
+    try {
+        return work();
+    } catch (const SQLite::Exception& error) {
+        throw SQLite::Exception(path + ": " + error.what(), error.getErrorCode());
+    }
+}
 
 /// Opens the database that is there, never makes one. Throws std::runtime_error, with what to do about it, when it is
 /// missing, and SQLite::Exception.

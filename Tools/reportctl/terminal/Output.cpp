@@ -13,6 +13,8 @@ int FinishOutput(int exitCode) {
     // Of std::cout, too, which the help is printed with: it keeps nothing of its own.
     if (std::fflush(stdout) == 0 && wasWritten)
         return exitCode;
+    if (errno == EPIPE)
+        return exitCode; // its reader has seen enough
     TellLastError("cannot write to standard output" +
                   (errno == 0 ? std::string() : ": " + SystemTool::ErrnoText(errno)));
     return exitCode == 0 ? 1 : exitCode;
