@@ -19,7 +19,7 @@ LogRecord ParseError(const std::string& message) {
 }
 
 /// On a server that was never started.
-class JsonToStructTest : public ::testing::Test {
+class TheJsonToStruct : public ::testing::Test {
 protected:
     ST_OptLog Converted(const std::string& json) {
         ST_OptLog log;
@@ -40,7 +40,7 @@ protected:
 
 } // namespace
 
-TEST_F(JsonToStructTest, ConvertsAReport) {
+TEST_F(TheJsonToStruct, ConvertsAReport) {
     const ST_OptLog log = Converted(
         R"({"eventID":"A100|10001","value":{"k": "v"},"createTime":1700000000,"isDayReport":0,"other":"ignored"})");
     EXPECT_EQ(log.nReserved, 0);
@@ -52,7 +52,7 @@ TEST_F(JsonToStructTest, ConvertsAReport) {
     EXPECT_THAT(FakeLogger().Records(), IsEmpty());
 }
 
-TEST_F(JsonToStructTest, WhatIsNoJsonLeavesTheDefaults) {
+TEST_F(TheJsonToStruct, WhatIsNoJsonLeavesTheDefaults) {
     ST_OptLog log;
     log.nReserved = 5;
     log.eventID = log.value = log.createTime = "left over";
@@ -66,7 +66,7 @@ TEST_F(JsonToStructTest, WhatIsNoJsonLeavesTheDefaults) {
     EXPECT_THAT(FakeLogger().Records(), ElementsAre(ParseError("Invalid value. At byte 0.")));
 }
 
-TEST_F(JsonToStructTest, AParsersTextIsAFormat) {
+TEST_F(TheJsonToStruct, AParsersTextIsAFormat) {
     g_scriptedJson.error = "near %d";
     ST_OptLog log;
     EXPECT_FALSE(m_server.JsonToStruct("{}", log));
@@ -76,7 +76,7 @@ TEST_F(JsonToStructTest, AParsersTextIsAFormat) {
                     "were passed")));
 }
 
-TEST_F(JsonToStructTest, LogsEachKindOfExceptionAndLeavesTheDefaults) {
+TEST_F(TheJsonToStruct, LogsEachKindOfExceptionAndLeavesTheDefaults) {
     ST_OptLog log;
     log.eventID = "left over";
     ExpectEachKindOfExceptionToBeLogged(g_scriptedJson.throws, "App/ReportServer", "JsonToStruct", 164,
@@ -84,7 +84,7 @@ TEST_F(JsonToStructTest, LogsEachKindOfExceptionAndLeavesTheDefaults) {
     EXPECT_EQ(log.eventID, "");
 }
 
-TEST_F(JsonToStructTest, TenCharactersOfTimeAreSeconds) {
+TEST_F(TheJsonToStruct, TenCharactersOfTimeAreSeconds) {
     EXPECT_EQ(CreateTimeOf("1700000000"), "1700000000000");
     EXPECT_EQ(CreateTimeOf(R"("1700000000")"), "1700000000000");
     EXPECT_EQ(CreateTimeOf(R"("abcdefghij")"), "abcdefghij000");
@@ -95,7 +95,7 @@ TEST_F(JsonToStructTest, TenCharactersOfTimeAreSeconds) {
     EXPECT_EQ(CreateTimeOf("12345678.5"), "12345678.5000") << "no integer: its text";
 }
 
-TEST_F(JsonToStructTest, OtherLengthsOfTimeStay) {
+TEST_F(TheJsonToStruct, OtherLengthsOfTimeStay) {
     for (const std::string json : {"1700000000123", "170000000", "17000000000", "0", "-1700000000", "1.5"})
         EXPECT_EQ(CreateTimeOf(json), json);
     EXPECT_EQ(CreateTimeOf(R"("abc")"), "abc");
@@ -105,7 +105,7 @@ TEST_F(JsonToStructTest, OtherLengthsOfTimeStay) {
     EXPECT_EQ(Converted("{}").createTime, "");
 }
 
-TEST_F(JsonToStructTest, ExactlyOneBarIsTypeZero) {
+TEST_F(TheJsonToStruct, ExactlyOneBarIsTypeZero) {
     EXPECT_EQ(TypeOf("A100|10001"), 0);
     EXPECT_EQ(TypeOf("|"), 0);
     EXPECT_EQ(TypeOf("A100|"), 0);
@@ -117,7 +117,7 @@ TEST_F(JsonToStructTest, ExactlyOneBarIsTypeZero) {
     EXPECT_EQ(Converted("{}").pType, 1);
 }
 
-TEST_F(JsonToStructTest, AnObjectsValueIsItsCompactJsonAndAnyOthersItsText) {
+TEST_F(TheJsonToStruct, AnObjectsValueIsItsCompactJsonAndAnyOthersItsText) {
     EXPECT_EQ(ValueOf(R"({ "a" : [ 1 , 2.5 ] , "b" : { } })"), R"({"a":[1,2.5],"b":{}})");
     EXPECT_EQ(ValueOf(R"("it's \"text\"")"), R"(it's "text")");
     EXPECT_EQ(ValueOf("1.5"), "1.5");
@@ -128,19 +128,19 @@ TEST_F(JsonToStructTest, AnObjectsValueIsItsCompactJsonAndAnyOthersItsText) {
     EXPECT_EQ(Converted("{}").value, "");
 }
 
-TEST_F(JsonToStructTest, OnlyTheIntegerOneIsADayReport) {
+TEST_F(TheJsonToStruct, OnlyTheIntegerOneIsADayReport) {
     EXPECT_TRUE(IsDayReport("1"));
     for (const std::string json : {"0", "2", "-1", "1.0", R"("1")", "true", "null", "4294967297"})
         EXPECT_FALSE(IsDayReport(json)) << json;
     EXPECT_FALSE(Converted("{}").isDayReport);
 }
 
-TEST_F(JsonToStructTest, ARootThatIsNoObjectGivesAnEmptyRecord) {
+TEST_F(TheJsonToStruct, ARootThatIsNoObjectGivesAnEmptyRecord) {
     for (const std::string json : {"[]", "5", R"("eventID")", "null"})
         EXPECT_EQ(Converted(json).eventID, "") << json;
 }
 
-TEST_F(JsonToStructTest, AnIdIsTextWhateverItsType) {
+TEST_F(TheJsonToStruct, AnIdIsTextWhateverItsType) {
     EXPECT_EQ(Converted(R"({"eventID":100})").eventID, "100");
     EXPECT_EQ(Converted(R"({"eventID":["A|"]})").eventID, R"(["A|"])");
     EXPECT_EQ(Converted(R"({"eventID":["A|"]})").pType, 0);

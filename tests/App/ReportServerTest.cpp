@@ -34,9 +34,9 @@ LogRecord Record(int level, const std::string& function, int line, const std::st
     return {level, "App/ReportServer", function, line, message};
 }
 
-class ReportServerTest : public ::testing::Test {
+class TheReportServer : public ::testing::Test {
 protected:
-    ~ReportServerTest() override {
+    ~TheReportServer() override {
         m_server.Stop();
         DBHelper::instance().Init(nullptr);
     }
@@ -93,7 +93,7 @@ std::ptrdiff_t ThreadCount() {
 
 // --- start and stop
 
-TEST_F(ReportServerTest, StartBringsUpTheDestinationsInOrder) {
+TEST_F(TheReportServer, StartBringsUpTheDestinationsInOrder) {
     EXPECT_TRUE(m_server.Start());
     EXPECT_EQ(m_server.GetBaseInfo().userDataDir, SystemTool::CommonTool::GetUserDataDir());
     EXPECT_EQ(m_server.GetBaseInfo().osVersion, SystemTool::CommonTool::GetOSVersionString());
@@ -104,7 +104,7 @@ TEST_F(ReportServerTest, StartBringsUpTheDestinationsInOrder) {
     EXPECT_THAT(messages, ElementsAre("Add metrik module :A759", "FrameWorker load success"));
 }
 
-TEST_F(ReportServerTest, StartReceivesOnTheReportPortAndConsumes) {
+TEST_F(TheReportServer, StartReceivesOnTheReportPortAndConsumes) {
     Start();
     SendDatagram(R"({"eventID":"B1","value":"v"})");
     SendDatagram(R"({"eventID":"A759|1"})");
@@ -114,7 +114,7 @@ TEST_F(ReportServerTest, StartReceivesOnTheReportPortAndConsumes) {
     EXPECT_EQ(EventCount(), 1U);
 }
 
-TEST_F(ReportServerTest, StartIsTrueWhenNothingWorks) {
+TEST_F(TheReportServer, StartIsTrueWhenNothingWorks) {
     m_db.createsNothing = true;
     m_sdk.createsNothing = true;
     Poco::Net::DatagramSocket taken;
@@ -124,7 +124,7 @@ TEST_F(ReportServerTest, StartIsTrueWhenNothingWorks) {
     EXPECT_EQ(output.Text(), "Poco exception: Net Exception: Address already in use: 127.0.0.1:9997\n");
 }
 
-TEST_F(ReportServerTest, AnExceptionInStartIsLogged) {
+TEST_F(TheReportServer, AnExceptionInStartIsLogged) {
     Start();
     CapturedOutput output; // the socket's complaint about a second bind
     EXPECT_FALSE(m_server.Start()) << "a thread that runs cannot be started";
@@ -134,7 +134,7 @@ TEST_F(ReportServerTest, AnExceptionInStartIsLogged) {
     EXPECT_THAT(records[0].message, ::testing::MatchesRegex("Poco exception :.*thread already running.* "));
 }
 
-TEST_F(ReportServerTest, AfterAnExceptionInStartReportsAreStillStored) {
+TEST_F(TheReportServer, AfterAnExceptionInStartReportsAreStillStored) {
     Start();
     CapturedOutput output;
     EXPECT_FALSE(m_server.Start());
@@ -145,7 +145,7 @@ TEST_F(ReportServerTest, AfterAnExceptionInStartReportsAreStillStored) {
     EXPECT_THAT(m_db.calls.back().argument, HasSubstr("'after'"));
 }
 
-TEST_F(ReportServerTest, DestructionStopsBothThreadsFirst) {
+TEST_F(TheReportServer, DestructionStopsBothThreadsFirst) {
     const auto before = ThreadCount();
     {
         ReportServer server;
@@ -157,7 +157,7 @@ TEST_F(ReportServerTest, DestructionStopsBothThreadsFirst) {
     EXPECT_TRUE(WaitUntil([&] { return ThreadCount() == before; }));
 }
 
-TEST_F(ReportServerTest, StopEndsTheInputBeforeTheQueue) {
+TEST_F(TheReportServer, StopEndsTheInputBeforeTheQueue) {
     BlockedServer server;
     const auto before = ThreadCount();
     ASSERT_TRUE(server.Start());
@@ -172,7 +172,7 @@ TEST_F(ReportServerTest, StopEndsTheInputBeforeTheQueue) {
     EXPECT_TRUE(WaitUntil([&] { return ThreadCount() == before; }));
 }
 
-TEST_F(ReportServerTest, DestructionKeepsTheDestinationsUntilTheReportUnderWayIsStored) {
+TEST_F(TheReportServer, DestructionKeepsTheDestinationsUntilTheReportUnderWayIsStored) {
     auto server = std::make_unique<ReportServer>();
     const auto before = ThreadCount();
     ASSERT_TRUE(server->Start());
@@ -193,7 +193,7 @@ TEST_F(ReportServerTest, DestructionKeepsTheDestinationsUntilTheReportUnderWayIs
     release.set();
 }
 
-TEST_F(ReportServerTest, TheStoreIsReleasedBeforeAnalytics) {
+TEST_F(TheReportServer, TheStoreIsReleasedBeforeAnalytics) {
     int sequence = 0;
     m_db.sequence = &sequence;
     m_sdk.sequence = &sequence;
@@ -205,12 +205,12 @@ TEST_F(ReportServerTest, TheStoreIsReleasedBeforeAnalytics) {
     EXPECT_EQ(m_sdk.destroyedAt, 2);
 }
 
-TEST_F(ReportServerTest, StopBeforeStartReturns) {
+TEST_F(TheReportServer, StopBeforeStartReturns) {
     m_server.Stop();
     EXPECT_THAT(FakeLogger().Records(), IsEmpty());
 }
 
-TEST_F(ReportServerTest, DestructionReleasesTheDestinations) {
+TEST_F(TheReportServer, DestructionReleasesTheDestinations) {
     {
         ReportServer server;
         ASSERT_TRUE(server.Start());
@@ -219,7 +219,7 @@ TEST_F(ReportServerTest, DestructionReleasesTheDestinations) {
     EXPECT_EQ(m_db.destroyed, 1);
 }
 
-TEST_F(ReportServerTest, WhatIsReceivedIsHandledInOrder) {
+TEST_F(TheReportServer, WhatIsReceivedIsHandledInOrder) {
     Start();
     for (int i = 0; i < 500; ++i)
         SendDatagram(R"({"eventID":"B)" + std::to_string(i) + "\"}");
@@ -233,12 +233,12 @@ TEST_F(ReportServerTest, WhatIsReceivedIsHandledInOrder) {
 
 // --- receiving
 
-TEST_F(ReportServerTest, RecvLogsTheTextAndIsTrue) {
+TEST_F(TheReportServer, RecvLogsTheTextAndIsTrue) {
     EXPECT_TRUE(m_server.Recv(R"({"eventID":"B1"})"));
     EXPECT_THAT(FakeLogger().Records(), ElementsAre(Record(2, "Recv", 42, R"({"eventID":"B1"})")));
 }
 
-TEST_F(ReportServerTest, RecvLogsBeforeItQueues) {
+TEST_F(TheReportServer, RecvLogsBeforeItQueues) {
     class Server : public ReportServer {
     public:
         using PocoTasker<std::string>::m_queue;
@@ -251,14 +251,14 @@ TEST_F(ReportServerTest, RecvLogsBeforeItQueues) {
     EXPECT_EQ(server.m_queue.size(), 1);
 }
 
-TEST_F(ReportServerTest, RecvTakesTheTextForAFormat) {
+TEST_F(TheReportServer, RecvTakesTheTextForAFormat) {
     EXPECT_TRUE(m_server.Recv("%s"));
     EXPECT_TRUE(m_server.Recv("100%% sure"));
     EXPECT_THAT(FakeLogger().Records(),
                 ElementsAre(Record(4, "Recv", 42, TOO_FEW_ARGUMENTS), Record(2, "Recv", 42, "100% sure")));
 }
 
-TEST_F(ReportServerTest, ATextThatCannotBeLoggedIsProcessedAllTheSame) {
+TEST_F(TheReportServer, ATextThatCannotBeLoggedIsProcessedAllTheSame) {
     Start();
     SendDatagram(R"({"eventID":"B1","value":"50%s"})");
     SendDatagram("%s");
@@ -272,7 +272,7 @@ TEST_F(ReportServerTest, ATextThatCannotBeLoggedIsProcessedAllTheSame) {
 
 // --- dispatch
 
-TEST_F(ReportServerTest, AReportOfAModuleGoesToAnalyticsOnly) {
+TEST_F(TheReportServer, AReportOfAModuleGoesToAnalyticsOnly) {
     Start();
     EXPECT_TRUE(m_server.Consume(R"({"eventID":"A759|10001","value":{"a":1},"createTime":1700000000})"));
     EXPECT_EQ(EventCount(), 1U);
@@ -281,7 +281,7 @@ TEST_F(ReportServerTest, AReportOfAModuleGoesToAnalyticsOnly) {
     EXPECT_THAT(m_sdk.calls.back().arguments.back(), HasSubstr(R"("createTime":"1700000000000")"));
 }
 
-TEST_F(ReportServerTest, AnyOtherReportGoesToTheStoreOnly) {
+TEST_F(TheReportServer, AnyOtherReportGoesToTheStoreOnly) {
     Start();
     for (const std::string eventID : {"B1", "a759|1", "", "|A", " A", "1"})
         EXPECT_TRUE(m_server.Consume(R"({"eventID":")" + eventID + "\"}")) << eventID;
@@ -289,13 +289,13 @@ TEST_F(ReportServerTest, AnyOtherReportGoesToTheStoreOnly) {
     EXPECT_EQ(RowCount(), 6U);
 }
 
-TEST_F(ReportServerTest, TheFirstLetterIsThatOfTheDecodedId) {
+TEST_F(TheReportServer, TheFirstLetterIsThatOfTheDecodedId) {
     Start();
     EXPECT_TRUE(m_server.Consume(R"({"eventID":"\u0041759|1"})"));
     EXPECT_EQ(EventCount(), 1U);
 }
 
-TEST_F(ReportServerTest, TheKeyIsSearchedInTheRawText) {
+TEST_F(TheReportServer, TheKeyIsSearchedInTheRawText) {
     Start();
     EXPECT_TRUE(m_server.Consume(R"({"event\u0049D":"B1"})")) << "an escaped spelling of the key is none";
     EXPECT_EQ(RowCount(), 0U);
@@ -304,14 +304,14 @@ TEST_F(ReportServerTest, TheKeyIsSearchedInTheRawText) {
     EXPECT_THAT(m_db.calls.back().argument, HasSubstr("values('', '','',1,"));
 }
 
-TEST_F(ReportServerTest, AControlMessageThatMentionsTheKeyIsNoControlMessage) {
+TEST_F(TheReportServer, AControlMessageThatMentionsTheKeyIsNoControlMessage) {
     Start();
     EXPECT_TRUE(m_server.Consume(R"({"msgType":"updateOpenID","exdata":{"openID":"eventID"}})"));
     EXPECT_EQ(m_server.GetBaseInfo().openID, "visitor");
     EXPECT_EQ(RowCount(), 1U);
 }
 
-TEST_F(ReportServerTest, AControlMessageGoesToTheManagerAndIsTrueWhateverItSays) {
+TEST_F(TheReportServer, AControlMessageGoesToTheManagerAndIsTrueWhateverItSays) {
     Start();
     EXPECT_TRUE(m_server.Consume(R"({"msgType":"updateOpenID","exdata":{"openID":"u1"}})"));
     EXPECT_EQ(m_server.GetBaseInfo().openID, "u1");
@@ -320,7 +320,7 @@ TEST_F(ReportServerTest, AControlMessageGoesToTheManagerAndIsTrueWhateverItSays)
     EXPECT_EQ(FakeLogger().RecordsOf("Update").size(), 2U);
 }
 
-TEST_F(ReportServerTest, AReportThatCannotBeParsedIsFalseAndTheNextOneIsTaken) {
+TEST_F(TheReportServer, AReportThatCannotBeParsedIsFalseAndTheNextOneIsTaken) {
     Start();
     EXPECT_FALSE(m_server.Consume(R"({"eventID":)"));
     EXPECT_THAT(FakeLogger().Records(),
@@ -329,7 +329,7 @@ TEST_F(ReportServerTest, AReportThatCannotBeParsedIsFalseAndTheNextOneIsTaken) {
     EXPECT_EQ(RowCount(), 1U);
 }
 
-TEST_F(ReportServerTest, ADestinationsFailureIsNoFailureOfConsume) {
+TEST_F(TheReportServer, ADestinationsFailureIsNoFailureOfConsume) {
     Start();
     m_db.answer = false;
     m_sdk.reportAnswer = false;
@@ -337,7 +337,7 @@ TEST_F(ReportServerTest, ADestinationsFailureIsNoFailureOfConsume) {
     EXPECT_TRUE(m_server.Consume(R"({"eventID":"A759|1"})"));
 }
 
-TEST_F(ReportServerTest, AMissingDestinationIsLogged) {
+TEST_F(TheReportServer, AMissingDestinationIsLogged) {
     EXPECT_FALSE(m_server.Consume(R"({"eventID":"B1"})"));
     EXPECT_FALSE(m_server.Consume(R"({"eventID":"A1"})"));
     EXPECT_FALSE(m_server.Consume("control"));
@@ -349,7 +349,7 @@ TEST_F(ReportServerTest, AMissingDestinationIsLogged) {
 
 // --- base information
 
-TEST_F(ReportServerTest, SetBaseInfoTakesUserAndVersionOverAndLogsThem) {
+TEST_F(TheReportServer, SetBaseInfoTakesUserAndVersionOverAndLogsThem) {
     ST_BaseInfo info;
     info.openID = "u1";
     info.suiteVersion = "5.1.0.2";
@@ -359,7 +359,7 @@ TEST_F(ReportServerTest, SetBaseInfoTakesUserAndVersionOverAndLogsThem) {
     EXPECT_THAT(FakeLogger().Records(), ElementsAre(Record(2, "SetBaseInfo", 111, "SetBaseInfo u1-5.1.0.2")));
 }
 
-TEST_F(ReportServerTest, SetBaseInfoWithBothEmptyChangesNothingAndLogs) {
+TEST_F(TheReportServer, SetBaseInfoWithBothEmptyChangesNothingAndLogs) {
     ST_BaseInfo info;
     info.openID.clear();
     info.suiteVersion.clear();
@@ -368,7 +368,7 @@ TEST_F(ReportServerTest, SetBaseInfoWithBothEmptyChangesNothingAndLogs) {
                 ElementsAre(Record(2, "SetBaseInfo", 111, "SetBaseInfo visitor-3.0.0.0")));
 }
 
-TEST_F(ReportServerTest, SetBaseInfoWithAnEmptyVersionKeepsTheVersion) {
+TEST_F(TheReportServer, SetBaseInfoWithAnEmptyVersionKeepsTheVersion) {
     ST_BaseInfo info;
     info.suiteVersion = "9";
     m_server.SetBaseInfo(info);
@@ -378,7 +378,7 @@ TEST_F(ReportServerTest, SetBaseInfoWithAnEmptyVersionKeepsTheVersion) {
     EXPECT_EQ(FakeLogger().Records().back().message, "SetBaseInfo u1-9");
 }
 
-TEST_F(ReportServerTest, AFreshRecordPassesItsOtherDefaultOn) {
+TEST_F(TheReportServer, AFreshRecordPassesItsOtherDefaultOn) {
     ST_BaseInfo info;
     info.suiteVersion = "9";
     m_server.SetBaseInfo(info);
@@ -388,7 +388,7 @@ TEST_F(ReportServerTest, AFreshRecordPassesItsOtherDefaultOn) {
     EXPECT_EQ(m_server.GetBaseInfo().suiteVersion, "3.0.0.0");
 }
 
-TEST_F(ReportServerTest, SetBaseInfoNeverChangesTheMachinesFacts) {
+TEST_F(TheReportServer, SetBaseInfoNeverChangesTheMachinesFacts) {
     m_server.InitBaseInfo();
     ST_BaseInfo info;
     info.userDataDir = "/elsewhere";
@@ -398,7 +398,7 @@ TEST_F(ReportServerTest, SetBaseInfoNeverChangesTheMachinesFacts) {
     EXPECT_EQ(m_server.GetBaseInfo().osVersion, SystemTool::CommonTool::GetOSVersionString());
 }
 
-TEST_F(ReportServerTest, InitBaseInfoLeavesUserAndVersionAlone) {
+TEST_F(TheReportServer, InitBaseInfoLeavesUserAndVersionAlone) {
     ST_BaseInfo info;
     info.openID = "u1";
     info.suiteVersion = "9";
@@ -408,7 +408,7 @@ TEST_F(ReportServerTest, InitBaseInfoLeavesUserAndVersionAlone) {
     EXPECT_EQ(m_server.GetBaseInfo().suiteVersion, "9");
 }
 
-TEST_F(ReportServerTest, AnOpenIdWithAPercentSignIsLoggedUnchanged) {
+TEST_F(TheReportServer, AnOpenIdWithAPercentSignIsLoggedUnchanged) {
     ST_BaseInfo info;
     info.openID = "100%s";
     m_server.SetBaseInfo(info);

@@ -142,7 +142,7 @@ private:
     std::atomic<int> m_idle = 0;
 };
 
-class UDPServerTest : public ::testing::Test {
+class TheUDPServer : public ::testing::Test {
 protected:
     void Send(const std::string& datagram) {
         m_sender.sendTo(datagram.data(), static_cast<int>(datagram.size()), SocketAddress(LOOPBACK, PORT));
@@ -163,7 +163,7 @@ protected:
 
 static_assert(std::is_abstract_v<UDPServer>);
 
-TEST_F(UDPServerTest, HandsEachDatagramOnAsText) {
+TEST_F(TheUDPServer, HandsEachDatagramOnAsText) {
     ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
     Send("one");
     Send("two");
@@ -172,40 +172,40 @@ TEST_F(UDPServerTest, HandsEachDatagramOnAsText) {
     EXPECT_EQ(m_output.Text(), "");
 }
 
-TEST_F(UDPServerTest, IgnoresADatagramOfNoBytes) {
+TEST_F(TheUDPServer, IgnoresADatagramOfNoBytes) {
     ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
     Send("");
     Send("after");
     EXPECT_THAT(Await(1), ElementsAre("after"));
 }
 
-TEST_F(UDPServerTest, CutsADatagramAtItsFirstZeroByte) {
+TEST_F(TheUDPServer, CutsADatagramAtItsFirstZeroByte) {
     ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
     Send(std::string("before\0after\0", 13));
     EXPECT_THAT(Await(1), ElementsAre("before"));
 }
 
-TEST_F(UDPServerTest, HandsADatagramThatStartsWithAZeroByteOnAsEmptyText) {
+TEST_F(TheUDPServer, HandsADatagramThatStartsWithAZeroByteOnAsEmptyText) {
     ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
     Send(std::string("\0text", 5));
     EXPECT_THAT(Await(1), ElementsAre(""));
 }
 
-TEST_F(UDPServerTest, LeavesNothingOfALongDatagramInAShortOneAfterIt) {
+TEST_F(TheUDPServer, LeavesNothingOfALongDatagramInAShortOneAfterIt) {
     ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
     Send(std::string(10240, 'x'));
     Send("short");
     EXPECT_EQ(Await(2)[1], "short");
 }
 
-TEST_F(UDPServerTest, TakesADatagramOf10240BytesWhole) {
+TEST_F(TheUDPServer, TakesADatagramOf10240BytesWhole) {
     ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
     const std::string whole = std::string(10239, 'x') + "y";
     Send(whole);
     EXPECT_EQ(Await(1)[0], whole);
 }
 
-TEST_F(UDPServerTest, CutsLongerDatagramsTo10240Bytes) {
+TEST_F(TheUDPServer, CutsLongerDatagramsTo10240Bytes) {
     ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
     Send(std::string(10241, 'x'));
     Send(std::string(65507, 'y'));
@@ -214,7 +214,7 @@ TEST_F(UDPServerTest, CutsLongerDatagramsTo10240Bytes) {
     EXPECT_EQ(received[1], std::string(10240, 'y'));
 }
 
-TEST_F(UDPServerTest, PrintsAnExceptionOutOfRecvAndGoesOn) {
+TEST_F(TheUDPServer, PrintsAnExceptionOutOfRecvAndGoesOn) {
     ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
     Send("throw Poco");
     Send("throw std");
@@ -228,7 +228,7 @@ TEST_F(UDPServerTest, PrintsAnExceptionOutOfRecvAndGoesOn) {
     EXPECT_EQ(m_output.Flushes(), 3);
 }
 
-TEST_F(UDPServerTest, NeedsNoDescriptorAfterAnExceptionOutOfRecv) {
+TEST_F(TheUDPServer, NeedsNoDescriptorAfterAnExceptionOutOfRecv) {
 #if defined(__SANITIZE_ADDRESS__)
     GTEST_SKIP() << "the sanitizer takes descriptors to look at an exception's type, and finds none without";
 #endif
@@ -248,14 +248,14 @@ TEST_F(UDPServerTest, NeedsNoDescriptorAfterAnExceptionOutOfRecv) {
     EXPECT_EQ(m_output.Text(), "Std exception: scripted\n");
 }
 
-TEST_F(UDPServerTest, TakesDatagramsOfAnyLocalSender) {
+TEST_F(TheUDPServer, TakesDatagramsOfAnyLocalSender) {
     ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
     Poco::Net::DatagramSocket other(SocketAddress("127.0.0.2", 0));
     other.sendTo("from elsewhere", 14, SocketAddress(LOOPBACK, PORT));
     EXPECT_THAT(Await(1), ElementsAre("from elsewhere"));
 }
 
-TEST_F(UDPServerTest, PrintsAReceiveThatFailsAndGoesOn) {
+TEST_F(TheUDPServer, PrintsAReceiveThatFailsAndGoesOn) {
     ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
     Send("fail the next receive");
     EXPECT_TRUE(WaitUntil([&] { return m_output.Text() == "Poco exception: Connection refused\n"; }))
@@ -264,7 +264,7 @@ TEST_F(UDPServerTest, PrintsAReceiveThatFailsAndGoesOn) {
     EXPECT_THAT(Await(2), ElementsAre("fail the next receive", "after"));
 }
 
-TEST_F(UDPServerTest, ATakenPortIsPrintedAndStartsNothing) {
+TEST_F(TheUDPServer, ATakenPortIsPrintedAndStartsNothing) {
     Poco::Net::DatagramSocket other;
     other.bind(SocketAddress(LOOPBACK, PORT), false, false);
     EXPECT_FALSE(m_receiver.Start(LOOPBACK, PORT));
@@ -273,19 +273,19 @@ TEST_F(UDPServerTest, ATakenPortIsPrintedAndStartsNothing) {
     m_receiver.Stop(); // returns at once: the thread was never started
 }
 
-TEST_F(UDPServerTest, AnAddressThatIsNoneIsPrintedAndStartsNothing) {
+TEST_F(TheUDPServer, AnAddressThatIsNoneIsPrintedAndStartsNothing) {
     EXPECT_FALSE(m_receiver.Start("not an address", PORT));
     EXPECT_FALSE(m_receiver.IsRunning());
     EXPECT_THAT(m_output.Text(), ::testing::StartsWith("Poco exception: "));
 }
 
-TEST_F(UDPServerTest, BindsAPortThatAnotherReceiverHolds) {
+TEST_F(TheUDPServer, BindsAPortThatAnotherReceiverHolds) {
     Receiver other;
     ASSERT_TRUE(other.Start(LOOPBACK, PORT));
     EXPECT_TRUE(m_receiver.Start(LOOPBACK, PORT)) << "a restarted service must not wait for its predecessor";
 }
 
-TEST_F(UDPServerTest, BindsBesideASocketThatHasEitherKindOfReuse) {
+TEST_F(TheUDPServer, BindsBesideASocketThatHasEitherKindOfReuse) {
     for (const bool address : {true, false}) {
         Poco::Net::DatagramSocket other;
         other.bind(SocketAddress(LOOPBACK, PORT), address, !address);
@@ -294,12 +294,12 @@ TEST_F(UDPServerTest, BindsBesideASocketThatHasEitherKindOfReuse) {
     }
 }
 
-TEST_F(UDPServerTest, StopBeforeStartReturns) {
+TEST_F(TheUDPServer, StopBeforeStartReturns) {
     m_receiver.Stop();
     EXPECT_FALSE(m_receiver.IsRunning());
 }
 
-TEST_F(UDPServerTest, StopsWithin300MillisecondsWhileIdle) {
+TEST_F(TheUDPServer, StopsWithin300MillisecondsWhileIdle) {
     std::unique_ptr<Receiver> receiver;
     const auto startAndIdle = [&] {
         receiver.reset();
@@ -313,7 +313,7 @@ TEST_F(UDPServerTest, StopsWithin300MillisecondsWhileIdle) {
     EXPECT_FALSE(receiver->IsRunning());
 }
 
-TEST_F(UDPServerTest, DestructionEndsTheThread) {
+TEST_F(TheUDPServer, DestructionEndsTheThread) {
     std::atomic<pid_t> thread = 0;
     auto receiver = std::make_unique<ReceiverWithoutAStop>(thread);
     ASSERT_TRUE(receiver->Start(LOOPBACK, PORT));
@@ -323,14 +323,14 @@ TEST_F(UDPServerTest, DestructionEndsTheThread) {
     EXPECT_FALSE(std::filesystem::exists("/proc/self/task/" + std::to_string(thread)));
 }
 
-TEST_F(UDPServerTest, ASecondStopReturns) {
+TEST_F(TheUDPServer, ASecondStopReturns) {
     ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
     m_receiver.Stop();
     m_receiver.Stop();
     EXPECT_FALSE(m_receiver.IsRunning());
 }
 
-TEST_F(UDPServerTest, StopSelfEndsTheLoopFromWithin) {
+TEST_F(TheUDPServer, StopSelfEndsTheLoopFromWithin) {
     ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
     Send("stop self");
     m_receiver.Join();
@@ -338,7 +338,7 @@ TEST_F(UDPServerTest, StopSelfEndsTheLoopFromWithin) {
     EXPECT_THAT(m_receiver.Received(), ElementsAre("stop self"));
 }
 
-TEST_F(UDPServerTest, AStopBeforeTheLoopBeganLetsItReturnAtOnce) {
+TEST_F(TheUDPServer, AStopBeforeTheLoopBeganLetsItReturnAtOnce) {
     m_receiver.Bind();
     Send("waiting");
     m_receiver.StopSelf();
@@ -346,7 +346,7 @@ TEST_F(UDPServerTest, AStopBeforeTheLoopBeganLetsItReturnAtOnce) {
     EXPECT_THAT(m_receiver.Received(), ElementsAre()) << "not even for what waits";
 }
 
-TEST_F(UDPServerTest, PrintsAPollThatKeepsFailingOnceAndCanStillBeStopped) {
+TEST_F(TheUDPServer, PrintsAPollThatKeepsFailingOnceAndCanStillBeStopped) {
     ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
     Send("close the socket");
     EXPECT_TRUE(WaitUntil([] { return Pauses().size() >= 3; })) << "the poll fails again and again";
@@ -358,7 +358,7 @@ TEST_F(UDPServerTest, PrintsAPollThatKeepsFailingOnceAndCanStillBeStopped) {
     EXPECT_FALSE(m_receiver.IsRunning());
 }
 
-TEST_F(UDPServerTest, PrintsASocketThatIsLostWithoutAWordOnce) {
+TEST_F(TheUDPServer, PrintsASocketThatIsLostWithoutAWordOnce) {
     ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
     Send("before");
     Await(1);
@@ -368,14 +368,14 @@ TEST_F(UDPServerTest, PrintsASocketThatIsLostWithoutAWordOnce) {
     EXPECT_EQ(m_output.Text(), "Poco exception: I/O error: 1\n");
 }
 
-TEST_F(UDPServerTest, HasTheLargestReceiveBufferThatTheKernelGrants) {
+TEST_F(TheUDPServer, HasTheLargestReceiveBufferThatTheKernelGrants) {
     ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
     Poco::Net::DatagramSocket asked(SocketAddress(LOOPBACK, 0));
     asked.setReceiveBufferSize(8 * 1024 * 1024);
     EXPECT_EQ(m_receiver.ReceiveBufferBytes(), asked.getReceiveBufferSize());
 }
 
-TEST_F(UDPServerTest, TellsItsWatchOfEachDatagramAlsoOfWhatGoesNoFurther) {
+TEST_F(TheUDPServer, TellsItsWatchOfEachDatagramAlsoOfWhatGoesNoFurther) {
     Watch watch;
     m_receiver.WatchBy(watch);
     ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
@@ -388,7 +388,7 @@ TEST_F(UDPServerTest, TellsItsWatchOfEachDatagramAlsoOfWhatGoesNoFurther) {
     m_receiver.Stop();
 }
 
-TEST_F(UDPServerTest, TellsItsWatchWhenNothingComes) {
+TEST_F(TheUDPServer, TellsItsWatchWhenNothingComes) {
     Watch watch;
     m_receiver.WatchBy(watch);
     ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
@@ -397,7 +397,7 @@ TEST_F(UDPServerTest, TellsItsWatchWhenNothingComes) {
     EXPECT_THAT(watch.Told(), ElementsAre());
 }
 
-TEST_F(UDPServerTest, TellsNobodyOfAReceiveThatFailed) {
+TEST_F(TheUDPServer, TellsNobodyOfAReceiveThatFailed) {
     Watch watch;
     m_receiver.WatchBy(watch);
     ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));

@@ -21,10 +21,10 @@ namespace {
 using Rows = std::vector<std::vector<std::string>>;
 using Call = FakeSqliteState::Call;
 
-class DBHelperTest : public ::testing::Test {
+class TheDBHelper : public ::testing::Test {
 protected:
-    DBHelperTest() { m_helper.Init(m_loader.GetModule()); }
-    ~DBHelperTest() override { m_helper.Init(nullptr); }
+    TheDBHelper() { m_helper.Init(m_loader.GetModule()); }
+    ~TheDBHelper() override { m_helper.Init(nullptr); }
 
     /// A record of DBHelper, with any line number.
     static auto Error(const std::string& function, const std::string& message) {
@@ -64,14 +64,14 @@ TEST_F(DBHelperWithoutPlugin, AQueryFailsSilentlyAndEmptiesTheRows) {
     EXPECT_THAT(FakeLogger().Records(), IsEmpty());
 }
 
-TEST_F(DBHelperTest, InitIsTrueAndTakesAnotherObjectLater) {
+TEST_F(TheDBHelper, InitIsTrueAndTakesAnotherObjectLater) {
     EXPECT_TRUE(m_helper.Init(nullptr));
     EXPECT_FALSE(m_helper.ExecSql("select 1"));
     EXPECT_TRUE(m_helper.Init(m_loader.GetModule()));
     EXPECT_TRUE(m_helper.ExecSql("select 1"));
 }
 
-TEST_F(DBHelperTest, PassesStatementsOnUnchanged) {
+TEST_F(TheDBHelper, PassesStatementsOnUnchanged) {
     const std::string sql = " select 'it''s' , \"%s\";; -- \n";
     Rows rows;
     int count = 0;
@@ -86,7 +86,7 @@ TEST_F(DBHelperTest, PassesStatementsOnUnchanged) {
     EXPECT_THAT(FakeLogger().Records(), IsEmpty());
 }
 
-TEST_F(DBHelperTest, AFailureIsLoggedAsErrorTextHyphenStatement) {
+TEST_F(TheDBHelper, AFailureIsLoggedAsErrorTextHyphenStatement) {
     m_db.answer = false;
     m_db.errorText = "no such table";
     Rows rows;
@@ -101,14 +101,14 @@ TEST_F(DBHelperTest, AFailureIsLoggedAsErrorTextHyphenStatement) {
                                                     Error("GetTotalCount", "no such table-select 1")));
 }
 
-TEST_F(DBHelperTest, PercentSignsOfErrorAndStatementAreLoggedAsTheyAre) {
+TEST_F(TheDBHelper, PercentSignsOfErrorAndStatementAreLoggedAsTheyAre) {
     m_db.answer = false;
     m_db.errorText = "near \"%d\"";
     EXPECT_FALSE(m_helper.ExecSql("select '%s'"));
     EXPECT_THAT(FakeLogger().Records(), ElementsAre(Error("ExecSql", "near \"%d\"-select '%s'")));
 }
 
-TEST_F(DBHelperTest, AFailureThatIsTooLongForTheLogIsFalseAndMarked) {
+TEST_F(TheDBHelper, AFailureThatIsTooLongForTheLogIsFalseAndMarked) {
     m_db.answer = false;
     const std::string statement(1024 * 1024, 'x');
     EXPECT_FALSE(m_helper.ExecSql(statement));
@@ -118,7 +118,7 @@ TEST_F(DBHelperTest, AFailureThatIsTooLongForTheLogIsFalseAndMarked) {
                                      "1048576 of a log record")));
 }
 
-TEST_F(DBHelperTest, AFailureThatTheLoggerDoesNotTakeIsFalseAllTheSame) {
+TEST_F(TheDBHelper, AFailureThatTheLoggerDoesNotTakeIsFalseAllTheSame) {
     m_db.answer = false;
     FakeLogger().throws = Throws::Std;
     Rows rows;
@@ -131,21 +131,21 @@ TEST_F(DBHelperTest, AFailureThatTheLoggerDoesNotTakeIsFalseAllTheSame) {
     EXPECT_EQ(m_db.calls.size(), 8U) << "each was tried, the batch three times";
 }
 
-TEST_F(DBHelperTest, AQueryIsTrueWhenARowCameBack) {
+TEST_F(TheDBHelper, AQueryIsTrueWhenARowCameBack) {
     m_db.rows = {{"OpenID", "u1"}, {"HubLinkVersion", "5.1.0.2"}};
     Rows rows = {{"left", "over"}};
     EXPECT_TRUE(m_helper.QuerySql("select key ,value from BaseInfo ;", rows));
     EXPECT_EQ(rows, m_db.rows);
 }
 
-TEST_F(DBHelperTest, AQueryWithoutARowIsFalseAndLogsNothing) {
+TEST_F(TheDBHelper, AQueryWithoutARowIsFalseAndLogsNothing) {
     Rows rows = {{"left", "over"}};
     EXPECT_FALSE(m_helper.QuerySql("select 1 where 0", rows));
     EXPECT_THAT(rows, IsEmpty());
     EXPECT_THAT(FakeLogger().Records(), IsEmpty());
 }
 
-TEST_F(DBHelperTest, ABatchThatFailsOnceIsTriedAgainAfterAPause) {
+TEST_F(TheDBHelper, ABatchThatFailsOnceIsTriedAgainAfterAPause) {
     m_db.answers = {false, true};
     EXPECT_TRUE(m_helper.BatExecSql({"a", "b"}));
     EXPECT_THAT(Pauses(), ElementsAre(1000));
@@ -153,7 +153,7 @@ TEST_F(DBHelperTest, ABatchThatFailsOnceIsTriedAgainAfterAPause) {
     EXPECT_THAT(FakeLogger().Records(), ElementsAre(Error("BatExecSql", "scripted error")));
 }
 
-TEST_F(DBHelperTest, ABatchThatKeepsFailingIsTriedThreeTimesWithThreePauses) {
+TEST_F(TheDBHelper, ABatchThatKeepsFailingIsTriedThreeTimesWithThreePauses) {
     m_db.answer = false;
     EXPECT_FALSE(m_helper.BatExecSql({"a"}));
     EXPECT_THAT(Pauses(), ElementsAre(1000, 1000, 1000)) << "the last failure pauses too";
@@ -163,7 +163,7 @@ TEST_F(DBHelperTest, ABatchThatKeepsFailingIsTriedThreeTimesWithThreePauses) {
                             Error("BatExecSql", "scripted error")));
 }
 
-TEST_F(DBHelperTest, ABatchErrorWithADirectiveIsABoostLogErrorAndIsRetried) {
+TEST_F(TheDBHelper, ABatchErrorWithADirectiveIsABoostLogErrorAndIsRetried) {
     m_db.answers = {false, true};
     m_db.errorText = "near %d";
     EXPECT_TRUE(m_helper.BatExecSql({"a"}));
@@ -173,7 +173,7 @@ TEST_F(DBHelperTest, ABatchErrorWithADirectiveIsABoostLogErrorAndIsRetried) {
                                         "arguments than were passed")));
 }
 
-TEST_F(DBHelperTest, ACountIsResetBeforeThePluginIsAsked) {
+TEST_F(TheDBHelper, ACountIsResetBeforeThePluginIsAsked) {
     m_db.count = -1;
     m_db.answer = false;
     int count = 99;
@@ -182,7 +182,7 @@ TEST_F(DBHelperTest, ACountIsResetBeforeThePluginIsAsked) {
     EXPECT_EQ(m_db.calls.front(), (Call{"count was", "0"}));
 }
 
-TEST_F(DBHelperTest, AFailedCountKeepsWhatThePluginStored) {
+TEST_F(TheDBHelper, AFailedCountKeepsWhatThePluginStored) {
     m_db.count = 5;
     m_db.answer = false;
     int count = 99;
@@ -190,7 +190,7 @@ TEST_F(DBHelperTest, AFailedCountKeepsWhatThePluginStored) {
     EXPECT_EQ(count, 5);
 }
 
-TEST_F(DBHelperTest, ThePluginsExceptionsGoToTheCaller) {
+TEST_F(TheDBHelper, ThePluginsExceptionsGoToTheCaller) {
     Rows rows;
     int count = 0;
     const auto expectAll = [&]<typename Exception>(Throws what, const Exception&) {

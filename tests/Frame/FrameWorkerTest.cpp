@@ -22,10 +22,10 @@ namespace {
 
 using Call = FakeSqliteState::Call;
 
-class FrameWorkerTest : public ::testing::Test {
+class TheFrameWorker : public ::testing::Test {
 protected:
-    FrameWorkerTest() { m_server.InitBaseInfo(); }
-    ~FrameWorkerTest() override { DBHelper::instance().Init(nullptr); }
+    TheFrameWorker() { m_server.InitBaseInfo(); }
+    ~TheFrameWorker() override { DBHelper::instance().Init(nullptr); }
 
     static auto Record(int level, const std::string& function, const std::string& message) {
         return AllOf(Field(&LogRecord::level, level), Field(&LogRecord::file, "Frame/FrameWorker"),
@@ -57,7 +57,7 @@ ST_OptLog Log(const std::string& eventID, const std::string& value, const std::s
 
 } // namespace
 
-TEST_F(FrameWorkerTest, InitOpensTheUsersDatabaseAndReadsTheBaseInformation) {
+TEST_F(TheFrameWorker, InitOpensTheUsersDatabaseAndReadsTheBaseInformation) {
     EXPECT_TRUE(m_worker.Init());
     EXPECT_THAT(m_db.calls, ElementsAre(Call{"Open", SystemTool::CommonTool::GetUserDataDir() +
                                                          "/hublink/database/Report.db"},
@@ -65,13 +65,13 @@ TEST_F(FrameWorkerTest, InitOpensTheUsersDatabaseAndReadsTheBaseInformation) {
     EXPECT_THAT(FakeLogger().Records(), ElementsAre(Record(2, "Init", "FrameWorker load success")));
 }
 
-TEST_F(FrameWorkerTest, ADatabaseThatDoesNotOpenIsNoFailureOfInit) {
+TEST_F(TheFrameWorker, ADatabaseThatDoesNotOpenIsNoFailureOfInit) {
     m_db.answers = {false};
     EXPECT_TRUE(m_worker.Init());
     EXPECT_THAT(FakeLogger().RecordsOf("Init"), ElementsAre(Record(2, "Init", "FrameWorker load success")));
 }
 
-TEST_F(FrameWorkerTest, APluginThatMakesNoObjectIsLogged) {
+TEST_F(TheFrameWorker, APluginThatMakesNoObjectIsLogged) {
     m_db.createsNothing = true;
     EXPECT_FALSE(m_worker.Init());
     EXPECT_THAT(
@@ -84,18 +84,18 @@ TEST_F(FrameWorkerTest, APluginThatMakesNoObjectIsLogged) {
     EXPECT_THAT(FakeLogger().Records(), IsEmpty());
 }
 
-TEST_F(FrameWorkerTest, InitLogsEachKindOfException) {
+TEST_F(TheFrameWorker, InitLogsEachKindOfException) {
     ExpectEachKindOfExceptionToBeLogged(m_db.throws, "Frame/FrameWorker", "Init", 0,
                                         [this] { return m_worker.Init(); });
 }
 
-TEST_F(FrameWorkerTest, SendsBeforeInitFailSilently) {
+TEST_F(TheFrameWorker, SendsBeforeInitFailSilently) {
     EXPECT_FALSE(m_worker.Send(Log("B1", "v", "1", 1)));
     EXPECT_THAT(m_db.calls, IsEmpty());
     EXPECT_THAT(FakeLogger().Records(), IsEmpty());
 }
 
-TEST_F(FrameWorkerTest, StoredUserAndVersionBecomeTheServersAndStandInLaterRows) {
+TEST_F(TheFrameWorker, StoredUserAndVersionBecomeTheServersAndStandInLaterRows) {
     InitWith({{"OpenID", "u1"}, {"HubLinkVersion", "5.1.0.2"}, {"Other", "ignored"}});
     EXPECT_EQ(m_server.GetBaseInfo().openID, "u1");
     EXPECT_EQ(m_server.GetBaseInfo().suiteVersion, "5.1.0.2");
@@ -104,7 +104,7 @@ TEST_F(FrameWorkerTest, StoredUserAndVersionBecomeTheServersAndStandInLaterRows)
                                R"(values('B100|1', '{"a":1}','1700000000000',0,'5.1.0.2','u1'))");
 }
 
-TEST_F(FrameWorkerTest, TheStatementIsWhatPocoFormatMakesOfAnyTexts) {
+TEST_F(TheFrameWorker, TheStatementIsWhatPocoFormatMakesOfAnyTexts) {
     InitWith({{"OpenID", "%s"}, {"HubLinkVersion", "{}"}});
     const std::string texts[] = {"",
                                  "it's",
@@ -123,7 +123,7 @@ TEST_F(FrameWorkerTest, TheStatementIsWhatPocoFormatMakesOfAnyTexts) {
     }
 }
 
-TEST_F(FrameWorkerTest, AMissingVersionPassesItsDefaultOn) {
+TEST_F(TheFrameWorker, AMissingVersionPassesItsDefaultOn) {
     ST_BaseInfo known;
     known.suiteVersion = "9.9.9.9";
     m_server.SetBaseInfo(known);
@@ -132,7 +132,7 @@ TEST_F(FrameWorkerTest, AMissingVersionPassesItsDefaultOn) {
     EXPECT_EQ(m_server.GetBaseInfo().suiteVersion, "3.0.0.0");
 }
 
-TEST_F(FrameWorkerTest, AMissingUserPassesItsDefaultOn) {
+TEST_F(TheFrameWorker, AMissingUserPassesItsDefaultOn) {
     ST_BaseInfo known;
     known.openID = "u9";
     m_server.SetBaseInfo(known);
@@ -140,18 +140,18 @@ TEST_F(FrameWorkerTest, AMissingUserPassesItsDefaultOn) {
     EXPECT_EQ(m_server.GetBaseInfo().openID, "visitor");
 }
 
-TEST_F(FrameWorkerTest, OfRowsWithTheSameKeyTheLaterCounts) {
+TEST_F(TheFrameWorker, OfRowsWithTheSameKeyTheLaterCounts) {
     InitWith({{"OpenID", "u1"}, {"OpenID", "u2"}});
     EXPECT_EQ(m_server.GetBaseInfo().openID, "u2");
 }
 
-TEST_F(FrameWorkerTest, KeysAreCaseSensitive) {
+TEST_F(TheFrameWorker, KeysAreCaseSensitive) {
     InitWith({{"openid", "u1"}, {"HUBLINKVERSION", "5"}});
     EXPECT_EQ(m_server.GetBaseInfo().openID, "visitor");
     EXPECT_EQ(m_server.GetBaseInfo().suiteVersion, "3.0.0.0");
 }
 
-TEST_F(FrameWorkerTest, AnEmptyStoredTextLeavesTheServersAlone) {
+TEST_F(TheFrameWorker, AnEmptyStoredTextLeavesTheServersAlone) {
     ST_BaseInfo known;
     known.openID = "u9";
     m_server.SetBaseInfo(known);
@@ -159,12 +159,12 @@ TEST_F(FrameWorkerTest, AnEmptyStoredTextLeavesTheServersAlone) {
     EXPECT_EQ(m_server.GetBaseInfo().openID, "u9");
 }
 
-TEST_F(FrameWorkerTest, WithoutARowTheServerIsNotCalled) {
+TEST_F(TheFrameWorker, WithoutARowTheServerIsNotCalled) {
     InitWith({});
     EXPECT_THAT(FakeLogger().RecordsOf("SetBaseInfo"), IsEmpty());
 }
 
-TEST_F(FrameWorkerTest, AFailedQueryDoesNotCallTheServer) {
+TEST_F(TheFrameWorker, AFailedQueryDoesNotCallTheServer) {
     m_db.rows = {{"OpenID", "u1"}};
     m_db.answers = {true, false};
     EXPECT_TRUE(m_worker.Init());
@@ -172,7 +172,7 @@ TEST_F(FrameWorkerTest, AFailedQueryDoesNotCallTheServer) {
     EXPECT_EQ(FakeLogger().RecordsOf("QuerySql").size(), 1U);
 }
 
-TEST_F(FrameWorkerTest, ALaterUserStandsInLaterRows) {
+TEST_F(TheFrameWorker, ALaterUserStandsInLaterRows) {
     InitWith({});
     EXPECT_TRUE(m_worker.Send(Log("B", "", "", 1)));
     EXPECT_THAT(LastStatement(), HasSubstr("values('B', '','',1,'3.0.0.0','visitor')"));
@@ -184,19 +184,19 @@ TEST_F(FrameWorkerTest, ALaterUserStandsInLaterRows) {
     EXPECT_THAT(LastStatement(), HasSubstr("values('B', '','',1,'7','u7')"));
 }
 
-TEST_F(FrameWorkerTest, TextsGoIntoTheStatementAsTheyAre) {
+TEST_F(TheFrameWorker, TextsGoIntoTheStatementAsTheyAre) {
     InitWith({});
     EXPECT_TRUE(m_worker.Send(Log("100%s'", "it's %d", "\\", 1)));
     EXPECT_THAT(LastStatement(), HasSubstr("values('100%s'', 'it's %d','\\',1,"));
 }
 
-TEST_F(FrameWorkerTest, AZeroByteStaysInTheStatement) {
+TEST_F(TheFrameWorker, AZeroByteStaysInTheStatement) {
     InitWith({});
     EXPECT_TRUE(m_worker.Send(Log("B", std::string("a\0b", 3), "", 1)));
     EXPECT_THAT(LastStatement(), HasSubstr(std::string("'a\0b'", 5)));
 }
 
-TEST_F(FrameWorkerTest, ARejectedStatementIsLoggedOnceAndNotRetried) {
+TEST_F(TheFrameWorker, ARejectedStatementIsLoggedOnceAndNotRetried) {
     InitWith({});
     m_db.answers = {false};
     EXPECT_FALSE(m_worker.Send(Log("B", "it's", "", 1)));
@@ -205,20 +205,20 @@ TEST_F(FrameWorkerTest, ARejectedStatementIsLoggedOnceAndNotRetried) {
     EXPECT_TRUE(m_worker.Send(Log("B", "its", "", 1))) << "the next record is stored normally";
 }
 
-TEST_F(FrameWorkerTest, SendLogsEachKindOfException) {
+TEST_F(TheFrameWorker, SendLogsEachKindOfException) {
     InitWith({});
     ExpectEachKindOfExceptionToBeLogged(m_db.throws, "Frame/FrameWorker", "Send", 0,
                                         [this] { return m_worker.Send(Log("B", "", "", 1)); });
 }
 
-TEST_F(FrameWorkerTest, AnInitThatFailsAfterOpeningLeavesTheDatabaseInUse) {
+TEST_F(TheFrameWorker, AnInitThatFailsAfterOpeningLeavesTheDatabaseInUse) {
     m_db.throwsIn = "QuerySql";
     m_db.throws = Throws::Std;
     EXPECT_FALSE(m_worker.Init());
     EXPECT_TRUE(m_worker.Send(Log("B", "", "", 1)));
 }
 
-TEST_F(FrameWorkerTest, AnInitThatFailsWhileOpeningLeavesTheStoreUnused) {
+TEST_F(TheFrameWorker, AnInitThatFailsWhileOpeningLeavesTheStoreUnused) {
     m_db.throws = Throws::Std;
     EXPECT_FALSE(m_worker.Init());
     m_db.throws = Throws::Nothing;
@@ -228,25 +228,25 @@ TEST_F(FrameWorkerTest, AnInitThatFailsWhileOpeningLeavesTheStoreUnused) {
     EXPECT_THAT(FakeLogger().Records(), IsEmpty());
 }
 
-TEST_F(FrameWorkerTest, AnExceptionOfThePluginsFactoryIsLogged) {
+TEST_F(TheFrameWorker, AnExceptionOfThePluginsFactoryIsLogged) {
     m_db.createThrows = Throws::Std;
     EXPECT_FALSE(m_worker.Init());
     EXPECT_THAT(FakeLogger().Records(), ElementsAre(Record(3, "Init", "Std exception :scripted ")));
 }
 
-TEST_F(FrameWorkerTest, ARowThatLacksItsValueIsPassedOver) {
+TEST_F(TheFrameWorker, ARowThatLacksItsValueIsPassedOver) {
     InitWith({{"OpenID"}, {}, {"HubLinkVersion", "5"}});
     EXPECT_EQ(m_server.GetBaseInfo().openID, "visitor");
     EXPECT_EQ(m_server.GetBaseInfo().suiteVersion, "5");
 }
 
-TEST_F(FrameWorkerTest, ReadingTheBaseInformationHasNoGuardOfItsOwn) {
+TEST_F(TheFrameWorker, ReadingTheBaseInformationHasNoGuardOfItsOwn) {
     InitWith({});
     m_db.throws = Throws::Std;
     EXPECT_THROW(m_worker.SetUserBaseInfo(), std::runtime_error);
 }
 
-TEST_F(FrameWorkerTest, DestructionGivesTheDatabaseBack) {
+TEST_F(TheFrameWorker, DestructionGivesTheDatabaseBack) {
     {
         FrameWorker worker(&m_server);
         EXPECT_TRUE(worker.Init());

@@ -20,7 +20,7 @@ LogRecord Record(int level, const std::string& function, int line, const std::st
     return {level, "Metrik/MetrikMgr", function, line, message};
 }
 
-class MetrikMgrTest : public ::testing::Test {
+class TheMetrikMgr : public ::testing::Test {
 protected:
     /// Registers the default module and forgets that it was logged.
     void Init() {
@@ -74,7 +74,7 @@ std::string InitMessage(const std::string& moduleID) {
 
 } // namespace
 
-TEST_F(MetrikMgrTest, InitRegistersTheDefaultModule) {
+TEST_F(TheMetrikMgr, InitRegistersTheDefaultModule) {
     EXPECT_TRUE(m_mgr.Init());
     EXPECT_THAT(Started(), ElementsAre("A759"));
     EXPECT_EQ(m_sdk.calls.front().arguments[2], "default") << "the worker's own settings, not the empty ones";
@@ -82,7 +82,7 @@ TEST_F(MetrikMgrTest, InitRegistersTheDefaultModule) {
     EXPECT_TRUE(Send("A759|1"));
 }
 
-TEST_F(MetrikMgrTest, InitIsTrueWhateverTheSdkDoes) {
+TEST_F(TheMetrikMgr, InitIsTrueWhateverTheSdkDoes) {
     m_sdk.createsNothing = true;
     EXPECT_TRUE(m_mgr.Init());
     EXPECT_THAT(FakeLogger().RecordsOf("AddWorker"),
@@ -91,7 +91,7 @@ TEST_F(MetrikMgrTest, InitIsTrueWhateverTheSdkDoes) {
     EXPECT_THAT(FakeLogger().RecordsOf("Send"), IsEmpty());
 }
 
-TEST_F(MetrikMgrTest, AnInitMessageRegistersItsModule) {
+TEST_F(TheMetrikMgr, AnInitMessageRegistersItsModule) {
     Init();
     EXPECT_TRUE(m_mgr.Update(InitMessage("A100")));
     EXPECT_EQ(m_sdk.calls.back(), (Call{2, 2, {"A100", "2.1", "Painter", "/l", "/d"}}));
@@ -101,7 +101,7 @@ TEST_F(MetrikMgrTest, AnInitMessageRegistersItsModule) {
     EXPECT_EQ(m_sdk.calls.back().object, 2);
 }
 
-TEST_F(MetrikMgrTest, AnInitMessageUpdatesUserAndVersion) {
+TEST_F(TheMetrikMgr, AnInitMessageUpdatesUserAndVersion) {
     Init();
     EXPECT_TRUE(m_mgr.Update(InitMessage("A100")));
     EXPECT_EQ(Info().openID, "u5");
@@ -109,7 +109,7 @@ TEST_F(MetrikMgrTest, AnInitMessageUpdatesUserAndVersion) {
     EXPECT_EQ(Info().userDataDir, "");
 }
 
-TEST_F(MetrikMgrTest, ARepeatedInitChangesNoWorkerButUserAndVersion) {
+TEST_F(TheMetrikMgr, ARepeatedInitChangesNoWorkerButUserAndVersion) {
     Init();
     EXPECT_TRUE(m_mgr.Update(InitMessage("A100")));
     FakeLogger().Clear();
@@ -121,7 +121,7 @@ TEST_F(MetrikMgrTest, ARepeatedInitChangesNoWorkerButUserAndVersion) {
     EXPECT_EQ(Info().suiteVersion, "6");
 }
 
-TEST_F(MetrikMgrTest, AnInitOfTheDefaultModuleUsesTheDefaults) {
+TEST_F(TheMetrikMgr, AnInitOfTheDefaultModuleUsesTheDefaults) {
     EXPECT_TRUE(m_mgr.Update(InitMessage("A759"))); // before Init
     EXPECT_EQ(m_sdk.calls.front().arguments[2], "default");
     EXPECT_TRUE(m_mgr.Init());
@@ -129,12 +129,12 @@ TEST_F(MetrikMgrTest, AnInitOfTheDefaultModuleUsesTheDefaults) {
     EXPECT_THAT(Started(), ElementsAre("A759"));
 }
 
-TEST_F(MetrikMgrTest, TheDefaultModulesIdIsCaseSensitive) {
+TEST_F(TheMetrikMgr, TheDefaultModulesIdIsCaseSensitive) {
     EXPECT_TRUE(m_mgr.Update(InitMessage("a759")));
     EXPECT_EQ(m_sdk.calls.front().arguments[2], "Painter");
 }
 
-TEST_F(MetrikMgrTest, AnInitWithoutItsTextsRegistersTheEmptyModule) {
+TEST_F(TheMetrikMgr, AnInitWithoutItsTextsRegistersTheEmptyModule) {
     Init();
     EXPECT_TRUE(m_mgr.Update(R"({"msgType":"init"})"));
     EXPECT_EQ(m_sdk.calls.back(), (Call{2, 2, {"", "", "", "", ""}}));
@@ -144,7 +144,7 @@ TEST_F(MetrikMgrTest, AnInitWithoutItsTextsRegistersTheEmptyModule) {
     EXPECT_EQ(Info().openID, "visitor");
 }
 
-TEST_F(MetrikMgrTest, TextsAreReadWhateverTheirType) {
+TEST_F(TheMetrikMgr, TextsAreReadWhateverTheirType) {
     Init();
     EXPECT_TRUE(
         m_mgr.Update(R"({"msgType":"init","exdata":{"moduleID":100,"moduleVersion":2.5,"moduleName":true,)"
@@ -154,7 +154,7 @@ TEST_F(MetrikMgrTest, TextsAreReadWhateverTheirType) {
     EXPECT_EQ(Info().suiteVersion, "5");
 }
 
-TEST_F(MetrikMgrTest, AnUpdateOfTheOpenIdTouchesNoWorker) {
+TEST_F(TheMetrikMgr, AnUpdateOfTheOpenIdTouchesNoWorker) {
     Init();
     EXPECT_TRUE(m_mgr.Update(R"({"msgType":"updateOpenID","exdata":{"openID":"u8","hublinkVersion":"8"}})"));
     EXPECT_EQ(Info().openID, "u8");
@@ -162,21 +162,21 @@ TEST_F(MetrikMgrTest, AnUpdateOfTheOpenIdTouchesNoWorker) {
     EXPECT_THAT(Started(), ElementsAre("A759"));
 }
 
-TEST_F(MetrikMgrTest, AnUpdateWithoutAVersionKeepsTheVersion) {
+TEST_F(TheMetrikMgr, AnUpdateWithoutAVersionKeepsTheVersion) {
     EXPECT_TRUE(m_mgr.Update(R"({"msgType":"updateOpenID","exdata":{"openID":"u8","hublinkVersion":"8"}})"));
     EXPECT_TRUE(m_mgr.Update(R"({"msgType":"updateOpenID","exdata":{"openID":"u9"}})"));
     EXPECT_EQ(Info().openID, "u9");
     EXPECT_EQ(Info().suiteVersion, "8");
 }
 
-TEST_F(MetrikMgrTest, AnUpdateWithAnEmptyOpenIdDoesNothing) {
+TEST_F(TheMetrikMgr, AnUpdateWithAnEmptyOpenIdDoesNothing) {
     EXPECT_TRUE(m_mgr.Update(R"({"msgType":"updateOpenID","exdata":{"openID":"","hublinkVersion":"8"}})"));
     EXPECT_EQ(Info().openID, "visitor");
     EXPECT_EQ(Info().suiteVersion, "3.0.0.0");
     EXPECT_THAT(FakeLogger().Records(), IsEmpty());
 }
 
-TEST_F(MetrikMgrTest, OtherKindsOfMessageAreIgnored) {
+TEST_F(TheMetrikMgr, OtherKindsOfMessageAreIgnored) {
     for (const std::string text :
          {R"({"msgType":"Init","exdata":{"moduleID":"A1","openID":"u"}})",
           R"({"msgType":"updateopenid","exdata":{"openID":"u"}})", R"({"exdata":{"openID":"u"}})",
@@ -187,14 +187,14 @@ TEST_F(MetrikMgrTest, OtherKindsOfMessageAreIgnored) {
     EXPECT_THAT(FakeLogger().Records(), IsEmpty());
 }
 
-TEST_F(MetrikMgrTest, TextThatIsNoJsonIsLoggedAndChangesNothing) {
+TEST_F(TheMetrikMgr, TextThatIsNoJsonIsLoggedAndChangesNothing) {
     EXPECT_FALSE(m_mgr.Update("%s"));
     EXPECT_THAT(FakeLogger().Records(),
                 ElementsAre(Record(4, "Update", 53, "json formate error :Invalid value. At byte 0.")));
     EXPECT_THAT(m_sdk.calls, IsEmpty());
 }
 
-TEST_F(MetrikMgrTest, UpdateLogsEachKindOfExceptionAndTheMapIsAsItWas) {
+TEST_F(TheMetrikMgr, UpdateLogsEachKindOfExceptionAndTheMapIsAsItWas) {
     ExpectEachKindOfExceptionToBeLogged(m_sdk.initThrows, "Metrik/MetrikMgr", "Update", 93,
                                         [this] { return m_mgr.Update(InitMessage("A100")); });
     FakeLogger().Clear();
@@ -203,14 +203,14 @@ TEST_F(MetrikMgrTest, UpdateLogsEachKindOfExceptionAndTheMapIsAsItWas) {
     EXPECT_EQ(Info().openID, "visitor") << "the exception came before";
 }
 
-TEST_F(MetrikMgrTest, AnExceptionLeavesAddWorker) {
+TEST_F(TheMetrikMgr, AnExceptionLeavesAddWorker) {
     m_sdk.initThrows = Throws::Std;
     ST_InitMsg msg;
     msg.moduleID = "A100";
     EXPECT_THROW(m_mgr.AddWorker(msg), std::runtime_error);
 }
 
-TEST_F(MetrikMgrTest, RoutesByTheTextBeforeTheFirstBar) {
+TEST_F(TheMetrikMgr, RoutesByTheTextBeforeTheFirstBar) {
     Init();
     EXPECT_TRUE(m_mgr.Update(InitMessage("A100")));
     EXPECT_TRUE(Send("A100|1|2"));
@@ -220,7 +220,7 @@ TEST_F(MetrikMgrTest, RoutesByTheTextBeforeTheFirstBar) {
     EXPECT_EQ(m_sdk.calls.back().object, 1);
 }
 
-TEST_F(MetrikMgrTest, AnEventIdWithoutABarIsLoggedWhole) {
+TEST_F(TheMetrikMgr, AnEventIdWithoutABarIsLoggedWhole) {
     Init();
     EXPECT_FALSE(Send("A759"));
     EXPECT_FALSE(Send(""));
@@ -230,7 +230,7 @@ TEST_F(MetrikMgrTest, AnEventIdWithoutABarIsLoggedWhole) {
                                                     Record(3, "Send", 107, "eventID error :100%s")));
 }
 
-TEST_F(MetrikMgrTest, AnEventIdThatBeginsWithABarLooksUpTheEmptyModule) {
+TEST_F(TheMetrikMgr, AnEventIdThatBeginsWithABarLooksUpTheEmptyModule) {
     Init();
     EXPECT_FALSE(Send("|1"));
     EXPECT_THAT(FakeLogger().Records(), ElementsAre(Record(3, "Send", 115, "module not init :")));
@@ -238,7 +238,7 @@ TEST_F(MetrikMgrTest, AnEventIdThatBeginsWithABarLooksUpTheEmptyModule) {
     EXPECT_TRUE(Send("|1"));
 }
 
-TEST_F(MetrikMgrTest, EventsBeforeTheirModulesInitAreLost) {
+TEST_F(TheMetrikMgr, EventsBeforeTheirModulesInitAreLost) {
     Init();
     EXPECT_FALSE(Send("A100|1"));
     EXPECT_THAT(FakeLogger().Records(), ElementsAre(Record(3, "Send", 115, "module not init :A100")));
@@ -247,7 +247,7 @@ TEST_F(MetrikMgrTest, EventsBeforeTheirModulesInitAreLost) {
     EXPECT_EQ(m_sdk.calls.size(), 2U) << "nothing was kept for it, nothing went to the default module";
 }
 
-TEST_F(MetrikMgrTest, SendLogsEachKindOfException) {
+TEST_F(TheMetrikMgr, SendLogsEachKindOfException) {
     Poco::SharedPtr<ThrowingWorker> worker(new ThrowingWorker);
     m_mgr.m_mapWorkers["A1"] = worker;
     ExpectEachKindOfExceptionToBeLogged(worker->throws, "Metrik/MetrikMgr", "Send", 122,
@@ -255,14 +255,14 @@ TEST_F(MetrikMgrTest, SendLogsEachKindOfException) {
     EXPECT_TRUE(Send("A1|1"));
 }
 
-TEST_F(MetrikMgrTest, TheWorkersAnswerIsTheResult) {
+TEST_F(TheMetrikMgr, TheWorkersAnswerIsTheResult) {
     Init();
     m_sdk.reportAnswer = false;
     EXPECT_FALSE(Send("A759|1"));
     EXPECT_THAT(FakeLogger().Records(), IsEmpty());
 }
 
-TEST_F(MetrikMgrTest, WorkersGoWithTheManager) {
+TEST_F(TheMetrikMgr, WorkersGoWithTheManager) {
     {
         MetrikMgr mgr(&m_server);
         EXPECT_TRUE(mgr.Init());

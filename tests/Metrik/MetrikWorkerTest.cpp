@@ -23,9 +23,9 @@ LogRecord Record(int level, const std::string& function, int line, const std::st
     return {level, "Metrik/MetrikWorker", function, line, message};
 }
 
-class MetrikWorkerTest : public ::testing::Test {
+class TheMetrikWorker : public ::testing::Test {
 protected:
-    MetrikWorkerTest() {
+    TheMetrikWorker() {
         m_server.InitBaseInfo();
         ST_BaseInfo info;
         info.openID = "u1";
@@ -61,7 +61,7 @@ const ST_InitMsg MESSAGE{.moduleID = "A100",
 
 } // namespace
 
-TEST_F(MetrikWorkerTest, InitDefalutStartsTheSdkForTheDefaultModuleInTheUsersDirectories) {
+TEST_F(TheMetrikWorker, InitDefalutStartsTheSdkForTheDefaultModuleInTheUsersDirectories) {
     EXPECT_TRUE(m_worker.InitDefalut());
     const std::string hublink = SystemTool::CommonTool::GetUserDataDir() + "/hublink";
     EXPECT_THAT(m_sdk.calls,
@@ -69,24 +69,24 @@ TEST_F(MetrikWorkerTest, InitDefalutStartsTheSdkForTheDefaultModuleInTheUsersDir
     EXPECT_THAT(FakeLogger().Records(), IsEmpty());
 }
 
-TEST_F(MetrikWorkerTest, InitPassesTheMessagesFieldsInOrder) {
+TEST_F(TheMetrikWorker, InitPassesTheMessagesFieldsInOrder) {
     EXPECT_TRUE(m_worker.Init(MESSAGE));
     EXPECT_THAT(m_sdk.calls, ElementsAre(Call{2, 1, {"A100", "2.1", "Painter", "/logs", "/db"}}));
 }
 
-TEST_F(MetrikWorkerTest, InitPassesEmptyFieldsEmpty) {
+TEST_F(TheMetrikWorker, InitPassesEmptyFieldsEmpty) {
     EXPECT_TRUE(m_worker.Init({}));
     EXPECT_THAT(m_sdk.calls, ElementsAre(Call{2, 1, {"", "", "", "", ""}}));
 }
 
-TEST_F(MetrikWorkerTest, TheResultOfStartingTheSdkIsIgnored) {
+TEST_F(TheMetrikWorker, TheResultOfStartingTheSdkIsIgnored) {
     m_sdk.initAnswer = false;
     EXPECT_TRUE(m_worker.InitDefalut());
     EXPECT_TRUE(m_worker.Init(MESSAGE));
     EXPECT_TRUE(Send(""));
 }
 
-TEST_F(MetrikWorkerTest, ASecondInitialisationReplacesTheSdkObject) {
+TEST_F(TheMetrikWorker, ASecondInitialisationReplacesTheSdkObject) {
     EXPECT_TRUE(m_worker.Init(MESSAGE));
     EXPECT_TRUE(m_worker.Init(MESSAGE));
     EXPECT_EQ(m_sdk.created, 2);
@@ -95,7 +95,7 @@ TEST_F(MetrikWorkerTest, ASecondInitialisationReplacesTheSdkObject) {
     EXPECT_EQ(m_sdk.calls.back().object, 2);
 }
 
-TEST_F(MetrikWorkerTest, AnSdkThatMakesNoObjectIsLogged) {
+TEST_F(TheMetrikWorker, AnSdkThatMakesNoObjectIsLogged) {
     m_sdk.createsNothing = true;
     EXPECT_FALSE(m_worker.InitDefalut());
     EXPECT_FALSE(m_worker.Init(MESSAGE));
@@ -108,12 +108,12 @@ TEST_F(MetrikWorkerTest, AnSdkThatMakesNoObjectIsLogged) {
     EXPECT_THAT(FakeLogger().Records(), IsEmpty());
 }
 
-TEST_F(MetrikWorkerTest, InitDefalutLogsEachKindOfException) {
+TEST_F(TheMetrikWorker, InitDefalutLogsEachKindOfException) {
     ExpectEachKindOfExceptionToBeLogged(m_sdk.initThrows, "Metrik/MetrikWorker", "InitDefalut", 56,
                                         [this] { return m_worker.InitDefalut(); });
 }
 
-TEST_F(MetrikWorkerTest, AnInitialisationThatFailedLeavesNothingToSendTo) {
+TEST_F(TheMetrikWorker, AnInitialisationThatFailedLeavesNothingToSendTo) {
     m_sdk.initThrows = Throws::Std;
     EXPECT_FALSE(m_worker.InitDefalut());
     EXPECT_FALSE(Send("{}"));
@@ -123,7 +123,7 @@ TEST_F(MetrikWorkerTest, AnInitialisationThatFailedLeavesNothingToSendTo) {
         EXPECT_EQ(call.slot, 2) << "no event was reported";
 }
 
-TEST_F(MetrikWorkerTest, AnExceptionOfThePluginsFactoryIsLoggedByInitDefalut) {
+TEST_F(TheMetrikWorker, AnExceptionOfThePluginsFactoryIsLoggedByInitDefalut) {
     m_sdk.createThrows = Throws::Std;
     EXPECT_FALSE(m_worker.InitDefalut());
     EXPECT_THAT(FakeLogger().Records(),
@@ -131,7 +131,7 @@ TEST_F(MetrikWorkerTest, AnExceptionOfThePluginsFactoryIsLoggedByInitDefalut) {
     EXPECT_THROW(m_worker.Init(MESSAGE), std::runtime_error);
 }
 
-TEST_F(MetrikWorkerTest, AnExceptionLeavesInitUnlogged) {
+TEST_F(TheMetrikWorker, AnExceptionLeavesInitUnlogged) {
     m_sdk.initThrows = Throws::Std;
     EXPECT_THROW(m_worker.Init(MESSAGE), std::runtime_error);
     m_sdk.initThrows = Throws::Poco;
@@ -139,13 +139,13 @@ TEST_F(MetrikWorkerTest, AnExceptionLeavesInitUnlogged) {
     EXPECT_THAT(FakeLogger().Records(), IsEmpty());
 }
 
-TEST_F(MetrikWorkerTest, SendBeforeAnInitialisationIsFalseAndSilent) {
+TEST_F(TheMetrikWorker, SendBeforeAnInitialisationIsFalseAndSilent) {
     EXPECT_FALSE(Send("{}"));
     EXPECT_THAT(m_sdk.calls, IsEmpty());
     EXPECT_THAT(FakeLogger().Records(), IsEmpty());
 }
 
-TEST_F(MetrikWorkerTest, SendsTheEventIdAndTheEventAsJson) {
+TEST_F(TheMetrikWorker, SendsTheEventIdAndTheEventAsJson) {
     ASSERT_TRUE(m_worker.InitDefalut());
     EXPECT_TRUE(Send(R"({"button":"save","n":[1,2.5,9007199254740993]})"));
     EXPECT_EQ(
@@ -159,7 +159,7 @@ TEST_F(MetrikWorkerTest, SendsTheEventIdAndTheEventAsJson) {
     EXPECT_THAT(FakeLogger().Records(), IsEmpty());
 }
 
-TEST_F(MetrikWorkerTest, AnEmptyValueLeavesTheOpenIdAndTheSystemVersion) {
+TEST_F(TheMetrikWorker, AnEmptyValueLeavesTheOpenIdAndTheSystemVersion) {
     ASSERT_TRUE(m_worker.InitDefalut());
     EXPECT_TRUE(Send(""));
     EXPECT_EQ(LastEvent(), R"({"extend":{"hublinkVersion":"5.1.0.2","createTime":"1700000000123"},)"
@@ -167,7 +167,7 @@ TEST_F(MetrikWorkerTest, AnEmptyValueLeavesTheOpenIdAndTheSystemVersion) {
                                m_osVersion + R"("}})");
 }
 
-TEST_F(MetrikWorkerTest, MembersOfTheValueThatTheServiceOwnsAreReplaced) {
+TEST_F(TheMetrikWorker, MembersOfTheValueThatTheServiceOwnsAreReplaced) {
     ASSERT_TRUE(m_worker.InitDefalut());
     EXPECT_TRUE(Send(R"({"openid":"forged","a":1,"sys_version":"forged","openid":"again"})"));
     EXPECT_THAT(LastEvent(),
@@ -176,7 +176,7 @@ TEST_F(MetrikWorkerTest, MembersOfTheValueThatTheServiceOwnsAreReplaced) {
     EXPECT_EQ(LastEvent().find("again"), std::string::npos);
 }
 
-TEST_F(MetrikWorkerTest, TheBaseInformationIsReadAtEverySend) {
+TEST_F(TheMetrikWorker, TheBaseInformationIsReadAtEverySend) {
     ASSERT_TRUE(m_worker.InitDefalut());
     EXPECT_TRUE(Send("{}"));
     ST_BaseInfo info;
@@ -188,14 +188,14 @@ TEST_F(MetrikWorkerTest, TheBaseInformationIsReadAtEverySend) {
     EXPECT_THAT(LastEvent(), ::testing::HasSubstr(R"("hublinkVersion":"9")"));
 }
 
-TEST_F(MetrikWorkerTest, AValueThatIsNoJsonIsLoggedAndNotSent) {
+TEST_F(TheMetrikWorker, AValueThatIsNoJsonIsLoggedAndNotSent) {
     ASSERT_TRUE(m_worker.InitDefalut());
     EXPECT_FALSE(Send("plain text"));
     EXPECT_THAT(FakeLogger().Records(), ElementsAre(Record(4, "Send", 107, "Invalid value. At byte 0.")));
     EXPECT_EQ(m_sdk.calls.size(), 1U) << "nothing but the initialisation";
 }
 
-TEST_F(MetrikWorkerTest, AValueThatIsNoObjectIsLoggedAndNotSent) {
+TEST_F(TheMetrikWorker, AValueThatIsNoObjectIsLoggedAndNotSent) {
     ASSERT_TRUE(m_worker.InitDefalut());
     EXPECT_FALSE(Send("5"));
     EXPECT_THAT(
@@ -205,32 +205,32 @@ TEST_F(MetrikWorkerTest, AValueThatIsNoObjectIsLoggedAndNotSent) {
     EXPECT_EQ(m_sdk.calls.size(), 1U);
 }
 
-TEST_F(MetrikWorkerTest, TheSdksAnswerIsTheResult) {
+TEST_F(TheMetrikWorker, TheSdksAnswerIsTheResult) {
     ASSERT_TRUE(m_worker.InitDefalut());
     m_sdk.reportAnswer = false;
     EXPECT_FALSE(Send("{}"));
     EXPECT_THAT(FakeLogger().Records(), IsEmpty());
 }
 
-TEST_F(MetrikWorkerTest, SendLogsEachKindOfException) {
+TEST_F(TheMetrikWorker, SendLogsEachKindOfException) {
     ASSERT_TRUE(m_worker.InitDefalut());
     ExpectEachKindOfExceptionToBeLogged(m_sdk.reportThrows, "Metrik/MetrikWorker", "Send", 121,
                                         [this] { return Send("{}"); });
 }
 
-TEST_F(MetrikWorkerTest, TheFailureCallbackLogsBothTexts) {
+TEST_F(TheMetrikWorker, TheFailureCallbackLogsBothTexts) {
     ASSERT_TRUE(m_worker.InitDefalut());
     m_sdk.onFailure("upload 100%", "why %s");
     EXPECT_THAT(FakeLogger().Records(), ElementsAre(Record(4, "FailCallBackFun", 21, "upload 100%-why %s")));
 }
 
-TEST_F(MetrikWorkerTest, TheSuccessCallbackWritesNothing) {
+TEST_F(TheMetrikWorker, TheSuccessCallbackWritesNothing) {
     ASSERT_TRUE(m_worker.InitDefalut());
     m_sdk.onSuccess("a", "b");
     EXPECT_THAT(FakeLogger().Records(), IsEmpty());
 }
 
-TEST_F(MetrikWorkerTest, AnAnnouncedModuleHasTheSameCallbacks) {
+TEST_F(TheMetrikWorker, AnAnnouncedModuleHasTheSameCallbacks) {
     ASSERT_TRUE(m_worker.Init(MESSAGE));
     m_sdk.onSuccess("a", "b");
     EXPECT_THAT(FakeLogger().Records(), IsEmpty());
@@ -238,7 +238,7 @@ TEST_F(MetrikWorkerTest, AnAnnouncedModuleHasTheSameCallbacks) {
     EXPECT_THAT(FakeLogger().Records(), ElementsAre(Record(4, "FailCallBackFun", 21, "a-b")));
 }
 
-TEST_F(MetrikWorkerTest, AParsersTextIsAFormat) {
+TEST_F(TheMetrikWorker, AParsersTextIsAFormat) {
     ASSERT_TRUE(m_worker.InitDefalut());
     g_scriptedJson.error = "near %d";
     EXPECT_FALSE(Send("{}"));
@@ -250,7 +250,7 @@ TEST_F(MetrikWorkerTest, AParsersTextIsAFormat) {
     EXPECT_EQ(m_sdk.calls.size(), 1U);
 }
 
-TEST_F(MetrikWorkerTest, DestructionGivesTheSdkObjectBack) {
+TEST_F(TheMetrikWorker, DestructionGivesTheSdkObjectBack) {
     {
         MetrikWorker worker(&m_server);
         ASSERT_TRUE(worker.InitDefalut());

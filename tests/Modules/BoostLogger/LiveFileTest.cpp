@@ -15,7 +15,7 @@ using BoostLogger::MakeDirectory;
 
 namespace {
 
-class LiveFileTest : public testing::Test {
+class TheLiveFile : public testing::Test {
 protected:
     TemporaryDirectory m_directory;
     const std::string m_path = m_directory.Path() + "/Report.log";
@@ -24,7 +24,7 @@ protected:
 
 } // namespace
 
-TEST_F(LiveFileTest, AppendsToWhatIsThere) {
+TEST_F(TheLiveFile, AppendsToWhatIsThere) {
     WriteFile(m_path, "old\n");
     ASSERT_FALSE(m_file.Open(m_path));
     EXPECT_EQ(m_file.SizeBytes(), 4);
@@ -33,7 +33,7 @@ TEST_F(LiveFileTest, AppendsToWhatIsThere) {
     EXPECT_EQ(ContentOf(m_path), "old\nnew\n");
 }
 
-TEST_F(LiveFileTest, SeesWithinSixteenLinesHowMuchAnotherWriterAppended) {
+TEST_F(TheLiveFile, SeesWithinSixteenLinesHowMuchAnotherWriterAppended) {
     LiveFile other;
     ASSERT_FALSE(m_file.Open(m_path));
     ASSERT_FALSE(other.Open(m_path));
@@ -43,7 +43,7 @@ TEST_F(LiveFileTest, SeesWithinSixteenLinesHowMuchAnotherWriterAppended) {
     EXPECT_EQ(m_file.SizeBytes(), 11 + 16 * 2);
 }
 
-TEST_F(LiveFileTest, SeesHowMuchAnotherWriterAppendedWhenItLooksAtThePath) {
+TEST_F(TheLiveFile, SeesHowMuchAnotherWriterAppendedWhenItLooksAtThePath) {
     LiveFile other;
     ASSERT_FALSE(m_file.Open(m_path));
     ASSERT_FALSE(other.Open(m_path));
@@ -52,7 +52,7 @@ TEST_F(LiveFileTest, SeesHowMuchAnotherWriterAppendedWhenItLooksAtThePath) {
     EXPECT_EQ(m_file.SizeBytes(), 11);
 }
 
-TEST_F(LiveFileTest, StartsANewLineAfterAHalfLineThatItFinds) {
+TEST_F(TheLiveFile, StartsANewLineAfterAHalfLineThatItFinds) {
     WriteFile(m_path, "half of a li");
     ASSERT_FALSE(m_file.Open(m_path));
     ASSERT_FALSE(m_file.Append("whole\n"));
@@ -60,14 +60,14 @@ TEST_F(LiveFileTest, StartsANewLineAfterAHalfLineThatItFinds) {
     EXPECT_EQ(ContentOf(m_path), "half of a li\nwhole\nnext\n");
 }
 
-TEST_F(LiveFileTest, NarrowsTheModeOfAWiderFile) {
+TEST_F(TheLiveFile, NarrowsTheModeOfAWiderFile) {
     WriteFile(m_path, "");
     ASSERT_EQ(chmod(m_path.c_str(), 0666), 0);
     ASSERT_FALSE(m_file.Open(m_path));
     EXPECT_EQ(ModeOf(m_path), 0600U);
 }
 
-TEST_F(LiveFileTest, HasItsModesWhateverTheUmask) {
+TEST_F(TheLiveFile, HasItsModesWhateverTheUmask) {
     for (const mode_t mask : {0000, 0777}) {
         const std::string directory = m_directory.Path() + "/" + std::to_string(mask);
         ChildProcess child([&] {
@@ -82,7 +82,7 @@ TEST_F(LiveFileTest, HasItsModesWhateverTheUmask) {
     }
 }
 
-TEST_F(LiveFileTest, LeavesTheModeOfADirectoryThatIsThere) {
+TEST_F(TheLiveFile, LeavesTheModeOfADirectoryThatIsThere) {
     const std::string directory = m_directory.Path() + "/wide";
     ASSERT_EQ(mkdir(directory.c_str(), 0700), 0);
     ASSERT_EQ(chmod(directory.c_str(), 0755), 0);
@@ -90,7 +90,7 @@ TEST_F(LiveFileTest, LeavesTheModeOfADirectoryThatIsThere) {
     EXPECT_EQ(ModeOf(directory), 0755U);
 }
 
-TEST_F(LiveFileTest, SaysWhyADirectoryCouldNotBeMade) {
+TEST_F(TheLiveFile, SaysWhyADirectoryCouldNotBeMade) {
     const std::string parent = m_directory.Path();
     ChildProcess child([&] {
         return BecomeOrdinaryUser(parent) && chmod(parent.c_str(), 0555) == 0 &&
@@ -100,7 +100,7 @@ TEST_F(LiveFileTest, SaysWhyADirectoryCouldNotBeMade) {
     chmod(parent.c_str(), 0700); // so that the fixture can remove it
 }
 
-TEST_F(LiveFileTest, IsNoLinkAndNoPipeAndNoDirectory) {
+TEST_F(TheLiveFile, IsNoLinkAndNoPipeAndNoDirectory) {
     ASSERT_EQ(symlink("elsewhere", m_path.c_str()), 0);
     EXPECT_EQ(m_file.Open(m_path).error, ELOOP);
     EXPECT_FALSE(std::filesystem::exists(m_directory.Path() + "/elsewhere"));
@@ -113,7 +113,7 @@ TEST_F(LiveFileTest, IsNoLinkAndNoPipeAndNoDirectory) {
     EXPECT_FALSE(m_file.IsOpen());
 }
 
-TEST_F(LiveFileTest, KnowsWhenThePathIsAnotherFile) {
+TEST_F(TheLiveFile, KnowsWhenThePathIsAnotherFile) {
     ASSERT_FALSE(m_file.Open(m_path));
     EXPECT_FALSE(m_file.IsGoneFrom(m_path));
     std::filesystem::rename(m_path, m_path + ".away");
@@ -123,7 +123,7 @@ TEST_F(LiveFileTest, KnowsWhenThePathIsAnotherFile) {
     EXPECT_FALSE(m_file.IsGoneFrom(m_path + ".away"));
 }
 
-TEST_F(LiveFileTest, IsLockedAgainstAnotherUntilItIsClosed) {
+TEST_F(TheLiveFile, IsLockedAgainstAnotherUntilItIsClosed) {
     LiveFile other;
     ASSERT_FALSE(m_file.Open(m_path));
     ASSERT_FALSE(other.Open(m_path));

@@ -20,7 +20,7 @@ using namespace std::chrono_literals;
 namespace {
 
 /// What the time says is up to the test; see LogWriter::Append.
-class LogWriterTest : public testing::Test {
+class TheLogWriter : public testing::Test {
 protected:
     LogSettings Settings(std::int64_t maxFileBytes = 1000, std::int64_t maxTotalBytes = 10000) const {
         return {m_directory, "Report.log", "TEST", "APP", maxFileBytes, maxTotalBytes, true, false};
@@ -54,7 +54,7 @@ void LimitFileSize(rlim_t bytes) {
 
 } // namespace
 
-TEST_F(LogWriterTest, RotatesBeforeAFileWouldBecomeTooLarge) {
+TEST_F(TheLogWriter, RotatesBeforeAFileWouldBecomeTooLarge) {
     LogWriter writer(Settings());
     ASSERT_FALSE(writer.Start());
     for (int i = 0; i < 25; ++i)
@@ -64,7 +64,7 @@ TEST_F(LogWriterTest, RotatesBeforeAFileWouldBecomeTooLarge) {
     EXPECT_EQ(std::filesystem::file_size(m_path), 500U);
 }
 
-TEST_F(LogWriterTest, RotatesBeforeASizeAtWhichTheSystemWouldEndTheProcess) {
+TEST_F(TheLogWriter, RotatesBeforeASizeAtWhichTheSystemWouldEndTheProcess) {
     ChildProcess child([this] {
         LimitFileSize(1050);
         LogWriter writer(Settings(100'000, 1'000'000));
@@ -79,7 +79,7 @@ TEST_F(LogWriterTest, RotatesBeforeASizeAtWhichTheSystemWouldEndTheProcess) {
     EXPECT_EQ(std::filesystem::file_size(m_path), 500U);
 }
 
-TEST_F(LogWriterTest, SeesWhatAnotherProcessWroteWhereTheSystemEndsTheProcessAtASize) {
+TEST_F(TheLogWriter, SeesWhatAnotherProcessWroteWhereTheSystemEndsTheProcessAtASize) {
     ChildProcess child([this] {
         LimitFileSize(1050);
         LogWriter writer(Settings(100'000, 1'000'000));
@@ -95,7 +95,7 @@ TEST_F(LogWriterTest, SeesWhatAnotherProcessWroteWhereTheSystemEndsTheProcessAtA
     EXPECT_EQ(std::filesystem::file_size(m_path), 100U);
 }
 
-TEST_F(LogWriterTest, LosesALineThatIsLargerThanTheSystemLetsAFileBecome) {
+TEST_F(TheLogWriter, LosesALineThatIsLargerThanTheSystemLetsAFileBecome) {
     ChildProcess child([this] {
         LimitFileSize(1050);
         LogWriter writer(Settings(100'000, 1'000'000));
@@ -113,7 +113,7 @@ TEST_F(LogWriterTest, LosesALineThatIsLargerThanTheSystemLetsAFileBecome) {
     EXPECT_EQ(lines[1] + "\n", Line(100));
 }
 
-TEST_F(LogWriterTest, GivesALineThatIsTooLargeForAnyFileAFileOfItsOwn) {
+TEST_F(TheLogWriter, GivesALineThatIsTooLargeForAnyFileAFileOfItsOwn) {
     LogWriter writer(Settings());
     ASSERT_FALSE(writer.Start());
     for (const std::size_t size : {10, 5000, 20})
@@ -123,7 +123,7 @@ TEST_F(LogWriterTest, GivesALineThatIsTooLargeForAnyFileAFileOfItsOwn) {
     EXPECT_EQ(std::filesystem::file_size(m_path), 20U);
 }
 
-TEST_F(LogWriterTest, KeepsAllFilesTogetherWithinTheCapAtAnyTime) {
+TEST_F(TheLogWriter, KeepsAllFilesTogetherWithinTheCapAtAnyTime) {
     LogWriter writer(Settings(1000, 3500));
     ASSERT_FALSE(writer.Start());
     for (int i = 0; i < 200; ++i) {
@@ -134,7 +134,7 @@ TEST_F(LogWriterTest, KeepsAllFilesTogetherWithinTheCapAtAnyTime) {
     EXPECT_GE(TotalBytes(), 2 * 910U);
 }
 
-TEST_F(LogWriterTest, KeepsNoRotatedFileWhereTheCapLeavesRoomForTheLiveOneOnly) {
+TEST_F(TheLogWriter, KeepsNoRotatedFileWhereTheCapLeavesRoomForTheLiveOneOnly) {
     LogWriter writer(Settings(1000, 1000));
     ASSERT_FALSE(writer.Start());
     for (int i = 0; i < 50; ++i)
@@ -142,7 +142,7 @@ TEST_F(LogWriterTest, KeepsNoRotatedFileWhereTheCapLeavesRoomForTheLiveOneOnly) 
     EXPECT_EQ(LogFilesOf(m_directory).size(), 1U);
 }
 
-TEST_F(LogWriterTest, AppliesASmallerCapWhenItStarts) {
+TEST_F(TheLogWriter, AppliesASmallerCapWhenItStarts) {
     std::filesystem::create_directory(m_directory);
     for (int number = 1; number <= 5; ++number)
         WriteFile(m_directory + "/Report_" + std::to_string(number) + ".log", Line(1000));
@@ -152,7 +152,7 @@ TEST_F(LogWriterTest, AppliesASmallerCapWhenItStarts) {
     EXPECT_TRUE(std::filesystem::exists(m_directory + "/Report_4.log"));
 }
 
-TEST_F(LogWriterTest, GoesOnWithTheLiveFileAndTheNumbersOfAnEarlierRun) {
+TEST_F(TheLogWriter, GoesOnWithTheLiveFileAndTheNumbersOfAnEarlierRun) {
     for (int run = 0; run < 3; ++run) {
         LogWriter writer(Settings());
         ASSERT_FALSE(writer.Start());
@@ -164,7 +164,7 @@ TEST_F(LogWriterTest, GoesOnWithTheLiveFileAndTheNumbersOfAnEarlierRun) {
     EXPECT_EQ(std::filesystem::file_size(m_path), 100U);
 }
 
-TEST_F(LogWriterTest, DoesNotRotateAFileThatAnotherProcessHasRotatedAlready) {
+TEST_F(TheLogWriter, DoesNotRotateAFileThatAnotherProcessHasRotatedAlready) {
     LogWriter one(Settings());
     LogWriter other(Settings());
     ASSERT_FALSE(one.Start());
@@ -177,7 +177,7 @@ TEST_F(LogWriterTest, DoesNotRotateAFileThatAnotherProcessHasRotatedAlready) {
     EXPECT_EQ(ContentOf(m_path), Line(50, 'b') + Line(50, 'a'));
 }
 
-TEST_F(LogWriterTest, DoesNotRotateAFileThatSomebodyHasEmptied) {
+TEST_F(TheLogWriter, DoesNotRotateAFileThatSomebodyHasEmptied) {
     LogWriter writer(Settings());
     ASSERT_FALSE(writer.Start());
     for (int i = 0; i < 10; ++i)
@@ -188,7 +188,7 @@ TEST_F(LogWriterTest, DoesNotRotateAFileThatSomebodyHasEmptied) {
     EXPECT_FALSE(std::filesystem::exists(m_directory + "/Report_1.log"));
 }
 
-TEST_F(LogWriterTest, FollowsAPathThatBecameAnotherFileWithinATenthOfASecond) {
+TEST_F(TheLogWriter, FollowsAPathThatBecameAnotherFileWithinATenthOfASecond) {
     LogWriter writer(Settings());
     ASSERT_FALSE(writer.Start());
     writer.Append("one\n", m_start);
@@ -199,7 +199,7 @@ TEST_F(LogWriterTest, FollowsAPathThatBecameAnotherFileWithinATenthOfASecond) {
     EXPECT_EQ(ContentOf(m_path), "three\n");
 }
 
-TEST_F(LogWriterTest, MakesADeletedDirectoryAgain) {
+TEST_F(TheLogWriter, MakesADeletedDirectoryAgain) {
     LogWriter writer(Settings());
     ASSERT_FALSE(writer.Start());
     writer.Append("one\n", m_start);
@@ -210,7 +210,7 @@ TEST_F(LogWriterTest, MakesADeletedDirectoryAgain) {
     EXPECT_EQ(ModeOf(m_path), 0600U);
 }
 
-TEST_F(LogWriterTest, CountsWhatItCannotWriteAndTellsWhenItRecovers) {
+TEST_F(TheLogWriter, CountsWhatItCannotWriteAndTellsWhenItRecovers) {
     LogWriter writer(Settings());
     ASSERT_FALSE(writer.Start());
     writer.Append("one\n", m_start);
@@ -234,7 +234,7 @@ TEST_F(LogWriterTest, CountsWhatItCannotWriteAndTellsWhenItRecovers) {
     EXPECT_EQ(lines[2], "six");
 }
 
-TEST_F(LogWriterTest, CountsARecordThatNeverBecameALine) {
+TEST_F(TheLogWriter, CountsARecordThatNeverBecameALine) {
     LogWriter writer(Settings());
     ASSERT_FALSE(writer.Start());
     writer.CountLost();
@@ -246,7 +246,7 @@ TEST_F(LogWriterTest, CountsARecordThatNeverBecameALine) {
         << lines[0];
 }
 
-TEST_F(LogWriterTest, DoesNotGlueALineToTheHalfOfOneThatAFullDiskCutOff) {
+TEST_F(TheLogWriter, DoesNotGlueALineToTheHalfOfOneThatAFullDiskCutOff) {
     ChildProcess child([&] {
         std::signal(SIGXFSZ, SIG_IGN);
         LogWriter writer(Settings());
@@ -271,7 +271,7 @@ TEST_F(LogWriterTest, DoesNotGlueALineToTheHalfOfOneThatAFullDiskCutOff) {
     EXPECT_EQ(lines[3], std::string(99, 'd'));
 }
 
-TEST_F(LogWriterTest, DropsRecordsRatherThanOutgrowItsFileWhereItMayNotRotate) {
+TEST_F(TheLogWriter, DropsRecordsRatherThanOutgrowItsFileWhereItMayNotRotate) {
     ChildProcess child([&] {
         if (!BecomeOrdinaryUser(m_temporary.Path()))
             return false;
@@ -296,7 +296,7 @@ TEST_F(LogWriterTest, DropsRecordsRatherThanOutgrowItsFileWhereItMayNotRotate) {
     EXPECT_EQ(std::filesystem::file_size(m_directory + "/Report_1.log"), 1000U);
 }
 
-TEST_F(LogWriterTest, DoesNotHangWhileAnotherProcessHoldsTheRotationLock) {
+TEST_F(TheLogWriter, DoesNotHangWhileAnotherProcessHoldsTheRotationLock) {
     LogWriter writer(Settings());
     ASSERT_FALSE(writer.Start());
     for (int i = 0; i < 10; ++i)
@@ -326,7 +326,7 @@ void LogFromTheHandler(int) {
 
 } // namespace
 
-TEST_F(LogWriterTest, LosesARecordOfASignalHandlerRatherThanWaitForTheThreadThatItInterrupted) {
+TEST_F(TheLogWriter, LosesARecordOfASignalHandlerRatherThanWaitForTheThreadThatItInterrupted) {
     ChildProcess child([&] {
         LogWriter writer(Settings());
         if (writer.Start())
@@ -346,7 +346,7 @@ TEST_F(LogWriterTest, LosesARecordOfASignalHandlerRatherThanWaitForTheThreadThat
 }
 #endif
 
-TEST_F(LogWriterTest, SaysWhyItCannotStart) {
+TEST_F(TheLogWriter, SaysWhyItCannotStart) {
     WriteFile(m_directory, "in the way");
     EXPECT_EQ(LogWriter(Settings()).Start().Text(), "cannot make the directory: Not a directory");
 }

@@ -19,7 +19,7 @@ std::vector<std::uint64_t> NumbersToDelete(std::vector<RotatedFile> files, std::
     return numbers;
 }
 
-class RotatedFilesTest : public testing::Test {
+class TheRotatedFiles : public testing::Test {
 protected:
     std::filesystem::path At(const std::string& name) const {
         return std::filesystem::path(m_directory.Path()) / name;
@@ -45,7 +45,7 @@ TEST(FilesToDelete, AreTheOldestThatAreTooMuch) {
     EXPECT_EQ(NumbersToDelete({}, 0), (std::vector<std::uint64_t>{}));
 }
 
-TEST_F(RotatedFilesTest, KnowsItsOwnNames) {
+TEST_F(TheRotatedFiles, KnowsItsOwnNames) {
     EXPECT_EQ(m_files.NumberOf("Report_1.log"), 1U);
     EXPECT_EQ(m_files.NumberOf("Report_120.log"), 120U);
     for (const char* name : {"Report.log", "Report_.log", "Report_1.txt", "Report_01.log", "Report_0.log",
@@ -54,11 +54,11 @@ TEST_F(RotatedFilesTest, KnowsItsOwnNames) {
         EXPECT_EQ(m_files.NumberOf(name), std::nullopt) << name;
 }
 
-TEST_F(RotatedFilesTest, NamesThemselvesAfterAFileWithoutExtension) {
+TEST_F(TheRotatedFiles, NamesThemselvesAfterAFileWithoutExtension) {
     EXPECT_EQ(RotatedFiles(m_directory.Path(), "trace").NumberOf("trace_7"), 7U);
 }
 
-TEST_F(RotatedFilesTest, NumberTheFilesInTheOrderOfRotation) {
+TEST_F(TheRotatedFiles, NumberTheFilesInTheOrderOfRotation) {
     TakeIn("one");
     TakeIn("two");
     EXPECT_EQ(ContentOf(At("Report_1.log")), "one");
@@ -66,7 +66,7 @@ TEST_F(RotatedFilesTest, NumberTheFilesInTheOrderOfRotation) {
     EXPECT_FALSE(std::filesystem::exists(At("Report.log")));
 }
 
-TEST_F(RotatedFilesTest, GoOnWithTheHighestNumberOfAnEarlierRun) {
+TEST_F(TheRotatedFiles, GoOnWithTheHighestNumberOfAnEarlierRun) {
     WriteFile(At("Report_9.log"), "");
     WriteFile(At("Report_10.log"), "");
     std::filesystem::create_directory(At("Report_12.log")); // not a log file, but its name is taken
@@ -74,7 +74,7 @@ TEST_F(RotatedFilesTest, GoOnWithTheHighestNumberOfAnEarlierRun) {
     EXPECT_EQ(ContentOf(At("Report_13.log")), "x");
 }
 
-TEST_F(RotatedFilesTest, DoNotUseANumberAgainWhoseFileIsGone) {
+TEST_F(TheRotatedFiles, DoNotUseANumberAgainWhoseFileIsGone) {
     TakeIn("one");
     m_files.Prune(0);
     EXPECT_FALSE(std::filesystem::exists(At("Report_1.log")));
@@ -82,7 +82,7 @@ TEST_F(RotatedFilesTest, DoNotUseANumberAgainWhoseFileIsGone) {
     EXPECT_EQ(ContentOf(At("Report_2.log")), "two");
 }
 
-TEST_F(RotatedFilesTest, LeaveTheFilesOfOthersAlone) {
+TEST_F(TheRotatedFiles, LeaveTheFilesOfOthersAlone) {
     WriteFile(At("Report_1.txt"), "other");
     WriteFile(At("Metrik_1.log"), "other");
     TakeIn("one");
@@ -91,7 +91,7 @@ TEST_F(RotatedFilesTest, LeaveTheFilesOfOthersAlone) {
     EXPECT_TRUE(std::filesystem::exists(At("Metrik_1.log")));
 }
 
-TEST_F(RotatedFilesTest, SayWhyTheLiveFileCannotBeRotated) {
+TEST_F(TheRotatedFiles, SayWhyTheLiveFileCannotBeRotated) {
     const auto failure = m_files.TakeIn(At("Report.log").string());
     EXPECT_EQ(failure.error, ENOENT);
     EXPECT_EQ(failure.Text(), "cannot rotate the file: No such file or directory");

@@ -11,7 +11,7 @@ using namespace std::chrono_literals;
 
 namespace {
 
-class MetrikSdkTest : public PluginFixture {
+class TheMetrikSdk : public PluginFixture {
 protected:
     static std::ptrdiff_t CountEntries(const std::string& directory) {
         return std::distance(std::filesystem::directory_iterator(directory), {});
@@ -32,17 +32,17 @@ protected:
     static std::ptrdiff_t Threads() { return CountEntries("/proc/self/task"); }
 };
 
-TEST_F(MetrikSdkTest, TellsItsVersion) {
+TEST_F(TheMetrikSdk, TellsItsVersion) {
     EXPECT_FALSE(Load()->GetModule()->GetSdkVersion().empty());
 }
 
-TEST_F(MetrikSdkTest, AcceptsNothingBeforeItIsInitialised) {
+TEST_F(TheMetrikSdk, AcceptsNothingBeforeItIsInitialised) {
     const auto loader = Load();
     EXPECT_FALSE(loader->GetModule()->ReportEvent("A759|1", "{}"));
     EXPECT_EQ(loader->GetModule()->GetPendingCount(), -1);
 }
 
-TEST_F(MetrikSdkTest, KeepsEventsWithoutThreadAndNetworkWhenNoEndpointIsSet) {
+TEST_F(TheMetrikSdk, KeepsEventsWithoutThreadAndNetworkWhenNoEndpointIsSet) {
     const auto before = Threads();
     Start();
     Report(10);
@@ -51,7 +51,7 @@ TEST_F(MetrikSdkTest, KeepsEventsWithoutThreadAndNetworkWhenNoEndpointIsSet) {
     EXPECT_EQ(Told::Successes().All(), std::vector<std::string>{"init: A759"});
 }
 
-TEST_F(MetrikSdkTest, KeepsEventsWithoutThreadAndNetworkWhenItIsSwitchedOff) {
+TEST_F(TheMetrikSdk, KeepsEventsWithoutThreadAndNetworkWhenItIsSwitchedOff) {
     LoopbackServer server([](const Request&) { return Reply(); });
     Configure("ENDPOINT", server.Url());
     SetVariable("OTEL_SDK_DISABLED", "true");
@@ -64,7 +64,7 @@ TEST_F(MetrikSdkTest, KeepsEventsWithoutThreadAndNetworkWhenItIsSwitchedOff) {
     EXPECT_EQ(Totals().waiting, 600);
 }
 
-TEST_F(MetrikSdkTest, RefusesEventsAndTellsWhenNoDirectoryWasEverGiven) {
+TEST_F(TheMetrikSdk, RefusesEventsAndTellsWhenNoDirectoryWasEverGiven) {
     InAFreshProcess([] {
         const auto loader = Load();
         for (const auto* directory : {"", "relative"}) {
@@ -76,7 +76,7 @@ TEST_F(MetrikSdkTest, RefusesEventsAndTellsWhenNoDirectoryWasEverGiven) {
     });
 }
 
-TEST_F(MetrikSdkTest, PutsAModuleWithoutADirectoryIntoTheOutboxOfTheFirst) {
+TEST_F(TheMetrikSdk, PutsAModuleWithoutADirectoryIntoTheOutboxOfTheFirst) {
     InAFreshProcess([this] {
         Start();
         const auto other = Load();
@@ -86,7 +86,7 @@ TEST_F(MetrikSdkTest, PutsAModuleWithoutADirectoryIntoTheOutboxOfTheFirst) {
     });
 }
 
-TEST_F(MetrikSdkTest, BeginsAnewWhenItIsInitialisedAgain) {
+TEST_F(TheMetrikSdk, BeginsAnewWhenItIsInitialisedAgain) {
     Start();
     Report(1);
     const auto other = m_directory.Path() + "/other";
@@ -98,7 +98,7 @@ TEST_F(MetrikSdkTest, BeginsAnewWhenItIsInitialisedAgain) {
     EXPECT_TRUE(std::filesystem::exists(other + "/MetrikOutbox.db"));
 }
 
-TEST_F(MetrikSdkTest, TakesTenThousandHostileModulesInOneFileWithOneThread) {
+TEST_F(TheMetrikSdk, TakesTenThousandHostileModulesInOneFileWithOneThread) {
     LoopbackServer server([](const Request&) { return Reply(); });
     Configure("ENDPOINT", server.Url());
     Start();
@@ -120,7 +120,7 @@ TEST_F(MetrikSdkTest, TakesTenThousandHostileModulesInOneFileWithOneThread) {
     EXPECT_TRUE(Told::Failures().All().empty());
 }
 
-TEST_F(MetrikSdkTest, TellsAFullOutboxOfAllModulesOnceAndNotTenThousandTimes) {
+TEST_F(TheMetrikSdk, TellsAFullOutboxOfAllModulesOnceAndNotTenThousandTimes) {
     std::filesystem::create_directories(File());
     std::vector<std::unique_ptr<Loader>> modules;
     for (int i = 0; i < 1000; ++i) {
@@ -132,7 +132,7 @@ TEST_F(MetrikSdkTest, TellsAFullOutboxOfAllModulesOnceAndNotTenThousandTimes) {
     EXPECT_EQ(Told::Failures().All().size(), 1U);
 }
 
-TEST_F(MetrikSdkTest, BoundsTheOutboxesThatHostileDirectoriesCanMake) {
+TEST_F(TheMetrikSdk, BoundsTheOutboxesThatHostileDirectoriesCanMake) {
     InAFreshProcess([this] {
         Start();
         std::vector<std::unique_ptr<Loader>> modules;
@@ -147,7 +147,7 @@ TEST_F(MetrikSdkTest, BoundsTheOutboxesThatHostileDirectoriesCanMake) {
     });
 }
 
-TEST_F(MetrikSdkTest, CountsAModulesEventsOnAcrossRestarts) {
+TEST_F(TheMetrikSdk, CountsAModulesEventsOnAcrossRestarts) {
     Start();
     Report(5);
     Stop();
@@ -160,7 +160,7 @@ TEST_F(MetrikSdkTest, CountsAModulesEventsOnAcrossRestarts) {
     EXPECT_EQ(batch.events.size(), 10U);
 }
 
-TEST_F(MetrikSdkTest, IsReleasedWithinASecondWhileTheCollectorKeepsItWaiting) {
+TEST_F(TheMetrikSdk, IsReleasedWithinASecondWhileTheCollectorKeepsItWaiting) {
     LoopbackServer server([](const Request&) {
         Reply never;
         never.manner = Reply::Manner::Never;
@@ -182,7 +182,7 @@ TEST_F(MetrikSdkTest, IsReleasedWithinASecondWhileTheCollectorKeepsItWaiting) {
     EXPECT_TRUE(Told::Failures().All().empty());
 }
 
-TEST_F(MetrikSdkTest, IsReleasedAtOnceWhileItWaitsForTheNextAttempt) {
+TEST_F(TheMetrikSdk, IsReleasedAtOnceWhileItWaitsForTheNextAttempt) {
     LoopbackServer server([](const Request&) {
         Reply later;
         later.status = 503;
@@ -199,7 +199,7 @@ TEST_F(MetrikSdkTest, IsReleasedAtOnceWhileItWaitsForTheNextAttempt) {
     EXPECT_TRUE(CanEndWithin(1s, start, [&] { Stop(); }));
 }
 
-TEST_F(MetrikSdkTest, StoresEventsWhileItUploadsOthers) {
+TEST_F(TheMetrikSdk, StoresEventsWhileItUploadsOthers) {
     LoopbackServer server([](const Request&) { return Reply(); });
     Configure("ENDPOINT", server.Url());
     Start();
@@ -213,7 +213,7 @@ TEST_F(MetrikSdkTest, StoresEventsWhileItUploadsOthers) {
     EXPECT_EQ(Totals().delivered, 5000);
 }
 
-TEST_F(MetrikSdkTest, TellsEverythingThatIsWrongWithTheConfiguration) {
+TEST_F(TheMetrikSdk, TellsEverythingThatIsWrongWithTheConfiguration) {
     Configure("ENDPOINT", "http://127.0.0.1:1");
     Configure("TIMEOUT", "soon");
     Configure("COMPRESSION", "zstd");
@@ -226,7 +226,7 @@ TEST_F(MetrikSdkTest, TellsEverythingThatIsWrongWithTheConfiguration) {
     EXPECT_NE(complaint->find("OTEL_EXPORTER_OTLP_COMPRESSION"), std::string::npos) << *complaint;
 }
 
-TEST_F(MetrikSdkTest, TellsAConfigurationThatMakesNoSenseAndKeepsTheEvents) {
+TEST_F(TheMetrikSdk, TellsAConfigurationThatMakesNoSenseAndKeepsTheEvents) {
     Configure("ENDPOINT", "gopher://x");
     Start();
     Report(1);

@@ -17,9 +17,9 @@ namespace fs = std::filesystem;
 
 namespace {
 
-class DatabaseFilesTest : public ::testing::Test {
+class TheDatabaseFiles : public ::testing::Test {
 protected:
-    DatabaseFilesTest() { Make(Database()); }
+    TheDatabaseFiles() { Make(Database()); }
 
     std::string Database() const { return m_directory.Path() + "/o.db"; }
 
@@ -43,7 +43,7 @@ protected:
 
 } // namespace
 
-TEST_F(DatabaseFilesTest, MayBeOpenedWhenTheyAreTheirUsersOwnOrMissing) {
+TEST_F(TheDatabaseFiles, MayBeOpenedWhenTheyAreTheirUsersOwnOrMissing) {
     EXPECT_EQ(Refusal(), "");
     for (const std::string suffix : SIDE_FILE_SUFFIXES)
         Make(Database() + suffix);
@@ -54,7 +54,7 @@ TEST_F(DatabaseFilesTest, MayBeOpenedWhenTheyAreTheirUsersOwnOrMissing) {
     EXPECT_EQ(Refusal(), "") << "SQLite says itself that it is missing";
 }
 
-TEST_F(DatabaseFilesTest, AreRefusedWhenOneOfThemMayBeWrittenByOthers) {
+TEST_F(TheDatabaseFiles, AreRefusedWhenOneOfThemMayBeWrittenByOthers) {
     for (const std::string suffix : {"", "-wal", "-shm", "-journal"}) {
         Make(Database() + suffix);
         for (const auto mode : {0620U, 0602U}) {
@@ -65,7 +65,7 @@ TEST_F(DatabaseFilesTest, AreRefusedWhenOneOfThemMayBeWrittenByOthers) {
     }
 }
 
-TEST_F(DatabaseFilesTest, AreRefusedWhenOneOfThemBelongsToAnotherUser) {
+TEST_F(TheDatabaseFiles, AreRefusedWhenOneOfThemBelongsToAnotherUser) {
     if (!OtherUser::CanBeMade())
         GTEST_SKIP() << "only root can give files to another user";
     for (const std::string suffix : {"-wal", "-shm", "-journal", ""}) {
@@ -76,7 +76,7 @@ TEST_F(DatabaseFilesTest, AreRefusedWhenOneOfThemBelongsToAnotherUser) {
     }
 }
 
-TEST_F(DatabaseFilesTest, AreRefusedWhenOneOfThemIsALinkOrAnotherKindOfFile) {
+TEST_F(TheDatabaseFiles, AreRefusedWhenOneOfThemIsALinkOrAnotherKindOfFile) {
     const auto other = m_directory.Path() + "/other";
     Make(other);
     const auto journal = Database() + "-journal";
@@ -90,7 +90,7 @@ TEST_F(DatabaseFilesTest, AreRefusedWhenOneOfThemIsALinkOrAnotherKindOfFile) {
     EXPECT_EQ(Refusal(), journal + " is not a regular file");
 }
 
-TEST_F(DatabaseFilesTest, AreRefusedInADirectoryWhereOthersMayPutMore) {
+TEST_F(TheDatabaseFiles, AreRefusedInADirectoryWhereOthersMayPutMore) {
     fs::permissions(m_directory.Path(), fs::perms{0770});
     EXPECT_EQ(Refusal(), m_directory.Path() + " may be written by other users");
     fs::permissions(m_directory.Path(), fs::perms{01777});
@@ -99,7 +99,7 @@ TEST_F(DatabaseFilesTest, AreRefusedInADirectoryWhereOthersMayPutMore) {
     EXPECT_EQ(Refusal(), "");
 }
 
-TEST_F(DatabaseFilesTest, AreLookedAtWhereALinkToTheDatabaseLeads) {
+TEST_F(TheDatabaseFiles, AreLookedAtWhereALinkToTheDatabaseLeads) {
     const auto link = m_directory.Path() + "/link";
     fs::create_symlink(Database(), link);
     RequireOurFiles(link);

@@ -17,9 +17,9 @@ namespace fs = std::filesystem;
 
 namespace {
 
-class DeletedLogTest : public ::testing::Test {
+class TheDeletedLog : public ::testing::Test {
 protected:
-    DeletedLogTest() {
+    TheDeletedLog() {
         m_database->exec("pragma journal_mode = wal");
         m_database->exec("create table t (x); insert into t values (1)");
         m_files = std::make_unique<SideFileWatch>(m_path);
@@ -50,7 +50,7 @@ private:
 
 } // namespace
 
-TEST_F(DeletedLogTest, IsNoticedFileByFile) {
+TEST_F(TheDeletedLog, IsNoticedFileByFile) {
     EXPECT_TRUE(m_files->AreInPlace());
     Remove("-shm");
     EXPECT_FALSE(m_files->AreInPlace());
@@ -59,7 +59,7 @@ TEST_F(DeletedLogTest, IsNoticedFileByFile) {
     EXPECT_FALSE(m_files->LogIsInPlace());
 }
 
-TEST_F(DeletedLogTest, IsBroughtIntoTheDatabase) {
+TEST_F(TheDeletedLog, IsBroughtIntoTheDatabase) {
     Remove("-wal");
     Remove("-shm");
     m_database->exec("insert into t values (2)"); // before it was noticed
@@ -68,13 +68,13 @@ TEST_F(DeletedLogTest, IsBroughtIntoTheDatabase) {
     EXPECT_EQ(Ask("pragma integrity_check"), "ok");
 }
 
-TEST_F(DeletedLogTest, IsReadAgainWhenOnlyItsIndexWasDeleted) {
+TEST_F(TheDeletedLog, IsReadAgainWhenOnlyItsIndexWasDeleted) {
     Remove("-shm");
     EXPECT_TRUE(Rescue());
     EXPECT_EQ(Ask("select group_concat(x) from t"), "1");
 }
 
-TEST_F(DeletedLogTest, IsLostWhenAnotherProgramHasBegunAnother) {
+TEST_F(TheDeletedLog, IsLostWhenAnotherProgramHasBegunAnother) {
     m_database->exec("pragma wal_checkpoint(truncate); insert into t values (2)");
     Remove("-wal");
     Remove("-shm");
@@ -85,7 +85,7 @@ TEST_F(DeletedLogTest, IsLostWhenAnotherProgramHasBegunAnother) {
     EXPECT_EQ(Ask("pragma integrity_check"), "ok");
 }
 
-TEST_F(DeletedLogTest, IsFoundThroughTheOpenDirectoryAsWell) {
+TEST_F(TheDeletedLog, IsFoundThroughTheOpenDirectoryAsWell) {
     const auto directory = SafeDirectory::Open(m_directory.Path() + "/db", m_directory.Path());
     const auto path = directory.PathOf("o.db");
     SQLite::Database database(path, SQLite::OPEN_READWRITE | SQLite::OPEN_CREATE | SQLite::OPEN_NOFOLLOW, 0,

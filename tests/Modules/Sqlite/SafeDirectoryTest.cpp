@@ -20,7 +20,7 @@ namespace fs = std::filesystem;
 namespace {
 
 /// The data directory is below /tmp, which every user may write; and so is the place outside it.
-class SafeDirectoryTest : public ::testing::Test {
+class TheSafeDirectory : public ::testing::Test {
 protected:
     std::string Open(const std::string& path) const { return SafeDirectory::Open(path, Home()).Path(); }
 
@@ -56,7 +56,7 @@ protected:
 
 } // namespace
 
-TEST_F(SafeDirectoryTest, MakesWhatIsMissingBelowTheDataDirectoryForItsUserAlone) {
+TEST_F(TheSafeDirectory, MakesWhatIsMissingBelowTheDataDirectoryForItsUserAlone) {
     const auto umask = ::umask(0);
     EXPECT_EQ(Open(Home() + "/a/b"), Home() + "/a/b");
     ::umask(umask);
@@ -64,13 +64,13 @@ TEST_F(SafeDirectoryTest, MakesWhatIsMissingBelowTheDataDirectoryForItsUserAlone
     EXPECT_EQ(ModeOf(Home() + "/a/b"), 0700U);
 }
 
-TEST_F(SafeDirectoryTest, MakesTheDataDirectoryToo) {
+TEST_F(TheSafeDirectory, MakesTheDataDirectoryToo) {
     EXPECT_EQ(SafeDirectory::Open(Home() + "/x/share/hublink", Home() + "/x/share").Path(),
               Home() + "/x/share/hublink");
     EXPECT_EQ(ModeOf(Home() + "/x/share"), 0700U);
 }
 
-TEST_F(SafeDirectoryTest, ResolvesOneNameAndMakesNothing) {
+TEST_F(TheSafeDirectory, ResolvesOneNameAndMakesNothing) {
     fs::create_directory_symlink(Home(), Home() + "/link");
     for (const std::string same : {"/db", "/db/", "/./db", "/x/../db", "//db", "/link/db", "/link/link/db"})
         EXPECT_EQ(SafeDirectory::Resolve(Home() + same, Home()), Home() + "/db") << same;
@@ -78,14 +78,14 @@ TEST_F(SafeDirectoryTest, ResolvesOneNameAndMakesNothing) {
     EXPECT_EQ(SafeDirectory::Resolve(Home() + "/none/db", Home() + "/none"), Home() + "/none/db");
 }
 
-TEST_F(SafeDirectoryTest, RefusesADirectoryBelowOneThatOthersMayWriteThoughItIsSticky) {
+TEST_F(TheSafeDirectory, RefusesADirectoryBelowOneThatOthersMayWriteThoughItIsSticky) {
     EXPECT_EQ(Refusal(Outside()), "/tmp may be written by other users");
     EXPECT_EQ(Refusal(Outside() + "/new"), "/tmp may be written by other users");
     EXPECT_EQ(Refusal(Home() + "/../x"), "/tmp may be written by other users");
     EXPECT_TRUE(fs::is_empty(Outside()));
 }
 
-TEST_F(SafeDirectoryTest, TakesADirectoryOutsideWhenNoOtherUserCanChangeItsPath) {
+TEST_F(TheSafeDirectory, TakesADirectoryOutsideWhenNoOtherUserCanChangeItsPath) {
     const auto path = PrivateRoot();
     if (path.empty())
         GTEST_SKIP() << "only root can make a directory whose path is its own";
@@ -100,7 +100,7 @@ TEST_F(SafeDirectoryTest, TakesADirectoryOutsideWhenNoOtherUserCanChangeItsPath)
     fs::remove_all(path);
 }
 
-TEST_F(SafeDirectoryTest, RefusesWhatIsNoAbsolutePathAndWhatIsNoDirectory) {
+TEST_F(TheSafeDirectory, RefusesWhatIsNoAbsolutePathAndWhatIsNoDirectory) {
     for (const auto& path : {std::string(), std::string("relative"), std::string("../up"), std::string("~/x"),
                              std::string("/a\0b", 4)})
         EXPECT_EQ(Refusal(path), "not an absolute path");
@@ -109,7 +109,7 @@ TEST_F(SafeDirectoryTest, RefusesWhatIsNoAbsolutePathAndWhatIsNoDirectory) {
     EXPECT_THAT(Refusal(Home() + "/" + std::string(300, 'n')), HasSubstr("File name too long"));
 }
 
-TEST_F(SafeDirectoryTest, DoesNotMakeADeepTree) {
+TEST_F(TheSafeDirectory, DoesNotMakeADeepTree) {
     std::string deep = Home();
     for (std::size_t i = 0; i < SafeDirectory::MAX_LEVELS; ++i)
         deep += "/d";
@@ -118,20 +118,20 @@ TEST_F(SafeDirectoryTest, DoesNotMakeADeepTree) {
     EXPECT_EQ(Refusal(deep), "");
 }
 
-TEST_F(SafeDirectoryTest, GivesUpOnLinksThatLeadInACircle) {
+TEST_F(TheSafeDirectory, GivesUpOnLinksThatLeadInACircle) {
     fs::create_symlink(Home() + "/b", Home() + "/a");
     fs::create_symlink("a", Home() + "/b");
     EXPECT_EQ(Refusal(Home() + "/a/x"), "too many links");
 }
 
-TEST_F(SafeDirectoryTest, HoldsTheTargetOfALinkToTheSameRule) {
+TEST_F(TheSafeDirectory, HoldsTheTargetOfALinkToTheSameRule) {
     fs::create_directory_symlink(Outside(), Home() + "/away");
     fs::create_directory_symlink("../" + fs::path(Outside()).filename().string(), Home() + "/relative");
     EXPECT_EQ(Refusal(Home() + "/away/x"), "/tmp may be written by other users");
     EXPECT_EQ(Refusal(Home() + "/relative/x"), "/tmp may be written by other users");
 }
 
-TEST_F(SafeDirectoryTest, RefusesWhatAnotherUserPlantedBelowTheDataDirectory) {
+TEST_F(TheSafeDirectory, RefusesWhatAnotherUserPlantedBelowTheDataDirectory) {
     if (!OtherUser::CanBeMade())
         GTEST_SKIP() << "only root can give files to another user";
     fs::create_directory(Home() + "/theirs");
@@ -146,7 +146,7 @@ TEST_F(SafeDirectoryTest, RefusesWhatAnotherUserPlantedBelowTheDataDirectory) {
     EXPECT_EQ(Refusal(Home() + "/open/own"), Home() + "/open may be written by other users");
 }
 
-TEST_F(SafeDirectoryTest, LeadsToTheSameDirectoryThoughItsPathIsSwapped) {
+TEST_F(TheSafeDirectory, LeadsToTheSameDirectoryThoughItsPathIsSwapped) {
     const auto directory = SafeDirectory::Open(Home() + "/db", Home());
     fs::rename(Home() + "/db", Home() + "/moved");
     fs::create_directory_symlink(Outside(), Home() + "/db");

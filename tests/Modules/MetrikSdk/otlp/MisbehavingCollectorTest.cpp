@@ -11,7 +11,7 @@ using Manner = Reply::Manner;
 
 /// A collector that answers its first requests as listed and takes everything afterwards. It keeps account of
 /// what it took.
-class MisbehavingCollectorTest : public PluginFixture {
+class TheMisbehavingCollector : public PluginFixture {
 protected:
     /// Before there is an uploader, so that a slow machine does not spread the events over more requests.
     void ReportBeforehand(int count) {
@@ -68,7 +68,7 @@ Reply Misbehave(Manner manner) {
     return reply;
 }
 
-TEST_F(MisbehavingCollectorTest, GetsWellFormedRequestsOverOneConnection) {
+TEST_F(TheMisbehavingCollector, GetsWellFormedRequestsOverOneConnection) {
     ReportBeforehand(1500);
     Configure("HEADERS", "api-key=secret%20word");
     StartAgainst({});
@@ -85,7 +85,7 @@ TEST_F(MisbehavingCollectorTest, GetsWellFormedRequestsOverOneConnection) {
     EXPECT_EQ(Told::Failures().All().size(), 0U);
 }
 
-TEST_F(MisbehavingCollectorTest, GetsTheUserAgentOfTheConfiguration) {
+TEST_F(TheMisbehavingCollector, GetsTheUserAgentOfTheConfiguration) {
     ReportBeforehand(1);
     Configure("HEADERS", "user-agent=Fleet%2F7");
     StartAgainst({});
@@ -93,7 +93,7 @@ TEST_F(MisbehavingCollectorTest, GetsTheUserAgentOfTheConfiguration) {
     EXPECT_EQ(m_server->Requests().at(0).headers.at("user-agent"), "Fleet/7");
 }
 
-TEST_F(MisbehavingCollectorTest, GetsEveryEventOnceAndInOrder) {
+TEST_F(TheMisbehavingCollector, GetsEveryEventOnceAndInOrder) {
     ReportBeforehand(1500);
     StartAgainst({});
     ExpectEverythingDelivered(1500);
@@ -106,7 +106,7 @@ TEST_F(MisbehavingCollectorTest, GetsEveryEventOnceAndInOrder) {
     EXPECT_EQ(next, 1500);
 }
 
-TEST_F(MisbehavingCollectorTest, GetsPlainBodiesWhenAskedFor) {
+TEST_F(TheMisbehavingCollector, GetsPlainBodiesWhenAskedFor) {
     ReportBeforehand(10);
     Configure("COMPRESSION", "none");
     StartAgainst({});
@@ -114,7 +114,7 @@ TEST_F(MisbehavingCollectorTest, GetsPlainBodiesWhenAskedFor) {
     EXPECT_EQ(m_server->Requests().at(0).headers.count("content-encoding"), 0U);
 }
 
-TEST_F(MisbehavingCollectorTest, NeverAnswersARequestOfMoreThanSomeEvents) {
+TEST_F(TheMisbehavingCollector, NeverAnswersARequestOfMoreThanSomeEvents) {
     ReportBeforehand(40);
     Configure("TIMEOUT", "200");
     StartAgainstScript([](const Request& request) {
@@ -123,7 +123,7 @@ TEST_F(MisbehavingCollectorTest, NeverAnswersARequestOfMoreThanSomeEvents) {
     ExpectEverythingDelivered(40);
 }
 
-TEST_F(MisbehavingCollectorTest, Answers503AndGetsTheSameEventsAgain) {
+TEST_F(TheMisbehavingCollector, Answers503AndGetsTheSameEventsAgain) {
     ReportBeforehand(10);
     StartAgainst({Status(503)});
     ExpectEverythingDelivered(10);
@@ -133,7 +133,7 @@ TEST_F(MisbehavingCollectorTest, Answers503AndGetsTheSameEventsAgain) {
     EXPECT_EQ(Told::Failures().Count("upload: "), 2) << "its beginning and its end";
 }
 
-TEST_F(MisbehavingCollectorTest, AsksForATimeInSecondsAndIsGivenIt) {
+TEST_F(TheMisbehavingCollector, AsksForATimeInSecondsAndIsGivenIt) {
     ReportBeforehand(512);
     StartAgainst({Status(429, "Retry-After: 2\r\n")});
     const auto start = std::chrono::steady_clock::now();
@@ -142,7 +142,7 @@ TEST_F(MisbehavingCollectorTest, AsksForATimeInSecondsAndIsGivenIt) {
     EXPECT_EQ(m_server->RequestCount(), 2U);
 }
 
-TEST_F(MisbehavingCollectorTest, AsksForATimeByADateAndIsGivenIt) {
+TEST_F(TheMisbehavingCollector, AsksForATimeByADateAndIsGivenIt) {
     ReportBeforehand(512);
     const std::time_t until = std::time(nullptr) + 3;
     std::tm utc{};
@@ -155,7 +155,7 @@ TEST_F(MisbehavingCollectorTest, AsksForATimeByADateAndIsGivenIt) {
     EXPECT_EQ(m_server->RequestCount(), 2U);
 }
 
-TEST_F(MisbehavingCollectorTest, RefusesOnePoisonousEventAmong500) {
+TEST_F(TheMisbehavingCollector, RefusesOnePoisonousEventAmong500) {
     ReportBeforehand(500);
     StartAgainstScript([](const Request& request) {
         const auto events = EventsOf(request.body);
@@ -178,7 +178,7 @@ TEST_F(MisbehavingCollectorTest, RefusesOnePoisonousEventAmong500) {
     EXPECT_EQ(Told::Failures().Count("events refused: Moved to the dead letters: 1 event from "), 1);
 }
 
-TEST_F(MisbehavingCollectorTest, RejectsSomeEventsOfARequest) {
+TEST_F(TheMisbehavingCollector, RejectsSomeEventsOfARequest) {
     ReportBeforehand(100);
     StartAgainst({Status(200, {}, R"({"partialSuccess":{"rejectedLogRecords":"7","errorMessage":"old"}})")});
     EXPECT_TRUE(WaitUntilNothingWaits());
@@ -190,7 +190,7 @@ TEST_F(MisbehavingCollectorTest, RejectsSomeEventsOfARequest) {
     EXPECT_EQ(Told::Failures().Count("events refused: The collector rejected 7 of 100"), 1);
 }
 
-TEST_F(MisbehavingCollectorTest, NeverAnswers) {
+TEST_F(TheMisbehavingCollector, NeverAnswers) {
     ReportBeforehand(10);
     Configure("TIMEOUT", "300");
     StartAgainst({Misbehave(Manner::Never)});
@@ -198,27 +198,27 @@ TEST_F(MisbehavingCollectorTest, NeverAnswers) {
     EXPECT_EQ(Told::Failures().Count("upload: "), 2) << "its beginning and its end";
 }
 
-TEST_F(MisbehavingCollectorTest, ClosesAfterReading) {
+TEST_F(TheMisbehavingCollector, ClosesAfterReading) {
     ReportBeforehand(10);
     StartAgainst({Misbehave(Manner::Close)});
     ExpectEverythingDelivered(10);
 }
 
-TEST_F(MisbehavingCollectorTest, ClosesHalfWayThroughTheBody) {
+TEST_F(TheMisbehavingCollector, ClosesHalfWayThroughTheBody) {
     ReportBeforehand(10);
     StartAgainst({Misbehave(Manner::CloseHalfway)});
     ExpectEverythingDelivered(10);
     EXPECT_EQ(m_server->RequestCount(), 3U) << "the second time in halves";
 }
 
-TEST_F(MisbehavingCollectorTest, ClosesInsideTheHeadersOfAnAcceptance) {
+TEST_F(TheMisbehavingCollector, ClosesInsideTheHeadersOfAnAcceptance) {
     ReportBeforehand(1);
     StartAgainst({Misbehave(Manner::CloseInHeaders)});
     ExpectEverythingDelivered(1);
     EXPECT_EQ(m_server->RequestCount(), 2U);
 }
 
-TEST_F(MisbehavingCollectorTest, WantsOtherCredentialsForAWhile) {
+TEST_F(TheMisbehavingCollector, WantsOtherCredentialsForAWhile) {
     ReportBeforehand(10);
     Configure("HEADERS", "api-key=secret%20word");
     StartAgainst({Status(401)});
@@ -231,14 +231,14 @@ TEST_F(MisbehavingCollectorTest, WantsOtherCredentialsForAWhile) {
     EXPECT_EQ(told[1], "upload: " + m_server->Url() + "/v1/logs: events are taken again");
 }
 
-TEST_F(MisbehavingCollectorTest, AnswersGarbage) {
+TEST_F(TheMisbehavingCollector, AnswersGarbage) {
     ReportBeforehand(10);
     StartAgainst({Misbehave(Manner::SpeakNonsense)});
     ExpectEverythingDelivered(10);
     EXPECT_EQ(m_server->RequestCount(), 3U) << "the second time in halves";
 }
 
-TEST_F(MisbehavingCollectorTest, AnswersABodyWithoutAnEnd) {
+TEST_F(TheMisbehavingCollector, AnswersABodyWithoutAnEnd) {
     ReportBeforehand(10);
     StartAgainst({Misbehave(Manner::Flood)});
     EXPECT_TRUE(WaitUntilNothingWaits());
@@ -247,14 +247,14 @@ TEST_F(MisbehavingCollectorTest, AnswersABodyWithoutAnEnd) {
     EXPECT_EQ(m_server->RequestCount(), 1U);
 }
 
-TEST_F(MisbehavingCollectorTest, IsALogInPage) {
+TEST_F(TheMisbehavingCollector, IsALogInPage) {
     ReportBeforehand(10);
     StartAgainst({Status(200, "Content-Type: text/html\r\n", "<html>log in</html>")});
     ExpectEverythingDelivered(10);
     EXPECT_EQ(m_server->RequestCount(), 2U);
 }
 
-TEST_F(MisbehavingCollectorTest, RefusesOneEventWithAPage) {
+TEST_F(TheMisbehavingCollector, RefusesOneEventWithAPage) {
     ReportBeforehand(20);
     StartAgainstScript([](const Request& request) {
         const auto events = EventsOf(request.body);
@@ -268,7 +268,7 @@ TEST_F(MisbehavingCollectorTest, RefusesOneEventWithAPage) {
     EXPECT_EQ(Totals().deadLettered, 1);
 }
 
-TEST_F(MisbehavingCollectorTest, RedirectsAndIsNotFollowed) {
+TEST_F(TheMisbehavingCollector, RedirectsAndIsNotFollowed) {
     ReportBeforehand(10);
     LoopbackServer elsewhere([](const Request&) { return Reply(); });
     Configure("HEADERS", "authorization=secret");
@@ -277,7 +277,7 @@ TEST_F(MisbehavingCollectorTest, RedirectsAndIsNotFollowed) {
     EXPECT_EQ(elsewhere.RequestCount(), 0U);
 }
 
-TEST_F(MisbehavingCollectorTest, IsAwayAndComesBack) {
+TEST_F(TheMisbehavingCollector, IsAwayAndComesBack) {
     std::string url;
     {
         LoopbackServer gone([](const Request&) { return Reply(); });

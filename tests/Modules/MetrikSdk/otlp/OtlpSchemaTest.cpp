@@ -7,7 +7,7 @@
 
 namespace {
 
-class OtlpSchemaTest : public PluginFixture {
+class TheOtlpSchema : public PluginFixture {
 protected:
     /// Whether the definition accepts the body.
     bool Passes(const std::string& body) {
@@ -42,7 +42,7 @@ protected:
     int m_count = 0;
 };
 
-TEST_F(OtlpSchemaTest, AcceptsThePluginsRequests) {
+TEST_F(TheOtlpSchema, AcceptsThePluginsRequests) {
     SetVariable("OTEL_SERVICE_NAME", "desk");
     SetVariable("OTEL_RESOURCE_ATTRIBUTES", "host.name=desk%207,deployment.environment.name=test");
     const auto bodies = BodiesOf({
@@ -67,7 +67,7 @@ TEST_F(OtlpSchemaTest, AcceptsThePluginsRequests) {
     EXPECT_EQ(events, 9U);
 }
 
-TEST_F(OtlpSchemaTest, NoticesABodyThatIsWrong) {
+TEST_F(TheOtlpSchema, NoticesABodyThatIsWrong) {
     const auto good = BodiesOf({NumberedPayload(1)}).at(0);
     EXPECT_TRUE(Passes(good));
     EXPECT_FALSE(Passes("{"));

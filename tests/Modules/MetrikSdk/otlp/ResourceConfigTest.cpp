@@ -10,7 +10,7 @@ using namespace MetrikSdk;
 
 namespace {
 
-class ResourceConfigTest : public testing::Test {
+class TheResourceConfig : public testing::Test {
 protected:
     otlp::ResourceConfig Read(const std::map<std::string, std::string>& environment) {
         m_complaints.clear();
@@ -25,7 +25,7 @@ protected:
     std::vector<std::string> m_complaints;
 };
 
-TEST_F(ResourceConfigTest, SaysWhichSystemThisIsAndNotWhichMachine) {
+TEST_F(TheResourceConfig, SaysWhichSystemThisIsAndNotWhichMachine) {
     const auto config = Read({});
     EXPECT_EQ(config.serviceName, "");
     EXPECT_EQ(config.osDescription, SystemTool::CommonTool::GetOSVersionString());
@@ -33,7 +33,7 @@ TEST_F(ResourceConfigTest, SaysWhichSystemThisIsAndNotWhichMachine) {
     EXPECT_TRUE(config.attributes.empty());
 }
 
-TEST_F(ResourceConfigTest, AddsWhatTheEnvironmentLists) {
+TEST_F(TheResourceConfig, AddsWhatTheEnvironmentLists) {
     const auto config = Read({{"OTEL_RESOURCE_ATTRIBUTES", "host.name=desk%207 , team=a%2Cb,team=c,,x="}});
     const std::vector<std::pair<std::string, std::string>> expected{
         {"host.name", "desk 7"}, {"team", "a,b"}, {"x", ""}};
@@ -41,14 +41,14 @@ TEST_F(ResourceConfigTest, AddsWhatTheEnvironmentLists) {
     EXPECT_TRUE(m_complaints.empty());
 }
 
-TEST_F(ResourceConfigTest, PrefersTheServiceNamesOwnVariable) {
+TEST_F(TheResourceConfig, PrefersTheServiceNamesOwnVariable) {
     const auto* list = "service.name=listed,team=a";
     EXPECT_EQ(Read({{"OTEL_RESOURCE_ATTRIBUTES", list}}).serviceName, "listed");
     EXPECT_EQ(Read({{"OTEL_RESOURCE_ATTRIBUTES", list}, {"OTEL_SERVICE_NAME", "own"}}).serviceName, "own");
     EXPECT_EQ(Read({{"OTEL_RESOURCE_ATTRIBUTES", list}}).attributes.size(), 1U);
 }
 
-TEST_F(ResourceConfigTest, DropsAnIllFormedListAsAWhole) {
+TEST_F(TheResourceConfig, DropsAnIllFormedListAsAWhole) {
     for (const auto* bad : {"a=1,nonsense", "=1", "a=1,=2"}) {
         EXPECT_TRUE(Read({{"OTEL_RESOURCE_ATTRIBUTES", bad}}).attributes.empty()) << bad;
         EXPECT_EQ(m_complaints, std::vector<std::string>{

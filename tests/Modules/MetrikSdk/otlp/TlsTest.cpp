@@ -23,7 +23,7 @@ void MakeCertificate(const std::string& name, const std::string& host) {
     ASSERT_EQ(std::system(command.c_str()), 0) << "openssl(1) is needed";
 }
 
-class TlsTest : public PluginFixture {
+class TheTls : public PluginFixture {
 protected:
     void StartAgainst(const std::string& host, Poco::Net::Context::VerificationMode mode) {
         MakeCertificate(m_keys.Path() + "/server", host);
@@ -59,7 +59,7 @@ protected:
     std::unique_ptr<LoopbackServer> m_server;
 };
 
-TEST_F(TlsTest, DeliversToACollectorWhoseCertificateWasNamed) {
+TEST_F(TheTls, DeliversToACollectorWhoseCertificateWasNamed) {
     Configure("CERTIFICATE", m_keys.Path() + "/server.crt");
     StartAgainst("IP:127.0.0.1", Poco::Net::Context::VERIFY_NONE);
     Report(10);
@@ -67,7 +67,7 @@ TEST_F(TlsTest, DeliversToACollectorWhoseCertificateWasNamed) {
     EXPECT_EQ(Totals().delivered, 10);
 }
 
-TEST_F(TlsTest, TrustsTheNamedCertificateInsteadOfTheSystemsDirectory) {
+TEST_F(TheTls, TrustsTheNamedCertificateInsteadOfTheSystemsDirectory) {
 #if defined(__SANITIZE_THREAD__)
     GTEST_SKIP() << "the sanitizer wants no threads in a child that was forked";
 #endif
@@ -106,18 +106,18 @@ TEST(HttpSender, TellsAnOptionThatTheLibraryRefuses) {
     EXPECT_THROW(MetrikSdk::otlp::HttpSender{config}, std::runtime_error);
 }
 
-TEST_F(TlsTest, DeliversNothingToACollectorThatNobodyVouchesFor) {
+TEST_F(TheTls, DeliversNothingToACollectorThatNobodyVouchesFor) {
     StartAgainst("IP:127.0.0.1", Poco::Net::Context::VERIFY_NONE);
     ExpectNothingLeaves();
 }
 
-TEST_F(TlsTest, DeliversNothingToACollectorWithAnotherHostsCertificate) {
+TEST_F(TheTls, DeliversNothingToACollectorWithAnotherHostsCertificate) {
     Configure("CERTIFICATE", m_keys.Path() + "/server.crt");
     StartAgainst("DNS:elsewhere.example", Poco::Net::Context::VERIFY_NONE);
     ExpectNothingLeaves();
 }
 
-TEST_F(TlsTest, IdentifiesItselfToACollectorThatAsks) {
+TEST_F(TheTls, IdentifiesItselfToACollectorThatAsks) {
     Configure("CERTIFICATE", m_keys.Path() + "/server.crt");
     Configure("CLIENT_KEY", m_keys.Path() + "/client.key");
     Configure("CLIENT_CERTIFICATE", m_keys.Path() + "/client.crt");
@@ -127,7 +127,7 @@ TEST_F(TlsTest, IdentifiesItselfToACollectorThatAsks) {
     EXPECT_EQ(Totals().delivered, 10);
 }
 
-TEST_F(TlsTest, DeliversNothingWhereItCannotIdentifyItself) {
+TEST_F(TheTls, DeliversNothingWhereItCannotIdentifyItself) {
     Configure("CERTIFICATE", m_keys.Path() + "/server.crt");
     StartAgainst("IP:127.0.0.1", Poco::Net::Context::VERIFY_STRICT);
     ExpectNothingLeaves();

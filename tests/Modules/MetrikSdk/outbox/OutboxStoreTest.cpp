@@ -23,9 +23,9 @@ const WallTime NOW{1'800'000'000s};
 constexpr WallTime NEVER_TOO_OLD{};
 constexpr std::size_t ANY_BYTES = std::numeric_limits<std::size_t>::max();
 
-class OutboxStoreTest : public testing::Test {
+class TheOutboxStore : public testing::Test {
 protected:
-    OutboxStoreTest() {
+    TheOutboxStore() {
         std::ofstream(m_path).close();
         Open();
     }
@@ -42,7 +42,7 @@ protected:
     int m_count = 0;
 };
 
-TEST_F(OutboxStoreTest, GivesEventsBackAsTheyCameInTheirOrder) {
+TEST_F(TheOutboxStore, GivesEventsBackAsTheyCameInTheirOrder) {
     const std::string odd("a\0'\";DROP TABLE event;--\xff", 26);
     Store(A759, odd);
     Store(A759, "second");
@@ -57,7 +57,7 @@ TEST_F(OutboxStoreTest, GivesEventsBackAsTheyCameInTheirOrder) {
     EXPECT_FALSE(batch.outboxId.empty());
 }
 
-TEST_F(OutboxStoreTest, KnowsWhenItsCollectorTookEventsLast) {
+TEST_F(TheOutboxStore, KnowsWhenItsCollectorTookEventsLast) {
     const auto last = [this] {
         return SQLite::Database(m_path)
             .execAndGet("SELECT coalesce(last_delivered_ms, 0) FROM totals")
@@ -78,7 +78,7 @@ TEST_F(OutboxStoreTest, KnowsWhenItsCollectorTookEventsLast) {
     EXPECT_LE(last(), now());
 }
 
-TEST_F(OutboxStoreTest, CountsEachModulesEventsFromOneAcrossRestartsDeletionsAndVersions) {
+TEST_F(TheOutboxStore, CountsEachModulesEventsFromOneAcrossRestartsDeletionsAndVersions) {
     const ModuleIdentity other{"B'; --", "1", "x"};
     Store(A759, "1");
     Store(other, "1");
@@ -97,7 +97,7 @@ TEST_F(OutboxStoreTest, CountsEachModulesEventsFromOneAcrossRestartsDeletionsAnd
     EXPECT_EQ(batch.releases.at(batch.events[1].release).version, "1");
 }
 
-TEST_F(OutboxStoreTest, ForgetsModulesOfWhichNothingWaitsOnceThereAreTooMany) {
+TEST_F(TheOutboxStore, ForgetsModulesOfWhichNothingWaitsOnceThereAreTooMany) {
     Store(A759, "1");
     Store(A759, "2");
     const auto many = outbox::OutboxStore::MAX_IDLE_MODULES + 500;
@@ -117,7 +117,7 @@ TEST_F(OutboxStoreTest, ForgetsModulesOfWhichNothingWaitsOnceThereAreTooMany) {
     EXPECT_EQ(m_store->Oldest(1000, ANY_BYTES).events.back().sequence, 3) << "it has a dead letter";
 }
 
-TEST_F(OutboxStoreTest, CountsWhatModulesTakeOnTheDisk) {
+TEST_F(TheOutboxStore, CountsWhatModulesTakeOnTheDisk) {
     const auto before = m_store->Status().moduleBytes;
     for (int i = 0; i < 2000; ++i) {
         const auto text = std::to_string(i) + std::string(250, 'x');
@@ -131,7 +131,7 @@ TEST_F(OutboxStoreTest, CountsWhatModulesTakeOnTheDisk) {
     EXPECT_LT(status.waitingBytes + status.moduleBytes - before, onDisk * 2);
 }
 
-TEST_F(OutboxStoreTest, TakesAnOutboxOfTheFirstVersionOver) {
+TEST_F(TheOutboxStore, TakesAnOutboxOfTheFirstVersionOver) {
     m_store.reset();
     std::filesystem::remove(m_path);
     ASSERT_EQ(std::system(("sqlite3 " + m_path + " < " + std::string(VERSION_1)).c_str()), 0);
@@ -150,13 +150,13 @@ TEST_F(OutboxStoreTest, TakesAnOutboxOfTheFirstVersionOver) {
     EXPECT_EQ(m_store->Status().waiting, 0);
 }
 
-TEST_F(OutboxStoreTest, KeepsItsIdentityAcrossRestarts) {
+TEST_F(TheOutboxStore, KeepsItsIdentityAcrossRestarts) {
     const auto id = m_store->Status().outboxId;
     Open();
     EXPECT_EQ(m_store->Status().outboxId, id);
 }
 
-TEST_F(OutboxStoreTest, EndsABatchWithTheEventThatReachesTheBytes) {
+TEST_F(TheOutboxStore, EndsABatchWithTheEventThatReachesTheBytes) {
     for (int i = 0; i < 5; ++i)
         Store(A759, std::string(1000, 'x'));
     EXPECT_EQ(m_store->Oldest(10, 2500).events.size(), 3U);
@@ -164,7 +164,7 @@ TEST_F(OutboxStoreTest, EndsABatchWithTheEventThatReachesTheBytes) {
     EXPECT_EQ(m_store->Oldest(2, ANY_BYTES).events.size(), 2U);
 }
 
-TEST_F(OutboxStoreTest, CountsEveryEventInExactlyOnePlace) {
+TEST_F(TheOutboxStore, CountsEveryEventInExactlyOnePlace) {
     for (int i = 0; i < 20; ++i)
         Store(A759, std::to_string(i), NOW + std::chrono::hours(i));
     m_store->RemoveDelivered(m_store->Oldest(5, ANY_BYTES), 2);
@@ -184,7 +184,7 @@ TEST_F(OutboxStoreTest, CountsEveryEventInExactlyOnePlace) {
     EXPECT_EQ(status.waitingBytes, bytes);
 }
 
-TEST_F(OutboxStoreTest, DoesNotRemoveWhatIsNotTheSameEventAnyMore) {
+TEST_F(TheOutboxStore, DoesNotRemoveWhatIsNotTheSameEventAnyMore) {
     Store(A759, "old");
     const auto taken = m_store->Oldest(1, ANY_BYTES);
     m_store->RemoveDelivered(taken, 0); // as another process would; the next event gets the same row
@@ -196,7 +196,7 @@ TEST_F(OutboxStoreTest, DoesNotRemoveWhatIsNotTheSameEventAnyMore) {
     EXPECT_EQ(m_store->Status().deadLetters, 0);
 }
 
-TEST_F(OutboxStoreTest, DropsTheOldestFirstAndNoMoreThanAsked) {
+TEST_F(TheOutboxStore, DropsTheOldestFirstAndNoMoreThanAsked) {
     for (int i = 0; i < 10; ++i)
         Store(A759, std::to_string(i));
     EXPECT_EQ(m_store->DropOldest(0, NEVER_TOO_OLD, 1, 100).events, 1U);
@@ -205,7 +205,7 @@ TEST_F(OutboxStoreTest, DropsTheOldestFirstAndNoMoreThanAsked) {
     EXPECT_EQ(m_store->DropOldest(0, NEVER_TOO_OLD, 0, 100).events, 0U);
 }
 
-TEST_F(OutboxStoreTest, DoesNotDropWhatIsUnderWay) {
+TEST_F(TheOutboxStore, DoesNotDropWhatIsUnderWay) {
     for (int i = 0; i < 4; ++i)
         Store(A759, std::to_string(i));
     const auto underWay = m_store->Oldest(2, ANY_BYTES);
@@ -216,7 +216,7 @@ TEST_F(OutboxStoreTest, DoesNotDropWhatIsUnderWay) {
     EXPECT_EQ(left.events[2].payload, "3");
 }
 
-TEST_F(OutboxStoreTest, KeepsTheNewestDeadLettersWithinBothBounds) {
+TEST_F(TheOutboxStore, KeepsTheNewestDeadLettersWithinBothBounds) {
     for (int i = 0; i < 10; ++i) {
         Store(A759, std::string(100, static_cast<char>('0' + i)));
         m_store->MoveToDeadLetters(m_store->Oldest(1, ANY_BYTES).events[0], {400, "bad"}, NOW);
@@ -234,7 +234,7 @@ TEST_F(OutboxStoreTest, KeepsTheNewestDeadLettersWithinBothBounds) {
     EXPECT_EQ(reader.execAndGet("SELECT status || reason FROM dead_letter LIMIT 1").getString(), "400bad");
 }
 
-TEST_F(OutboxStoreTest, TrimsATableThatAPersonHasEmptied) {
+TEST_F(TheOutboxStore, TrimsATableThatAPersonHasEmptied) {
     Store(A759, "x");
     m_store->MoveToDeadLetters(m_store->Oldest(1, ANY_BYTES).events[0], {400, "bad"}, NOW);
     SQLite::Database(m_path, SQLite::OPEN_READWRITE).exec("DELETE FROM dead_letter");
@@ -242,7 +242,7 @@ TEST_F(OutboxStoreTest, TrimsATableThatAPersonHasEmptied) {
     EXPECT_EQ(m_store->Status().deadLetters, 0);
 }
 
-TEST_F(OutboxStoreTest, CallsAFileThatIsNoDatabaseDamaged) {
+TEST_F(TheOutboxStore, CallsAFileThatIsNoDatabaseDamaged) {
     m_store.reset();
     std::ofstream(m_path, std::ios::trunc) << std::string(8192, 'x');
     try {
@@ -253,7 +253,7 @@ TEST_F(OutboxStoreTest, CallsAFileThatIsNoDatabaseDamaged) {
     }
 }
 
-TEST_F(OutboxStoreTest, CallsAnotherProgramsDatabaseNotItsOwn) {
+TEST_F(TheOutboxStore, CallsAnotherProgramsDatabaseNotItsOwn) {
     m_store.reset();
     std::ofstream(m_path, std::ios::trunc).close();
     SQLite::Database(m_path, SQLite::OPEN_READWRITE).exec("CREATE TABLE theirs(x)");
@@ -265,7 +265,7 @@ TEST_F(OutboxStoreTest, CallsAnotherProgramsDatabaseNotItsOwn) {
     }
 }
 
-TEST_F(OutboxStoreTest, AsksToTryLaterWhileAnotherProcessHoldsTheLock) {
+TEST_F(TheOutboxStore, AsksToTryLaterWhileAnotherProcessHoldsTheLock) {
     SQLite::Database other(m_path, SQLite::OPEN_READWRITE);
     other.exec("BEGIN IMMEDIATE");
     try {
@@ -279,7 +279,7 @@ TEST_F(OutboxStoreTest, AsksToTryLaterWhileAnotherProcessHoldsTheLock) {
     EXPECT_EQ(m_store->Status().waiting, 1);
 }
 
-TEST_F(OutboxStoreTest, IsSharedByTwoProcessesWithoutGapsOrRepeats) {
+TEST_F(TheOutboxStore, IsSharedByTwoProcessesWithoutGapsOrRepeats) {
     outbox::OutboxStore other(m_path, 5s);
     for (int i = 0; i < 10; ++i) {
         Store(A759, "mine");

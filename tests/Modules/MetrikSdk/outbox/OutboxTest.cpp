@@ -24,9 +24,9 @@ namespace {
 
 const ModuleIdentity A759{"A759", "1", "default"};
 
-class OutboxTest : public testing::Test {
+class TheOutbox : public testing::Test {
 protected:
-    OutboxTest() {
+    TheOutbox() {
         Told::Forget();
         m_notifier.Subscribe(&Told::OnFailure, &Told::OnSuccess);
         m_settings.file.reopenInterval = 0ms;
@@ -59,7 +59,7 @@ protected:
     std::unique_ptr<outbox::Outbox> m_outbox;
 };
 
-TEST_F(OutboxTest, MakesTheDirectoryAndPrivateFilesWhateverTheUmask) {
+TEST_F(TheOutbox, MakesTheDirectoryAndPrivateFilesWhateverTheUmask) {
     const auto before = ::umask(0);
     Open();
     Append();
@@ -74,7 +74,7 @@ TEST_F(OutboxTest, MakesTheDirectoryAndPrivateFilesWhateverTheUmask) {
         EXPECT_EQ(mode(File() + suffix), 0600U) << suffix;
 }
 
-TEST_F(OutboxTest, NarrowsAFileThatOthersCouldRead) {
+TEST_F(TheOutbox, NarrowsAFileThatOthersCouldRead) {
     std::filesystem::create_directories(m_path);
     std::ofstream(File()).close();
     ::chmod(File().c_str(), 0644);
@@ -84,7 +84,7 @@ TEST_F(OutboxTest, NarrowsAFileThatOthersCouldRead) {
     EXPECT_EQ(status.st_mode & 07777, 0600U);
 }
 
-TEST_F(OutboxTest, DoesNotFollowALinkInTheFilesPlace) {
+TEST_F(TheOutbox, DoesNotFollowALinkInTheFilesPlace) {
     std::filesystem::create_directories(m_path);
     const auto target = m_directory.Path() + "/victim";
     std::ofstream(target) << "precious";
@@ -94,14 +94,14 @@ TEST_F(OutboxTest, DoesNotFollowALinkInTheFilesPlace) {
     EXPECT_EQ(ContentOf(target), "precious");
 }
 
-TEST_F(OutboxTest, KeepsEventsAcrossRestarts) {
+TEST_F(TheOutbox, KeepsEventsAcrossRestarts) {
     Open();
     EXPECT_TRUE(Append());
     EXPECT_TRUE(Append());
     EXPECT_EQ(Open().Status().waiting, 2);
 }
 
-TEST_F(OutboxTest, RefusesAnEventOverTheBoundAndTellsIt) {
+TEST_F(TheOutbox, RefusesAnEventOverTheBoundAndTellsIt) {
     m_settings.caps.maxEventBytes = 1000;
     Open();
     EXPECT_FALSE(Append(std::string(1000, 'x')));
@@ -109,7 +109,7 @@ TEST_F(OutboxTest, RefusesAnEventOverTheBoundAndTellsIt) {
     EXPECT_EQ(Told::Failures().Count("event: "), 1);
 }
 
-TEST_F(OutboxTest, StaysWithinItsCapTellsARunOfDropsOnceAndCountsEveryOne) {
+TEST_F(TheOutbox, StaysWithinItsCapTellsARunOfDropsOnceAndCountsEveryOne) {
     m_settings.caps.maxWaitingBytes = 100'000;
     Open();
     for (int i = 0; i < 1000; ++i)
@@ -122,7 +122,7 @@ TEST_F(OutboxTest, StaysWithinItsCapTellsARunOfDropsOnceAndCountsEveryOne) {
     EXPECT_EQ(Told::Failures().Count("events dropped: "), 1);
 }
 
-TEST_F(OutboxTest, TakesItsCapFromTheModuleThatFillsIt) {
+TEST_F(TheOutbox, TakesItsCapFromTheModuleThatFillsIt) {
     m_settings.caps.maxWaitingBytes = 100'000;
     Open();
     const ModuleIdentity quiet{"QUIET", "1", "quiet"};
@@ -143,7 +143,7 @@ TEST_F(OutboxTest, TakesItsCapFromTheModuleThatFillsIt) {
         << "its oldest went, and no other";
 }
 
-TEST_F(OutboxTest, DropsTheOthersWhenAllOfTheLargestModuleIsUnderWay) {
+TEST_F(TheOutbox, DropsTheOthersWhenAllOfTheLargestModuleIsUnderWay) {
     m_settings.caps.maxWaitingBytes = 10'000;
     Open();
     ASSERT_TRUE(m_outbox->Append({"LARGE", "1", ""}, "LARGE|1", std::string(8000, 'x')));
@@ -154,7 +154,7 @@ TEST_F(OutboxTest, DropsTheOthersWhenAllOfTheLargestModuleIsUnderWay) {
     EXPECT_EQ(m_outbox->Take(1).events.at(0).payload.size(), 8000U);
 }
 
-TEST_F(OutboxTest, TellsTheTotalsOfItsLosses) {
+TEST_F(TheOutbox, TellsTheTotalsOfItsLosses) {
     m_settings.caps.maxWaitingBytes = 100'000;
     Open();
     for (int i = 0; i < 1000; ++i)
@@ -176,7 +176,7 @@ TEST_F(OutboxTest, TellsTheTotalsOfItsLosses) {
     EXPECT_EQ(Told::Failures().All().size(), told.size()) << "once";
 }
 
-TEST_F(OutboxTest, TellsTheTotalsOnceARunOfDropsIsOver) {
+TEST_F(TheOutbox, TellsTheTotalsOnceARunOfDropsIsOver) {
     m_settings.caps.maxWaitingBytes = 10'000;
     m_settings.caps.dropRunEnds = 0ms;
     Open();
@@ -186,7 +186,7 @@ TEST_F(OutboxTest, TellsTheTotalsOnceARunOfDropsIsOver) {
     EXPECT_GE(Told::Failures().Count("events dropped: No events are dropped any more; lost: "), 1);
 }
 
-TEST_F(OutboxTest, DropsNothingByAgeBeforeItsClockHasProvedItself) {
+TEST_F(TheOutbox, DropsNothingByAgeBeforeItsClockHasProvedItself) {
     Open();
     Append();
     SQLite::Database(File(), SQLite::OPEN_READWRITE).exec("UPDATE event SET stored_ms = 1000");
@@ -195,7 +195,7 @@ TEST_F(OutboxTest, DropsNothingByAgeBeforeItsClockHasProvedItself) {
     EXPECT_EQ(m_outbox->Status().waiting, 2);
 }
 
-TEST_F(OutboxTest, DropsEventsThatAreTooOld) {
+TEST_F(TheOutbox, DropsEventsThatAreTooOld) {
     m_settings.caps.clockAgreement = 0ms;
     Open();
     Append();
@@ -209,7 +209,7 @@ TEST_F(OutboxTest, DropsEventsThatAreTooOld) {
     EXPECT_EQ(status.waiting, 2);
 }
 
-TEST_F(OutboxTest, KeepsWhatIsUnderWayWhenACapDrops) {
+TEST_F(TheOutbox, KeepsWhatIsUnderWayWhenACapDrops) {
     m_settings.caps.maxWaitingBytes = 10'000;
     Open();
     for (int i = 0; i < 10; ++i)
@@ -221,7 +221,7 @@ TEST_F(OutboxTest, KeepsWhatIsUnderWayWhenACapDrops) {
     EXPECT_EQ(m_outbox->Status().delivered, 5);
 }
 
-TEST_F(OutboxTest, SetsADamagedFileAsideBeginsANewOneAndTells) {
+TEST_F(TheOutbox, SetsADamagedFileAsideBeginsANewOneAndTells) {
     std::filesystem::create_directories(m_path);
     std::ofstream(File()) << std::string(10'000, 'x');
     std::ofstream(File() + "-wal") << "its log";
@@ -236,7 +236,7 @@ TEST_F(OutboxTest, SetsADamagedFileAsideBeginsANewOneAndTells) {
     EXPECT_EQ(m_outbox->Status().waiting, 1);
 }
 
-TEST_F(OutboxTest, SetsAFileAsideThatIsDamagedWhileInUse) {
+TEST_F(TheOutbox, SetsAFileAsideThatIsDamagedWhileInUse) {
     Open();
     for (int i = 0; i < 200; ++i)
         Append(std::string(1000, 'x'));
@@ -262,7 +262,7 @@ TEST_F(OutboxTest, SetsAFileAsideThatIsDamagedWhileInUse) {
     EXPECT_GE(m_outbox->Status().waiting, 1);
 }
 
-TEST_F(OutboxTest, BeginsAnewWhenTheFileIsDeletedAndTells) {
+TEST_F(TheOutbox, BeginsAnewWhenTheFileIsDeletedAndTells) {
     Open();
     Append();
     for (const std::string suffix : {"", "-wal", "-shm"})
@@ -272,7 +272,7 @@ TEST_F(OutboxTest, BeginsAnewWhenTheFileIsDeletedAndTells) {
     EXPECT_EQ(Open().Status().waiting, 1) << "the event is in the new file";
 }
 
-TEST_F(OutboxTest, WritesNoEventIntoADeletedFileHoweverSoonItComes) {
+TEST_F(TheOutbox, WritesNoEventIntoADeletedFileHoweverSoonItComes) {
     m_settings.file.reopenInterval = OutboxSettings().file.reopenInterval;
     Open();
     for (int i = 0; i < 20; ++i) {
@@ -284,7 +284,7 @@ TEST_F(OutboxTest, WritesNoEventIntoADeletedFileHoweverSoonItComes) {
     }
 }
 
-TEST_F(OutboxTest, StaysWithinItsCapThoughEachEventIsOfAnotherModule) {
+TEST_F(TheOutbox, StaysWithinItsCapThoughEachEventIsOfAnotherModule) {
     m_settings.caps.maxWaitingBytes = 8 << 20;
     Open();
     for (int i = 0; i < 6'000; ++i) {
@@ -298,7 +298,7 @@ TEST_F(OutboxTest, StaysWithinItsCapThoughEachEventIsOfAnotherModule) {
     EXPECT_LT(std::filesystem::file_size(File()), 12U << 20);
 }
 
-TEST_F(OutboxTest, KeepsItsEventsWhenTheFilesBesideItAreDeleted) {
+TEST_F(TheOutbox, KeepsItsEventsWhenTheFilesBesideItAreDeleted) {
     Open();
     for (const std::string suffix : {"-wal", "-shm"}) {
         ASSERT_TRUE(Append());
@@ -310,7 +310,7 @@ TEST_F(OutboxTest, KeepsItsEventsWhenTheFilesBesideItAreDeleted) {
     EXPECT_TRUE(Told::Failures().All().empty()) << "nothing is lost";
 }
 
-TEST_F(OutboxTest, TellsTheLossWhenAnotherProgramHasBegunALogOfItsOwn) {
+TEST_F(TheOutbox, TellsTheLossWhenAnotherProgramHasBegunALogOfItsOwn) {
     Open();
     ASSERT_TRUE(Append());
     for (const std::string suffix : {"-wal", "-shm"})
@@ -324,7 +324,7 @@ TEST_F(OutboxTest, TellsTheLossWhenAnotherProgramHasBegunALogOfItsOwn) {
               1);
 }
 
-TEST_F(OutboxTest, BeginsAnewWhenTheWholeDirectoryIsDeleted) {
+TEST_F(TheOutbox, BeginsAnewWhenTheWholeDirectoryIsDeleted) {
     Open();
     Append();
     std::filesystem::remove_all(m_path);
@@ -332,7 +332,7 @@ TEST_F(OutboxTest, BeginsAnewWhenTheWholeDirectoryIsDeleted) {
     EXPECT_EQ(Open().Status().waiting, 1);
 }
 
-TEST_F(OutboxTest, GoesOnWithTheFileThatWasPutInItsPlace) {
+TEST_F(TheOutbox, GoesOnWithTheFileThatWasPutInItsPlace) {
     Open();
     Append();
     const auto first = m_outbox->Status().outboxId;
@@ -344,7 +344,7 @@ TEST_F(OutboxTest, GoesOnWithTheFileThatWasPutInItsPlace) {
     EXPECT_NE(m_outbox->Status().outboxId, first);
 }
 
-TEST_F(OutboxTest, StoresAgainOnceADirectoryThatWasInTheWayIsGone) {
+TEST_F(TheOutbox, StoresAgainOnceADirectoryThatWasInTheWayIsGone) {
     std::filesystem::create_directories(File());
     EXPECT_FALSE(Open().Open());
     for (int i = 0; i < 10'000; ++i)
@@ -354,7 +354,7 @@ TEST_F(OutboxTest, StoresAgainOnceADirectoryThatWasInTheWayIsGone) {
     EXPECT_TRUE(Append());
 }
 
-TEST_F(OutboxTest, DoesNotLookAtAFailingFileMoreOftenThanItsInterval) {
+TEST_F(TheOutbox, DoesNotLookAtAFailingFileMoreOftenThanItsInterval) {
     m_settings.file.reopenInterval = 1h;
     std::filesystem::create_directories(File());
     Open();
@@ -362,7 +362,7 @@ TEST_F(OutboxTest, DoesNotLookAtAFailingFileMoreOftenThanItsInterval) {
     EXPECT_FALSE(Append());
 }
 
-TEST_F(OutboxTest, WaitsForALockOnceAndNotForEveryEvent) {
+TEST_F(TheOutbox, WaitsForALockOnceAndNotForEveryEvent) {
     Open();
     Append();
     SQLite::Database other(File(), SQLite::OPEN_READWRITE);
@@ -378,7 +378,7 @@ TEST_F(OutboxTest, WaitsForALockOnceAndNotForEveryEvent) {
     EXPECT_EQ(Told::Failures().Count("outbox file: "), 2) << "its beginning and its end";
 }
 
-TEST_F(OutboxTest, OpensAnExistingFileWhileAnotherProcessHoldsTheLock) {
+TEST_F(TheOutbox, OpensAnExistingFileWhileAnotherProcessHoldsTheLock) {
     Open();
     Append();
     SQLite::Database other(File(), SQLite::OPEN_READWRITE);
@@ -387,7 +387,7 @@ TEST_F(OutboxTest, OpensAnExistingFileWhileAnotherProcessHoldsTheLock) {
     other.exec("COMMIT");
 }
 
-TEST_F(OutboxTest, WaitsForALockOnceAndNotForEveryOpening) {
+TEST_F(TheOutbox, WaitsForALockOnceAndNotForEveryOpening) {
     std::filesystem::create_directories(m_path);
     SQLite::Database other(File(), SQLite::OPEN_READWRITE | SQLite::OPEN_CREATE);
     other.exec("PRAGMA journal_mode = WAL"); // empty, so that opening has to write
@@ -404,7 +404,7 @@ TEST_F(OutboxTest, WaitsForALockOnceAndNotForEveryOpening) {
     EXPECT_TRUE(m_outbox->Open());
 }
 
-TEST_F(OutboxTest, StoresAnEventOnceTheLockIsReleasedWithinThePatience) {
+TEST_F(TheOutbox, StoresAnEventOnceTheLockIsReleasedWithinThePatience) {
     m_settings.file.lockPatience = 20s;
     Open();
     SQLite::Database other(File(), SQLite::OPEN_READWRITE);
@@ -419,7 +419,7 @@ TEST_F(OutboxTest, StoresAnEventOnceTheLockIsReleasedWithinThePatience) {
     releaser.join();
 }
 
-TEST_F(OutboxTest, SurvivesAFullDiskWithoutCallingItDamageAndGoesOnWhenThereIsSpace) {
+TEST_F(TheOutbox, SurvivesAFullDiskWithoutCallingItDamageAndGoesOnWhenThereIsSpace) {
     std::filesystem::create_directories(m_path);
     const auto result = RunOnSmallDisk(m_path, 400'000, [this] {
         Open();
@@ -448,7 +448,7 @@ TEST_F(OutboxTest, SurvivesAFullDiskWithoutCallingItDamageAndGoesOnWhenThereIsSp
     EXPECT_EQ(result, SmallDiskResult::Passed);
 }
 
-TEST_F(OutboxTest, OpensLaterOnADiskThatIsFullAtFirst) {
+TEST_F(TheOutbox, OpensLaterOnADiskThatIsFullAtFirst) {
     std::filesystem::create_directories(m_path);
     const auto result = RunOnSmallDisk(m_path, 64'000, [this] {
         std::ofstream(m_path + "/filler") << std::string(100'000, 'x');
@@ -465,7 +465,7 @@ TEST_F(OutboxTest, OpensLaterOnADiskThatIsFullAtFirst) {
     EXPECT_EQ(result, SmallDiskResult::Passed);
 }
 
-TEST_F(OutboxTest, TakesEventsFromSeveralThreads) {
+TEST_F(TheOutbox, TakesEventsFromSeveralThreads) {
     Open();
     std::vector<std::thread> threads;
     for (int i = 0; i < 4; ++i)

@@ -11,7 +11,7 @@ using namespace MetrikSdk::process;
 
 namespace {
 
-class MembershipsTest : public ::testing::Test {
+class TheMemberships : public ::testing::Test {
 protected:
     Membership Module(const std::string& version) {
         return {m_registry.Acquire(m_directory.Path()), &Told::OnFailure, nullptr, version, "name"};
@@ -24,7 +24,7 @@ protected:
 
 } // namespace
 
-TEST_F(MembershipsTest, AreOneForModulesThatHaveAllInCommon) {
+TEST_F(TheMemberships, AreOneForModulesThatHaveAllInCommon) {
     auto& members = m_registry.Members();
     auto one = members.Join(Module("1"));
     auto same = members.Join(Module("1"));
@@ -35,7 +35,7 @@ TEST_F(MembershipsTest, AreOneForModulesThatHaveAllInCommon) {
         members.Leave(*membership);
 }
 
-TEST_F(MembershipsTest, TellTheirCallbacksUntilTheLastModuleLeft) {
+TEST_F(TheMemberships, TellTheirCallbacksUntilTheLastModuleLeft) {
     Told::Forget();
     auto& members = m_registry.Members();
     const auto engine = m_registry.Acquire(m_directory.Path());
@@ -48,7 +48,7 @@ TEST_F(MembershipsTest, TellTheirCallbacksUntilTheLastModuleLeft) {
     EXPECT_EQ(Told::Failures().All(), std::vector<std::string>{"outbox file: first"});
 }
 
-TEST_F(MembershipsTest, LeaveTheTextsOutOnceTooManyModulesBringTheirOwn) {
+TEST_F(TheMemberships, LeaveTheTextsOutOnceTooManyModulesBringTheirOwn) {
     auto& members = m_registry.Members();
     std::vector<std::shared_ptr<const Membership>> joined;
     for (std::size_t i = 0; i < Memberships::MAX_WITH_TEXTS; ++i)

@@ -12,14 +12,14 @@ using namespace MetrikSdk;
 
 namespace {
 
-class OutboxRegistryTest : public testing::Test {
+class TheOutboxRegistry : public testing::Test {
 protected:
     TemporaryDirectory m_directory;
     process::OutboxRegistry m_registry{OutboxSettings{}, [](const char*) -> const char* { return nullptr; },
                                        [this] { return m_directory.Path(); }};
 };
 
-TEST_F(OutboxRegistryTest, SharesOneOutboxForADirectoryHoweverItIsWritten) {
+TEST_F(TheOutboxRegistry, SharesOneOutboxForADirectoryHoweverItIsWritten) {
     const auto path = m_directory.Path();
     std::filesystem::create_directory_symlink(path, path + "/link");
     const auto one = m_registry.Acquire(path + "/db");
@@ -28,14 +28,14 @@ TEST_F(OutboxRegistryTest, SharesOneOutboxForADirectoryHoweverItIsWritten) {
     EXPECT_NE(m_registry.Acquire(path + "/other"), one);
 }
 
-TEST_F(OutboxRegistryTest, HasNoneUntilADirectoryWasGiven) {
+TEST_F(TheOutboxRegistry, HasNoneUntilADirectoryWasGiven) {
     EXPECT_EQ(m_registry.Acquire(""), nullptr);
     EXPECT_EQ(m_registry.Acquire("relative/path"), nullptr);
     EXPECT_TRUE(m_registry.ReportNoDirectory());
     EXPECT_FALSE(m_registry.ReportNoDirectory()) << "told once a minute";
 }
 
-TEST_F(OutboxRegistryTest, FallsBackToTheFirstDirectoryAlsoAfterItsRelease) {
+TEST_F(TheOutboxRegistry, FallsBackToTheFirstDirectoryAlsoAfterItsRelease) {
     const auto path = m_directory.Path() + "/first";
     auto first = m_registry.Acquire(path);
     const auto second = m_registry.Acquire(m_directory.Path() + "/second");
@@ -47,7 +47,7 @@ TEST_F(OutboxRegistryTest, FallsBackToTheFirstDirectoryAlsoAfterItsRelease) {
     EXPECT_EQ(again, m_registry.Acquire(path));
 }
 
-TEST_F(OutboxRegistryTest, TellsTheSameCauseOnceForAllOutboxes) {
+TEST_F(TheOutboxRegistry, TellsTheSameCauseOnceForAllOutboxes) {
     Told::Forget();
     std::vector<std::shared_ptr<process::OutboxEngine>> engines;
     for (const std::string name : {"/1", "/2", "/3"}) {
@@ -61,7 +61,7 @@ TEST_F(OutboxRegistryTest, TellsTheSameCauseOnceForAllOutboxes) {
     EXPECT_FALSE(m_registry.RecordFailure(report::Cause::Init, "why"));
 }
 
-TEST_F(OutboxRegistryTest, BoundsTheOutboxesOfAProcess) {
+TEST_F(TheOutboxRegistry, BoundsTheOutboxesOfAProcess) {
     const auto first = m_registry.Acquire(m_directory.Path() + "/0");
     std::vector<std::shared_ptr<process::OutboxEngine>> held;
     for (int i = 1; i < 1000; ++i)
@@ -71,7 +71,7 @@ TEST_F(OutboxRegistryTest, BoundsTheOutboxesOfAProcess) {
     EXPECT_EQ(held.back(), first);
 }
 
-TEST_F(OutboxRegistryTest, ForgetsAnOutboxThatNobodyUses) {
+TEST_F(TheOutboxRegistry, ForgetsAnOutboxThatNobodyUses) {
     const auto first = m_registry.Acquire(m_directory.Path() + "/0");
     for (int i = 1; i < 100; ++i) {
         auto engine = m_registry.Acquire(m_directory.Path() + "/" + std::to_string(i));

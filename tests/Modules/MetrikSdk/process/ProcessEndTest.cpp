@@ -19,9 +19,9 @@ constexpr int ROUNDS = 50;
 #endif
 
 /// What happens to the outbox when its process ends, in every way in which processes end.
-class ProcessEndTest : public PluginFixture {
+class TheProcessEnd : public PluginFixture {
 protected:
-    ProcessEndTest() { Configure("ENDPOINT", m_server.Url()); }
+    TheProcessEnd() { Configure("ENDPOINT", m_server.Url()); }
 
     void AnswerWith(const Reply& reply) {
         const std::lock_guard lock(m_mutex);
@@ -80,7 +80,7 @@ protected:
     std::mt19937 m_random{std::random_device{}()};
 };
 
-TEST_F(ProcessEndTest, LosesNothingThatWasAcceptedBeforeFiftyKills) {
+TEST_F(TheProcessEnd, LosesNothingThatWasAcceptedBeforeFiftyKills) {
     std::vector<int> accepted;
     for (int i = 0; i < ROUNDS; ++i) {
         const auto after = i % 4 == 0 ? KillAfter::AnEvent : KillAfter::ARequest;
@@ -106,36 +106,36 @@ TEST_F(ProcessEndTest, LosesNothingThatWasAcceptedBeforeFiftyKills) {
     RecordProperty("accepted", static_cast<int>(accepted.size()));
 }
 
-TEST_F(ProcessEndTest, ExitsCleanlyWhileItUploads) {
+TEST_F(TheProcessEnd, ExitsCleanlyWhileItUploads) {
     ExpectACleanExit("exit");
 }
 
-TEST_F(ProcessEndTest, ExitsCleanlyWhileTheCollectorKeepsItWaiting) {
+TEST_F(TheProcessEnd, ExitsCleanlyWhileTheCollectorKeepsItWaiting) {
     Reply never;
     never.manner = Reply::Manner::Never;
     AnswerWith(never);
     ExpectACleanExit("exit");
 }
 
-TEST_F(ProcessEndTest, ExitsCleanlyWhenTheLoaderIsDestroyedMeanwhile) {
+TEST_F(TheProcessEnd, ExitsCleanlyWhenTheLoaderIsDestroyedMeanwhile) {
     Reply never;
     never.manner = Reply::Manner::Never;
     AnswerWith(never);
     ExpectACleanExit("static");
 }
 
-TEST_F(ProcessEndTest, ExitsCleanlyFromTheHandlerOfACrashOnAnotherThread) {
+TEST_F(TheProcessEnd, ExitsCleanlyFromTheHandlerOfACrashOnAnotherThread) {
     ExpectACleanExit("crash");
 }
 
-TEST_F(ProcessEndTest, ExitsCleanlyFromTheUploadersOwnThread) {
+TEST_F(TheProcessEnd, ExitsCleanlyFromTheUploadersOwnThread) {
     Reply busy;
     busy.status = 503;
     AnswerWith(busy);
     ExpectACleanExit("callback");
 }
 
-TEST_F(ProcessEndTest, SharesItsFileWithAnotherProcessWithoutGapsOrRepeats) {
+TEST_F(TheProcessEnd, SharesItsFileWithAnotherProcessWithoutGapsOrRepeats) {
     SetVariable("OTEL_SDK_DISABLED", "true");
     Start();
     ChildProgram child(m_directory.Path(), 1'000'000, "exit");

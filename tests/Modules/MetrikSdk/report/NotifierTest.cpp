@@ -22,20 +22,20 @@ void Throw(std::string, std::string) {
     throw std::runtime_error("a bad listener");
 }
 
-class NotifierTest : public testing::Test {
+class TheNotifier : public testing::Test {
 protected:
-    NotifierTest() { g_told.clear(); }
+    TheNotifier() { g_told.clear(); }
     Notifier m_notifier{1min};
 };
 
-TEST_F(NotifierTest, CallsAFunctionOnceHoweverManyModulesBroughtIt) {
+TEST_F(TheNotifier, CallsAFunctionOnceHoweverManyModulesBroughtIt) {
     for (int i = 0; i < 10'000; ++i)
         m_notifier.Subscribe(&Listen, nullptr);
     m_notifier.TellFailure({Cause::Upload, "no route"});
     EXPECT_EQ(g_told, std::vector<std::string>{"upload-no route"});
 }
 
-TEST_F(NotifierTest, CallsAFunctionUntilItsLastModuleIsGone) {
+TEST_F(TheNotifier, CallsAFunctionUntilItsLastModuleIsGone) {
     m_notifier.Subscribe(&Listen, &Listen);
     m_notifier.Subscribe(&Listen, &Listen);
     m_notifier.Unsubscribe(&Listen, &Listen);
@@ -46,14 +46,14 @@ TEST_F(NotifierTest, CallsAFunctionUntilItsLastModuleIsGone) {
     EXPECT_EQ(g_told, std::vector<std::string>{"upload-1"});
 }
 
-TEST_F(NotifierTest, SurvivesAListenerThatThrows) {
+TEST_F(TheNotifier, SurvivesAListenerThatThrows) {
     m_notifier.Subscribe(&Throw, nullptr);
     m_notifier.Subscribe(&Listen, nullptr);
     m_notifier.TellFailure({Cause::File, "disk full"});
     EXPECT_EQ(g_told.size(), 1U);
 }
 
-TEST_F(NotifierTest, IgnoresMissingFunctions) {
+TEST_F(TheNotifier, IgnoresMissingFunctions) {
     m_notifier.Subscribe(nullptr, nullptr);
     m_notifier.TellFailure({Cause::File, "disk full"});
     m_notifier.TellSuccess("upload", "1");

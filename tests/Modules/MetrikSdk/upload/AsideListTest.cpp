@@ -16,7 +16,7 @@ StoredEvent Event(std::int64_t row) {
     return event;
 }
 
-class AsideListTest : public testing::Test {
+class TheAsideList : public testing::Test {
 protected:
     /// The row that is due.
     std::int64_t Due(WallTime now) const { return m_list.Due(now).value_or(EventKey{}).row; }
@@ -25,7 +25,7 @@ protected:
     upload::AsideList m_list{m_settings};
 };
 
-TEST_F(AsideListTest, TriesAnEventAtOnceWhenOthersWereTakenForTheFirstTime) {
+TEST_F(TheAsideList, TriesAnEventAtOnceWhenOthersWereTakenForTheFirstTime) {
     m_list.Add(Event(7), NOW);
     EXPECT_EQ(Due(NOW), 0);
     EXPECT_EQ(m_list.UntilDue(NOW), 1min);
@@ -34,7 +34,7 @@ TEST_F(AsideListTest, TriesAnEventAtOnceWhenOthersWereTakenForTheFirstTime) {
     EXPECT_EQ(m_list.Due(NOW)->uuid, "uuid-7");
 }
 
-TEST_F(AsideListTest, CountsNoStrikeWhileNothingIsTaken) {
+TEST_F(TheAsideList, CountsNoStrikeWhileNothingIsTaken) {
     m_list.Add(Event(7), NOW);
     for (int i = 0; i < 1000; ++i)
         EXPECT_EQ(m_list.Failed(7, NOW).count, 0);
@@ -43,7 +43,7 @@ TEST_F(AsideListTest, CountsNoStrikeWhileNothingIsTaken) {
     EXPECT_EQ(m_list.Failed(7, NOW).count, 1) << "nothing was taken since the try before";
 }
 
-TEST_F(AsideListTest, DoublesThePauseUpToTheLongestAndIsOutAfterAllStrikes) {
+TEST_F(TheAsideList, DoublesThePauseUpToTheLongestAndIsOutAfterAllStrikes) {
     m_list.Add(Event(7), NOW);
     std::vector<std::chrono::milliseconds> pauses;
     for (int strike = 1; strike <= m_settings.strikes; ++strike) {
@@ -55,12 +55,12 @@ TEST_F(AsideListTest, DoublesThePauseUpToTheLongestAndIsOutAfterAllStrikes) {
               (std::vector<std::chrono::milliseconds>{1min, 2min, 4min, 8min, 16min, 32min, 1h, 1h, 1h, 1h}));
 }
 
-TEST_F(AsideListTest, DoesNotHoldAnEventWhenTheClockIsSetBack) {
+TEST_F(TheAsideList, DoesNotHoldAnEventWhenTheClockIsSetBack) {
     m_list.Add(Event(7), NOW);
     EXPECT_EQ(Due(NOW - 24h), 7);
 }
 
-TEST_F(AsideListTest, ForgetsWhatIsRemoved) {
+TEST_F(TheAsideList, ForgetsWhatIsRemoved) {
     m_list.Add(Event(7), NOW);
     m_list.Add(Event(8), NOW);
     m_list.Remove(7);

@@ -38,9 +38,9 @@ otlp::HttpResult Status(long status) {
     return result;
 }
 
-class UploadCycleTest : public testing::Test {
+class TheUploadCycle : public testing::Test {
 protected:
-    UploadCycleTest() {
+    TheUploadCycle() {
         Told::Forget();
         m_notifier.Subscribe(&Told::OnFailure, &Told::OnSuccess);
         AnswerAlways(Status(200));
@@ -111,14 +111,14 @@ protected:
     WallTime m_clock = WallNow() + 1h; ///< Of RunFor.
 };
 
-TEST_F(UploadCycleTest, SleepsUntilAnEventComesWhenTheOutboxIsEmpty) {
+TEST_F(TheUploadCycle, SleepsUntilAnEventComesWhenTheOutboxIsEmpty) {
     const auto pause = m_cycle.Pass(WallNow());
     EXPECT_EQ(pause.untilWaiting, 1);
     EXPECT_GE(pause.duration, 1s);
     EXPECT_TRUE(m_sender.bodies.empty());
 }
 
-TEST_F(UploadCycleTest, GivesAnEventCompanyForASecondUnlessTheBatchIsFull) {
+TEST_F(TheUploadCycle, GivesAnEventCompanyForASecondUnlessTheBatchIsFull) {
     Append(1);
     const auto pause = m_cycle.Pass(WallNow());
     EXPECT_GT(pause.duration, 0ms);
@@ -130,7 +130,7 @@ TEST_F(UploadCycleTest, GivesAnEventCompanyForASecondUnlessTheBatchIsFull) {
     EXPECT_EQ(m_sender.bodies.size(), 1U);
 }
 
-TEST_F(UploadCycleTest, DeletesWhatWasTakenAndTellsTheSuccess) {
+TEST_F(TheUploadCycle, DeletesWhatWasTakenAndTellsTheSuccess) {
     Append(600);
     RunUntilPause();
     EXPECT_EQ(m_sender.bodies.size(), 2U);
@@ -140,7 +140,7 @@ TEST_F(UploadCycleTest, DeletesWhatWasTakenAndTellsTheSuccess) {
     EXPECT_TRUE(Told::Failures().All().empty());
 }
 
-TEST_F(UploadCycleTest, KeepsTheBatchAndWaitsLongerEachTime) {
+TEST_F(TheUploadCycle, KeepsTheBatchAndWaitsLongerEachTime) {
     Append(3);
     AnswerAlways(Status(503));
     EXPECT_EQ(RunUntilPause().duration, 500ms);
@@ -159,7 +159,7 @@ TEST_F(UploadCycleTest, KeepsTheBatchAndWaitsLongerEachTime) {
     EXPECT_EQ(RunUntilPause().duration, 500ms) << "a success begins anew";
 }
 
-TEST_F(UploadCycleTest, SendsTheSameEventsWithTheSameIdsAgain) {
+TEST_F(TheUploadCycle, SendsTheSameEventsWithTheSameIdsAgain) {
     Append(3);
     AnswerAlways(Status(429));
     RunUntilPause();
@@ -167,7 +167,7 @@ TEST_F(UploadCycleTest, SendsTheSameEventsWithTheSameIdsAgain) {
     EXPECT_EQ(m_sender.bodies.at(0), m_sender.bodies.at(1));
 }
 
-TEST_F(UploadCycleTest, DeletesAPartialSuccessAndReportsTheRefusedCount) {
+TEST_F(TheUploadCycle, DeletesAPartialSuccessAndReportsTheRefusedCount) {
     Append(10);
     auto partial = Status(200);
     partial.body = R"({"partialSuccess":{"rejectedLogRecords":"4","errorMessage":"too old"}})";
@@ -181,7 +181,7 @@ TEST_F(UploadCycleTest, DeletesAPartialSuccessAndReportsTheRefusedCount) {
         Told::Failures().Count("events refused: The collector rejected 4 of 10 events for good: too old"), 1);
 }
 
-TEST_F(UploadCycleTest, MovesTheOnePoisonousEventToTheDeadLettersAndDeliversTheOthers) {
+TEST_F(TheUploadCycle, MovesTheOnePoisonousEventToTheDeadLettersAndDeliversTheOthers) {
     Append(500);
     Refuse({321});
     RunUntilPause();
@@ -192,7 +192,7 @@ TEST_F(UploadCycleTest, MovesTheOnePoisonousEventToTheDeadLettersAndDeliversTheO
     EXPECT_LE(m_sender.bodies.size(), 20U);
 }
 
-TEST_F(UploadCycleTest, FindsSeveralPoisonousEvents) {
+TEST_F(TheUploadCycle, FindsSeveralPoisonousEvents) {
     Append(500);
     Refuse({0, 1, 250, 499});
     RunUntilPause();
@@ -208,7 +208,7 @@ otlp::HttpResult TimedOut() {
     return result;
 }
 
-TEST_F(UploadCycleTest, LetsOthersGoPastAnEventToWhichTheCollectorSaysLaterForEver) {
+TEST_F(TheUploadCycle, LetsOthersGoPastAnEventToWhichTheCollectorSaysLaterForEver) {
     Append(500);
     AnswerLaterTo({321, 322}, Status(503));
     RunFor(1h);
@@ -222,7 +222,7 @@ TEST_F(UploadCycleTest, LetsOthersGoPastAnEventToWhichTheCollectorSaysLaterForEv
         2);
 }
 
-TEST_F(UploadCycleTest, MovesSuchAnEventToTheDeadLettersAtLast) {
+TEST_F(TheUploadCycle, MovesSuchAnEventToTheDeadLettersAtLast) {
     Append(20);
     AnswerLaterTo({13}, TimedOut());
     RunFor(6h, [&] { Append(1); });
@@ -236,7 +236,7 @@ TEST_F(UploadCycleTest, MovesSuchAnEventToTheDeadLettersAtLast) {
     EXPECT_EQ(file.execAndGet("SELECT payload FROM dead_letter").getString(), NumberedPayload(13));
 }
 
-TEST_F(UploadCycleTest, DeliversAnEventThatSteppedAsideOnceTheCollectorTakesIt) {
+TEST_F(TheUploadCycle, DeliversAnEventThatSteppedAsideOnceTheCollectorTakesIt) {
     Append(20);
     AnswerLaterTo({13}, Status(503));
     RunFor(10min);
@@ -246,7 +246,7 @@ TEST_F(UploadCycleTest, DeliversAnEventThatSteppedAsideOnceTheCollectorTakesIt) 
     EXPECT_EQ(m_outbox.Status().delivered, 20);
 }
 
-TEST_F(UploadCycleTest, BlamesNoEventWhileACollectorIsAwayForADay) {
+TEST_F(TheUploadCycle, BlamesNoEventWhileACollectorIsAwayForADay) {
     Append(600);
     for (const auto& away : {Status(503), TimedOut()}) {
         AnswerAlways(away);
@@ -260,7 +260,7 @@ TEST_F(UploadCycleTest, BlamesNoEventWhileACollectorIsAwayForADay) {
     EXPECT_LE(m_sender.bodies.size() - before, 600U);
 }
 
-TEST_F(UploadCycleTest, KeepsItsBatchesWhileTheCollectorCannotBeReached) {
+TEST_F(TheUploadCycle, KeepsItsBatchesWhileTheCollectorCannotBeReached) {
     Append(600);
     otlp::HttpResult unreachable;
     unreachable.fault = "no route";
@@ -272,7 +272,7 @@ TEST_F(UploadCycleTest, KeepsItsBatchesWhileTheCollectorCannotBeReached) {
     EXPECT_EQ(m_sender.bodies.size() - before, 2U);
 }
 
-TEST_F(UploadCycleTest, GetsEverythingOverALineThatIsTooSlowForAFullBatch) {
+TEST_F(TheUploadCycle, GetsEverythingOverALineThatIsTooSlowForAFullBatch) {
     Append(2000);
     m_sender.answer = [&](const auto&) {
         return m_sender.bodies.back().size() > 100'000 ? TimedOut() : Status(200);
@@ -282,7 +282,7 @@ TEST_F(UploadCycleTest, GetsEverythingOverALineThatIsTooSlowForAFullBatch) {
     EXPECT_LE(m_sender.bodies.size(), 40U);
 }
 
-TEST_F(UploadCycleTest, StaysBelowTheLengthThatWasRefusedOnce) {
+TEST_F(TheUploadCycle, StaysBelowTheLengthThatWasRefusedOnce) {
     Append(2000);
     int tooLarge = 0;
     m_sender.answer = [&](const auto&) {
@@ -295,7 +295,7 @@ TEST_F(UploadCycleTest, StaysBelowTheLengthThatWasRefusedOnce) {
     EXPECT_LE(tooLarge, 3);
 }
 
-TEST_F(UploadCycleTest, LosesNoEventToAWrongConfigurationAndTellsWhatToLookAt) {
+TEST_F(TheUploadCycle, LosesNoEventToAWrongConfigurationAndTellsWhatToLookAt) {
     Append(100);
     for (const long status : {401, 403, 404, 405, 407, 415}) {
         AnswerAlways(Status(status));
@@ -312,14 +312,14 @@ TEST_F(UploadCycleTest, LosesNoEventToAWrongConfigurationAndTellsWhatToLookAt) {
     EXPECT_EQ(Told::Failures().All().back(), "upload: http://collector: events are taken again");
 }
 
-TEST_F(UploadCycleTest, LetsOthersGoPastAnEventThatAFirewallForbids) {
+TEST_F(TheUploadCycle, LetsOthersGoPastAnEventThatAFirewallForbids) {
     Append(100);
     AnswerLaterTo({13}, Status(403));
     RunFor(1h);
     EXPECT_EQ(m_outbox.Status().delivered, 99);
 }
 
-TEST_F(UploadCycleTest, HeedsARetryAfterInEveryAnswer) {
+TEST_F(TheUploadCycle, HeedsARetryAfterInEveryAnswer) {
     for (const long status : {200, 400, 404, 413, 503}) {
         Append(2);
         auto answer = Status(status);
@@ -333,7 +333,7 @@ TEST_F(UploadCycleTest, HeedsARetryAfterInEveryAnswer) {
     }
 }
 
-TEST_F(UploadCycleTest, TellsWhatTheCollectorHasToSayAboutEventsThatItTook) {
+TEST_F(TheUploadCycle, TellsWhatTheCollectorHasToSayAboutEventsThatItTook) {
     const auto answer = [&](const std::string& partialSuccess) {
         Append(10);
         auto partial = Status(200);
@@ -352,7 +352,7 @@ TEST_F(UploadCycleTest, TellsWhatTheCollectorHasToSayAboutEventsThatItTook) {
     EXPECT_EQ(m_outbox.Status().refused, 10);
 }
 
-TEST_F(UploadCycleTest, SlowsDownWhenEverythingIsRefused) {
+TEST_F(TheUploadCycle, SlowsDownWhenEverythingIsRefused) {
     Append(500);
     AnswerAlways(Status(400));
     EXPECT_EQ(RunUntilPause().duration, 500ms);
@@ -364,7 +364,7 @@ TEST_F(UploadCycleTest, SlowsDownWhenEverythingIsRefused) {
     EXPECT_EQ(m_outbox.Status().waiting, 0);
 }
 
-TEST_F(UploadCycleTest, WaitsInTheMiddleOfASearchWithoutLosingIt) {
+TEST_F(TheUploadCycle, WaitsInTheMiddleOfASearchWithoutLosingIt) {
     Append(8);
     Refuse({5});
     m_cycle.Pass(WallNow() + 1h);
@@ -376,7 +376,7 @@ TEST_F(UploadCycleTest, WaitsInTheMiddleOfASearchWithoutLosingIt) {
     EXPECT_EQ(m_outbox.Status().deadLettered, 1);
 }
 
-TEST_F(UploadCycleTest, DeletesWhatWasDeliveredBeforeItSendsAnythingElse) {
+TEST_F(TheUploadCycle, DeletesWhatWasDeliveredBeforeItSendsAnythingElse) {
     Append(2);
     SQLite::Database other(m_directory.Path() + "/MetrikOutbox.db", SQLite::OPEN_READWRITE);
     m_sender.answer = [&](const auto&) {
@@ -392,7 +392,7 @@ TEST_F(UploadCycleTest, DeletesWhatWasDeliveredBeforeItSendsAnythingElse) {
     EXPECT_EQ(m_outbox.Status().delivered, 2);
 }
 
-TEST_F(UploadCycleTest, DoesNotDropForACapWhatWasDeliveredAndIsNotDeletedYet) {
+TEST_F(TheUploadCycle, DoesNotDropForACapWhatWasDeliveredAndIsNotDeletedYet) {
     const TemporaryDirectory directory;
     m_settings = SettingsFor(directory.Path());
     m_settings.caps.maxWaitingBytes = 10'000;
@@ -417,7 +417,7 @@ TEST_F(UploadCycleTest, DoesNotDropForACapWhatWasDeliveredAndIsNotDeletedYet) {
     EXPECT_EQ(outbox.Status().delivered, 5);
 }
 
-TEST_F(UploadCycleTest, SaysNothingWhenARequestEndsBecauseItIsToStop) {
+TEST_F(TheUploadCycle, SaysNothingWhenARequestEndsBecauseItIsToStop) {
     Append(1);
     otlp::HttpResult abandoned;
     abandoned.fault = "stopped";

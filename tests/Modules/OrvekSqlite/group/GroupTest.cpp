@@ -13,7 +13,7 @@ namespace {
 
 using OrvekSqlite::group::Clock;
 
-class GroupTest : public SqliteFixture {
+class TheGroup : public SqliteFixture {
 protected:
     void SetUp() override {
         SqliteFixture::SetUp();
@@ -51,13 +51,13 @@ protected:
     OrvekSqlite::group::Group m_group{m_file, SeldomTriedAgain()};
 };
 
-TEST_F(GroupTest, IsCommittedByTheNextStatementOnceItIsDueAlsoByOneThatIsRefused) {
+TEST_F(TheGroup, IsCommittedByTheNextStatementOnceItIsDueAlsoByOneThatIsRefused) {
     OpenDueGroup();
     EXPECT_THROW(m_group.Execute("nonsense"), SQLite::Exception);
     EXPECT_FALSE(m_group.Due());
 }
 
-TEST_F(GroupTest, ThatIsUncommittedIsNotTriedAgainByAStatementBeforeItsTime) {
+TEST_F(TheGroup, ThatIsUncommittedIsNotTriedAgainByAStatementBeforeItsTime) {
     OpenDueGroup();
     const auto aside = Store() + ".aside";
     std::filesystem::rename(Store(), aside);
@@ -69,7 +69,7 @@ TEST_F(GroupTest, ThatIsUncommittedIsNotTriedAgainByAStatementBeforeItsTime) {
     EXPECT_FALSE(m_group.Due());
 }
 
-TEST_F(GroupTest, IsEmptyOnceTheTableRefusesItsOnlyStatement) {
+TEST_F(TheGroup, IsEmptyOnceTheTableRefusesItsOnlyStatement) {
     ASSERT_TRUE(WaitUntil([&] {
         m_group.Commit();
         m_group.Execute(Insert("twice"));

@@ -14,9 +14,9 @@ using ::testing::ElementsAre;
 namespace {
 
 /// A pipe that the test writes and the reader reads.
-class LineReaderTest : public ::testing::Test {
+class TheLineReader : public ::testing::Test {
 protected:
-    LineReaderTest() {
+    TheLineReader() {
         int ends[2];
         if (::pipe(ends) != 0)
             throw std::runtime_error("no pipe");
@@ -45,19 +45,19 @@ protected:
 
 } // namespace
 
-TEST_F(LineReaderTest, TakesTheLastLineWithAndWithoutItsLineFeed) {
+TEST_F(TheLineReader, TakesTheLastLineWithAndWithoutItsLineFeed) {
     EXPECT_THAT(Lines("one\n\ntwo"), ElementsAre("one", "", "two"));
 }
 
-TEST_F(LineReaderTest, TakesALineFeedAtTheEndForAnEnd) {
+TEST_F(TheLineReader, TakesALineFeedAtTheEndForAnEnd) {
     EXPECT_THAT(Lines("one\n"), ElementsAre("one"));
 }
 
-TEST_F(LineReaderTest, KeepsZeroBytesAndCarriageReturns) {
+TEST_F(TheLineReader, KeepsZeroBytesAndCarriageReturns) {
     EXPECT_THAT(Lines(std::string("a\0b\r\n", 5)), ElementsAre(std::string("a\0b\r", 4)));
 }
 
-TEST_F(LineReaderTest, GivesALineBeforeTheNextOneIsWritten) {
+TEST_F(TheLineReader, GivesALineBeforeTheNextOneIsWritten) {
     LineReader reader(m_readEnd.Number());
     Write("one\ntw");
     EXPECT_TRUE(reader.Next());
@@ -67,7 +67,7 @@ TEST_F(LineReaderTest, GivesALineBeforeTheNextOneIsWritten) {
     EXPECT_EQ(reader.Text(), "two");
 }
 
-TEST_F(LineReaderTest, KeepsTheBeginningOfALineOfAHundredMegabytes) {
+TEST_F(TheLineReader, KeepsTheBeginningOfALineOfAHundredMegabytes) {
     constexpr std::size_t CHUNKS = 1600;
     const std::string chunk(64 * 1024, 'x');
     OtherThread writer([&] {
@@ -88,7 +88,7 @@ TEST_F(LineReaderTest, KeepsTheBeginningOfALineOfAHundredMegabytes) {
     EXPECT_FALSE(reader.Next());
 }
 
-TEST_F(LineReaderTest, TellsThatItCouldNotRead) {
+TEST_F(TheLineReader, TellsThatItCouldNotRead) {
     const SystemTool::IO::Descriptor directory(::open("/", O_RDONLY | O_DIRECTORY | O_CLOEXEC));
     LineReader reader(directory.Number());
     EXPECT_FALSE(reader.Next());
