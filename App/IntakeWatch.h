@@ -10,8 +10,8 @@
 
 namespace SyncServiceReport {
 
-/// Tells the ledger what only the receiver sees: each datagram, also an empty or a cut one, and what the kernel dropped.
-/// Keeps the ledger's marks in passing.
+/// Tells the ledger what only the receiver sees: each datagram, also an empty or a cut one, and what the
+/// kernel dropped. Keeps the ledger's marks in passing.
 ///
 /// Threads: the receiving thread only. Keeps both references without owning them.
 class IntakeWatch final : public DatagramWatch {

@@ -25,9 +25,10 @@ namespace {
 
 constexpr mode_t PID_FILE_MODE = 0666; // of every user's instance: the lock is the machine's
 
-/// After this long in the handler, SIGALRM's default action ends the process. The fault may have come while this very
-/// thread held a lock that the trace needs, the allocator's for one; a service that hangs there would keep the instance
-/// lock and the port from its successor for ever. Long enough for a trace on a slow disk.
+/// After this long in the handler, SIGALRM's default action ends the process. The fault may have come while
+/// this very thread held a lock that the trace needs, the allocator's for one; a service that hangs there
+/// would keep the instance lock and the port from its successor for ever. Long enough for a trace on a slow
+/// disk.
 constexpr unsigned CRASH_DEADLINE_SECONDS = 5;
 
 constexpr std::size_t FRAME_ENTRIES = 64;
@@ -41,8 +42,8 @@ struct BackTrace {
     void* overrun[FRAME_BYTES - FRAME_ENTRIES];
 };
 
-/// Locks the file; true, with the reason in errno, when another process holds the lock. One that fails for another
-/// reason (a file system without locks) does not stop the service, deliberately.
+/// Locks the file; true, with the reason in errno, when another process holds the lock. One that fails for
+/// another reason (a file system without locks) does not stop the service, deliberately.
 bool IsLockedElsewhere(int file) {
     struct flock lock {};
     lock.l_type = F_WRLCK;
@@ -68,7 +69,8 @@ void MiniDump::EnableAutoStack(const std::string& logPath, const std::string& lo
     ::signal(SIGSEGV, OnStackCallBack);
 }
 
-// exit is intended, also while other threads run, and this library's strerror has a text of its own for each thread.
+// exit is intended, also while other threads run, and this library's strerror has a text of its own for each
+// thread.
 // NOLINTBEGIN(concurrency-mt-unsafe)
 
 void MiniDump::OnStackCallBack(int signal) {
@@ -86,8 +88,8 @@ void MiniDump::OnStackCallBack(int signal) {
 bool MiniDump::IsAlreadyRun() {
     ::umask(0);
     const std::string path = Poco::format("/Library/Preferences/hublink/%s.pid", m_strLogName);
-    // Not truncated: an instance that loses must not wipe the winner's id. Not through a link: every user may put one
-    // into that directory, and the file that it names would be emptied.
+    // Not truncated: an instance that loses must not wipe the winner's id. Not through a link: every user may
+    // put one into that directory, and the file that it names would be emptied.
     const int file = ::open(path.c_str(), O_RDWR | O_CREAT | O_NOFOLLOW, PID_FILE_MODE);
     if (file < 0) {
         WriteLog({LogLevel::Info, "IsAlreadyRun", 304}, "Open file failed, error : %s", std::strerror(errno));

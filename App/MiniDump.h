@@ -20,9 +20,9 @@ public:
     /// would drop it. Called once, before any thread is started.
     static bool IsAlreadyRun();
 
-    /// The handler: logs the signal and the frames, and ends the process with exit(0). None of what it does is safe in a
-    /// signal handler; a process that is lost anyway has nothing to lose by trying. When it hangs, SIGALRM ends the
-    /// process after a few seconds.
+    /// The handler: logs the signal and the frames, and ends the process with exit(0). None of what it does
+    /// is safe in a signal handler; a process that is lost anyway has nothing to lose by trying. When it
+    /// hangs, SIGALRM ends the process after a few seconds.
     static void OnStackCallBack(int signal);
 
 private:

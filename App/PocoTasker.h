@@ -43,7 +43,8 @@ public:
         }
     }
 
-    /// Queues a copy of `data`; from any thread, and without waiting. Throws std::bad_alloc, and what copying throws.
+    /// Queues a copy of `data`; from any thread, and without waiting. Throws std::bad_alloc, and what copying
+    /// throws.
     void Produce(const T& data) { m_queue.enqueueNotification(new WorkNotification<T>(data)); }
 
     /// Drops what is waiting, lets the consumer finish the value it works on, and joins it. Returns at once
@@ -65,7 +66,8 @@ protected:
     Poco::Thread m_thread;
 
 private:
-    /// The next item, waited for. To wait takes memory; where there is none, the thread looks again later and does not end.
+    /// The next item, waited for. To wait takes memory; where there is none, the thread looks again later and
+    /// does not end.
     Poco::Notification* Next() {
         constexpr long NO_MEMORY_PAUSE_MS = 10;
         try {

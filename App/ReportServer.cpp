@@ -66,7 +66,8 @@ bool ReportServer::Recv(const std::string& msg) {
 }
 
 bool ReportServer::Consume(const std::string& msg) {
-    // How a report ended is named where that is known; what is named here is what a destination's answer alone tells.
+    // How a report ended is named where that is known; what is named here is what a destination's answer
+    // alone tells.
     const ReportLedger::Handling handling(m_ledger);
     try {
         // A search of the raw text and no parse, deliberately: it is what tells the two kinds of message

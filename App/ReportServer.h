@@ -15,15 +15,17 @@ namespace SyncServiceReport {
 class FrameWorker;
 class MetrikMgr;
 
-/// The service: receives reports, queues them, and routes each one to the analytics side or to the local store.
+/// The service: receives reports, queues them, and routes each one to the analytics side or to the local
+/// store.
 ///
-/// Life: constructed → started → stopped (receiver first, then the queue, whose backlog is dropped) → destroyed.
+/// Life: constructed → started → stopped (receiver first, then the queue, whose backlog is dropped) →
+/// destroyed.
 ///
 /// Ownership: owns both destinations; they point back to it.
 ///
-/// Threads: construction, Start and Stop on the owner's thread; Recv on the receiving thread; Consume, and through it
-/// everything that reads or changes the base information after the start, on the consuming thread. The queue between
-/// the two is all that they share.
+/// Threads: construction, Start and Stop on the owner's thread; Recv on the receiving thread; Consume, and
+/// through it everything that reads or changes the base information after the start, on the consuming thread.
+/// The queue between the two is all that they share.
 ///
 /// Failure: no exception leaves Start or Consume; one is logged and makes the result false.
 class ReportServer : public PocoTasker<std::string>, public UDPServer {
@@ -44,14 +46,15 @@ public:
 
     void Stop();
 
-    /// Counts every report, and what became of it. In memory only, until its owner opens its file, which is before Start.
+    /// Counts every report, and what became of it. In memory only, until its owner opens its file, which is
+    /// before Start.
     ReportLedger::Writer& Ledger() { return m_ledger; }
 
     /// Logs and queues a datagram's text; always true.
     bool Recv(const std::string& msg) override;
 
-    /// Routes one text: with "eventID" anywhere in it, it is a report; else a control message. False when a report
-    /// could not be parsed or an exception was caught.
+    /// Routes one text: with "eventID" anywhere in it, it is a report; else a control message. False when a
+    /// report could not be parsed or an exception was caught.
     bool Consume(const std::string& msg) override;
 
     /// Turns a report's text into a record. On false `out` holds what was filled before the failure, at least

@@ -20,7 +20,8 @@ constexpr long POLL_TIMEOUT_MS = 250; // how long a stop may take; spares the lo
 /// thread waits for a processor.
 constexpr int SOCKET_BUFFER_BYTES = 8 * 1024 * 1024;
 
-/// Prints the exception under way. Throws when there is no memory for its text; a line is printed whole or not at all.
+/// Prints the exception under way. Throws when there is no memory for its text; a line is printed whole or
+/// not at all.
 void PrintExceptionUnderWay() {
     try {
         throw;
@@ -75,9 +76,9 @@ bool UDPServer::Start(const std::string& ip, int port) {
         const Poco::Net::SocketAddress address(ip, static_cast<std::uint16_t>(port));
         // Both kinds of reuse, so that a service which was just restarted can bind at once.
         m_socket.bind(address, true, true);
-        // And then not of the address any more: with that, a later socket of any user could bind the same address, and the
-        // kernel would hand the datagrams to that one. The port is still reused by sockets of this user alone, so the next
-        // service binds at once.
+        // And then not of the address any more: with that, a later socket of any user could bind the same
+        // address, and the kernel would hand the datagrams to that one. The port is still reused by sockets
+        // of this user alone, so the next service binds at once.
         m_socket.setReuseAddress(false);
         try {
             m_socket.setReceiveBufferSize(SOCKET_BUFFER_BYTES);
@@ -102,11 +103,11 @@ void UDPServer::run() {
     } while (!m_bStop);
 }
 
-/// Whether a datagram came within the poll timeout. By a set that lasts: the socket's own poll makes, fills, waits for and
-/// closes one each time, which is four system calls instead of one.
+/// Whether a datagram came within the poll timeout. By a set that lasts: the socket's own poll makes, fills,
+/// waits for and closes one each time, which is four system calls instead of one.
 ///
-/// A poll that fails (a closed socket) would fail again at once and for ever: it is printed when it begins, and each one
-/// waits out the timeout that it did not use.
+/// A poll that fails (a closed socket) would fail again at once and for ever: it is printed when it begins,
+/// and each one waits out the timeout that it did not use.
 bool UDPServer::WaitForDatagram() {
     const Poco::Timespan timeout(POLL_TIMEOUT_MS * Poco::Timespan::MILLISECONDS);
     try {
@@ -129,10 +130,11 @@ bool UDPServer::WaitForDatagram() {
     }
 }
 
-/// Whether there was a datagram, so that there may be another one. The socket does not block: while datagrams come faster
-/// than they are handled, each costs one system call and not two.
+/// Whether there was a datagram, so that there may be another one. The socket does not block: while datagrams
+/// come faster than they are handled, each costs one system call and not two.
 ///
-/// Only a receive that fails drops the set: another one takes a descriptor, which what Recv threw may be the lack of.
+/// Only a receive that fails drops the set: another one takes a descriptor, which what Recv threw may be the
+/// lack of.
 bool UDPServer::ReceiveOne(Buffer& buffer) {
     bool received = false;
     try {

@@ -9,8 +9,8 @@
 #include <Poco/Runnable.h>
 #include <Poco/Thread.h>
 
-/// Is told what the receiver sees and its texts do not show. All of it on the receiving thread, and none of it may throw or
-/// wait.
+/// Is told what the receiver sees and its texts do not show. All of it on the receiving thread, and none of
+/// it may throw or wait.
 class DatagramWatch {
 public:
     virtual ~DatagramWatch() = default;
@@ -25,14 +25,16 @@ public:
     virtual void Idle() = 0;
 };
 
-/// Receives datagrams on a thread of its own and hands each one, as text, to Recv. Knows nothing of what they mean.
+/// Receives datagrams on a thread of its own and hands each one, as text, to Recv. Knows nothing of what they
+/// mean.
 ///
 /// Life: constructed → started (Start returned true) → stopping → joined. There is no restart.
 ///
-/// Threads: Recv runs on the receiving thread, everything else on the owner's. A derived class stops in its own
-/// destructor: once that has run, the receiving thread has no Recv to call any more.
+/// Threads: Recv runs on the receiving thread, everything else on the owner's. A derived class stops in its
+/// own destructor: once that has run, the receiving thread has no Recv to call any more.
 ///
-/// Failure: goes to standard output, never to the log; the receiver must be able to complain without a logger.
+/// Failure: goes to standard output, never to the log; the receiver must be able to complain without a
+/// logger.
 class UDPServer : public Poco::Runnable {
 public:
     UDPServer() = default;
@@ -77,8 +79,8 @@ private:
     /// orders the rest. The worst that the race can cost is one more pass.
     bool m_bStop = false;
 
-    /// Made when it is first needed, and anew after a failure. The kernel drops a socket that is closed from it, and says
-    /// nothing.
+    /// Made when it is first needed, and anew after a failure. The kernel drops a socket that is closed from
+    /// it, and says nothing.
     std::optional<Poco::Net::PollSet> m_poll;
 
     /// Whether the last poll failed, so that a socket that stays broken is reported once.

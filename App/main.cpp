@@ -32,8 +32,8 @@ void ConfigureLog() {
     }
 }
 
-/// Behind the instance check, so that a refused second instance does not touch what the first one counts. A file that cannot
-/// be had costs the file and nothing else.
+/// Behind the instance check, so that a refused second instance does not touch what the first one counts. A
+/// file that cannot be had costs the file and nothing else.
 void OpenLedger(ReportLedger::Writer& ledger) {
     ledger.Open(Paths::Run(SystemTool::CommonTool::GetUserDataDir()), SystemTool::Version::Number(),
                 SystemTool::Version::BuildId(), SystemTool::Platform::CoarseTimeMs());

@@ -1,7 +1,8 @@
 #pragma once
 
-// What every source file of the service that logs includes. The order of these headers is also the order in which the
-// statics of a source file are built: the plain constants, the logger, the constants that ask the system.
+// What every source file of the service that logs includes. The order of these headers is also the order in
+// which the statics of a source file are built: the plain constants, the logger, the constants that ask the
+// system.
 #include "Common/Constants.h"
 #include "Common/Logger.h"
 

@@ -8,14 +8,15 @@
 namespace SyncServiceReport {
 namespace {
 
-/// The numbers in a directive: which argument, width and precision. boost::format computes with them unchecked, beyond the
-/// range of its integers.
+/// The numbers in a directive: which argument, width and precision. boost::format computes with them
+/// unchecked, beyond the range of its integers.
 class NumbersOfDirective {
 public:
     /// `begin` is behind the percent sign.
     NumbersOfDirective(const std::string& format, std::size_t begin) : m_format(format), m_at(begin) {}
 
-    /// Throws std::length_error when one has more than nine digits, which no text within the size limits can have.
+    /// Throws std::length_error when one has more than nine digits, which no text within the size limits can
+    /// have.
     void Check() {
         Skip('|');
         const bool isNumbered = Next() != '0' && SkipNumber(); // else a zero is a flag
@@ -71,7 +72,8 @@ private:
     std::size_t m_at;
 };
 
-/// A text on its way. Beyond its limit it only counts, so that the reason can say how long it would have become.
+/// A text on its way. Beyond its limit it only counts, so that the reason can say how long it would have
+/// become.
 class BoundedText {
 public:
     explicit BoundedText(std::size_t limit) : m_limit(limit) {}
@@ -98,10 +100,11 @@ private:
     std::string m_text;
 };
 
-/// boost::format for a text without arguments: the same reading of each directive, by the same function, and the same
-/// errors. boost::format itself keeps an item for each directive, which takes a tenth of a millisecond for a datagram of
-/// them; and it counts the directives before it makes room for the items, and counts a tabulation whose fill is a percent
-/// sign (`%1T%%|9t|`) as one too few: parsing then writes behind its array, and such a datagram could end the service.
+/// boost::format for a text without arguments: the same reading of each directive, by the same function, and
+/// the same errors. boost::format itself keeps an item for each directive, which takes a tenth of a
+/// millisecond for a datagram of them; and it counts the directives before it makes room for the items, and
+/// counts a tabulation whose fill is a percent sign (`%1T%%|9t|`) as one too few: parsing then writes behind
+/// its array, and such a datagram could end the service.
 class OutsideFormat {
 public:
     explicit OutsideFormat(const std::string& format)

@@ -94,8 +94,8 @@ static bool WriteLog(const LogSite& site, const std::string& format, const Argum
 
 /// For the last handler of a public operation, `catch (...) { return LogCaughtException(site); }`: logs the
 /// exception under way in the words that people search the log for, their trailing blanks included. Always
-/// false, the result of an operation that caught one. Where its text cannot be built, the reason for that is logged
-/// instead; without memory for that, nothing is.
+/// false, the result of an operation that caught one. Where its text cannot be built, the reason for that is
+/// logged instead; without memory for that, nothing is.
 [[maybe_unused]] static bool LogCaughtException(const LogSite& site) noexcept {
     try {
         LogExceptionUnderWay(site);

@@ -2,8 +2,8 @@
 
 #include <string>
 
-/// Where the service keeps its files below the user's data directory, which SystemTool::CommonTool::GetUserDataDir tells.
-/// Nothing is created here.
+/// Where the service keeps its files below the user's data directory, which
+/// SystemTool::CommonTool::GetUserDataDir tells. Nothing is created here.
 namespace SyncServiceReport::Paths {
 
 /// What the suite keeps.

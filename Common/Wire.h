@@ -2,13 +2,14 @@
 
 #include <cstddef>
 
-/// What the service and its senders agree on: the facts of a datagram. `UDP_SERVER_IP` and the kinds of control message
-/// are in ServiceConstants.h. For people, docs/Sending.md has the whole contract.
+/// What the service and its senders agree on: the facts of a datagram. `UDP_SERVER_IP` and the kinds of
+/// control message are in ServiceConstants.h. For people, docs/Sending.md has the whole contract.
 namespace Wire {
 
 inline constexpr int PORT = 9997;
 
-/// The room for one datagram. The service cuts off what is longer, and everything from the first zero byte on.
+/// The room for one datagram. The service cuts off what is longer, and everything from the first zero byte
+/// on.
 inline constexpr std::size_t MAX_BYTES = 10240;
 
 /// A text that holds this anywhere is a report; every other text is a control message.

@@ -48,8 +48,8 @@ bool DBHelper::BatExecSql(std::vector<std::string> sqls) {
     for (int attempt = 0; attempt < BATCH_ATTEMPTS; ++attempt) {
         if (m_pSqliteDb->BatExecSql(sqls))
             return true;
-        // The error text is the format string, deliberately: one with a percent sign is found in the log by the
-        // mark "[BoostLogError]".
+        // The error text is the format string, deliberately: one with a percent sign is found in the log by
+        // the mark "[BoostLogError]".
         WriteLog({LogLevel::Error, "BatExecSql"}, m_pSqliteDb->GetLastErrorMsg());
         // After the last failure too: a caller that starts over at once does not hammer a busy database.
         Poco::Thread::sleep(BATCH_PAUSE_MS);
@@ -59,8 +59,8 @@ bool DBHelper::BatExecSql(std::vector<std::string> sqls) {
 
 bool DBHelper::GetTotalCount(const std::string& sql, int& count) {
     count = 0;
-    // No test for a missing object here, deliberately: to count before Init is the caller's mistake, and must not look
-    // like an ordinary failure.
+    // No test for a missing object here, deliberately: to count before Init is the caller's mistake, and must
+    // not look like an ordinary failure.
     return m_pSqliteDb->GetTotalCount(sql, count) || Report("GetTotalCount", __LINE__, sql);
 }
 

@@ -7,15 +7,16 @@
 
 namespace SyncServiceReport {
 
-/// The one access point for SQL on the report database. Passes statements to the SQLite plug-in unchanged and gives
-/// failures one form in the log: the plug-in's error text, a hyphen, the statement.
+/// The one access point for SQL on the report database. Passes statements to the SQLite plug-in unchanged and
+/// gives failures one form in the log: the plug-in's error text, a hyphen, the statement.
 ///
-/// Ownership: holds the plug-in's object without owning it. After the plug-in's loader is gone, nothing may be called.
+/// Ownership: holds the plug-in's object without owning it. After the plug-in's loader is gone, nothing may
+/// be called.
 ///
 /// Threads: no lock; one thread at a time. Only the first call of instance may come from several at once.
 ///
-/// Failure: false, with one Error line for each failure of the plug-in; false and no line while there is no plug-in.
-/// Exceptions of the plug-in itself go to the caller.
+/// Failure: false, with one Error line for each failure of the plug-in; false and no line while there is no
+/// plug-in. Exceptions of the plug-in itself go to the caller.
 class DBHelper {
 public:
     static DBHelper& instance();

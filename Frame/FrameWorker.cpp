@@ -63,9 +63,9 @@ void FrameWorker::SetUserBaseInfo() {
 bool FrameWorker::Send(const ST_OptLog& log) {
     try {
         const ST_BaseInfo& info = m_pServer->GetBaseInfo();
-        // The texts go in as they are, deliberately: a sender may double its quotes itself, and escaping again would
-        // store them doubled. A text with a lone quote makes a statement that the database rejects. What a text may do
-        // inside the statement, the plug-in limits.
+        // The texts go in as they are, deliberately: a sender may double its quotes itself, and escaping
+        // again would store them doubled. A text with a lone quote makes a statement that the database
+        // rejects. What a text may do inside the statement, the plug-in limits.
         // Poco::format would give the same text, ten times slower: it makes a stream for each value.
         const std::string sql =
             fmt::format("insert into OperLog (eventID,value,createTime,pType,extData3,extData4) "

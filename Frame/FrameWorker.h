@@ -12,14 +12,15 @@ namespace SyncServiceReport {
 
 class ReportServer;
 
-/// The local store: appends each report to the table OperLog of "Report.db" in the user's data directory, and reads the
-/// stored open id and suite version from the table BaseInfo at the start. It makes neither the file nor the tables.
+/// The local store: appends each report to the table OperLog of "Report.db" in the user's data directory, and
+/// reads the stored open id and suite version from the table BaseInfo at the start. It makes neither the file
+/// nor the tables.
 ///
-/// Life: constructed → initialised. Until Init has given the plug-in's object to DBHelper, every Send returns false
-/// silently; when Init fails after that, Send still tries.
+/// Life: constructed → initialised. Until Init has given the plug-in's object to DBHelper, every Send returns
+/// false silently; when Init fails after that, Send still tries.
 ///
-/// Ownership: keeps the server without owning it; owns the plug-in through its loader. The destructor unloads the
-/// plug-in, and DBHelper must not be called from then on.
+/// Ownership: keeps the server without owning it; owns the plug-in through its loader. The destructor unloads
+/// the plug-in, and DBHelper must not be called from then on.
 ///
 /// Threads: Init on the starting thread, before any report; Send on the consuming thread only.
 ///

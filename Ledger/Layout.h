@@ -7,12 +7,12 @@
 
 #include "Ledger/Outcome.h"
 
-/// The ledger's file, byte for byte; docs/Ledger.md describes it for other readers. Everything is in the machine's own byte
-/// order: the file is its machine's.
+/// The ledger's file, byte for byte; docs/Ledger.md describes it for other readers. Everything is in the
+/// machine's own byte order: the file is its machine's.
 ///
-/// Every field that changes while the service runs is an atomic word of eight bytes. A counter belongs to one thread, and
-/// each thread's counters have cache lines of their own, so that counting is a load and a store that no other thread waits
-/// for.
+/// Every field that changes while the service runs is an atomic word of eight bytes. A counter belongs to one
+/// thread, and each thread's counters have cache lines of their own, so that counting is a load and a store
+/// that no other thread waits for.
 namespace ReportLedger {
 
 inline constexpr std::array<char, 8> MAGIC = {'H', 'L', 'L', 'E', 'D', 'G', 'E', 'R'};
@@ -104,7 +104,8 @@ static_assert(FILE_BYTES == 17920);
 
 inline constexpr auto FILE_NAME = "Report.ledger";
 
-/// Appended to the name of a file that makes no sense, so that it can be looked at; the next such file replaces it.
+/// Appended to the name of a file that makes no sense, so that it can be looked at; the next such file
+/// replaces it.
 inline constexpr auto SET_ASIDE_SUFFIX = ".set-aside";
 
 } // namespace ReportLedger

@@ -35,7 +35,8 @@ bool LockSoon(int file) {
     return true;
 }
 
-/// Without waiting for a writer where the name is that of a pipe; no descriptor for anything but a file that can be locked.
+/// Without waiting for a writer where the name is that of a pipe; no descriptor for anything but a file that
+/// can be locked.
 Descriptor OpenAndLock(const std::string& path, int flags) {
     Descriptor file(::open(path.c_str(), O_RDWR | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC | flags, FILE_MODE));
     struct stat status {};

@@ -18,15 +18,15 @@ enum class Outcome : unsigned {
     Exception,         ///< An exception cost the report.
 };
 
-/// Names how the report under way on this thread ends, at the place that knows it. The first call counts: the code
-/// nearest to the failure calls first, and its callers, which see only its result, call later. Has no lasting effect
-/// while no report is under way.
+/// Names how the report under way on this thread ends, at the place that knows it. The first call counts: the
+/// code nearest to the failure calls first, and its callers, which see only its result, call later. Has no
+/// lasting effect while no report is under way.
 void Ended(Outcome outcome) noexcept;
 
 class Writer;
 
-/// One report's stay on the consuming thread: when this goes, the ledger counts what was named meanwhile. A report of which
-/// nothing was named was cut short: it counts as an exception.
+/// One report's stay on the consuming thread: when this goes, the ledger counts what was named meanwhile. A
+/// report of which nothing was named was cut short: it counts as an exception.
 class Handling {
 public:
     explicit Handling(Writer& ledger) noexcept;

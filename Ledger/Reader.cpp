@@ -65,8 +65,8 @@ void CountAsLost(Counts& total) {
     total[RECEIVING] = 0;
 }
 
-/// Repeated until it balances. One that never does may have been taken in the middle of much work: what moved between it and
-/// the one before is allowed for.
+/// Repeated until it balances. One that never does may have been taken in the middle of much work: what moved
+/// between it and the one before is allowed for.
 void TakeBalancedLook(const File& content, Look& look) {
     Counts before = CopyOf(content.total);
     for (int i = 0; i < MOST_LOOKS; ++i) {

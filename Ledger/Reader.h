@@ -44,14 +44,16 @@ struct Look {
     std::vector<MarkAt> recent; ///< One each second, the oldest first.
 };
 
-/// Looks at the file, without changing it or its times. Beside a process that counts it takes some milliseconds at the most:
-/// a look that does not balance is repeated, because a report may just be half counted.
+/// Looks at the file, without changing it or its times. Beside a process that counts it takes some
+/// milliseconds at the most: a look that does not balance is repeated, because a report may just be half
+/// counted.
 Look LookAt(const std::string& path);
 
 /// The same at counters in this process's memory.
 Look LookAt(const File& content, bool counting, std::int64_t nowMs);
 
-/// What the running process, or the last one, has counted itself: LOST_AT_ENDS is 0, and MOST_WAITING its own.
+/// What the running process, or the last one, has counted itself: LOST_AT_ENDS is 0, and MOST_WAITING its
+/// own.
 Counts SinceStart(const Look& look);
 
 } // namespace ReportLedger

@@ -10,8 +10,8 @@
 namespace ReportLedger {
 namespace {
 
-/// For the counter's own thread. The release orders it behind what that thread counted before: for a kill at any instruction
-/// and for readers. It costs nothing on the processors that order their stores by themselves.
+/// For the counter's own thread. The release orders it behind what that thread counted before: for a kill at
+/// any instruction and for readers. It costs nothing on the processors that order their stores by themselves.
 void Add(Word& word, std::uint64_t count) noexcept {
     word.store(word.load(std::memory_order_relaxed) + count, std::memory_order_release);
 }
@@ -39,7 +39,8 @@ Mark& OldestOf(std::span<Mark> marks) noexcept {
         marks, {}, [](const Mark& mark) { return mark.atMs.load(std::memory_order_relaxed); });
 }
 
-/// Replaces the oldest mark. Its time is 0 meanwhile: a reader, and the next start after a kill, then leave it out.
+/// Replaces the oldest mark. Its time is 0 meanwhile: a reader, and the next start after a kill, then leave
+/// it out.
 void Write(std::span<Mark> marks, const Counters& counters, std::int64_t nowMs) noexcept {
     Mark& mark = OldestOf(marks);
     Set(mark.atMs, 0);
@@ -93,8 +94,8 @@ void Writer::BeginProcess(const std::string& programVersion, const std::string& 
     Tick(nowMs);
 }
 
-/// What came and did not end. Computed from the whole, and not added: a kill between any two of these stores leaves nothing
-/// to be counted twice.
+/// What came and did not end. Computed from the whole, and not added: a kill between any two of these stores
+/// leaves nothing to be counted twice.
 void Writer::CountWhatWasLost(std::int64_t nowMs) {
     Counters& total = m_content->total;
     const Counts counts = CopyOf(total);
@@ -131,8 +132,8 @@ void Writer::Queued() noexcept {
     NoteMostWaiting(total[QUEUED].load(std::memory_order_relaxed));
 }
 
-/// What the consuming thread has handled is looked at only when the most may be passed: that cache line is the other
-/// thread's, and a look costs as much as everything else here.
+/// What the consuming thread has handled is looked at only when the most may be passed: that cache line is
+/// the other thread's, and a look costs as much as everything else here.
 void Writer::NoteMostWaiting(std::uint64_t queued) noexcept {
     Counters& total = m_content->total;
     if (queued - m_handledSeen <= total[MOST_WAITING_SINCE_START].load(std::memory_order_relaxed))

@@ -13,23 +13,26 @@ namespace ReportLedger {
 
 /// Counts every report of the running service: where it came from, where it ended, and when.
 ///
-/// Life: counts in memory of its own from the beginning; Open moves it to a file, whose counts it goes on with. What a
-/// process had received and not ended when it ended, the next one's Open counts as lost.
+/// Life: counts in memory of its own from the beginning; Open moves it to a file, whose counts it goes on
+/// with. What a process had received and not ended when it ended, the next one's Open counts as lost.
 ///
-/// Threads: Received, CouldNotFormat, Queued, CouldNotQueue, Dropped and Tick on the receiving thread; Ended on the consuming
-/// thread; Open before both. Each counter is written by one thread only (a report's end as an exception is not, and is added
-/// atomically), so that counting costs no lock and no bus-locked instruction. Readers of the file need no lock either.
+/// Threads: Received, CouldNotFormat, Queued, CouldNotQueue, Dropped and Tick on the receiving thread; Ended
+/// on the consuming thread; Open before both. Each counter is written by one thread only (a report's end as
+/// an exception is not, and is added atomically), so that counting costs no lock and no bus-locked
+/// instruction. Readers of the file need no lock either.
 ///
-/// Order, which keeps the books true at whichever instruction the process is killed: a datagram is counted as received before
-/// it is counted as anything else, and what is lost is not counted but computed, as what is missing.
+/// Order, which keeps the books true at whichever instruction the process is killed: a datagram is counted as
+/// received before it is counted as anything else, and what is lost is not counted but computed, as what is
+/// missing.
 ///
-/// Failure: a file that cannot be had costs the file. Nothing throws once the object is made, and nothing waits.
+/// Failure: a file that cannot be had costs the file. Nothing throws once the object is made, and nothing
+/// waits.
 class Writer {
 public:
     Writer();
 
-    /// Goes on in the file of `directory`, before anything is counted. False when that cannot be had; the counts then stay
-    /// in memory.
+    /// Goes on in the file of `directory`, before anything is counted. False when that cannot be had; the
+    /// counts then stay in memory.
     bool Open(const std::string& directory, const std::string& programVersion, const std::string& buildId,
               std::int64_t nowMs);
 

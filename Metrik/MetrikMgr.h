@@ -15,10 +15,11 @@ class ReportServer;
 ///
 /// Ownership: owns the workers; keeps the server without owning it.
 ///
-/// Threads: no lock. Init on the starting thread before any report; Update and Send on the consuming thread only.
+/// Threads: no lock. Init on the starting thread before any report; Update and Send on the consuming thread
+/// only.
 ///
-/// Failure: no exception leaves Update or Send. One leaves AddWorker, and Init, when a worker cannot be made; the map
-/// then is as it was.
+/// Failure: no exception leaves Update or Send. One leaves AddWorker, and Init, when a worker cannot be made;
+/// the map then is as it was.
 class MetrikMgr {
 public:
     explicit MetrikMgr(ReportServer* server);
@@ -48,8 +49,8 @@ protected:
 private:
     ReportServer* m_pServer;
 
-    /// The worker that was made last. One that failed is kept until the next: the exception that its SDK threw may be
-    /// of a class of the plug-in, whose code must be there until the exception has been logged.
+    /// The worker that was made last. One that failed is kept until the next: the exception that its SDK
+    /// threw may be of a class of the plug-in, whose code must be there until the exception has been logged.
     Poco::SharedPtr<IWorker> m_pNewest;
 };
 

@@ -52,7 +52,8 @@ bool MetrikWorker::Init(const ST_InitMsg& msg) {
     return true;
 }
 
-/// Loads a plug-in of this worker's own; its object, or null after logging in the name of `function` what is missing.
+/// Loads a plug-in of this worker's own; its object, or null after logging in the name of `function` what is
+/// missing.
 IMetrikSdk* MetrikWorker::LoadSdk(const char* function, int loaderLine, int interfaceLine) {
     m_pSdk = nullptr; // it goes with the loader that held it
     const std::string library = ORVEK_EXCUTABLE_PATH + "libMetrikSdk.dylib";

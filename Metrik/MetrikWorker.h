@@ -20,11 +20,11 @@ void SuccCallBackFun(std::string a, std::string b);
 
 /// Connects one module to the analytics SDK: each worker has an SDK object of its own.
 ///
-/// Life: created → initialised by one successful InitDefalut or Init. A worker whose initialisation failed answers
-/// every Send with false and is not tried again.
+/// Life: created → initialised by one successful InitDefalut or Init. A worker whose initialisation failed
+/// answers every Send with false and is not tried again.
 ///
-/// Ownership: keeps the server without owning it; owns the plug-in through its loader, which takes the SDK object back
-/// when the worker goes.
+/// Ownership: keeps the server without owning it; owns the plug-in through its loader, which takes the SDK
+/// object back when the worker goes.
 ///
 /// Threads: one at a time, the consuming thread once the service runs.
 ///

@@ -19,8 +19,8 @@ public:
     /// `maxTotalBytes`. `flushEach` other than 0: a record is in the file when WriteLog returns. `console`
     /// other than 0: records are copied to standard output.
     ///
-    /// Throws SystemTool::BSException when the directory or the file cannot be used. Records are lost then, and the log
-    /// begins, with their number, as soon as it can be written.
+    /// Throws SystemTool::BSException when the directory or the file cannot be used. Records are lost then,
+    /// and the log begins, with their number, as soon as it can be written.
     virtual void InitLog(const std::string& logDir, const std::string& fileName, const std::string& appName,
                          const std::string& moduleName, std::int64_t maxFileBytes, std::int64_t maxTotalBytes,
                          int flushEach, int console) = 0;

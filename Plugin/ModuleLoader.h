@@ -104,8 +104,8 @@ public:
     const std::string& GetModuleName() const { return m_strModuleName; }
 
 private:
-    /// A plug-in that throws stays open for the rest of the process: its exception may be of a class of its own, whose
-    /// code must be there for as long as the exception exists.
+    /// A plug-in that throws stays open for the rest of the process: its exception may be of a class of its
+    /// own, whose code must be there for as long as the exception exists.
     T* Create() {
         try {
             return m_pDllLoader->template get<T*()>("CreateModule")();

@@ -3,7 +3,8 @@
 #include <algorithm>
 #include <array>
 
-// Linked into programs and plug-ins as an object, because the linker leaves out of a library what is not called.
+// Linked into programs and plug-ins as an object, because the linker leaves out of a library what is not
+// called.
 namespace SystemTool::PackageNote {
 namespace {
 
@@ -26,7 +27,8 @@ constexpr Note Make() {
     return note;
 }
 
-// The alignment by name: the compiler would align a record of this size by more than a reader of notes accepts.
+// The alignment by name: the compiler would align a record of this size by more than a reader of notes
+// accepts.
 [[gnu::section(".note.package"), gnu::used, gnu::aligned(sizeof(std::uint32_t))]] constexpr Note NOTE =
     Make();
 

@@ -63,7 +63,8 @@ std::string PrettyNameOf(const char* osReleasePath) {
     return {};
 }
 
-/// A lock of the opening and not of the process: it does not go when another opening of the same file is closed.
+/// A lock of the opening and not of the process: it does not go when another opening of the same file is
+/// closed.
 int ControlLock(int file, int command, struct flock& lock) {
     lock.l_type = F_WRLCK;
     lock.l_whence = SEEK_SET; // with start and length 0: the whole file

@@ -76,7 +76,8 @@ bool AllocateFile(int file, std::int64_t bytes) {
     return ::fcntl(file, F_PREALLOCATE, &store) == 0 && ::ftruncate(file, bytes) == 0;
 }
 
-// The process's lock: this system has none of a single opening. Nothing else in the process opens and closes the file.
+// The process's lock: this system has none of a single opening. Nothing else in the process opens and closes
+// the file.
 bool TryLockFile(int file) {
     struct flock lock {};
     lock.l_type = F_WRLCK;

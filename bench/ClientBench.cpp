@@ -14,9 +14,10 @@
 #include <syslog.h>
 #include <unistd.h>
 
-// What reporting costs the program that reports, beside the least that any program could do (a bare sendto of the same
-// bytes), and beside what programs do in its place: a counter for a metrics daemon, a line for the local syslog. In
-// processor time of the sending thread. A socket listens to each, with room for all. bench/client runs it.
+// What reporting costs the program that reports, beside the least that any program could do (a bare sendto of
+// the same bytes), and beside what programs do in its place: a counter for a metrics daemon, a line for the
+// local syslog. In processor time of the sending thread. A socket listens to each, with room for all.
+// bench/client runs it.
 namespace {
 
 constexpr int BATCH = 50; // datagrams that wait in the listener's socket, as many as fit with room to spare

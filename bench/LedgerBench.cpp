@@ -11,8 +11,8 @@
 #include "SystemTool/Platform.h"
 #include "bench/Report.h"
 
-// What the ledger costs a report: all that is counted from the socket to the store, in a real file, beside the same without a
-// ledger.
+// What the ledger costs a report: all that is counted from the socket to the store, in a real file, beside
+// the same without a ledger.
 namespace {
 
 using ReportLedger::Outcome;

@@ -1,5 +1,5 @@
-// A datagram's way through the server to fake destinations: what must reach one reaches it as the text says, nothing
-// reaches the other one, and the log tells of each datagram once.
+// A datagram's way through the server to fake destinations: what must reach one reaches it as the text says,
+// nothing reaches the other one, and the log tells of each datagram once.
 
 #include <map>
 

@@ -1,5 +1,5 @@
-// A text through the JSON reader: what can be read prints as the same value, number by number, and what is set can be
-// got.
+// A text through the JSON reader: what can be read prints as the same value, number by number, and what is
+// set can be got.
 
 #include <charconv>
 #include <cmath>

@@ -67,8 +67,9 @@ bool HasALongNumber(std::string_view text) {
     return std::search_n(text.begin(), text.end(), 10, true, same) != text.end();
 }
 
-/// boost::format makes room for the directives that it counts, and counts a tabulation whose fill is a percent sign as one
-/// too few. One that has parsed as many directives as there are percent signs before keeps the room for them.
+/// boost::format makes room for the directives that it counts, and counts a tabulation whose fill is a
+/// percent sign as one too few. One that has parsed as many directives as there are percent signs before
+/// keeps the room for them.
 boost::format WithRoom(const std::string& text) {
     std::string roomy;
     for (auto count = std::ranges::count(text, '%'); count > 0; --count)
@@ -106,7 +107,8 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
         RequireEqual(record.message, FormattedByBoost(text), "the text is what boost::format makes of it");
     Require(record.message.size() <= text.size() + MAX_LOG_TEXT_GROWTH_BYTES, "a text hardly grows");
     RequireOneHarmlessLine(record);
-    // As an argument, a text is never a format. (A text from outside that is the format has no arguments anywhere.)
+    // As an argument, a text is never a format. (A text from outside that is the format has no arguments
+    // anywhere.)
     const std::string both = text + "-" + text;
     if (both.size() <= MAX_LOG_TEXT_BYTES)
         RequireEqual(Logged(logger, "%s-%s", text, text).message, both, "an argument stays as it is");

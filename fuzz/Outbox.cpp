@@ -1,9 +1,9 @@
-// Modules, events and a collector's answers through the analytics SDK and its own outbox: with any content, what was
-// accepted is counted in exactly one place, and what is sent is a request that a collector can read, with each event under
-// one id and one number.
+// Modules, events and a collector's answers through the analytics SDK and its own outbox: with any content,
+// what was accepted is counted in exactly one place, and what is sent is a request that a collector can read,
+// with each event under one id and one number.
 //
-// An input is a list of steps with a zero byte behind each. The first character says what a step is, line ends part the
-// texts in it:
+// An input is a list of steps with a zero byte behind each. The first character says what a step is, line
+// ends part the texts in it:
 //     m id, version, name, directory     a module announces itself
 //     e event id, payload                the newest module reports
 //     a status, Retry-After, type, body  one pass of the uploader, which gets this answer
@@ -185,8 +185,8 @@ private:
         std::string id, version, name, directory;
     };
 
-    /// A directory of the input's is one below the data directory: as root, the target could use others. Events in it are
-    /// not counted, so its module is not the newest.
+    /// A directory of the input's is one below the data directory: as root, the target could use others.
+    /// Events in it are not counted, so its module is not the newest.
     void Announce(const Announcement& module) {
         if (m_modules.size() >= MAX_MODULES || module.directory.find("..") != std::string::npos)
             return;

@@ -1,5 +1,5 @@
-// Runs a target once for each file of some folders: the fuzzer's place where there is none, so that what the fuzzers
-// once found stays found with every compiler.
+// Runs a target once for each file of some folders: the fuzzer's place where there is none, so that what the
+// fuzzers once found stays found with every compiler.
 
 #include <cstdint>
 #include <cstdio>

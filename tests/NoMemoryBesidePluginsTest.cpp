@@ -22,8 +22,8 @@
 
 using namespace SyncServiceReport;
 
-// The service where each allocation fails once, and then each with all that follow it, beside the plug-ins that ship, whose
-// allocations, and those of the libraries that they use, count too.
+// The service where each allocation fails once, and then each with all that follow it, beside the plug-ins
+// that ship, whose allocations, and those of the libraries that they use, count too.
 
 namespace {
 

@@ -23,8 +23,8 @@
 using namespace SyncServiceReport;
 using ::testing::ElementsAre;
 
-// Each allocation on a report's way fails once, and then each with all that follow it: that costs the report, and never the
-// ones after it. Beside fake plug-ins, whose allocations count, too.
+// Each allocation on a report's way fails once, and then each with all that follow it: that costs the report,
+// and never the ones after it. Beside fake plug-ins, whose allocations count, too.
 
 namespace {
 
@@ -305,7 +305,8 @@ TEST(NoMemoryForPrinting, DoesNotEndTheReceiver) {
         sender.sendTo(text.data(), static_cast<int>(text.size()),
                       Poco::Net::SocketAddress("127.0.0.1", 9997));
     };
-    // The memory that is missing may cost a datagram behind the one that threw, too; another one then comes through.
+    // The memory that is missing may cost a datagram behind the one that threw, too; another one then comes
+    // through.
     const auto comesThrough = [&](const std::string& text) {
         const int before = receiver.Received();
         send(text);

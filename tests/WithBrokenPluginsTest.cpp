@@ -10,8 +10,8 @@
 using namespace SyncServiceReport;
 using ::testing::ElementsAre;
 
-// Beside this program there are a SQLite plug-in without "CreateModule", and an SDK whose start throws an exception of a
-// class that only its own library has.
+// Beside this program there are a SQLite plug-in without "CreateModule", and an SDK whose start throws an
+// exception of a class that only its own library has.
 
 TEST(WithBrokenPlugins, AStoreWithoutCreateModuleIsLoggedAsOneThatCannotBeLoaded) {
     ReportServer server;

@@ -1,4 +1,5 @@
-// Several threads, one reporter: any thread may use it at any time. At the end, the counters tell what became of all.
+// Several threads, one reporter: any thread may use it at any time. At the end, the counters tell what became
+// of all.
 #include <cstdint>
 #include <cstdio>
 #include <functional>

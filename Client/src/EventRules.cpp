@@ -50,8 +50,9 @@ private:
     std::size_t m_length = 0;
 };
 
-/// JSON goes to the store as an object where the service prints it again as it was. Everything else would come out
-/// different (numbers of more digits than the service keeps, deep nesting), and goes as a text, which stays as it is.
+/// JSON goes to the store as an object where the service prints it again as it was. Everything else would
+/// come out different (numbers of more digits than the service keeps, deep nesting), and goes as a text,
+/// which stays as it is.
 wire::ValueForm FormForStore(const wire::JsonFacts& facts) {
     return facts.isObject && facts.fate == wire::Fate::Exact && facts.levels <= MAX_LEVELS
                ? wire::ValueForm::Json

@@ -99,8 +99,8 @@ FileFailure LiveFile::Append(std::string_view line) {
     } while (written < 0 && errno == EINTR);
     if (written < 0)
         return {errno, "write to the file"};
-    // The offset after an append is the end of the file, with what other processes appended. Asking for it after each
-    // line was a sixth of the line's cost.
+    // The offset after an append is the end of the file, with what other processes appended. Asking for it
+    // after each line was a sixth of the line's cost.
     m_sizeBytes = ++m_lines % LINES_PER_LOOK == 0 ? lseek(m_descriptor, 0, SEEK_CUR) : m_sizeBytes + written;
     if (static_cast<std::size_t>(written) == size) {
         m_endsInHalfLine = false;

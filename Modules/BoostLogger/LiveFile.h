@@ -32,8 +32,8 @@ public:
     /// deleted. Looks at the size of the file that is open, too.
     bool IsGoneFrom(const std::string& path);
 
-    /// How many lines are appended between two looks at the size. So many may each writer go beyond a limit where several
-    /// write at once.
+    /// How many lines are appended between two looks at the size. So many may each writer go beyond a limit
+    /// where several write at once.
     static constexpr unsigned LINES_PER_LOOK = 16;
 
     /// The size of the file, with what other processes appended until the last look.

@@ -99,8 +99,8 @@ FileFailure LogWriter::Reopen() {
     return m_live.Open(m_path);
 }
 
-/// The size from which on the system ends a process that writes on, by SIGXFSZ (`ulimit -f`). A log must not be what ends
-/// its program, and a plug-in must not change what the program does on a signal.
+/// The size from which on the system ends a process that writes on, by SIGXFSZ (`ulimit -f`). A log must not
+/// be what ends its program, and a plug-in must not change what the program does on a signal.
 std::int64_t LogWriter::FileSizeLimit() {
     rlimit limit{};
     if (::getrlimit(RLIMIT_FSIZE, &limit) != 0 || limit.rlim_cur > static_cast<rlim_t>(NO_LIMIT))
@@ -135,8 +135,8 @@ FileFailure LogWriter::Put(std::string_view line) {
     return m_live.Append(line);
 }
 
-/// The lock is the live file's own: a process that waited for it finds that the path is another file by then, which
-/// means that the rotation is done already. Opening the new file gives the lock up.
+/// The lock is the live file's own: a process that waited for it finds that the path is another file by then,
+/// which means that the rotation is done already. Opening the new file gives the lock up.
 FileFailure LogWriter::Rotate() {
     if (const FileFailure failure = m_live.Lock())
         return failure;

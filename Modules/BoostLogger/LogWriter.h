@@ -27,8 +27,8 @@ public:
 
     explicit LogWriter(const LogSettings& settings);
 
-    /// Makes the directory, opens the live file and deletes what an older, larger cap has left. After a failure the
-    /// writer is losing: lines may be appended, and it opens the file once that can be done.
+    /// Makes the directory, opens the live file and deletes what an older, larger cap has left. After a
+    /// failure the writer is losing: lines may be appended, and it opens the file once that can be done.
     FileFailure Start();
 
     /// Appends one line, its newline included. When this returns the line is in the file and survives the end

@@ -19,8 +19,8 @@ namespace {
 using SystemTool::BSErrorText;
 using SystemTool::BSException;
 
-/// Null until configured; then the sink for the rest of the process. One that could not be opened is in place too, and
-/// opens its log as soon as that can be done; another InitLog replaces it.
+/// Null until configured; then the sink for the rest of the process. One that could not be opened is in place
+/// too, and opens its log as soon as that can be done; another InitLog replaces it.
 std::atomic<LogSink*> g_sink = nullptr;
 
 std::mutex g_configuring;                ///< Guards g_settings, and lets one InitLog run at a time.

@@ -9,8 +9,8 @@
 namespace MetrikSdk {
 namespace {
 
-/// A module's texts come from datagrams of 10 KiB, and every module's id stays in memory. Longer ones are cut; no honest
-/// module has one.
+/// A module's texts come from datagrams of 10 KiB, and every module's id stays in memory. Longer ones are
+/// cut; no honest module has one.
 constexpr std::size_t MAX_ID_BYTES = 64;
 constexpr std::size_t MAX_TEXT_BYTES = 256; ///< Of a version or a name.
 
@@ -103,7 +103,8 @@ void Sdk::TellDirectory(Callback onFailure, bool hasOutbox, const std::string& r
         Call(onFailure, NameOf(report::Cause::Directory), *text);
 }
 
-/// Leaves an outbox whose directory turned unsafe after it was announced for the first outbox. Whether it did.
+/// Leaves an outbox whose directory turned unsafe after it was announced for the first outbox. Whether it
+/// did.
 bool Sdk::MovesToTheFirst() {
     if (!m_membership || !Events().IsUnsafe())
         return false;

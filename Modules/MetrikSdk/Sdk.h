@@ -54,7 +54,8 @@ private:
     std::shared_ptr<const process::Membership>
         m_membership; ///< Null before InitSdk, and without any directory.
     std::string m_id;
-    /// Kept until the module has been attached, for the next event to try again. Made beforehand: to fill it takes no memory.
+    /// Kept until the module has been attached, for the next event to try again. Made beforehand: to fill it
+    /// takes no memory.
     std::unique_ptr<Announcement> m_announcement;
 };
 

@@ -16,8 +16,8 @@ struct CapSettings {
     std::size_t maxWaitingBytes = std::size_t{512} * 1024 * 1024;
     /// Usage figures older than this change no decision any more, and a collector's store has closed the day.
     std::chrono::milliseconds maxAge = std::chrono::days(30);
-    /// So long must the wall clock have run without a step before events are dropped by age. A machine that starts
-    /// without the right time has it from the network within minutes.
+    /// So long must the wall clock have run without a step before events are dropped by age. A machine that
+    /// starts without the right time has it from the network within minutes.
     std::chrono::milliseconds clockAgreement = std::chrono::hours(1);
     /// Looking for old events costs a read; they age by the day.
     std::chrono::milliseconds ageCheckInterval = std::chrono::minutes(1);
@@ -25,8 +25,8 @@ struct CapSettings {
     std::size_t maxDropsAtOnce = 1000;
     /// Drops this far apart are two incidents, and each is told.
     std::chrono::milliseconds dropRunEnds = std::chrono::minutes(10);
-    /// Refused events are kept for a person to look at. A person looks at no more than this, and a collector that
-    /// refuses everything must not move the whole outbox here unbounded.
+    /// Refused events are kept for a person to look at. A person looks at no more than this, and a collector
+    /// that refuses everything must not move the whole outbox here unbounded.
     std::size_t maxDeadLetters = 10'000;
     std::size_t maxDeadLetterBytes = std::size_t{16} * 1024 * 1024;
     /// One event. A datagram carries 10 KiB; a hundred times that is no event any more, and the batch bound
@@ -39,8 +39,8 @@ struct BatchSettings {
     /// The batch size that telemetry SDKs agree on by default; larger ones gain nothing on a local network.
     std::size_t maxEvents = 512;
     /// Structured JSON is two to three times the stored size, about nine times where the payload is a list of
-    /// small integers. The common case fits the 4 MiB that collectors accept; one that does not is answered with
-    /// 413, and halved.
+    /// small integers. The common case fits the 4 MiB that collectors accept; one that does not is answered
+    /// with 413, and halved.
     std::size_t maxBytes = std::size_t{1024} * 1024;
     /// An event waits this long for company before it is sent alone.
     std::chrono::milliseconds linger = std::chrono::seconds(1);
@@ -65,15 +65,18 @@ struct AsideSettings {
     std::chrono::milliseconds firstPause = std::chrono::minutes(1);
     /// A collector that was mended has the event within this.
     std::chrono::milliseconds maxPause = std::chrono::hours(1);
-    /// So many tries, between which others were taken: some four hours. What fails for so long fails for ever.
+    /// So many tries, between which others were taken: some four hours. What fails for so long fails for
+    /// ever.
     int strikes = 10;
-    /// One that comes on top is sent again and again until there is room. They cost memory and a look at each batch.
+    /// One that comes on top is sent again and again until there is room. They cost memory and a look at each
+    /// batch.
     std::size_t maxEvents = 512;
 };
 
 /// How the outbox file is looked after.
 struct FileSettings {
-    /// The user's data directory. Only below it is a directory made that is missing; see Sqlite::SafeDirectory.
+    /// The user's data directory. Only below it is a directory made that is missing; see
+    /// Sqlite::SafeDirectory.
     std::string dataDirectory;
     /// A file that cannot be opened is tried again this often; the first event after that interval pays.
     std::chrono::milliseconds reopenInterval = std::chrono::milliseconds(500);

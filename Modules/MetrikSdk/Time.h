@@ -11,8 +11,8 @@ using WallTime = std::chrono::sys_time<std::chrono::milliseconds>;
 /// For what must not jump with the wall clock: how often something is tried or told.
 using SteadyTime = std::chrono::steady_clock::time_point;
 
-/// The nearest time that can be computed with, in nanoseconds too: from 1970 to 2262. A file that a person has
-/// edited may hold any number.
+/// The nearest time that can be computed with, in nanoseconds too: from 1970 to 2262. A file that a person
+/// has edited may hold any number.
 inline WallTime Computable(WallTime time) {
     constexpr WallTime LAST =
         std::chrono::floor<std::chrono::milliseconds>(std::chrono::sys_time<std::chrono::nanoseconds>::max());

@@ -31,13 +31,14 @@ namespace OrvekSqlite {
 /// What is committed survives the end of the process, kill -9 included, which so loses at most the last 10 ms
 /// of a burst. A commit that fails loses nothing: the group's statements are kept and committed, in order,
 /// once the database takes them, by the committer if nothing follows; new statements fail with the error text
-/// meanwhile. They fail at once, but one in a tenth of a second tries to commit first; when another program's lock is
-/// the reason, each of them waits for the lock. Kept are the group's texts, 5 MiB at most; they end with the process.
+/// meanwhile. They fail at once, but one in a tenth of a second tries to commit first; when another program's
+/// lock is the reason, each of them waits for the lock. Kept are the group's texts, 5 MiB at most; they end
+/// with the process.
 ///
 /// Other programs: the write lock is free between groups. When another process has the file open, it stays
-/// free for as long as the group held it, so that the other gets its turn. When another program has the lock, the
-/// caller waits up to Settings::busyTimeout; its own queue grows meanwhile. The committer does not wait for a lock,
-/// so it never keeps a caller waiting.
+/// free for as long as the group held it, so that the other gets its turn. When another program has the lock,
+/// the caller waits up to Settings::busyTimeout; its own queue grows meanwhile. The committer does not wait
+/// for a lock, so it never keeps a caller waiting.
 ///
 /// Failure: no operation throws. Each that returns false leaves its reason for GetLastErrorMsg, in SQLite's
 /// own words when SQLite refused, in the guard's when the plug-in did ("not authorized: ..."). A failure
@@ -83,8 +84,8 @@ public:
     /// crashed. Waits a fifth of a second at most for an operation to end; when it does not, a crash may cost
     /// the last 10 ms of a burst. The commit and the close take as long as the disk does.
     ///
-    /// False: another thread may still be in an operation, or come back with the next. Then the object must stay where
-    /// it is. An operation that is under way goes on; every operation that begins later fails.
+    /// False: another thread may still be in an operation, or come back with the next. Then the object must
+    /// stay where it is. An operation that is under way goes on; every operation that begins later fails.
     [[nodiscard]] bool Finish();
 
 private:

@@ -15,8 +15,9 @@ void DoWithoutStatistics() {
     sqlite3_config(SQLITE_CONFIG_MEMSTATUS, 0);
 }
 
-/// Keeps an object that another thread may still use: in a process that exits while its other threads go on. The list
-/// tells leak checkers that this is no leak. The code stays in memory anyway, see cmake/Plugin.cmake.
+/// Keeps an object that another thread may still use: in a process that exits while its other threads go on.
+/// The list tells leak checkers that this is no leak. The code stays in memory anyway, see
+/// cmake/Plugin.cmake.
 void LeaveBehind(const OrvekSqlite::Database* database) {
     static auto* const left = new std::vector<const OrvekSqlite::Database*>;
     left->push_back(database);

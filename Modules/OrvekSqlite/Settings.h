@@ -6,8 +6,8 @@
 
 namespace OrvekSqlite {
 
-/// Bounds on the work and the memory of one statement. Any local program can put its text into a statement, so there
-/// is a bound on everything that SQLite can be made to use.
+/// Bounds on the work and the memory of one statement. Any local program can put its text into a statement,
+/// so there is a bound on everything that SQLite can be made to use.
 struct Limits {
     /// One value, and one row. A report's datagram carries 10 KB, so that the longest text of it fits a
     /// hundred times.
@@ -57,8 +57,8 @@ struct GroupSettings {
     /// statement at most, so that with the longest statement it is 5 MiB. Usual groups have 0.4 MB.
     std::size_t bytes = 4'194'304;
 
-    /// How often a group that could not be committed is tried again. When a person has made room on the disk or ended
-    /// a transaction, he does not notice a tenth of a second, and ten tries a second cost nothing.
+    /// How often a group that could not be committed is tried again. When a person has made room on the disk
+    /// or ended a transaction, he does not notice a tenth of a second, and ten tries a second cost nothing.
     std::chrono::milliseconds retry{100};
 
     /// The longest that the lock is left free for others after a group. They get as long as the group had it;

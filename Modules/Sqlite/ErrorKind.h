@@ -6,7 +6,7 @@ namespace Sqlite {
 
 /// What an error of SQLite's is about, named for what can be done.
 enum class ErrorKind {
-    Wait, ///< Nothing is wrong with the file: another program's lock, a full disk, no memory. Try again later.
+    Wait,      ///< The file is sound: another program's lock, a full disk, no memory. Try again later.
     Reopen,    ///< The open file cannot be used any more. Open its path again.
     Damage,    ///< The file is damaged, or no database.
     Statement, ///< The statement's own fault.

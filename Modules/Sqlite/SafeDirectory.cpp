@@ -29,8 +29,8 @@ enum class Missing { Make, Leave };
     throw std::system_error(error, std::generic_category(), what);
 }
 
-/// Without dots and doubled separators. Dots are taken out as text: a link before them changes where they lead, and
-/// what they lead to is checked like any other path.
+/// Without dots and doubled separators. Dots are taken out as text: a link before them changes where they
+/// lead, and what they lead to is checked like any other path.
 std::string Normal(const std::string& path) {
     if (path.empty() || path.front() != '/' || path.find('\0') != std::string::npos)
         throw UnsafePath("not an absolute path");
@@ -54,7 +54,8 @@ std::vector<std::string> NamesOf(const std::string& path) {
     return names;
 }
 
-/// The data directory without links. Made when it is missing, with its parents, as it is the environment's word.
+/// The data directory without links. Made when it is missing, with its parents, as it is the environment's
+/// word.
 std::string RealHome(const std::string& home, Missing missing) {
     if (home.empty() || home.front() != '/')
         return {};
@@ -78,7 +79,8 @@ public:
             throw UnsafePath("the path has too many levels");
     }
 
-    /// Where to begin anew, when there is a link; otherwise the way is gone to its end, or to what is missing.
+    /// Where to begin anew, when there is a link; otherwise the way is gone to its end, or to what is
+    /// missing.
     std::optional<std::string> Go() {
         m_directory = Descriptor(::open(m_path.c_str(), SafeDirectory::LOOK_FLAGS));
         if (m_directory.Number() < 0 && errno == ENOENT && m_missing == Missing::Leave)

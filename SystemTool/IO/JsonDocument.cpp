@@ -25,8 +25,9 @@ Value::ConstMemberIterator Find(const Value& object, const std::string& key) {
 
 } // namespace
 
-/// The values of a usual report fit into the room, which is a part of the tree. The allocator's own first chunk of 64 KiB is
-/// more than a heap keeps ready for a thread, and was a quarter of the cost of a document in the program.
+/// The values of a usual report fit into the room, which is a part of the tree. The allocator's own first
+/// chunk of 64 KiB is more than a heap keeps ready for a thread, and was a quarter of the cost of a document
+/// in the program.
 // NOLINTNEXTLINE(cppcoreguidelines-pro-type-member-init): the room is written before it is read
 struct JsonDocument::Tree {
     static constexpr std::size_t ROOM_BYTES = 768;
@@ -73,14 +74,16 @@ JsonDocument::Value& JsonDocument::Editable() {
     return m_tree->document;
 }
 
-/// After a change that ran out of memory: the object may believe that it has room for a member which it has not.
+/// After a change that ran out of memory: the object may believe that it has room for a member which it has
+/// not.
 void JsonDocument::Abandon() {
     *this = JsonDocument();
 }
 
 void JsonDocument::SetMember(const std::string& key, Value& value) {
     Value& object = m_tree->document;
-    // Of const iterators: comparing the others is ambiguous in C++20, where either side may be the one to convert.
+    // Of const iterators: comparing the others is ambiguous in C++20, where either side may be the one to
+    // convert.
     const auto isEnd = [&object](Value::ConstMemberIterator member) {
         return member == std::as_const(object).MemberEnd();
     };

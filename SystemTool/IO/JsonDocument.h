@@ -17,10 +17,11 @@ class JsonAllocator;
 /// So a caller reads `document.GetKeyValue("a").GetKeyValue("b").ToString()` without a test in between.
 ///
 /// Cost: a value shares its text's tree. Copying a JsonDocument, or taking a member, copies a pointer and not
-/// the value, however large; only SetKeyValue copies, and only what it is about to change while another document
-/// holds it. Nothing here recurses on the call stack with the depth of the input.
+/// the value, however large; only SetKeyValue copies, and only what it is about to change while another
+/// document holds it. Nothing here recurses on the call stack with the depth of the input.
 ///
-/// Threads: one thread at a time for a document and all that were copied or taken from it, since they share a tree.
+/// Threads: one thread at a time for a document and all that were copied or taken from it, since they share a
+/// tree.
 ///
 /// Failure: what needs memory throws std::bad_alloc when there is none. Nothing else but SetKeyValue throws.
 class JsonDocument { // NOLINT(cppcoreguidelines-special-member-functions): see its copy constructor
@@ -47,8 +48,9 @@ public:
 
     /// Sets the member `key`. All members of that name are replaced by one, in the first one's place; a new
     /// one goes to the end. A null document becomes an object first; any other that is no object throws
-    /// std::logic_error, because its content would be lost silently. In a text, bytes that are no UTF-8 are replaced
-    /// by U+FFFD, so that what is printed parses again. A document whose memory ran out on the way is null.
+    /// std::logic_error, because its content would be lost silently. In a text, bytes that are no UTF-8 are
+    /// replaced by U+FFFD, so that what is printed parses again. A document whose memory ran out on the way
+    /// is null.
     void SetKeyValue(const std::string& key, const std::string& value);
     void SetKeyValue(const std::string& key, const JsonDocument& value);
 

@@ -9,8 +9,9 @@
 #include <rapidjson/stringbuffer.h>
 #include <rapidjson/writer.h>
 
-// RapidJSON's classes with memory of our own. Its own allocators return null when there is none, and nothing in the library
-// looks at that: a report that met the end of the memory ended the process. Use these names, and not the library's.
+// RapidJSON's classes with memory of our own. Its own allocators return null when there is none, and nothing
+// in the library looks at that: a report that met the end of the memory ended the process. Use these names,
+// and not the library's.
 namespace SystemTool::IO {
 
 /// Throws std::bad_alloc, and no call returns without the memory that was asked for.

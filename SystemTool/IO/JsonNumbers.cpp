@@ -39,7 +39,8 @@ std::size_t SkipNumber(std::string_view json, std::size_t at) {
     return IsDigit(json, exponent) ? SkipDigits(json, exponent) : at;
 }
 
-/// A text with the number's value and an exponent that the parser takes; empty when there is none, or no need of one.
+/// A text with the number's value and an exponent that the parser takes; empty when there is none, or no need
+/// of one.
 std::string StandIn(const std::string& number) {
     const double value = std::strtod(number.c_str(), nullptr);
     if (value == 0)

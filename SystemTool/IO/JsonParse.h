@@ -17,11 +17,13 @@
 #include "SystemTool/IO/JsonNumbers.h"
 #include "SystemTool/Text/Utf8.h"
 
-// How a JSON text is read: JsonDocument and the encoder of analytics events use it, so that both read numbers alike.
+// How a JSON text is read: JsonDocument and the encoder of analytics events use it, so that both read numbers
+// alike.
 namespace SystemTool::IO {
 
-// Numbers come as their texts. The parser's own conversion loses some: 1.84467440737095516155 runs over in its 64 bits
-// and comes out as anything, 10e308 as next to nothing, and 17976931348623159e292 as an infinity, which JSON cannot hold.
+// Numbers come as their texts. The parser's own conversion loses some: 1.84467440737095516155 runs over in
+// its 64 bits and comes out as anything, 10e308 as next to nothing, and 17976931348623159e292 as an infinity,
+// which JSON cannot hold.
 inline constexpr unsigned JSON_PARSE_FLAGS =
     rapidjson::kParseIterativeFlag | rapidjson::kParseNumbersAsStringsFlag;
 
@@ -66,8 +68,8 @@ public:
             return m_document.Int64(*integer);
         if (const auto integer = IntegerOf<std::uint64_t>({text, length}))
             return m_document.Uint64(*integer);
-        // Not std::from_chars, which the standard library of macOS lacks for doubles. The decimal point is that of the
-        // C locale, which no program of ours leaves.
+        // Not std::from_chars, which the standard library of macOS lacks for doubles. The decimal point is
+        // that of the C locale, which no program of ours leaves.
         const double number = std::strtod(text, nullptr);
         return std::isinf(number) ? Refuse("Number too big to be stored in double.")
                                   : m_document.Double(number);
@@ -148,8 +150,8 @@ private:
     const char* m_refusal = "";
 };
 
-/// Fills `tree` with the value of `text`. Returns what is wrong with the text and at which byte; empty when it is JSON, and
-/// only then the tree has a value.
+/// Fills `tree` with the value of `text`. Returns what is wrong with the text and at which byte; empty when
+/// it is JSON, and only then the tree has a value.
 inline std::string ReadJson(const std::string& text, JsonTree& tree, int maxDepth = JsonDocument::MAX_DEPTH) {
     JsonParse parse(text, maxDepth);
     tree.Populate(parse);

@@ -22,8 +22,8 @@ int MakeOne(const std::string& path, mode_t mode) {
     struct stat status {};
     if (::lstat(path.c_str(), &status) == 0 && (status.st_mode & 07777) == mode)
         return 0;
-    // The mode is wider than a new directory's, or the umask took rights of the owner away. Not through a link: another
-    // user who may write the parent could have put one there meanwhile.
+    // The mode is wider than a new directory's, or the umask took rights of the owner away. Not through a
+    // link: another user who may write the parent could have put one there meanwhile.
     // A file system without modes refuses, which is no reason to have no directory.
     [[maybe_unused]] const int ignored = ::fchmodat(AT_FDCWD, path.c_str(), mode, AT_SYMLINK_NOFOLLOW);
     return 0;

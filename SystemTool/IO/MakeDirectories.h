@@ -16,9 +16,9 @@ struct DirectoryFailure {
 
 inline constexpr mode_t PRIVATE_DIRECTORY = 0700;
 
-/// Makes the directory at `path` and its missing parents. When this returns without a failure, each directory that it
-/// made has its mode, under any umask, on a file system that knows modes. A directory that exists keeps
-/// its mode: it may hold other things.
+/// Makes the directory at `path` and its missing parents. When this returns without a failure, each directory
+/// that it made has its mode, under any umask, on a file system that knows modes. A directory that exists
+/// keeps its mode: it may hold other things.
 ///
 /// A new directory is private until it has its mode. A symbolic link to a directory counts as a directory.
 /// Threads: any. The umask is not changed.

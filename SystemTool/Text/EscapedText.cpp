@@ -34,9 +34,10 @@ std::size_t PlainLength(std::string_view text) {
     return length;
 }
 
-/// Characters that make a line read as what it is not. U+2028 and U+2029 end a line in some editors; U+061C, U+200E,
-/// U+200F, U+202A to U+202E and U+2066 to U+2069 turn the direction of text; U+200B to U+200D, U+2060 to U+2064, U+FEFF
-/// and the tags U+E0000 to U+E007F are there and not seen. `character` is one whole character in UTF-8.
+/// Characters that make a line read as what it is not. U+2028 and U+2029 end a line in some editors; U+061C,
+/// U+200E, U+200F, U+202A to U+202E and U+2066 to U+2069 turn the direction of text; U+200B to U+200D, U+2060
+/// to U+2064, U+FEFF and the tags U+E0000 to U+E007F are there and not seen. `character` is one whole
+/// character in UTF-8.
 bool ChangesTheLine(std::string_view character) {
     const auto isBetween = [character](std::string_view first, std::string_view last) {
         return character >= first && character <= last; // UTF-8 sorts as the characters' numbers do

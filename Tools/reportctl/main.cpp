@@ -22,8 +22,8 @@ int Run(int argc, char** argv) {
 int main(int argc, char** argv) {
     SystemTool::IO::OpenClosedStandardDescriptors();
 
-    // The caller's mask does not count: a file or directory is its owner's alone from the moment it exists, and is
-    // opened to others afterwards where that is meant.
+    // The caller's mask does not count: a file or directory is its owner's alone from the moment it exists,
+    // and is opened to others afterwards where that is meant.
     ::umask(0077);
 
     try {

@@ -1,6 +1,7 @@
-// Bare SQLite, opened as the plug-in opens it: the rows that the service makes of reports, and a commit after every
-// so many. Either each row is a statement's text, there already but for its number, which SQLite compiles; or one
-// statement is prepared and gets the values of each row, which is the least that a store can do.
+// Bare SQLite, opened as the plug-in opens it: the rows that the service makes of reports, and a commit after
+// every so many. Either each row is a statement's text, there already but for its number, which SQLite
+// compiles; or one statement is prepared and gets the values of each row, which is the least that a store can
+// do.
 
 #include <iostream>
 #include <string>
@@ -29,7 +30,8 @@ std::string Statement(std::int64_t number) {
                        number);
 }
 
-/// The same row with a statement that is compiled once. All values are bound anew, as those of a report would have to be.
+/// The same row with a statement that is compiled once. All values are bound anew, as those of a report would
+/// have to be.
 class PreparedRow {
 public:
     explicit PreparedRow(SQLite::Database& database)

@@ -1,6 +1,6 @@
 // Sees rows appear as another program that reads the same database does: looks again and again whether
-// another program committed, and then reads the numbers of the new rows. What it prints as JSON tells, beside the
-// latencies, how often it looked, which is how exact they are.
+// another program committed, and then reads the numbers of the new rows. What it prints as JSON tells, beside
+// the latencies, how often it looked, which is how exact they are.
 
 #include <algorithm>
 #include <iostream>

@@ -8,13 +8,13 @@
 #include "App/ReportServer.h"
 #include "tests/fakes/FakeSdk.h"
 
-/// The service without its port and its threads: a text is received, queued and consumed on the target's thread, one
-/// after the other. Wants the fake SDK beside the program.
+/// The service without its port and its threads: a text is received, queued and consumed on the target's
+/// thread, one after the other. Wants the fake SDK beside the program.
 class FuzzedServer final : public SyncServiceReport::ReportServer {
 public:
     FuzzedServer() {
-        // A socket is bound once at most: so Start does not get the service's port, complains to standard output, and
-        // has no receiving thread, whose end would take 250 ms.
+        // A socket is bound once at most: so Start does not get the service's port, complains to standard
+        // output, and has no receiving thread, whose end would take 250 ms.
         m_socket.bind(Poco::Net::SocketAddress("127.0.0.1", 0));
         std::streambuf* const output = std::cout.rdbuf(nullptr);
         Start();
@@ -45,8 +45,8 @@ private:
     std::string m_suiteVersion;
 };
 
-/// A server for each input, so that nothing but its file is needed to see a finding again. One that an input left as it
-/// was serves the next input too: a new one takes longer than most inputs.
+/// A server for each input, so that nothing but its file is needed to see a finding again. One that an input
+/// left as it was serves the next input too: a new one takes longer than most inputs.
 class ServerPerInput {
 public:
     FuzzedServer& Next() {

@@ -13,8 +13,8 @@
 using namespace SyncServiceReport;
 using ::testing::ExitedWithCode;
 
-// A mistake in the program, on each of its threads. Unlike a signal that was sent, its fault comes again if the handler
-// returns.
+// A mistake in the program, on each of its threads. Unlike a signal that was sent, its fault comes again if
+// the handler returns.
 
 namespace {
 
@@ -23,8 +23,8 @@ namespace {
     *nowhere = 1; // NOLINT(clang-analyzer-core.NullDereference): what is asked for
 }
 
-/// Has the thread that logs a record of `function` make the mistake then. A record of the trace that comes from the same
-/// thread is followed by a line that says so.
+/// Has the thread that logs a record of `function` make the mistake then. A record of the trace that comes
+/// from the same thread is followed by a line that says so.
 void MakeTheMistakeIn(const std::string& function) {
     FakeLogger().echoes = true;
     FakeLogger().onWrite = [function](const LogRecord& record) {

@@ -17,7 +17,8 @@
 #include "tests/support/CapturedOutput.h"
 #include "tests/support/WaitUntil.h"
 
-// Who else may bind the report port. A socket's options say, its own and those of the sockets that it would share with.
+// Who else may bind the report port. A socket's options say, its own and those of the sockets that it would
+// share with.
 
 namespace {
 

@@ -77,8 +77,8 @@ public:
 
     void Join() { m_thread.join(); }
 
-    /// From here on, the socket's descriptor is another file, as after a wrong second close by other code. By bare
-    /// system calls: a sanitizer takes it for the mistake that it is.
+    /// From here on, the socket's descriptor is another file, as after a wrong second close by other code. By
+    /// bare system calls: a sanitizer takes it for the mistake that it is.
     void LoseTheSocket() {
         const int other = ::open("/dev/null", O_RDWR | O_CLOEXEC);
         ::syscall(SYS_dup3, other, m_socket.impl()->sockfd(), O_CLOEXEC);

@@ -100,7 +100,8 @@ private:
         (event.id.starts_with("A") ? m_forAnalytics : m_forStore).push_back(event);
     }
 
-    /// JSON that another parser takes is not refused for its grammar. (Half of a surrogate pair, that parser lets pass.)
+    /// JSON that another parser takes is not refused for its grammar. (Half of a surrogate pair, that parser
+    /// lets pass.)
     static void ExpectThatItIsRefusedRightly(const RandomEvent& event, Result result) {
         if (result != Result::InvalidJson || event.kind != RandomEvent::Kind::Json ||
             event.id.starts_with("A") || event.value.find("\\u") != std::string::npos)

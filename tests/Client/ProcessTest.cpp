@@ -22,7 +22,8 @@ using ::testing::ElementsAre;
 using ::testing::SizeIs;
 using ::testing::StartsWith;
 
-// What a program may do around a reporter: many threads, forks, closing what it does not know, running out of memory.
+// What a program may do around a reporter: many threads, forks, closing what it does not know, running out of
+// memory.
 
 namespace {
 
@@ -40,7 +41,8 @@ protected:
         return static_cast<Result>(WEXITSTATUS(status));
     }
 
-    /// The descriptor that the reporter opens for its first event: the one that is connected to the service's port.
+    /// The descriptor that the reporter opens for its first event: the one that is connected to the service's
+    /// port.
     int DescriptorOfTheReporter() {
         constexpr int MOST_DESCRIPTORS = 256;
         EXPECT_EQ(m_reporter.Event("B1"), Result::Sent);

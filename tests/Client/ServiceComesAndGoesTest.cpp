@@ -182,9 +182,9 @@ TEST_F(ServiceComesAndGoes, AnEventWhoseModuleCouldNotBeAnnouncedIsNotSent) {
     EXPECT_THAT(m_port->Take(), ElementsAre(INIT, EventWithId("A100|2")));
 }
 
-/// A loopback that passes a thousand bytes a second, while this lives: what waits for its turn fills the sender's buffer. Of
-/// the test's own network; but what was left in it would be answered later, and take the room for such answers from
-/// all networks of the machine.
+/// A loopback that passes a thousand bytes a second, while this lives: what waits for its turn fills the
+/// sender's buffer. Of the test's own network; but what was left in it would be answered later, and take the
+/// room for such answers from all networks of the machine.
 class SlowNetwork {
 public:
     SlowNetwork()

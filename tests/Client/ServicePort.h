@@ -6,7 +6,8 @@
 #include <Poco/Net/DatagramSocket.h>
 #include <Poco/Net/SocketAddress.h>
 
-/// Listens where the service would, and reads nothing into what arrives. In the sandbox only, which has the port to itself.
+/// Listens where the service would, and reads nothing into what arrives. In the sandbox only, which has the
+/// port to itself.
 class ServicePort {
 public:
     ServicePort() : m_socket(Poco::Net::SocketAddress("127.0.0.1", 9997)) {

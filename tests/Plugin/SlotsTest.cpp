@@ -7,11 +7,13 @@
 #include "Plugin/IMetrikSdk.h"
 #include "Plugin/ISqliteDatabase.h"
 
-// The order of the operations is the plug-ins' binary interface: a plug-in that was built yesterday has them so.
+// The order of the operations is the plug-ins' binary interface: a plug-in that was built yesterday has them
+// so.
 
 namespace {
 
-/// The place of a virtual operation in its class's table. A pointer to one holds one more than its offset in bytes.
+/// The place of a virtual operation in its class's table. A pointer to one holds one more than its offset in
+/// bytes.
 template <typename Operation>
 std::size_t SlotOf(Operation operation) {
     std::uintptr_t offset = 0;

@@ -18,8 +18,8 @@ namespace {
 
 using namespace std::chrono_literals;
 
-/// From the fault to the end of the process: the second that is promised, and room for a busy test machine. Less than the
-/// five seconds after which the handler's own deadline would end it.
+/// From the fault to the end of the process: the second that is promised, and room for a busy test machine.
+/// Less than the five seconds after which the handler's own deadline would end it.
 constexpr auto DEADLINE = 4s;
 
 /// What puts the service under load.
@@ -98,7 +98,8 @@ TEST_F(Crash, UnderLoadIsTraced) {
 }
 
 TEST_F(Crash, OfAThreadAtWorkEndsTheProcess) {
-    // The fault may hit a thread while it holds the allocator's lock; then the trace is lost, but not the end.
+    // The fault may hit a thread while it holds the allocator's lock; then the trace is lost, but not the
+    // end.
     int traced = 0;
     constexpr int CRASHES = 6;
     for (int i = 0; i < CRASHES; ++i) {

@@ -84,7 +84,8 @@ private:
     std::thread m_thread;
 };
 
-/// What a reader with a connection of its own has seen in the store: the number of each row's report, by the row's id.
+/// What a reader with a connection of its own has seen in the store: the number of each row's report, by the
+/// row's id.
 class Reader {
 public:
     explicit Reader(std::string file) : m_file(std::move(file)) {}
@@ -215,8 +216,8 @@ protected:
                     ElementsAre("1|1"));
     }
 
-    /// Rows are in the order in which their reports were sent, and what is missing between two of them was lost by a
-    /// kill or dropped by the kernel.
+    /// Rows are in the order in which their reports were sent, and what is missing between two of them was
+    /// lost by a kill or dropped by the kernel.
     void ExpectOrderWithoutGaps() {
         const auto& numbers = m_reader.Numbers();
         std::int64_t missing = 0;

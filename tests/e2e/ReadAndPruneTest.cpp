@@ -9,7 +9,8 @@
 #include "tests/e2e/support/Service.h"
 #include "tests/support/WaitUntil.h"
 
-// What people do with the store while the service writes to it: nothing that it is sent may be lost or refused.
+// What people do with the store while the service writes to it: nothing that it is sent may be lost or
+// refused.
 
 namespace {
 
@@ -85,7 +86,8 @@ TEST_F(StoreInUse, IsPrunedWithoutAReportLost) {
     Stream reports;
     ASSERT_EQ(m_service.Reportctl({"prune", "--older-than", "2025-01-01", "--yes"}), 0) << m_service.Output();
     const auto walBytes = WalBytes();
-    // The file is cut by the merge of a log that no writer is behind; the service's own may come a little later.
+    // The file is cut by the merge of a log that no writer is behind; the service's own may come a little
+    // later.
     EXPECT_TRUE(WaitUntil([&] { return std::filesystem::file_size(m_service.DatabaseFile()) < before / 2; }))
         << "the space was not given back";
     ExpectAllStored(reports.Stop());

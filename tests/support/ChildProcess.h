@@ -18,8 +18,8 @@
 
 /// A second process, which runs a function of the test. Killed with this object.
 ///
-/// Start it before this process opens a database or starts a thread: neither survives a fork. The child ends without
-/// exit handlers, unless the function calls exit itself.
+/// Start it before this process opens a database or starts a thread: neither survives a fork. The child ends
+/// without exit handlers, unless the function calls exit itself.
 class ChildProcess {
 public:
     /// For a function that can tell the parent, once, that it is where the parent waits for it.

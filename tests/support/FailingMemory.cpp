@@ -72,8 +72,8 @@ void operator delete(void* memory, std::size_t) noexcept {
 
 const bool FailingMemory::FAILS_IN_C = true;
 
-// The program's own come before the C library's, for the libraries that it loads, too. What they return is the C library's
-// memory, which its free takes back.
+// The program's own come before the C library's, for the libraries that it loads, too. What they return is
+// the C library's memory, which its free takes back.
 extern "C" {
 
 void* __libc_malloc(std::size_t bytes);

@@ -1,7 +1,8 @@
 #pragma once
 
-/// Has allocations of the calling thread fail while this object lives: by operator new, and by the C library where no
-/// sanitizer has a heap of its own. A program that uses it links FailingMemory.cpp. One at a time on a thread.
+/// Has allocations of the calling thread fail while this object lives: by operator new, and by the C library
+/// where no sanitizer has a heap of its own. A program that uses it links FailingMemory.cpp. One at a time on
+/// a thread.
 class FailingMemory {
 public:
     static constexpr int ALL = 1'000'000'000;

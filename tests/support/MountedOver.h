@@ -6,8 +6,8 @@
 
 #include <sys/mount.h>
 
-/// One file in the place of another one while this object lives; the other one is made where there is none. Needs the
-/// sandbox, whose mounts are its own.
+/// One file in the place of another one while this object lives; the other one is made where there is none.
+/// Needs the sandbox, whose mounts are its own.
 class MountedOver {
 public:
     MountedOver(const std::string& file, std::string place) : m_place(std::move(place)) {

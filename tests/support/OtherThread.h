@@ -9,7 +9,8 @@
 
 #include "tests/support/WaitUntil.h"
 
-/// Whether the kernel has put the thread to sleep, as it does while the thread waits for a lock, another thread or time.
+/// Whether the kernel has put the thread to sleep, as it does while the thread waits for a lock, another
+/// thread or time.
 inline bool IsAsleep(pid_t thread) {
     std::ifstream file("/proc/self/task/" + std::to_string(thread) + "/stat");
     std::string fields;

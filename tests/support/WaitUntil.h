@@ -4,7 +4,8 @@
 #include <thread>
 
 /// Whether `condition` became true before the deadline. It sleeps for a millisecond between two
-/// looks. A test sleeps nowhere else, but where time itself is what it is about: a lock that is held for seconds, a pace.
+/// looks. A test sleeps nowhere else, but where time itself is what it is about: a lock that is held for
+/// seconds, a pace.
 template <typename Condition>
 bool WaitUntil(Condition condition, std::chrono::milliseconds deadline = std::chrono::seconds(10)) {
     const auto end = std::chrono::steady_clock::now() + deadline;

@@ -1,5 +1,5 @@
-/* The same library for C, and for what can call C. hublink/report.hpp tells it in full: what each result means, which
- * threads may call (any), and what survives a fork (everything).
+/* The same library for C, and for what can call C. hublink/report.hpp tells it in full: what each result
+ * means, which threads may call (any), and what survives a fork (everything).
  *
  *     hublink_reporter *reporter = hublink_reporter_new("A100", "2.1", "Painter");
  *     hublink_reporter_event_json(reporter, "A100|10001", "{\"clicks\":3}");
@@ -42,8 +42,9 @@ typedef enum hublink_result {
 
 typedef struct hublink_reporter hublink_reporter;
 
-/* A reporter for the local store and for a module of the program's own; with NULLs, without such a module. NULL when
- * there is no memory, which every function below takes: it answers HUBLINK_SYSTEM_ERROR, or does nothing. */
+/* A reporter for the local store and for a module of the program's own; with NULLs, without such a module.
+ * NULL when there is no memory, which every function below takes: it answers HUBLINK_SYSTEM_ERROR, or does
+ * nothing. */
 HUBLINK_C_EXPORT HUBLINK_C_USE_RESULT hublink_reporter*
 hublink_reporter_new(const char* module_id, const char* module_version, const char* module_name);
 

@@ -9,8 +9,8 @@
 namespace hublink {
 namespace {
 
-/// How long events may get lost after a restart that none of them fell into. Asking costs 15 µs, and so 15 millionths of
-/// the time.
+/// How long events may get lost after a restart that none of them fell into. Asking costs 15 µs, and so 15
+/// millionths of the time.
 constexpr std::chrono::seconds LOOK_INTERVAL{1};
 
 /// Where a restart cannot be seen: a user does not miss the events of so long, and a datagram is nothing.
@@ -103,8 +103,8 @@ bool Channel::IsOthersService(Clock::time_point now) noexcept {
     return m_isOthers && !m_allowsOthers;
 }
 
-/// The system may not report a refusal: a flood can fill the buffer for such messages. So where no program was seen
-/// to listen, a second look decides.
+/// The system may not report a refusal: a flood can fill the buffer for such messages. So where no program
+/// was seen to listen, a second look decides.
 bool Channel::IsNobodyThere() noexcept {
     if (!m_isServiceKnown)
         LookWhoListens(Clock::now());

@@ -18,9 +18,9 @@ namespace hublink {
 ///        │                  └─► another user's
 ///        └── the next event asks anew
 ///
-/// A datagram goes out behind the announcements that are due: the user, when one was set, and the module, when the event is
-/// of that module. When one of these cannot be sent, neither is the event, which the service would lose or give to the wrong
-/// user.
+/// A datagram goes out behind the announcements that are due: the user, when one was set, and the module,
+/// when the event is of that module. When one of these cannot be sent, neither is the event, which the
+/// service would lose or give to the wrong user.
 ///
 /// Threads: any.
 class Channel final : private ForkGuard {

@@ -5,14 +5,15 @@
 namespace hublink {
 namespace {
 
-/// Guards the list and is taken before any guard's own lock. Both are never destroyed: a reporter may be static.
+/// Guards the list and is taken before any guard's own lock. Both are never destroyed: a reporter may be
+/// static.
 std::mutex g_listMutex;
 ForkGuard* g_first = nullptr;
 
 } // namespace
 
-/// When the library is loaded, and not with the first guard, which a fork might fall into. Without memory for the handlers
-/// a child shares its parent's socket, which works, but mixes up their errors.
+/// When the library is loaded, and not with the first guard, which a fork might fall into. Without memory for
+/// the handlers a child shares its parent's socket, which works, but mixes up their errors.
 const int ForkGuard::HANDLERS = ::pthread_atfork(&BeforeFork, &AfterForkInParent, &AfterForkInChild);
 
 void ForkGuard::Enlist() noexcept {

@@ -43,7 +43,8 @@ bool Connect(int descriptor) {
     return ::connect(descriptor, reinterpret_cast<const sockaddr*>(&service), sizeof service) == 0;
 }
 
-/// What an open socket that is ours answers to no call: the program closed the descriptor, and may use it for another file.
+/// What an open socket that is ours answers to no call: the program closed the descriptor, and may use it for
+/// another file.
 bool IsNotOurs(int error) {
     return error == EBADF || error == ENOTSOCK || error == EDESTADDRREQ || error == ENOTCONN;
 }

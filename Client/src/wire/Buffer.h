@@ -9,8 +9,8 @@ namespace hublink::wire {
 /// What the service receives a datagram into; it cuts what is longer.
 inline constexpr std::size_t MAX_DATAGRAM_BYTES = 10240;
 
-/// A text that is put together in memory of the caller's, without an allocation. What no longer fits is dropped, and
-/// remembered: a caller appends everything and asks once.
+/// A text that is put together in memory of the caller's, without an allocation. What no longer fits is
+/// dropped, and remembered: a caller appends everything and asks once.
 class Buffer {
 public:
     Buffer(char* begin, std::size_t capacity) : m_begin(begin), m_at(begin), m_end(begin + capacity) {}

@@ -6,8 +6,8 @@
 
 namespace hublink::wire {
 
-/// Some bytes, each looked up in one step. The standard library's find_first_of searches the whole set for each byte, which
-/// made JSON cost an event as much as the datagram does.
+/// Some bytes, each looked up in one step. The standard library's find_first_of searches the whole set for
+/// each byte, which made JSON cost an event as much as the datagram does.
 class ByteSet {
 public:
     constexpr explicit ByteSet(std::string_view bytes) {

@@ -37,7 +37,8 @@ int UnitAt(std::string_view text) {
     return unit;
 }
 
-/// The length of the escape at the start of the text, of both halves of a surrogate pair; 0 when there is none.
+/// The length of the escape at the start of the text, of both halves of a surrogate pair; 0 when there is
+/// none.
 std::size_t EscapeLength(std::string_view text) {
     constexpr std::string_view SIMPLE = "\"\\/bfnrt";
     if (text.size() > 1 && SIMPLE.find(text[1]) != std::string_view::npos)
@@ -184,7 +185,8 @@ private:
     bool m_isBegun = false; ///< The innermost level has no value yet.
 };
 
-/// Hands the parts of a JSON text to `take`, without white space: each string, quotes included, and what stands between.
+/// Hands the parts of a JSON text to `take`, without white space: each string, quotes included, and what
+/// stands between.
 template <typename Take>
 void ForEachPart(std::string_view json, Take take) {
     while (!json.empty()) {

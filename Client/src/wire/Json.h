@@ -18,13 +18,15 @@ struct JsonFacts {
     bool isCompact = true;   ///< There is no white space between its parts.
 };
 
-/// More levels make a datagram that is too long; what is nested deeper is not read to its end, and counts as no JSON.
+/// More levels make a datagram that is too long; what is nested deeper is not read to its end, and counts as
+/// no JSON.
 inline constexpr std::size_t MAX_LEVELS = MAX_DATAGRAM_BYTES;
 
 /// Reads a valid text (IsText) by JSON's grammar; an escape must be a whole character. Does not recurse.
 JsonFacts ReadJson(std::string_view text);
 
-/// Appends JSON (ReadJson) as a JSON value, without white space. With doubled quotes, those behind an escape too.
+/// Appends JSON (ReadJson) as a JSON value, without white space. With doubled quotes, those behind an escape
+/// too.
 /// `isCompact`: there is no white space, as JsonFacts says.
 void AppendJson(Buffer& buffer, std::string_view json, Quotes quotes, bool isCompact);
 

@@ -34,8 +34,8 @@ Fate FateOfInteger(std::string_view number) {
     return FitsIn64Bits(number.substr(isNegative ? 1 : 0), isNegative) ? Fate::Exact : Fate::Lost;
 }
 
-/// A number with a fraction or an exponent: its digits from the first to the last that are not zero, and the power of ten of
-/// the first.
+/// A number with a fraction or an exponent: its digits from the first to the last that are not zero, and the
+/// power of ten of the first.
 class Decimal {
 public:
     explicit Decimal(std::string_view number) {

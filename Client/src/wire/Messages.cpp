@@ -25,8 +25,8 @@ void AppendValue(Buffer& buffer, const Report& report) {
     }
 }
 
-/// The inside of a JSON string in a control message. The service takes any text with these letters in it for a report;
-/// with one of them escaped, they read the same.
+/// The inside of a JSON string in a control message. The service takes any text with these letters in it for
+/// a report; with one of them escaped, they read the same.
 void AppendMasked(Buffer& buffer, std::string_view text) {
     constexpr std::string_view MARK = "eventID";
     constexpr std::string_view MASKED = "event\\u0049D";

@@ -5,16 +5,17 @@
 #include "wire/Buffer.h"
 #include "wire/Text.h"
 
-// The texts that the service reads, and the one place that knows how they are written. They are written as they are asked
-// for: what a text must be so that the service can use it is for the caller to know. All texts are valid (IsText).
+// The texts that the service reads, and the one place that knows how they are written. They are written as
+// they are asked for: what a text must be so that the service can use it is for the caller to know. All texts
+// are valid (IsText).
 namespace hublink::wire {
 
 /// How a report's value is written.
 enum class ValueForm {
-    Nothing, ///< There is none.
-    Text,    ///< A text, as a JSON string.
-    Json,    ///< JSON, as it is. The service reads it, and prints it again if it is an object.
-    JsonText, ///< JSON, as the contents of a JSON string. The service takes it for a text, and changes nothing.
+    Nothing,  ///< There is none.
+    Text,     ///< A text, as a JSON string.
+    Json,     ///< JSON, as it is. The service reads it, and prints it again if it is an object.
+    JsonText, ///< JSON, as the contents of a JSON string: a text, which the service leaves as it is.
 };
 
 struct Report {

@@ -23,9 +23,10 @@ struct EndpointConfig {
 };
 
 /// What the environment asks for; nothing when events are to stay in the outbox: no endpoint is set,
-/// OTEL_SDK_DISABLED is true, or OTEL_LOGS_EXPORTER is none. What is set and has no effect is described, too. A variable that makes no sense is described in `complaints` and counts as unset, so
-/// that the common one of its pair holds; of a list of headers only the one that makes no sense is left out.
-/// `lookUp` returns the value of a variable, or null; empty counts as unset.
+/// OTEL_SDK_DISABLED is true, or OTEL_LOGS_EXPORTER is none. What is set and has no effect is described, too.
+/// A variable that makes no sense is described in `complaints` and counts as unset, so that the common one of
+/// its pair holds; of a list of headers only the one that makes no sense is left out. `lookUp` returns the
+/// value of a variable, or null; empty counts as unset.
 using LookUp = std::function<const char*(const char*)>;
 std::optional<EndpointConfig> ReadEndpoint(const LookUp& lookUp, std::vector<std::string>& complaints);
 

@@ -39,7 +39,8 @@ void InitialiseLibrary() {
 }
 
 /// Every option is one that this library's minimum version knows. One that is refused all the same, by a TLS
-/// backend that cannot do it say, must not be passed over: the next request would be less safe than was asked for.
+/// backend that cannot do it say, must not be passed over: the next request would be less safe than was asked
+/// for.
 template <typename Value>
 void Set(CURL* easy, CURLoption option, Value value) {
     if (const auto code = ::curl_easy_setopt(easy, option, value); code != CURLE_OK)

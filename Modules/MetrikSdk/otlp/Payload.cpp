@@ -14,7 +14,8 @@ constexpr std::int64_t MAX_CREATE_TIME_MS = 9'223'372'036'854;
 
 } // namespace
 
-/// Read by the service's own rules, and iteratively: what follows may use the call stack freely, since the depth is known.
+/// Read by the service's own rules, and iteratively: what follows may use the call stack freely, since the
+/// depth is known.
 ///
 /// What the service takes as a report's value is one level deeper in its payload.
 Payload::Payload(const std::string& text)

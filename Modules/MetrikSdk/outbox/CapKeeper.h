@@ -13,8 +13,9 @@
 
 namespace MetrikSdk::outbox {
 
-/// Keeps an outbox within its caps: knows how much waits, looks for what is too much or too old, and drops it. The rules
-/// are PruneRule's; here is when to look, and what was seen of the clocks since the file was opened.
+/// Keeps an outbox within its caps: knows how much waits, looks for what is too much or too old, and drops
+/// it. The rules are PruneRule's; here is when to look, and what was seen of the clocks since the file was
+/// opened.
 ///
 /// Threads: one at a time. Failure: throws StoreError.
 class CapKeeper {
@@ -32,8 +33,8 @@ public:
     /// Asks the file how much waits, after a change that the caller did not count.
     void Recount(OutboxStore& store);
 
-    /// Drops the oldest events that are too much, and those that are too old, if it is time to look for those. Appends
-    /// what is to be told.
+    /// Drops the oldest events that are too much, and those that are too old, if it is time to look for
+    /// those. Appends what is to be told.
     void KeepWithinCaps(OutboxStore& store, SteadyTime now, std::vector<report::News>& news);
 
     /// Tells the totals of a run of drops that is over.

@@ -10,8 +10,9 @@
 
 namespace MetrikSdk::outbox {
 
-/// Wakes one waiting thread when a count has grown far enough for it. Threads: Set and Stop by any, Await by one. As long
-/// as the waiting thread needs no waking, Set takes no lock: it writes one atomic number and reads another.
+/// Wakes one waiting thread when a count has grown far enough for it. Threads: Set and Stop by any, Await by
+/// one. As long as the waiting thread needs no waking, Set takes no lock: it writes one atomic number and
+/// reads another.
 class CountWaiter {
 public:
     static constexpr std::int64_t NEVER = std::numeric_limits<std::int64_t>::max();

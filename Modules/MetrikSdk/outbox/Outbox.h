@@ -30,12 +30,12 @@ public:
     /// Stores the event. True once it survives kill -9 of this process.
     bool Append(const ModuleIdentity& module, std::string eventId, std::string payload);
 
-    /// Whether the last event or opening failed because another user could change the directory. Its modules are to use
-    /// another outbox.
+    /// Whether the last event or opening failed because another user could change the directory. Its modules
+    /// are to use another outbox.
     bool IsUnsafe() const { return m_isUnsafe; }
 
-    /// The oldest events but those of `without`. They are under way until Release, also when the file is opened anew
-    /// meanwhile: a cap drops others first.
+    /// The oldest events but those of `without`. They are under way until Release, also when the file is
+    /// opened anew meanwhile: a cap drops others first.
     Batch Take(std::size_t maxEvents, const EventKeys& without = {});
 
     /// The event, if it still waits. The same holds for it.
@@ -45,14 +45,14 @@ public:
     void RemoveDelivered(const Batch& batch, std::size_t refused);
     void MoveToDeadLetters(const StoredEvent& event, const Refusal& refusal);
 
-    /// Tells the totals of what is being lost, because a listener is about to go. Not if another thread hangs in the file
-    /// system with the lock: going must not wait for it.
+    /// Tells the totals of what is being lost, because a listener is about to go. Not if another thread hangs
+    /// in the file system with the lock: going must not wait for it.
     void EndRuns();
 
     OutboxStatus Status();
 
-    /// How many events wait, as far as this process knows: it learns within a minute what another process does to the
-    /// same file.
+    /// How many events wait, as far as this process knows: it learns within a minute what another process
+    /// does to the same file.
     CountWaiter& WaitingCount() { return m_waitingCount; }
 
 private:

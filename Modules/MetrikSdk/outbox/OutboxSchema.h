@@ -60,8 +60,8 @@ CREATE TABLE totals(
     last_delivered_ms    INTEGER);
 )sql";
 
-/// From version 1, whose modules were kept for ever. Which of them have an event waiting is not known: until the last that
-/// waits now has left, all of them count as such.
+/// From version 1, whose modules were kept for ever. Which of them have an event waiting is not known: until
+/// the last that waits now has left, all of them count as such.
 constexpr const char* MIGRATION = R"sql(
 ALTER TABLE module ADD COLUMN last_event INTEGER NOT NULL DEFAULT 0;
 UPDATE module SET last_event = (SELECT coalesce(max(id), 0) FROM event);
@@ -77,11 +77,11 @@ DROP TRIGGER event_stored;
 DROP VIEW outbox_status;
 )sql";
 
-/// The trigger keeps the sums right in the very statement that stores an event, so that storing is one statement, and
-/// nothing ever has to count the events.
+/// The trigger keeps the sums right in the very statement that stores an event, so that storing is one
+/// statement, and nothing ever has to count the events.
 ///
-/// What a module's rows and their indexes cost is estimated from above: a text over some 200 bytes takes a page of its own
-/// in an index.
+/// What a module's rows and their indexes cost is estimated from above: a text over some 200 bytes takes a
+/// page of its own in an index.
 constexpr const char* TRIGGER_AND_VIEW = R"sql(
 CREATE INDEX dead_letter_module ON dead_letter(module);
 CREATE TRIGGER event_stored AFTER INSERT ON event BEGIN

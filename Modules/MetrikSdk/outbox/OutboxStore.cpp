@@ -244,8 +244,9 @@ bool OutboxStore::Delete(const StoredEvent& event) {
     return statement->exec() == 1;
 }
 
-/// To be called in the transaction that removed events. Modules of few events go first: a flood of them does not push out
-/// one that reports every day. The newest is kept, so that no key is given out twice: another process may know it.
+/// To be called in the transaction that removed events. Modules of few events go first: a flood of them does
+/// not push out one that reports every day. The newest is kept, so that no key is given out twice: another
+/// process may know it.
 void OutboxStore::ForgetIdleModules() {
     if (Number(m_database, "SELECT EXISTS (SELECT 1 FROM event)") == 0) // the next ones get low rows again
         m_database.exec("UPDATE module SET last_event = 0 WHERE last_event > 0");
@@ -354,7 +355,8 @@ std::size_t OutboxStore::TrimDeadLetters(std::size_t maxRows, std::size_t maxByt
     });
 }
 
-/// Deletes the oldest events behind `afterRow`, of one module or (0) of all, as long as `goesOn` says so for the next one.
+/// Deletes the oldest events behind `afterRow`, of one module or (0) of all, as long as `goesOn` says so for
+/// the next one.
 template <typename GoesOn>
 void OutboxStore::DropWhile(std::int64_t afterRow, std::int64_t module, std::size_t maxRows, Removed& removed,
                             Dropped& dropped, GoesOn goesOn) {
@@ -386,7 +388,8 @@ void OutboxStore::DropWhile(std::int64_t afterRow, std::int64_t module, std::siz
     removed.events += static_cast<std::int64_t>(doomed.size());
 }
 
-/// Of those that have at least so many bytes waiting; 0 when no module has, so that none of them fills the outbox.
+/// Of those that have at least so many bytes waiting; 0 when no module has, so that none of them fills the
+/// outbox.
 std::int64_t OutboxStore::LargestModule(std::int64_t minBytes) {
     SQLite::Statement query(m_database, "SELECT coalesce((SELECT id FROM module "
                                         "WHERE stored_bytes - removed_bytes >= ?1 "

@@ -68,17 +68,19 @@ public:
     /// Whether the files beside the database still have their names. Two system calls.
     bool IsWhole() { return m_sideFiles.AreInPlace(); }
 
-    /// Whether a transaction of an operation that failed is still open. What is stored then, would be undone with it.
+    /// Whether a transaction of an operation that failed is still open. What is stored then, would be undone
+    /// with it.
     bool InTransaction();
 
     /// When it is not whole, before it is closed: whether all events are in the file all the same.
     bool Rescue();
 
-    /// Stores the event as its module's next one. Returns the bytes that it counts for, with those of a module that the
-    /// file did not know.
+    /// Stores the event as its module's next one. Returns the bytes that it counts for, with those of a
+    /// module that the file did not know.
     std::size_t Store(const ModuleIdentity& module, const NewEvent& event);
 
-    /// The oldest events but those of `without`, at most `maxEvents`, ending with the one that reaches `maxBytes`.
+    /// The oldest events but those of `without`, at most `maxEvents`, ending with the one that reaches
+    /// `maxBytes`.
     Batch Oldest(std::size_t maxEvents, std::size_t maxBytes, const EventKeys& without = {});
 
     /// The event, if it still waits.
@@ -87,7 +89,8 @@ public:
     /// Deletes what is still there of `batch`. `refused` of them count as refused, the others as delivered.
     void RemoveDelivered(const Batch& batch, std::size_t refused);
 
-    /// Moves the event, if it is still there, to the dead-letter table. Returns its module's id; empty if it is not there.
+    /// Moves the event, if it is still there, to the dead-letter table. Returns its module's id; empty if it
+    /// is not there.
     std::string MoveToDeadLetters(const StoredEvent& event, const Refusal& refusal, WallTime now);
 
     /// Deletes the oldest dead letters until both bounds hold. Returns how many.
@@ -99,12 +102,14 @@ public:
         std::map<std::string, std::size_t> modules; ///< By id.
     };
 
-    /// Deletes events behind row `afterRow`, at most `maxRows`: those that were stored before `before`, and then, until
-    /// `excessBytes` are gone, the oldest ones of the module with the most waiting bytes. So a module that reports without
-    /// end loses its own events and not the others'. When no module has so many, the oldest of all go.
+    /// Deletes events behind row `afterRow`, at most `maxRows`: those that were stored before `before`, and
+    /// then, until `excessBytes` are gone, the oldest ones of the module with the most waiting bytes. So a
+    /// module that reports without end loses its own events and not the others'. When no module has so many,
+    /// the oldest of all go.
     Dropped DropOldest(std::int64_t afterRow, WallTime before, std::int64_t excessBytes, std::size_t maxRows);
 
-    /// So many modules are remembered when nothing of theirs waits. A suite has some tens, whose numbers so go on.
+    /// So many modules are remembered when nothing of theirs waits. A suite has some tens, whose numbers so
+    /// go on.
     static constexpr std::int64_t MAX_IDLE_MODULES = 1000;
 
     /// Reads the sums; grows with the number of modules, not of events.

@@ -34,8 +34,8 @@ ClockWatch BeginWatch(WallTime wall, SteadyTime steady);
 /// does by slewing is none.
 ClockWatch LookAgain(const ClockWatch& watch, WallTime wall, SteadyTime steady);
 
-/// Whether the clocks have agreed for long enough that events may be called old. Until then none is dropped by
-/// age: a board without a battery starts in a wrong year, and the network corrects its clock later.
+/// Whether the clocks have agreed for long enough that events may be called old. Until then none is dropped
+/// by age: a board without a battery starts in a wrong year, and the network corrects its clock later.
 bool MayDropByAge(const ClockWatch& watch, const CapSettings& caps);
 
 } // namespace MetrikSdk::outbox::PruneRule

@@ -49,9 +49,10 @@ private:
     SQLite::Statement& m_statement;
 };
 
-/// A transaction that has the write lock from its beginning: a deferred one could fail in its middle when another process
-/// writes between its read and its write. Undone unless it is committed, but for want of memory: then it stays open, and
-/// its connection is to be closed. (The library's own ends the process then: its destructor throws.)
+/// A transaction that has the write lock from its beginning: a deferred one could fail in its middle when
+/// another process writes between its read and its write. Undone unless it is committed, but for want of
+/// memory: then it stays open, and its connection is to be closed. (The library's own ends the process then:
+/// its destructor throws.)
 class WriteTransaction {
 public:
     explicit WriteTransaction(SQLite::Database& database) : m_database(database) {

@@ -96,7 +96,8 @@ void OutboxRegistry::Release(std::shared_ptr<OutboxEngine>& engine) {
         ForgetWhatWasTold();
 }
 
-/// What comes next is a new beginning, which tells anew. Part of the modules' destruction, so it does without memory.
+/// What comes next is a new beginning, which tells anew. Part of the modules' destruction, so it does without
+/// memory.
 void OutboxRegistry::ForgetWhatWasTold() noexcept {
     try {
         m_reporter = std::make_shared<report::FailureReporter>(m_settings.tellInterval);

@@ -16,9 +16,9 @@ namespace MetrikSdk::process {
 
 /// The outboxes of this process: one for each database directory, however many modules announce themselves.
 ///
-/// Directories come from outside, in datagrams. Empty ones mean the one that the process gave first. So do those that
-/// break the rule of Sqlite::SafeDirectory, and every new one once MAX_OUTBOXES are in use: an outbox costs a file and a
-/// thread.
+/// Directories come from outside, in datagrams. Empty ones mean the one that the process gave first. So do
+/// those that break the rule of Sqlite::SafeDirectory, and every new one once MAX_OUTBOXES are in use: an
+/// outbox costs a file and a thread.
 ///
 /// Threads: any.
 class OutboxRegistry {
@@ -43,12 +43,12 @@ public:
     /// The modules that use the outboxes.
     Memberships& Members() { return m_members; }
 
-    /// Gives `engine` up. The last user's call stops its uploader before it returns; no other thread can open the same
-    /// file meanwhile.
+    /// Gives `engine` up. The last user's call stops its uploader before it returns; no other thread can open
+    /// the same file meanwhile.
     void Release(std::shared_ptr<OutboxEngine>& engine);
 
-    /// What to tell a module that got no outbox, if it is time to tell: the limit on what is told holds for the
-    /// process. It begins anew when the last outbox in use was released, whose users have heard it all.
+    /// What to tell a module that got no outbox, if it is time to tell: the limit on what is told holds for
+    /// the process. It begins anew when the last outbox in use was released, whose users have heard it all.
     std::optional<std::string> ReportNoDirectory();
     std::optional<std::string> RecordFailure(report::Cause cause, const std::string& text);
 

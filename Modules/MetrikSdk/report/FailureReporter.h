@@ -13,8 +13,8 @@ namespace MetrikSdk::report {
 
 /// Decides which failures are told: of the same cause at most one in an interval, with the number of those
 /// that were kept back since. Its end is told once for each failure that was told, because a
-/// person who reads of a failure wants to know whether it lasts. All outboxes of a process share one: they end in the same log, and a full disk
-/// hits them all. The clock is the caller's. Threads: any.
+/// person who reads of a failure wants to know whether it lasts. All outboxes of a process share one: they
+/// end in the same log, and a full disk hits them all. The clock is the caller's. Threads: any.
 class FailureReporter {
 public:
     explicit FailureReporter(std::chrono::milliseconds interval) : m_interval(interval) {}

@@ -10,8 +10,8 @@
 
 namespace MetrikSdk::report {
 
-/// Events that were lost shortly after one another: a run. A person who reads that losses began wants to know in the end
-/// how many there were, when, and whose. Pure: the times are the caller's. Threads: one at a time.
+/// Events that were lost shortly after one another: a run. A person who reads that losses began wants to know
+/// in the end how many there were, when, and whose. Pure: the times are the caller's. Threads: one at a time.
 class LossRun {
 public:
     /// Modules that a run counts one by one, and names. A hostile program has thousands.

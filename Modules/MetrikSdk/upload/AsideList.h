@@ -12,19 +12,19 @@
 
 namespace MetrikSdk::upload {
 
-/// The events that a collector does not take alone, though it never says that they are bad. They stay in the outbox, and
-/// others go past them:
+/// The events that a collector does not take alone, though it never says that they are bad. They stay in the
+/// outbox, and others go past them:
 ///
 ///     waiting ──► aside ──┬─► taken          at one of its tries
 ///                  ▲  │   └─► dead-lettered  after AsideSettings::strikes
 ///                  └──┘ a try fails
 ///
-/// A try that fails is a strike only when other events were taken since the try before: while a collector is away, nothing
-/// is any event's fault. An event is tried at once when others were taken for the first time, and then with pauses that
-/// double.
+/// A try that fails is a strike only when other events were taken since the try before: while a collector is
+/// away, nothing is any event's fault. An event is tried at once when others were taken for the first time,
+/// and then with pauses that double.
 ///
-/// It is kept in memory. A process that starts anew searches once more, which costs some requests; in the file, it would
-/// cost a write at each try, and a column in every event.
+/// It is kept in memory. A process that starts anew searches once more, which costs some requests; in the
+/// file, it would cost a write at each try, and a column in every event.
 /// Threads: one. Pure: the time is the caller's.
 class AsideList {
 public:

@@ -20,19 +20,19 @@ enum class Blame {
     Later     ///< "Not now", which a collector also says for ever to an event that it cannot digest.
 };
 
-/// How many events go into the next request. Batches are always the oldest events, so numbers are all that has to be
-/// remembered. Pure.
+/// How many events go into the next request. Batches are always the oldest events, so numbers are all that
+/// has to be remembered. Pure.
 ///
-/// A request that fails is followed by its halves in turn, a failing half by its own, until one event is left. What comes
-/// of such a search:
+/// A request that fails is followed by its halves in turn, a failing half by its own, until one event is
+/// left. What comes of such a search:
 ///
 ///     one event was to blame      batches are as large again as before the search
 ///     all were taken in parts     refused before: the refusal was a passing one, and batches are as before
 ///                                 no answer, or "later": the size was to blame. The size that worked is remembered; it
 ///                                 doubles up to half of what failed, and grows by an eighth after eight full requests
 ///
-/// The first "later" halves nothing: it is about the collector, usually. The longest body that a collector reads is known
-/// once it has refused one: later bodies stay below, starting with half of it.
+/// The first "later" halves nothing: it is about the collector, usually. The longest body that a collector
+/// reads is known once it has refused one: later bodies stay below, starting with half of it.
 class BatchSizer {
 public:
     static constexpr std::size_t UNKNOWN = std::numeric_limits<std::size_t>::max();
@@ -54,7 +54,8 @@ public:
     /// The event that was sent alone is to blame, and has left the head of the outbox.
     void Found();
 
-    /// The event that was sent alone has left the head of the outbox for now. It is to blame if the next request is taken.
+    /// The event that was sent alone has left the head of the outbox for now. It is to blame if the next
+    /// request is taken.
     void SteppedAside() { m_suspectIsAside = true; }
 
 private:

@@ -22,8 +22,8 @@ bool IsSuccess(long status) {
     return status >= 200 && status < 300;
 }
 
-/// A hotel's log-in page answers every plain request with 200 and a page. Collectors answer that with JSON, with
-/// nothing, or with a word; a page of theirs comes with errors only, from the proxy before them.
+/// A hotel's log-in page answers every plain request with 200 and a page. Collectors answer that with JSON,
+/// with nothing, or with a word; a page of theirs comes with errors only, from the proxy before them.
 bool IsWebPage(const otlp::HttpResult& result) {
     static constexpr std::string_view PAGE = "text/html"; // media types have no letter case
     return ::strncasecmp(result.contentType.c_str(), PAGE.data(), PAGE.size()) == 0;
@@ -33,8 +33,8 @@ bool AsksToWait(long status) {
     return status == 429 || status == 502 || status == 503 || status == 504;
 }
 
-/// Who sends them, and where to, is wrong, and not what they are. (A firewall that dislikes one event answers so,
-/// too; so one that is never taken while others are steps aside as with any other "later".)
+/// Who sends them, and where to, is wrong, and not what they are. (A firewall that dislikes one event answers
+/// so, too; so one that is never taken while others are steps aside as with any other "later".)
 bool IsConfigurationsFault(long status) {
     static constexpr std::array STATUSES{401L, 403L, 404L, 405L, 407L, 415L, 511L};
     return std::find(STATUSES.begin(), STATUSES.end(), status) != STATUSES.end();

@@ -40,15 +40,16 @@ PartialSuccess ReadPartialSuccess(const otlp::HttpResult& result, std::size_t se
 std::chrono::milliseconds WaitBefore(const otlp::HttpResult& result, int failures, double random,
                                      WallTime now, const RetrySettings& settings);
 
-/// How long the collector wishes us to wait, up to the bound; 0 when it says nothing. It may say so in any answer.
+/// How long the collector wishes us to wait, up to the bound; 0 when it says nothing. It may say so in any
+/// answer.
 std::chrono::milliseconds WishedWait(const otlp::HttpResult& result, WallTime now,
                                      const RetrySettings& settings);
 
 /// One line about what went wrong, for people.
 std::string Describe(const otlp::HttpResult& result);
 
-/// What a person should look at, when the answer is one to a wrong configuration rather than to wrong events; else
-/// empty. `headers` are the names of the headers that were configured: among them are the credentials.
+/// What a person should look at, when the answer is one to a wrong configuration rather than to wrong events;
+/// else empty. `headers` are the names of the headers that were configured: among them are the credentials.
 std::string LookAt(const otlp::HttpResult& result, const std::vector<std::string>& headers);
 
 } // namespace RetryPolicy

@@ -17,8 +17,8 @@ constexpr Pause AT_ONCE{};
 
 } // namespace
 
-/// Keeps the batch from being dropped for a cap while it is under way. What was delivered and is not deleted yet
-/// stays so until Settle: dropped, it would be counted as lost.
+/// Keeps the batch from being dropped for a cap while it is under way. What was delivered and is not deleted
+/// yet stays so until Settle: dropped, it would be counted as lost.
 class UploadCycle::UnderWay {
 public:
     explicit UnderWay(UploadCycle& cycle) : m_cycle(cycle) {}

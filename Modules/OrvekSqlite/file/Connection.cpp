@@ -88,9 +88,9 @@ Connection::Connection(const std::string& path, const Settings& settings)
 }
 
 /// SQLite checkpoints on closing, unless the file has lost its name. Then the write-ahead log keeps its own
-/// name and its rows, and SQLite would read the next database at that path through it and damage that database.
-/// Emptying the log into the file that it belongs to keeps both databases whole. A file that kept its name
-/// and was damaged gets its rows, too, for the same reason.
+/// name and its rows, and SQLite would read the next database at that path through it and damage that
+/// database. Emptying the log into the file that it belongs to keeps both databases whole. A file that kept
+/// its name and was damaged gets its rows, too, for the same reason.
 Connection::~Connection() {
     RollBack();
     if (!HasLostItsName())

@@ -39,8 +39,8 @@ public:
         return guard::Statement(m_database.getHandle(), m_guard, sql, permission);
     }
 
-    /// Runs one statement that changes data and returns no row. Outside a transaction, which could undo it, only where
-    /// the file is still in its place.
+    /// Runs one statement that changes data and returns no row. Outside a transaction, which could undo it,
+    /// only where the file is still in its place.
     void Execute(const std::string& sql) {
         if (!InTransaction())
             RequireInPlace();
@@ -52,7 +52,8 @@ public:
     void Begin() { m_database.exec("begin immediate"); }
 
     /// Once it returned, the transaction survives the end of the process. When it throws, nothing of the
-    /// transaction is stored, but the transaction may still be open. Throws when the file is not in its place any more.
+    /// transaction is stored, but the transaction may still be open. Throws when the file is not in its place
+    /// any more.
     void Commit() {
         RequireInPlace();
         m_database.exec("commit");
@@ -72,9 +73,10 @@ public:
     /// Whether another process has the database open, be it to write or to read.
     bool IsShared() { return m_others.Exist(); }
 
-    /// Whether the path still leads to the file that is open here, that is still a database, and whose side files still
-    /// have their names. Asked after each operation: a row that was written to a file which has no name any more is lost,
-    /// and only looking afterwards tells. Costs three stats and a read of 16 bytes, some two microseconds.
+    /// Whether the path still leads to the file that is open here, that is still a database, and whose side
+    /// files still have their names. Asked after each operation: a row that was written to a file which has
+    /// no name any more is lost, and only looking afterwards tells. Costs three stats and a read of 16 bytes,
+    /// some two microseconds.
     bool IsInPlace();
 
     /// What became of rows that were committed, when a file beside the database was deleted.
@@ -84,7 +86,8 @@ public:
     Rescue RescueRows() noexcept;
 
 private:
-    /// Throws when not. Asked before what could not be undone: what is not in the old file need not be in both.
+    /// Throws when not. Asked before what could not be undone: what is not in the old file need not be in
+    /// both.
     void RequireInPlace();
     bool HasLostItsName();
     bool HasDatabaseHeader();

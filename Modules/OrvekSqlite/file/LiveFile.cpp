@@ -16,8 +16,8 @@ bool IsAboutTheFile(const SQLite::Exception& error) {
     return kind == Sqlite::ErrorKind::Reopen || kind == Sqlite::ErrorKind::Damage;
 }
 
-/// A file may be replaced again while it is opened anew, by a busy script. One that is replaced each time is no
-/// store.
+/// A file may be replaced again while it is opened anew, by a busy script. One that is replaced each time is
+/// no store.
 constexpr int MAX_ATTEMPTS = 3;
 
 constexpr std::size_t PATH_ROOM_BYTES = 4096; ///< The longest path that the system takes.
@@ -33,7 +33,8 @@ std::string AsAbsolute(const std::string& path) {
 } // namespace
 
 LiveFile::LiveFile(const Settings& settings) : m_settings(settings) {
-    // The path comes once, when the program begins: no memory for it then must not cost every row until a restart.
+    // The path comes once, when the program begins: no memory for it then must not cost every row until a
+    // restart.
     m_path.reserve(PATH_ROOM_BYTES);
 }
 

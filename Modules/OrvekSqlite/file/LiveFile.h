@@ -28,7 +28,8 @@ public:
     /// file: then the first run had no effect that counts. A transaction that was open on the old connection
     /// is gone; the operation finds out by Connection::InTransaction.
     ///
-    /// A file beside the database that was deleted costs a new connection, and no row that the operation committed.
+    /// A file beside the database that was deleted costs a new connection, and no row that the operation
+    /// committed.
     ///
     /// Within a transaction that was open before and is so afterwards, the file is not looked for: that takes
     /// a microsecond, and who commits will look.
@@ -38,8 +39,8 @@ public:
     bool IsShared() { return m_connection && m_connection->IsShared(); }
     void RollBack() noexcept;
 
-    /// Runs `action`, whose operations on this file fail at once where another program has the lock. All other
-    /// operations wait for it, up to Settings::busyTimeout.
+    /// Runs `action`, whose operations on this file fail at once where another program has the lock. All
+    /// other operations wait for it, up to Settings::busyTimeout.
     void WithoutWaiting(const std::function<void()>& action);
 
     void Close() { LetGo(); }

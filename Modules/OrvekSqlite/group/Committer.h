@@ -11,11 +11,11 @@ namespace OrvekSqlite::group {
 
 /// The thread that commits a group when no further statement comes, and tries an uncommitted group again.
 ///
-/// It starts with the first group. It sleeps without a deadline while the group is empty, and otherwise until the group is
-/// due. In a burst it wakes about a hundred times a second; a single statement does not wake it.
+/// It starts with the first group. It sleeps without a deadline while the group is empty, and otherwise until
+/// the group is due. In a burst it wakes about a hundred times a second; a single statement does not wake it.
 ///
-/// It never waits for another process's lock, because it holds the mutex: the thread that brings statements would have to
-/// wait with it.
+/// It never waits for another process's lock, because it holds the mutex: the thread that brings statements
+/// would have to wait with it.
 ///
 /// Threads: see each operation.
 class Committer {
@@ -43,7 +43,8 @@ private:
     Group& m_group;
     std::condition_variable m_wake;
     std::thread m_thread;
-    /// No thread-local variable tells: the C library ends the process where it finds no memory for a plug-in's.
+    /// No thread-local variable tells: the C library ends the process where it finds no memory for a
+    /// plug-in's.
     std::atomic<std::thread::id> m_self;
     bool m_isResting = true; ///< waits without a deadline, or has not been started
     bool m_stop = false;

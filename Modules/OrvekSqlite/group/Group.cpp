@@ -59,8 +59,8 @@ void Group::ExecuteInGroup(const std::string& sql, Clock::time_point now) {
     m_state = State::Open;
 }
 
-/// Usually, the transaction is as it was. But a full disk, or RAISE(ROLLBACK) in a trigger, ends the whole transaction:
-/// then the statements before this one are tried again at once.
+/// Usually, the transaction is as it was. But a full disk, or RAISE(ROLLBACK) in a trigger, ends the whole
+/// transaction: then the statements before this one are tried again at once.
 void Group::AfterFailedStatement() noexcept {
     if (m_kept.IsEmpty()) {
         m_file.RollBack(); // a group of nothing holds no lock
@@ -70,8 +70,8 @@ void Group::AfterFailedStatement() noexcept {
     }
 }
 
-/// Commits a group that is complete, whether the statement was run or refused. A caller whose statements are all refused
-/// takes the mutex again so quickly that the committer would get it too late.
+/// Commits a group that is complete, whether the statement was run or refused. A caller whose statements are
+/// all refused takes the mutex again so quickly that the committer would get it too late.
 void Group::EndStatement(Clock::time_point now) noexcept {
     m_last = now;
     if (m_state == State::Open && m_policy.IsComplete(m_kept.Count(), m_kept.Bytes(), m_began, now))
@@ -137,9 +137,9 @@ void Group::Begin(file::Connection& connection) {
     }
 }
 
-/// Drops a statement that a constraint refuses now, in another file or after another program's change. It would have been
-/// refused had it come now, and if it were kept, all others would wait for it for ever. Any other error, such as a missing
-/// table, can be remedied: then the group waits.
+/// Drops a statement that a constraint refuses now, in another file or after another program's change. It
+/// would have been refused had it come now, and if it were kept, all others would wait for it for ever. Any
+/// other error, such as a missing table, can be remedied: then the group waits.
 void Group::RunAgain(file::Connection& connection) {
     for (std::size_t i = 0; i < m_kept.Count();) {
         try {

@@ -27,12 +27,12 @@ public:
 
     /// Runs one statement, and throws its error.
     ///
-    /// A statement that comes alone is committed when this returns. In a burst it joins the group: it is committed with
-    /// the group, and run again if that fails. Its own error leaves the group as it was.
+    /// A statement that comes alone is committed when this returns. In a burst it joins the group: it is
+    /// committed with the group, and run again if that fails. Its own error leaves the group as it was.
     ///
-    /// While the group is uncommitted, every statement is refused with the reason. Once in GroupSettings::retry one of
-    /// them tries to commit the group first, and is run if that works. If another program's lock is the reason, each of
-    /// them tries, and waits for the lock.
+    /// While the group is uncommitted, every statement is refused with the reason. Once in
+    /// GroupSettings::retry one of them tries to commit the group first, and is run if that works. If another
+    /// program's lock is the reason, each of them tries, and waits for the lock.
     ///
     /// After rows were lost, one statement is refused with that for its reason.
     void Execute(const std::string& sql);
@@ -50,7 +50,7 @@ private:
     enum class State {
         Empty, ///< Nothing is kept.
         Open,  ///< We hold the write lock, and the transaction holds the effect of every statement kept.
-        Uncommitted, ///< There is no transaction and no lock. The kept statements wait for the database to take them.
+        Uncommitted, ///< No transaction and no lock. The kept statements wait for the database to take them.
     };
 
     void ExecuteAlone(const std::string& sql);

@@ -35,16 +35,16 @@ public:
     /// When a group that could not be committed is tried again.
     Clock::time_point NextTry(Clock::time_point lastTry) const { return lastTry + m_settings.retry; }
 
-    /// Whether a statement that comes now may try it. The committer does not wait for another program's lock, so a
-    /// statement does: it tries at once.
+    /// Whether a statement that comes now may try it. The committer does not wait for another program's lock,
+    /// so a statement does: it tries at once.
     bool MayTry(Clock::time_point lastTry, bool metALock, Clock::time_point now) const {
         return metALock || now >= NextTry(lastTry);
     }
 
     /// How long the lock is left free after a group that held it for `held`, when another process has the
-    /// file open. SQLite has no queue for the lock: a program that waits for it looks after 1, 2, 5, 10, 15, 20, 25
-    /// and more milliseconds. It finds a lock that is free for half of the time within a few looks. It may never find
-    /// one that is taken again at once.
+    /// file open. SQLite has no queue for the lock: a program that waits for it looks after 1, 2, 5, 10, 15,
+    /// 20, 25 and more milliseconds. It finds a lock that is free for half of the time within a few looks. It
+    /// may never find one that is taken again at once.
     Clock::duration Pause(Clock::duration held) const {
         return std::min<Clock::duration>(held, m_settings.longestPause);
     }

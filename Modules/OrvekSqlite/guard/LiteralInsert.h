@@ -14,8 +14,8 @@ struct Literal {
     std::string_view text; ///< without the quotes around it
 };
 
-/// The text of an INSERT whose values are literals and nothing else, taken apart: what it says before them is the same
-/// for each of its kind.
+/// The text of an INSERT whose values are literals and nothing else, taken apart: what it says before them is
+/// the same for each of its kind.
 ///
 /// Views into the text; they live as long as that does.
 struct LiteralInsert {
@@ -25,8 +25,9 @@ struct LiteralInsert {
     std::string_view head; ///< up to and with the parenthesis behind "values"
     std::vector<Literal> literals;
 
-    /// Nothing for any other text, and when in doubt: an expression, a comment, a sign, a zero byte, upper-case keywords,
-    /// anything behind the closing parenthesis. Such a text is no error, it is SQLite's to judge.
+    /// Nothing for any other text, and when in doubt: an expression, a comment, a sign, a zero byte,
+    /// upper-case keywords, anything behind the closing parenthesis. Such a text is no error, it is SQLite's
+    /// to judge.
     static std::optional<LiteralInsert> Of(std::string_view sql);
 };
 

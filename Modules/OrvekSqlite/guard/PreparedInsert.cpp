@@ -42,8 +42,9 @@ int BindTo(sqlite3_stmt* statement, int place, const Literal& literal) {
 
 } // namespace
 
-/// While it lives, the connection's statements may have parameters, and the guard takes what is run for an INSERT. SQLite
-/// compiles the statement again by itself where another program has changed the tables, so also while it runs.
+/// While it lives, the connection's statements may have parameters, and the guard takes what is run for an
+/// INSERT. SQLite compiles the statement again by itself where another program has changed the tables, so
+/// also while it runs.
 class PreparedInsert::Use {
 public:
     explicit Use(PreparedInsert& owner) : m_owner(owner) {

@@ -9,9 +9,10 @@
 
 namespace OrvekSqlite::guard {
 
-/// Runs INSERTs of literals with a statement that was prepared once, for as long as they differ in their literals only.
-/// SQLite needs two thirds of the time of a statement to compile its text, and the text of the store is always the same
-/// otherwise. What a text does, and which error it gives, is what it would be without this.
+/// Runs INSERTs of literals with a statement that was prepared once, for as long as they differ in their
+/// literals only. SQLite needs two thirds of the time of a statement to compile its text, and the text of the
+/// store is always the same otherwise. What a text does, and which error it gives, is what it would be
+/// without this.
 ///
 /// Ownership: of the connection that it is made with, and destroyed before that is closed.
 /// Threads: those of the connection.
@@ -24,8 +25,8 @@ public:
     PreparedInsert(const PreparedInsert&) = delete;
     PreparedInsert& operator=(const PreparedInsert&) = delete;
 
-    /// Runs `sql`. False, and nothing happened, when it is no INSERT of literals alone, or none that can be prepared:
-    /// it is to be run as it stands, and to give its own error.
+    /// Runs `sql`. False, and nothing happened, when it is no INSERT of literals alone, or none that can be
+    /// prepared: it is to be run as it stands, and to give its own error.
     bool Execute(const std::string& sql);
 
 private:

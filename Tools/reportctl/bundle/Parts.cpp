@@ -33,7 +33,8 @@ namespace fs = std::filesystem;
 
 constexpr std::size_t LOG_LINES = 2000;
 
-/// What another command of this program prints. A process of its own, so that one that fails costs its part alone.
+/// What another command of this program prints. A process of its own, so that one that fails costs its part
+/// alone.
 std::string OutputOf(const std::string& command) {
     const auto program = SystemTool::IO::Directory::GetExcutableDirectory() + "reportctl";
     const auto line = fmt::format("{} {} 2>&1", terminal::ShellQuoted(program), command);

@@ -11,8 +11,9 @@ public:
     /// `withValues`: nothing is taken out. `home`: the home directory; empty when there is none.
     Redaction(bool withValues, std::string home) : m_withValues(withValues), m_home(std::move(home)) {}
 
-    /// A line of the service's log. Of a datagram, the members that the service reads are left, without the value and the
-    /// open id; a datagram that is no JSON is left out, and so is the statement of a report that the store refused.
+    /// A line of the service's log. Of a datagram, the members that the service reads are left, without the
+    /// value and the open id; a datagram that is no JSON is left out, and so is the statement of a report
+    /// that the store refused.
     std::string OfLogLine(const std::string& text) const;
 
     /// Any other text: paths below the home directory begin with "~".

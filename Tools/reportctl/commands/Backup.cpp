@@ -37,7 +37,8 @@ constexpr auto HELP = "Example:\n"
     throw std::system_error(errno, std::generic_category(), what);
 }
 
-/// The directory of the backup. It is this command's own: it must not exist before, and is gone after a failure.
+/// The directory of the backup. It is this command's own: it must not exist before, and is gone after a
+/// failure.
 class NewDirectory {
 public:
     explicit NewDirectory(std::string path) : m_path(std::move(path)) {

@@ -6,12 +6,12 @@ namespace CLI {
 class App;
 }
 
-/// The commands of reportctl. Each has one file in this folder, with its flags and its words; what it does is in the
-/// other rooms. A new command is a file, its line in CMakeLists.txt, and two lines here.
+/// The commands of reportctl. Each has one file in this folder, with its flags and its words; what it does is
+/// in the other rooms. A new command is a file, its line in CMakeLists.txt, and two lines here.
 namespace reportctl::commands {
 
-/// Adds one command to the command line. If the user gave this command, parsing runs it and puts the exit code of the
-/// program into `exitCode`, which must outlive the parsing.
+/// Adds one command to the command line. If the user gave this command, parsing runs it and puts the exit
+/// code of the program into `exitCode`, which must outlive the parsing.
 using Add = void(CLI::App& app, int& exitCode);
 
 Add AddSetup;   ///< `setup` makes what the service needs.

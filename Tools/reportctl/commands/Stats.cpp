@@ -102,8 +102,8 @@ void RequireNoFilter(const FilterOptions& filter) {
                                    "--since, --until and --event out");
 }
 
-/// How the datagrams ended that the service received, and those that the system dropped before. The keys are the names in
-/// `reportctl status --json`.
+/// How the datagrams ended that the service received, and those that the system dropped before. The keys are
+/// the names in `reportctl status --json`.
 Stats CountOutcomes(const StatsOptions& options) {
     const auto look = ReportLedger::LookAt(store::LedgerPath());
     if (look.sight != ReportLedger::Sight::Sound)

@@ -19,7 +19,8 @@ std::uint64_t RefusedIn(const ReportLedger::Counts& counts);
 Rates RatesBetween(const ReportLedger::Counts& before, const ReportLedger::Counts& after,
                    std::chrono::milliseconds time);
 
-/// Of about the last minute and the last second, by the marks that the ledger keeps. Zeros when nothing counts.
+/// Of about the last minute and the last second, by the marks that the ledger keeps. Zeros when nothing
+/// counts.
 Rates OfTheLastMinute(const ReportLedger::Look& look);
 Rates OfTheLastSecond(const ReportLedger::Look& look);
 

@@ -11,9 +11,10 @@
 
 namespace reportctl::log {
 
-/// Reads the lines of the log in their order: those of the files that it is given, those of the live file, and then, call
-/// after call, those that come. It reads a file that is rotated away to its end and goes on with the ones after it; it goes
-/// on where a file was cut, with one that was deleted and made again, and with one that is not there yet.
+/// Reads the lines of the log in their order: those of the files that it is given, those of the live file,
+/// and then, call after call, those that come. It reads a file that is rotated away to its end and goes on
+/// with the ones after it; it goes on where a file was cut, with one that was deleted and made again, and
+/// with one that is not there yet.
 ///
 /// It only reads, and the service notices nothing of it. One thread.
 class Follower {

@@ -28,8 +28,8 @@ int NumberAt(std::string_view text, std::size_t at, std::size_t size) {
     return number;
 }
 
-/// The seconds since 1970 of a local time. A busy log has thousands of lines with one second, and the conversion costs more
-/// than all else.
+/// The seconds since 1970 of a local time. A busy log has thousands of lines with one second, and the
+/// conversion costs more than all else.
 std::time_t SecondsOf(std::string_view stamp) {
     thread_local std::string lastText;
     thread_local std::time_t lastSeconds = 0;

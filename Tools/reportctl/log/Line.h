@@ -20,13 +20,15 @@ struct Line {
     std::string message;  ///< the original bytes
 };
 
-/// Reads a line without its line feed. Nothing for what is no record, such as the half line that a full disk leaves.
+/// Reads a line without its line feed. Nothing for what is no record, such as the half line that a full disk
+/// leaves.
 std::optional<Line> ReadLine(std::string_view text);
 
 /// The text that the log wrote with escapes. What is no escape stays as it is.
 std::string Unescaped(std::string_view text);
 
-/// The level of a word such as "WARN", or of the number that the log writes for another level; 0 for anything else.
+/// The level of a word such as "WARN", or of the number that the log writes for another level; 0 for anything
+/// else.
 int LevelOf(std::string_view word);
 
 } // namespace reportctl::log

@@ -70,8 +70,9 @@ void Outcomes::Resolve(Pairing& pairing) {
         CountSince(pairing);
 }
 
-/// Of the events that came before the first reading, nobody knows how many the module had stored before each. When it has
-/// stored as many as the log has of it, and no line tells of one that could not be kept, these are among them.
+/// Of the events that came before the first reading, nobody knows how many the module had stored before each.
+/// When it has stored as many as the log has of it, and no line tells of one that could not be kept, these
+/// are among them.
 void Outcomes::CountBefore(Pairing& pairing) {
     if (pairing.AnalyticsFailures() > 0)
         return;

@@ -19,10 +19,12 @@ struct Backlog {
 
 /// Tells of datagrams whether the store or the outbox has them.
 ///
-/// An event that was delivered has left the outbox. It counts as toAnalytics when its module has stored as many events as
-/// the log has datagrams of the module, so that none can be missing; otherwise it stays unknown.
+/// An event that was delivered has left the outbox. It counts as toAnalytics when its module has stored as
+/// many events as the log has datagrams of the module, so that none can be missing; otherwise it stays
+/// unknown.
 ///
-/// Call Read, then read the log, then Resolve: an event that was read and has no line yet would be counted for another.
+/// Call Read, then read the log, then Resolve: an event that was read and has no line yet would be counted
+/// for another.
 ///
 /// One thread. Failure: nothing throws for a database that is missing or cannot be read; Complaints tells it.
 class Outcomes {

@@ -10,10 +10,10 @@ namespace reportctl::log {
 
 /// Makes entries of the log's lines, and finds the datagram that a refusal is about.
 ///
-/// The service handles datagrams in the order in which it logs their arrival, and logs a refusal when it comes to it, which
-/// may be long after. Most refusals name what they refuse: then it is the first such datagram that is still open. One that
-/// names nothing is told of a datagram only when no other one can be meant; else it stays a line of its own, and the
-/// datagram "unknown".
+/// The service handles datagrams in the order in which it logs their arrival, and logs a refusal when it
+/// comes to it, which may be long after. Most refusals name what they refuse: then it is the first such
+/// datagram that is still open. One that names nothing is told of a datagram only when no other one can be
+/// meant; else it stays a line of its own, and the datagram "unknown".
 ///
 /// One thread.
 class Pairing {
@@ -25,8 +25,8 @@ public:
     std::deque<Entry>& Entries() { return m_entries; }
     void DropFront();
 
-    /// How many lines said, so far, that an event could not be kept for analytics. They are told once a minute for the same
-    /// cause, so events without a line of their own may have been refused after one.
+    /// How many lines said, so far, that an event could not be kept for analytics. They are told once a
+    /// minute for the same cause, so events without a line of their own may have been refused after one.
     int AnalyticsFailures() const { return m_analyticsFailures; }
 
 private:

@@ -11,13 +11,15 @@
 
 namespace reportctl::log {
 
-/// The log as a stream of entries, each with its outcome: reads the lines, pairs the refusals, asks the databases.
+/// The log as a stream of entries, each with its outcome: reads the lines, pairs the refusals, asks the
+/// databases.
 ///
 /// One thread.
 class Stream {
 public:
-    /// So long a datagram waits for its outcome. Handling one takes well under a millisecond, and the store commits at least
-    /// ten times a second; a service that is further behind has many waiting, and no one wants to wait for them all.
+    /// So long a datagram waits for its outcome. Handling one takes well under a millisecond, and the store
+    /// commits at least ten times a second; a service that is further behind has many waiting, and no one
+    /// wants to wait for them all.
     static constexpr std::chrono::milliseconds PATIENCE{1000};
 
     Stream(const std::string& directory, const std::vector<std::string>& rotated);
@@ -28,7 +30,8 @@ public:
     /// Reads what the log has now, and asks the databases. Returns how many entries there are in all.
     std::size_t Read();
 
-    /// Hands over the entries whose outcome is known, or will not be, in the order of the log; the first that waits stops it.
+    /// Hands over the entries whose outcome is known, or will not be, in the order of the log; the first that
+    /// waits stops it.
     void TakeFinished(const std::function<void(Entry&)>& visit);
 
     bool HasLog() const { return m_follower.HasLiveFile(); }

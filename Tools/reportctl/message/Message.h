@@ -24,7 +24,8 @@ struct Message {
     std::string control;    ///< the kind of control message, such as "init"
     std::string fault;      ///< the parser's words when it is no JSON
 
-    /// What stands before the first bar of the event id, or the module that a control message announces; empty without one.
+    /// What stands before the first bar of the event id, or the module that a control message announces;
+    /// empty without one.
     std::string module;
 };
 

@@ -15,8 +15,8 @@ constexpr int LETTERS_AT_ONCE = 500;
 constexpr auto OLDEST = "select id from dead_letter order by id limit ?1";
 constexpr auto WITH_UUID = "select id from dead_letter where uuid = ?1";
 
-/// The collector tells a repeated event by its uuid, so that stays. A sequence number counts what was stored, and this is
-/// stored anew; so is its age.
+/// The collector tells a repeated event by its uuid, so that stays. A sequence number counts what was stored,
+/// and this is stored anew; so is its age.
 constexpr auto PUT_BACK = R"sql(
 insert into event(uuid, module, release, sequence, event_id, payload, stored_ms, bytes)
     select d.uuid, d.module, d.release, m.last_sequence + row_number() over (partition by d.module order by d.id),

@@ -26,8 +26,8 @@ std::string TimeIn(const std::string& payload) {
     return Parsed(payload).GetKeyValue("extend").GetKeyValue("createTime").ToString();
 }
 
-/// The service adds two members to the value, or replaces them. Added in the same way to the report's value, with the
-/// same texts, they must give the same data.
+/// The service adds two members to the value, or replaces them. Added in the same way to the report's value,
+/// with the same texts, they must give the same data.
 bool IsMadeOf(const std::string& payload, const std::string& value) {
     const auto data = Parsed(payload).GetKeyValue("eventData");
     auto expected = Parsed(value);

@@ -21,9 +21,9 @@ struct EventContent {
     std::string createTime;
 };
 
-/// The youngest events of the outbox, waiting or dead, to be found by their content, and how many each module has stored:
-/// a delivered event has left the outbox, and only that number tells of it. An event is found once, so that two equal
-/// reports need two.
+/// The youngest events of the outbox, waiting or dead, to be found by their content, and how many each module
+/// has stored: a delivered event has left the outbox, and only that number tells of it. An event is found
+/// once, so that two equal reports need two.
 ///
 /// One thread. Failure: ReadNew throws what OpenToLook throws.
 class RecentEvents {
@@ -36,7 +36,8 @@ public:
     /// Whether an event was made of this report. It is then taken away, and no longer part of Uncounted.
     bool Take(const EventContent& report, const std::string& module);
 
-    /// How many events the module has stored before the first reading, and since then without one that Take found.
+    /// How many events the module has stored before the first reading, and since then without one that Take
+    /// found.
     std::int64_t Before(const std::string& module) const;
     std::int64_t Uncounted(const std::string& module) const;
 

@@ -93,8 +93,8 @@ std::string JsonOf(const PageData& data) {
     return {text.GetString(), text.GetSize()};
 }
 
-/// JSON inside an HTML script element. A text of it must not end the element nor begin a comment; these characters stand
-/// only in texts, where JSON has another spelling for them.
+/// JSON inside an HTML script element. A text of it must not end the element nor begin a comment; these
+/// characters stand only in texts, where JSON has another spelling for them.
 std::string ForScriptElement(const std::string& json) {
     std::string safe;
     safe.reserve(json.size());

@@ -8,7 +8,8 @@
 
 #include "Tools/reportctl/store/Tally.h"
 
-/// The page of `reportctl page`: one HTML file that holds everything it needs and asks no other place for anything.
+/// The page of `reportctl page`: one HTML file that holds everything it needs and asks no other place for
+/// anything.
 namespace reportctl::page {
 
 /// How many reports were refused by each reason in the time before `atMs`.
@@ -30,8 +31,8 @@ struct PageData {
     std::vector<RefusedAt> refused;
 };
 
-/// The page. `nonce` is what its style and scripts are known by: a random text of letters and digits, another one for each
-/// page. Every text of the data stays a text and never becomes markup.
+/// The page. `nonce` is what its style and scripts are known by: a random text of letters and digits, another
+/// one for each page. Every text of the data stays a text and never becomes markup.
 std::string ComposePage(const PageData& data, const std::string& nonce);
 
 /// Such a text, from the system's random numbers.

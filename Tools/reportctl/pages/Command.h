@@ -9,8 +9,8 @@ class App;
 
 namespace reportctl::pages {
 
-/// The command line as the manual pages and the completions show it: read from the very objects that parse it and print
-/// --help, so that none of the three can differ from the others.
+/// The command line as the manual pages and the completions show it: read from the very objects that parse it
+/// and print --help, so that none of the three can differ from the others.
 struct Option {
     std::vector<std::string> names; ///< with their dashes, the short ones first; a positional's one name
     std::string value;              ///< what --help calls its value, such as "INT"; empty for a flag

@@ -4,8 +4,8 @@
 
 #include "Tools/reportctl/pages/Command.h"
 
-/// What makes a shell complete reportctl's command line. An option's value is completed with its choices, or, when it has
-/// none, with names of files.
+/// What makes a shell complete reportctl's command line. An option's value is completed with its choices, or,
+/// when it has none, with names of files.
 namespace reportctl::pages {
 
 std::string BashCompletion(const Command& program);

@@ -116,7 +116,8 @@ std::string Description(const Command& command) {
     return text + Sections(command);
 }
 
-/// The paragraphs of --help that stand below the options. Each goes where readers of manual pages look for it.
+/// The paragraphs of --help that stand below the options. Each goes where readers of manual pages look for
+/// it.
 struct Footer {
     std::string notes;
     std::string examples;

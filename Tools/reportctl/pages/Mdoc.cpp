@@ -13,7 +13,8 @@ bool IsUpper(char c) {
     return std::isupper(static_cast<unsigned char>(c)) != 0;
 }
 
-/// A backslash begins an instruction; a bare hyphen may be shown as another character, which a shell does not know.
+/// A backslash begins an instruction; a bare hyphen may be shown as another character, which a shell does not
+/// know.
 std::string Escaped(std::string_view text) {
     std::string escaped;
     for (const char c : text) {

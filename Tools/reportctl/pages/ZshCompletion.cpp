@@ -58,7 +58,8 @@ std::string Branches(const Command& command) {
     return text;
 }
 
-/// One function a command: it completes its own options, and hands the rest to the function of the command that follows.
+/// One function a command: it completes its own options, and hands the rest to the function of the command
+/// that follows.
 std::string Function(const Command& command) {
     if (command.commands.empty())
         return fmt::format("_{}() {{\n    _arguments -s{}\n}}\n", command.Name("_"), Arguments(command));

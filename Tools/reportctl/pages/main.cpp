@@ -9,7 +9,8 @@
 #include "Tools/reportctl/pages/Completions.h"
 #include "Tools/reportctl/pages/ManPage.h"
 
-// reportctl_pages DIRECTORY DATE: writes reportctl's manual pages and completions. A part of the build, never installed.
+// reportctl_pages DIRECTORY DATE: writes reportctl's manual pages and completions. A part of the build, never
+// installed.
 namespace {
 
 using reportctl::pages::Command;

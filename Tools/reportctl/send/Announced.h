@@ -5,14 +5,16 @@
 
 namespace reportctl::send {
 
-/// The analytics modules that the running service knows, as its log tells: it logs each one that is announced.
+/// The analytics modules that the running service knows, as its log tells: it logs each one that is
+/// announced.
 ///
 /// Reads the log once. Never throws: a log that cannot be read tells nothing.
 class Announced {
 public:
     explicit Announced(const std::string& logDirectory);
 
-    /// Whether the service is sure to drop this module's events. False when the log does not reach back to its start.
+    /// Whether the service is sure to drop this module's events. False when the log does not reach back to
+    /// its start.
     bool Lacks(const std::string& module) const { return m_isWhole && !m_modules.contains(module); }
 
     /// The module is announced now.

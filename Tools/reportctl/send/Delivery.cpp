@@ -48,7 +48,8 @@ bool MaySend(const Origin& origin, const Judgement& judgement, bool anyway) {
     return anyway || judgement.errors.empty();
 }
 
-/// What only the running service can tell: whether it knows the module. Asked for events alone, since it reads the log.
+/// What only the running service can tell: whether it knows the module. Asked for events alone, since it
+/// reads the log.
 class ServiceState {
 public:
     void Judge(Judgement& judgement, const std::string& text) {

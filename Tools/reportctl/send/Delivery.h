@@ -17,9 +17,9 @@ struct DeliverySettings {
 int DeliverOne(const std::string& text, const DeliverySettings& settings);
 
 /// The same for each line that is not blank, as it stands, without its line feed. A line that is judged bad
-/// is told with its number and left out. The first line that no program takes is the last that is sent. Each line goes out as soon
-/// as it is read, so that the descriptor may be that of a pipe that is still being written. A line of any length
-/// takes no more memory than 64 KiB.
+/// is told with its number and left out. The first line that no program takes is the last that is sent. Each
+/// line goes out as soon as it is read, so that the descriptor may be that of a pipe that is still being
+/// written. A line of any length takes no more memory than 64 KiB.
 int DeliverLines(int descriptor, const DeliverySettings& settings);
 
 } // namespace reportctl::send

@@ -34,7 +34,8 @@ bool HasLoneQuote(const std::string& text) {
     return false;
 }
 
-/// What becomes of a text that goes into the SQL of the store, and what the sender can do about a quote in it.
+/// What becomes of a text that goes into the SQL of the store, and what the sender can do about a quote in
+/// it.
 struct InTheStore {
     const char* loss;
     const char* advice;

@@ -8,8 +8,8 @@
 
 namespace reportctl::send {
 
-/// Reads a file, pipe or terminal line by line, each as soon as it is there. Of a line that no datagram can hold, only the
-/// beginning is kept, so that a file without line feeds takes no more memory than another one.
+/// Reads a file, pipe or terminal line by line, each as soon as it is there. Of a line that no datagram can
+/// hold, only the beginning is kept, so that a file without line feeds takes no more memory than another one.
 ///
 /// Does not own the descriptor. One thread.
 class LineReader {

@@ -11,8 +11,8 @@ namespace wire = hublink::wire;
 using SystemTool::IO::JsonDocument;
 using SystemTool::Text::ValidUtf8;
 
-/// What the client library writes, in as much room as it may need; a library's own datagrams end where the service would cut
-/// them. `bytes`: of all texts that go in.
+/// What the client library writes, in as much room as it may need; a library's own datagrams end where the
+/// service would cut them. `bytes`: of all texts that go in.
 template <typename Append>
 std::string Written(std::size_t bytes, Append append) {
     constexpr std::size_t LONGEST_ESCAPE = 6; // of one byte, as in \u0001

@@ -15,8 +15,8 @@ struct Report {
     bool isDayReport = false;
 };
 
-// The texts that the service reads, as the client library writes them. They are built, not judged: what cannot work (see Judgement.h) is built
-// all the same, so that the service can be shown it.
+// The texts that the service reads, as the client library writes them. They are built, not judged: what
+// cannot work (see Judgement.h) is built all the same, so that the service can be shown it.
 
 std::string BuildReport(const Report& report);
 

@@ -12,8 +12,9 @@
 namespace reportctl::send {
 namespace {
 
-/// How long the system may take to tell that no program listens. Linux tells before the send over loopback returns,
-/// but nothing promises that, there or elsewhere. The wait at the end of a command is too short to be noticed.
+/// How long the system may take to tell that no program listens. Linux tells before the send over loopback
+/// returns, but nothing promises that, there or elsewhere. The wait at the end of a command is too short to
+/// be noticed.
 constexpr long REFUSAL_WAIT_MS = 20;
 
 } // namespace

@@ -9,8 +9,8 @@ namespace reportctl::send {
 
 /// Sends texts to the service, a datagram each.
 ///
-/// A datagram gets no answer, so this can tell only whether a program listens on the port: the socket is connected,
-/// and the system then reports a datagram for a port that no program has bound.
+/// A datagram gets no answer, so this can tell only whether a program listens on the port: the socket is
+/// connected, and the system then reports a datagram for a port that no program has bound.
 ///
 /// One thread. Failure: what the system refuses to send throws Poco::Exception.
 class Sender {

@@ -14,8 +14,8 @@ struct Environment {
     const char* Find(const std::string& name) const;
 };
 
-/// The environment of the running service, as it was at its start; where there is none, or it is another user's, this
-/// program's own.
+/// The environment of the running service, as it was at its start; where there is none, or it is another
+/// user's, this program's own.
 Environment OfTheService();
 
 } // namespace reportctl::service

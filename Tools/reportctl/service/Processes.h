@@ -7,14 +7,15 @@
 
 #include <sys/types.h>
 
-/// What the system tells of processes. It tells more of this user's own processes than of others'; root sees all of them.
-/// Nothing throws. Linux; elsewhere nothing is known.
+/// What the system tells of processes. It tells more of this user's own processes than of others'; root sees
+/// all of them. Nothing throws. Linux; elsewhere nothing is known.
 namespace reportctl::service {
 
 /// The user's name, or its number where it has none.
 std::string NameOf(uid_t user);
 
-/// The name of a process's program, as the system shows it to everybody, but not cut to 15 characters where that can be seen.
+/// The name of a process's program, as the system shows it to everybody, but not cut to 15 characters where
+/// that can be seen.
 std::optional<std::string> ProgramNameOf(pid_t process);
 
 std::optional<uid_t> OwnerOf(pid_t process);
@@ -36,7 +37,8 @@ struct BoundSocket {
     std::uint64_t inode = 0;
 };
 
-/// The sockets that are bound to the service's address and port, or to the port at any address; the exact ones first.
+/// The sockets that are bound to the service's address and port, or to the port at any address; the exact
+/// ones first.
 std::vector<BoundSocket> SocketsAtTheServicesPort();
 
 /// The process that holds the machine's lock of the one service; nothing when none does.

@@ -40,7 +40,8 @@ void SetMode(const std::string& path, mode_t mode, int openFlags) {
         SystemTool::ThrowErrno(errno);
 }
 
-/// Private at first, then opened as wide as it is to be. One that appeared meanwhile is as good, but may have another mode.
+/// Private at first, then opened as wide as it is to be. One that appeared meanwhile is as good, but may have
+/// another mode.
 void Make(const std::string& path, const Kind& kind) {
     const fs::path itself = (fs::path(path) / "").parent_path(); // without a slash at its end
     if (const auto parent = itself.parent_path(); !parent.empty())

@@ -27,8 +27,9 @@ void SetUpBaseInfo(terminal::Worklog& log, const std::string& store, const Setup
         store::EnsureBaseInfo(log, store, store::SUITE_VERSION_KEY, options.suiteVersion);
 }
 
-/// One set-up at a time makes or changes the store: another one would take the files beside it for what a lost store left
-/// behind. Held for as long as the result lives. Nothing where there is no directory, as in a dry run.
+/// One set-up at a time makes or changes the store: another one would take the files beside it for what a
+/// lost store left behind. Held for as long as the result lives. Nothing where there is no directory, as in a
+/// dry run.
 SystemTool::IO::Descriptor WaitForTurn(const std::string& directory) {
     SystemTool::IO::Descriptor lock(::open(directory.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
     if (lock.IsOpen())

@@ -41,8 +41,8 @@ std::int64_t MillisecondsOf(std::string_view stamp) {
     return std::int64_t{std::mktime(&local)} * 1000 + NumberAt(stamp, 20, 3);
 }
 
-/// A line such as "2026-11-20 10:15:30.123 ERROR [pid:tid] [App/ReportServer:42 Recv] message". Nothing for a line of a lower
-/// level, and for what is no record.
+/// A line such as "2026-11-20 10:15:30.123 ERROR [pid:tid] [App/ReportServer:42 Recv] message". Nothing for a
+/// line of a lower level, and for what is no record.
 std::optional<Log::Line> WarningOrErrorIn(std::string_view text) {
     if (text.size() < STAMP_BYTES + 7 || text[4] != '-' || text[19] != '.')
         return std::nullopt;
@@ -79,7 +79,8 @@ int NumberOf(const fs::path& path) {
     return name.starts_with("Report_") && name.ends_with(".log") ? NumberAt(name, 7, name.size() - 11) : 0;
 }
 
-/// The log's newest part: the end of the live file, and before it that of the newest rotated one, where there is room.
+/// The log's newest part: the end of the live file, and before it that of the newest rotated one, where there
+/// is room.
 std::string NewestPart(const std::string& directory, const fs::path& rotated) {
     auto newest = EndOf(directory + "/Report.log", MOST_READ);
     if (!rotated.empty() && newest.size() < MOST_READ)

@@ -11,7 +11,8 @@
 namespace reportctl::status {
 namespace {
 
-/// Events of several modules are told apart up to so many: the table has no index, so that storing an event stays one step.
+/// Events of several modules are told apart up to so many: the table has no index, so that storing an event
+/// stays one step.
 constexpr std::int64_t MOST_TOLD_APART = 20'000;
 
 /// The words with which the outbox tells that a failure is over.

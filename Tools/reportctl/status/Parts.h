@@ -4,8 +4,8 @@
 
 #include "Tools/reportctl/status/Status.h"
 
-/// Each part of the status, gathered by itself. Nothing throws for what is missing, damaged or another user's: it is then not
-/// known. No file is changed.
+/// Each part of the status, gathered by itself. Nothing throws for what is missing, damaged or another
+/// user's: it is then not known. No file is changed.
 namespace reportctl::status {
 
 /// The service of the user `owner`, whose ledger was looked at.

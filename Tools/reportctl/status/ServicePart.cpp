@@ -24,8 +24,8 @@ std::optional<std::int64_t> StartOf(pid_t process) {
     return std::int64_t{status.st_mtim.tv_sec} * 1000 + status.st_mtim.tv_nsec / 1'000'000;
 }
 
-/// The process that counts in this user's ledger; without a ledger, the one that holds the machine's lock, if it is this
-/// user's.
+/// The process that counts in this user's ledger; without a ledger, the one that holds the machine's lock, if
+/// it is this user's.
 void FindProcess(Service& service, const ReportLedger::Look& ledger, uid_t owner) {
     const auto holder = service::LockHolder();
     const auto user = holder ? service::OwnerOf(*holder) : std::nullopt;

@@ -10,8 +10,8 @@
 #include "Ledger/Reader.h"
 #include "Tools/reportctl/ledger/Rates.h"
 
-/// What can be known of one user's service at a moment. Plain values: what gathers them, what judges them and what shows them
-/// are apart. Nothing stands for what is not known or not there.
+/// What can be known of one user's service at a moment. Plain values: what gathers them, what judges them and
+/// what shows them are apart. Nothing stands for what is not known or not there.
 namespace reportctl::status {
 
 /// Who has bound the service's port.

@@ -16,7 +16,8 @@ constexpr std::uint64_t LEAST_FREE = 500'000'000;
 constexpr std::uint64_t SMALL_DISK = 10'000'000'000; // where the least is a part of it
 constexpr std::uint64_t PART_OF_A_SMALL_DISK = 20;   // 5 %
 
-/// What is the service's fault, or the machine's, and what to do about it. Other refusals are senders' mistakes.
+/// What is the service's fault, or the machine's, and what to do about it. Other refusals are senders'
+/// mistakes.
 struct Fault {
     unsigned place;
     const char* what;

@@ -24,8 +24,8 @@ std::string CheckOf(SQLite::Database& database) {
 void CopyDatabase(const std::string& from, const std::string& to,
                   const std::function<void(int done, int total)>& progress) {
     auto source = OpenToRead(from);
-    // One read that lasts as long as the copy: without it, SQLite would begin the copy again after each write of the
-    // service, and never end it.
+    // One read that lasts as long as the copy: without it, SQLite would begin the copy again after each write
+    // of the service, and never end it.
     source.exec("begin");
     source.execAndGet("select count(*) from sqlite_master");
     SQLite::Database copy(to, SQLite::OPEN_READWRITE | SQLite::OPEN_CREATE);

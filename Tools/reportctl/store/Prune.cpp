@@ -59,8 +59,8 @@ std::int64_t RowsOverSize(SQLite::Database& database, std::int64_t rows, std::in
     return std::clamp(static_cast<std::int64_t>(part * double(rows)) + 1, std::int64_t{1}, rows);
 }
 
-/// Runs `work` in a transaction of its own and then leaves the lock alone for as long as it was held. Returns how long that
-/// was.
+/// Runs `work` in a transaction of its own and then leaves the lock alone for as long as it was held. Returns
+/// how long that was.
 Clock::duration InTurn(SQLite::Database& database, const std::function<void()>& work) {
     SQLite::Transaction transaction(database, SQLite::TransactionBehavior::IMMEDIATE);
     const auto begin = Clock::now();
@@ -71,7 +71,8 @@ Clock::duration InTurn(SQLite::Database& database, const std::function<void()>& 
     return held;
 }
 
-/// The size of the next batch by how long the last one took: towards the time that one may take, in steps of at most two.
+/// The size of the next batch by how long the last one took: towards the time that one may take, in steps of
+/// at most two.
 std::int64_t NextBatch(std::int64_t last, Clock::duration took, const PruneSettings& settings) {
     const auto allowed = std::chrono::milliseconds(settings.batchMs);
     const double factor =
@@ -140,8 +141,9 @@ void GiveSpaceBack(SQLite::Database& database, const PruneSettings& settings) {
     }
 }
 
-/// Merges the write-ahead log, which cuts the file. That takes a moment in which no other program writes: without one, the
-/// service's own next merge does it. A checkpoint that waits for the writers would keep them waiting for the disk.
+/// Merges the write-ahead log, which cuts the file. That takes a moment in which no other program writes:
+/// without one, the service's own next merge does it. A checkpoint that waits for the writers would keep them
+/// waiting for the disk.
 void MergeLog(SQLite::Database& database) {
     constexpr auto PATIENCE = std::chrono::seconds(2);
     constexpr auto BETWEEN_TRIES = std::chrono::milliseconds(20);

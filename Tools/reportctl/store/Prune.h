@@ -25,7 +25,8 @@ struct PrunePlan {
 
 /// How much the service may be kept waiting, and how much memory and disk one step may take.
 struct PruneSettings {
-    /// A transaction holds the write lock; the service's statements wait meanwhile. Its own groups hold the lock for 10 ms.
+    /// A transaction holds the write lock; the service's statements wait meanwhile. Its own groups hold the
+    /// lock for 10 ms.
     std::int64_t batchMs = 5;
     /// Rows of the first batch. The next ones are as large as their time allows.
     std::int64_t firstBatch = 200;
@@ -44,10 +45,12 @@ struct PruneResult {
 /// Reads the whole store, in pieces; changes nothing.
 PrunePlan PlanPrune(SQLite::Database& database, const PruneRule& rule);
 
-/// Deletes the rows of the plan in short transactions and gives the space back in further ones. Between two of them the
-/// lock is free for as long as it was held. `progress` is called with the ids that are done and the ids there are.
+/// Deletes the rows of the plan in short transactions and gives the space back in further ones. Between two
+/// of them the lock is free for as long as it was held. `progress` is called with the ids that are done and
+/// the ids there are.
 ///
-/// After a failure or a kill, what was committed stays done and the store is sound; doing it again does the rest.
+/// After a failure or a kill, what was committed stays done and the store is sound; doing it again does the
+/// rest.
 PruneResult Prune(SQLite::Database& database, const PruneRule& rule, const PrunePlan& plan,
                   const PruneSettings& settings,
                   const std::function<void(std::int64_t done, std::int64_t total)>& progress);

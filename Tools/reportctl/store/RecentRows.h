@@ -14,7 +14,8 @@ struct RowContent {
     std::string createTime;
 };
 
-/// The youngest rows of the store, to be found by their content. A row is found once, so that two equal reports need two.
+/// The youngest rows of the store, to be found by their content. A row is found once, so that two equal
+/// reports need two.
 ///
 /// One thread. Failure: ReadNew throws SQLite::Exception, and std::runtime_error when the store is missing.
 class RecentRows {
@@ -24,7 +25,8 @@ public:
     /// Reads the rows that came since; the first time, the last `before` rows.
     void ReadNew(std::int64_t before);
 
-    /// The id of the row that the service makes of this report, which is then taken away; 0 when there is none.
+    /// The id of the row that the service makes of this report, which is then taken away; 0 when there is
+    /// none.
     std::int64_t Take(const RowContent& report);
 
 private:

@@ -49,7 +49,8 @@ void WriteText(Writer& writer, const char* name, const ReportRow::Text& text) {
     writer.String(utf8.Text().data(), static_cast<rapidjson::SizeType>(utf8.Text().size()));
 }
 
-/// The JSON as it is, but on one line: a line's end is white space between the tokens, and cannot be inside one.
+/// The JSON as it is, but on one line: a line's end is white space between the tokens, and cannot be inside
+/// one.
 void WriteJson(Writer& writer, const char* name, std::string_view json) {
     writer.Key(name);
     std::string line(Utf8(json).Text());

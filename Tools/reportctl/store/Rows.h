@@ -22,14 +22,15 @@ IdRange AllIds(SQLite::Database& database);
 
 /// Calls `visit` with each piece of `range`, in order, each of at most `idsAtOnce` ids.
 ///
-/// A reader keeps SQLite from giving the write-ahead log's space back, so a command that reads the whole store reads it
-/// in pieces: each statement is over after some milliseconds.
+/// A reader keeps SQLite from giving the write-ahead log's space back, so a command that reads the whole
+/// store reads it in pieces: each statement is over after some milliseconds.
 void InPieces(IdRange range, std::int64_t idsAtOnce, const std::function<void(IdRange)>& visit);
 
 /// The pieces in which a command reads. 50,000 rows are read in about 0.1 s.
 inline constexpr std::int64_t IDS_AT_ONCE = 50'000;
 
-/// A statement over the rows of ReportsSelect: `select <columns> from (...) where <filter> and <id in :first..:end> <rest>`.
+/// A statement over the rows of ReportsSelect:
+/// `select <columns> from (...) where <filter> and <id in :first..:end> <rest>`.
 SQLite::Statement SelectReports(SQLite::Database& database, const std::string& columns,
                                 const ReportFilter& filter, const std::string& rest);
 

@@ -131,7 +131,8 @@ std::string ViewIn(SQLite::Database& database) {
     return query.getColumn(1);
 }
 
-/// The view is made anew around every change of a table: renaming one would have SQLite change the view's text.
+/// The view is made anew around every change of a table: renaming one would have SQLite change the view's
+/// text.
 void WrapInView(std::vector<std::string>& statements, SQLite::Database& database) {
     const auto present = ViewIn(database);
     if (statements.empty() && present == ReportsView())

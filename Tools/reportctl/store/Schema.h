@@ -7,8 +7,8 @@
 
 namespace reportctl::store {
 
-/// The version of the store's tables that this program makes, kept in the database's user_version. 0 is a database whose
-/// tables, if any, were made by hand; 1 has the tables; 2 also has the view `reports`.
+/// The version of the store's tables that this program makes, kept in the database's user_version. 0 is a
+/// database whose tables, if any, were made by hand; 1 has the tables; 2 also has the view `reports`.
 inline constexpr int SCHEMA_VERSION = 2;
 
 /// The version that the database says it has.

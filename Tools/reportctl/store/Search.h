@@ -18,7 +18,8 @@ struct FoundRow {
     std::string openid;
 };
 
-/// Calls `visit` with each row that holds the text in its event id, value, createTime or open id, oldest first.
+/// Calls `visit` with each row that holds the text in its event id, value, createTime or open id, oldest
+/// first.
 void Search(SQLite::Database& database, const std::string& text,
             const std::function<void(const FoundRow&)>& visit);
 

@@ -75,9 +75,10 @@ std::string FreeName(const std::string& path) {
             return name;
 }
 
-/// Side files without their database: what a lost one left behind, or what a service that still has the deleted one
-/// open goes on writing. SQLite would read the new database through them and damage it. They may hold the newest rows,
-/// so they are kept, all under one new name: with their database beside them under that name, SQLite reads them again.
+/// Side files without their database: what a lost one left behind, or what a service that still has the
+/// deleted one open goes on writing. SQLite would read the new database through them and damage it. They may
+/// hold the newest rows, so they are kept, all under one new name: with their database beside them under that
+/// name, SQLite reads them again.
 bool MoveOrphanedSideFilesAway(terminal::Worklog& log, const std::string& path) {
     const auto name = FreeName(path);
     bool areAway = true;
@@ -157,8 +158,9 @@ bool CanShrink(const std::string& path) {
     return OpenStoreToLook(path).execAndGet("pragma auto_vacuum").getInt() == AUTO_VACUUM_INCREMENTAL;
 }
 
-/// A store of an older set-up keeps the size that it once had. It is rewritten so that `prune` can give space back: at
-/// once when that is short, else when it is asked for, because the service can store nothing meanwhile.
+/// A store of an older set-up keeps the size that it once had. It is rewritten so that `prune` can give space
+/// back: at once when that is short, else when it is asked for, because the service can store nothing
+/// meanwhile.
 void EnsureThatItCanShrink(terminal::Worklog& log, const std::string& path, bool mayTakeLong) {
     if (CanShrink(path) || (!mayTakeLong && fs::file_size(path) > MAX_BYTES_TO_REWRITE_UNASKED))
         return;

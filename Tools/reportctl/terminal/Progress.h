@@ -6,8 +6,8 @@
 
 namespace reportctl::terminal {
 
-/// A line on standard error that tells how far a long command is. It is shown on a terminal only, and it is gone when
-/// this object is: what the command has to say at its end stands alone.
+/// A line on standard error that tells how far a long command is. It is shown on a terminal only, and it is
+/// gone when this object is: what the command has to say at its end stands alone.
 class Progress {
 public:
     /// `label` says what is being done, such as "exporting".
@@ -16,7 +16,8 @@ public:
     Progress(const Progress&) = delete;
     Progress& operator=(const Progress&) = delete;
 
-    /// `done` of `total` are done. Cheap enough to be called for each thousand rows; draws ten times a second.
+    /// `done` of `total` are done. Cheap enough to be called for each thousand rows; draws ten times a
+    /// second.
     void Show(std::int64_t done, std::int64_t total);
 
 private:

@@ -28,8 +28,8 @@ std::string DirectoryOf(const std::string& path) {
     return slash == std::string::npos ? "." : path.substr(0, slash + 1);
 }
 
-/// The reader has seen enough: no failure, and nothing to tell. A library that this program links ignores the signal, which
-/// would have ended it.
+/// The reader has seen enough: no failure, and nothing to tell. A library that this program links ignores the
+/// signal, which would have ended it.
 [[noreturn]] void EndByTheClosedPipe() {
     std::signal(SIGPIPE, SIG_DFL);
     std::raise(SIGPIPE);

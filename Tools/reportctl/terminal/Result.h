@@ -9,9 +9,9 @@ namespace reportctl::terminal {
 
 /// Where a command's result goes: standard output, or a file that appears whole or not at all.
 ///
-/// A file is written under another name beside its own, mode 0600 unless another one is asked for, and gets its name in Finish, after its contents are
-/// on the disk; one that was there before stays as it is until then, and for good when anything fails. A path that
-/// names a device or a pipe is written to as it is.
+/// A file is written under another name beside its own, mode 0600 unless another one is asked for, and gets
+/// its name in Finish, after its contents are on the disk; one that was there before stays as it is until
+/// then, and for good when anything fails. A path that names a device or a pipe is written to as it is.
 ///
 /// Failure: every operation throws std::system_error, a full disk and a full /dev/full included.
 class Result {

@@ -62,7 +62,8 @@ seconds OffsetOf(const std::string& zone) {
     return zone[0] == '-' ? -offset : offset;
 }
 
-/// The moment that the clock on the wall shows so. In the hour that a summer time repeats, the C library chooses.
+/// The moment that the clock on the wall shows so. In the hour that a summer time repeats, the C library
+/// chooses.
 TimePoint MomentOf(std::tm wall, const std::string& zone) {
     if (zone.empty()) {
         wall.tm_isdst = -1;

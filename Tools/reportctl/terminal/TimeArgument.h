@@ -12,8 +12,8 @@ inline constexpr auto TIME_FORMS =
     "10m, 2h or 90d back from now, or a date or date-time such as 2026-11-21, 2026-11-21T14:05 or "
     "2026-11-21T14:05:06Z; local time unless it ends in Z or an offset such as +01:00";
 
-/// Reads a point in time that a person wrote, in one of TIME_FORMS. `s` for seconds and `w` for weeks are understood,
-/// too. A date alone is its first moment.
+/// Reads a point in time that a person wrote, in one of TIME_FORMS. `s` for seconds and `w` for weeks are
+/// understood, too. A date alone is its first moment.
 ///
 /// Throws std::invalid_argument for anything else, with a message that says what would be right.
 TimePoint ReadTime(const std::string& text, TimePoint now);

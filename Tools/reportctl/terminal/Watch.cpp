@@ -21,7 +21,8 @@ void Handle(void (*handler)(int)) {
         ::sigaction(signal, &action, nullptr);
 }
 
-/// A signal that comes between the look at g_isToEnd and the wait would be seen only after it. So it is let in by the wait.
+/// A signal that comes between the look at g_isToEnd and the wait would be seen only after it. So it is let
+/// in by the wait.
 sigset_t TheSignals() {
     sigset_t signals;
     ::sigemptyset(&signals);

@@ -17,7 +17,8 @@ inline constexpr Verb SET{"set", "would set"};
 inline constexpr Verb MIGRATE{"migrated", "would migrate"};
 inline constexpr Verb RENAME{"renamed", "would rename"};
 
-/// What an action throws when another program has done the same meanwhile, such as a set-up that was started with this one.
+/// What an action throws when another program has done the same meanwhile, such as a set-up that was started
+/// with this one.
 struct AlreadyThere {};
 
 /// Does things and tells the person, one line each: results on standard output, failures and warnings on
@@ -31,8 +32,8 @@ public:
     /// `thing` needs nothing.
     void AlreadyDone(const std::string& thing);
 
-    /// Does `action` to `thing` unless this is a dry run. AlreadyThere means AlreadyDone. Any other exception from it is told as a failure, followed
-    /// by `advice`. Returns false after a failure.
+    /// Does `action` to `thing` unless this is a dry run. AlreadyThere means AlreadyDone. Any other exception
+    /// from it is told as a failure, followed by `advice`. Returns false after a failure.
     bool Run(const Verb& verb, const std::string& thing, const std::function<void()>& action,
              const std::string& advice = {});
 

@@ -30,7 +30,8 @@ OutboxSettings RoomForThreeEvents() {
     return settings;
 }
 
-/// To open an outbox takes some thousand allocations: every thirteenth has its turn, and all with SSR_EVERY_ALLOCATION set.
+/// To open an outbox takes some thousand allocations: every thirteenth has its turn, and all with
+/// SSR_EVERY_ALLOCATION set.
 int Step() {
     return std::getenv("SSR_EVERY_ALLOCATION") != nullptr ? 1 : 13;
 }

@@ -3,8 +3,8 @@
 #include <cstdint>
 #include <string>
 
-/// A small file system of the test's own, mounted at a directory; it hides what was there and goes with this object.
-/// Only in the sandbox. Failure: throws std::system_error.
+/// A small file system of the test's own, mounted at a directory; it hides what was there and goes with this
+/// object. Only in the sandbox. Failure: throws std::system_error.
 class Disk {
 public:
     Disk(std::string directory, std::uintmax_t bytes);

@@ -2,8 +2,8 @@
 
 #include <sys/resource.h>
 
-/// While this lives, no file that this process, or a child that it starts, writes may become larger: the system ends the
-/// process by SIGXFSZ. A child keeps the limit.
+/// While this lives, no file that this process, or a child that it starts, writes may become larger: the
+/// system ends the process by SIGXFSZ. A child keeps the limit.
 class FileSizeLimit {
 public:
     explicit FileSizeLimit(rlim_t bytes) {

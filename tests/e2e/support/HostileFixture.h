@@ -18,8 +18,9 @@ protected:
     /// Sends without overrunning the socket, so that each one is received.
     void Send(const std::string& datagram);
 
-    /// The next report is stored in time, the store and the outbox have got so many rows and events and are sound, the
-    /// log is one line for each record, the ledger has them all, and neither memory nor descriptors nor threads nor files have grown.
+    /// The next report is stored in time, the store and the outbox have got so many rows and events and are
+    /// sound, the log is one line for each record, the ledger has them all, and neither memory nor
+    /// descriptors nor threads nor files have grown.
     void ExpectSoundness(std::int64_t rows, std::int64_t events);
 
     /// An empty directory that the service was started in.

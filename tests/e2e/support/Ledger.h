@@ -7,8 +7,8 @@
 
 #include "tests/e2e/support/Service.h"
 
-/// Numbered reports for the store, and what became of each: a row, or a line of the log with its statement. Made for
-/// faults, in which no marker can be stored to wait for.
+/// Numbered reports for the store, and what became of each: a row, or a line of the log with its statement.
+/// Made for faults, in which no marker can be stored to wait for.
 class Ledger {
 public:
     using Numbers = std::set<int>;

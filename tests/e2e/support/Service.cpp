@@ -60,8 +60,8 @@ Service::Service() {
     for (const auto& plugin : PLUGINS)
         std::filesystem::create_symlink(std::filesystem::path(SSR_BIN_DIR) / plugin,
                                         m_program.Path() + "/" + plugin);
-    // A sanitizer looks for leaks at exit, which takes longer than the crash handler's deadline on a busy machine; and it
-    // wants to be the first library otherwise, where a test loads one before the program.
+    // A sanitizer looks for leaks at exit, which takes longer than the crash handler's deadline on a busy
+    // machine; and it wants to be the first library otherwise, where a test loads one before the program.
     m_environment = {"XDG_DATA_HOME=" + DataDirectory(), "HOME=" + DataDirectory(), "PATH=/usr/bin:/bin",
                      "ASAN_OPTIONS=detect_leaks=0:verify_asan_link_order=0"};
 }
@@ -74,8 +74,8 @@ Service::~Service() {
         ADD_FAILURE() << output;
 }
 
-/// After any fault, each received report has ended, waits, or was lost. There is no ledger where the disk took
-/// none.
+/// After any fault, each received report has ended, waits, or was lost. There is no ledger where the disk
+/// took none.
 void Service::ExpectBalance() {
     const auto isBalanced = [this] {
         const auto books = Books();

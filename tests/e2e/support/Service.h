@@ -12,8 +12,8 @@
 #include "tests/support/TemporaryDirectory.h"
 
 /// The real program with the real plug-ins, in a user data directory of its own. The sandbox of the test
-/// gives it port 9997 and the pid file's directory. Killed by the destructor, which fails the test when a sanitizer found
-/// something in it, or when its ledger does not balance.
+/// gives it port 9997 and the pid file's directory. Killed by the destructor, which fails the test when a
+/// sanitizer found something in it, or when its ledger does not balance.
 class Service {
 public:
     /// A line of the log, taken apart.

@@ -7,7 +7,8 @@
 #include "tests/e2e/support/Service.h"
 #include "tests/support/TemporaryDirectory.h"
 
-/// The wall clock of a service that is started after this object was made: it runs as the machine's, so much ahead of it.
+/// The wall clock of a service that is started after this object was made: it runs as the machine's, so much
+/// ahead of it.
 class SteppedClock {
 public:
     explicit SteppedClock(Service& service) {

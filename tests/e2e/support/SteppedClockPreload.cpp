@@ -1,5 +1,5 @@
-// Loaded into the program before the C library, whose functions for the wall clock it replaces by ones that add the
-// seconds which a file names; see SteppedClock.h. No other clock changes, least of all the machine's.
+// Loaded into the program before the C library, whose functions for the wall clock it replaces by ones that
+// add the seconds which a file names; see SteppedClock.h. No other clock changes, least of all the machine's.
 
 #include <cstdint>
 #include <cstdlib>

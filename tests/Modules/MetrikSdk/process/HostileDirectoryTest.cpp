@@ -71,8 +71,8 @@ protected:
                 [this] { return m_home.Path(); }};
     }
 
-    /// A directory of the test's own whose way from the root no other user can change; empty without the right to make
-    /// one.
+    /// A directory of the test's own whose way from the root no other user can change; empty without the
+    /// right to make one.
     std::string MakePlace() {
         m_place = "/run/ssr-hostile-" + std::to_string(::getpid());
         return ::mkdir(m_place.c_str(), 0755) == 0 ? m_place : "";

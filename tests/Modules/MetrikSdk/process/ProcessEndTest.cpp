@@ -39,8 +39,8 @@ protected:
 
     enum class KillAfter { AnEvent, ARequest };
 
-    /// A "stream" child is killed a moment after its first event, or after the first request that the server sees
-    /// of it; the numbers that it was told were accepted.
+    /// A "stream" child is killed a moment after its first event, or after the first request that the server
+    /// sees of it; the numbers that it was told were accepted.
     std::vector<int> KillAtARandomMoment(int firstNumber, KillAfter what) {
         const auto before = m_server.RequestCount();
         ChildProgram child(m_directory.Path(), firstNumber, "stream");

@@ -75,7 +75,8 @@ protected:
         };
     }
 
-    /// Passes, with the pauses that the cycle wants, for so long by its own clock; `eachMinute` comes about once a minute.
+    /// Passes, with the pauses that the cycle wants, for so long by its own clock; `eachMinute` comes about
+    /// once a minute.
     void RunFor(
         std::chrono::hours duration, const std::function<void()>& eachMinute = [] {}) {
         RunFor(std::chrono::minutes(duration), eachMinute);

@@ -209,7 +209,8 @@ class ProcessThatExits : public GroupAndProcesses {
 protected:
     static constexpr int ROUNDS = 20;
 
-    /// Runs `end` in a child while another of its threads streams, which `end` is given. What the child's Wait returned.
+    /// Runs `end` in a child while another of its threads streams, which `end` is given. What the child's
+    /// Wait returned.
     int StreamAndEnd(const std::function<void(std::thread&)>& end) {
         ForgetProgress();
         const auto life = ALifeTime();

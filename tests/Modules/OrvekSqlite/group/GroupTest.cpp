@@ -21,8 +21,8 @@ protected:
         m_file.Set(Store());
     }
 
-    /// Runs statements until two have come so close together that they share a transaction, and waits until that is
-    /// to be committed.
+    /// Runs statements until two have come so close together that they share a transaction, and waits until
+    /// that is to be committed.
     void OpenDueGroup() {
         ASSERT_TRUE(WaitUntil([&] {
             m_group.Execute(Insert("x"));

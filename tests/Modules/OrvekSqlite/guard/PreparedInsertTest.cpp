@@ -2,8 +2,8 @@
 
 #include "tests/Modules/OrvekSqlite/SqliteFixture.h"
 
-// Inserts that differ in their literals only are compiled once. No caller sees a difference: the stored rows and the
-// errors they give are those of SQLite running the same texts.
+// Inserts that differ in their literals only are compiled once. No caller sees a difference: the stored rows
+// and the errors they give are those of SQLite running the same texts.
 namespace {
 
 class PreparedInsert : public SqliteFixture {
@@ -18,7 +18,8 @@ protected:
 
     std::string Plain() const { return Directory() + "/Plain.db"; }
 
-    /// Runs the text through the plug-in and through SQLite, and expects the same of both: no error, or this one.
+    /// Runs the text through the plug-in and through SQLite, and expects the same of both: no error, or this
+    /// one.
     void Run(const std::string& sql) {
         const bool done = Plugin()->ExecSql(sql);
         try {

@@ -216,8 +216,8 @@ TEST_F(Setup, SaysSoWhenItsWordsCannotBeWritten) {
     EXPECT_EQ(Reportctl("--help >/dev/full").exitCode, 1) << "standard error is as full there";
 }
 
-/// A directory for pid files that is another's, and a user who runs set-up: where the test runs as root, that must be
-/// made.
+/// A directory for pid files that is another's, and a user who runs set-up: where the test runs as root, that
+/// must be made.
 class SetupInAnothersDirectory : public Setup {
 protected:
     static constexpr uid_t NOBODY = 65534;

@@ -1,4 +1,5 @@
-// page_sample FILE [RELOAD-SECONDS]: writes a page with known numbers and hostile texts, for the browser that looks at it.
+// page_sample FILE [RELOAD-SECONDS]: writes a page with known numbers and hostile texts, for the browser that
+// looks at it.
 
 #include <cstdlib>
 #include <fstream>

@@ -38,8 +38,8 @@ private:
         return std::stoi(Ask("select count(*) from OperLog where " + condition));
     }
 
-    /// A report whose row tells that everything before it has been handled: the store commits the rows of a burst
-    /// together and in order. The user of before it may be one with whom nothing is stored.
+    /// A report whose row tells that everything before it has been handled: the store commits the rows of a
+    /// burst together and in order. The user of before it may be one with whom nothing is stored.
     static constexpr auto AN_END = R"({"msgType":"updateOpenID","exdata":{"openID":"u","hublinkVersion":"1"}}
 {"eventID":"the end","createTime":1700000000})";
 

@@ -22,7 +22,8 @@ protected:
         EXPECT_EQ(ContentOf(Store()), before);
     }
 
-    /// What kill -9 leaves of a store when the service had run these statements: what they wrote is in the log alone.
+    /// What kill -9 leaves of a store when the service had run these statements: what they wrote is in the
+    /// log alone.
     void RunInAServiceThatIsKilled(const std::string& sql) const {
         namespace fs = std::filesystem;
         const auto aside = Data() + "/aside";
