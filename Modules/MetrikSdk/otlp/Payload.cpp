@@ -33,8 +33,9 @@ std::unique_ptr<SystemTool::IO::JsonTree> Payload::Parsed(const std::string& tex
 const SystemTool::IO::JsonValue* Payload::ObjectIn(const char* name) const {
     if (!m_document)
         return nullptr;
-    const auto member = m_document->FindMember(name);
-    return member != m_document->MemberEnd() && member->value.IsObject() ? &member->value : nullptr;
+    const SystemTool::IO::JsonValue& document = *m_document;
+    const auto member = document.FindMember(name);
+    return member != document.MemberEnd() && member->value.IsObject() ? &member->value : nullptr;
 }
 
 std::optional<std::string> Payload::TextIn(const char* outer, const char* name) const {
