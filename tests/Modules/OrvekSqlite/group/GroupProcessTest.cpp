@@ -207,7 +207,7 @@ TEST_F(AnotherProgram, HasItsTurnUnderConstantLoad) {
 /// A program whose plug-in is destroyed by exit, while another thread streams.
 class ProcessThatExits : public GroupAndProcesses {
 protected:
-    static constexpr int ROUNDS = 20;
+    static constexpr int ROUNDS = 10;
 
     /// Runs `end` in a child while another of its threads streams, which `end` is given. What the child's
     /// Wait returned.
