@@ -1,5 +1,5 @@
-// The bare parts of a report's way that no other program measures: what any service would pay that does what this one
-// does. bench/run adds them to a bare receive and a bare insert, and calls the sum the floor.
+// The bare parts of a report's way that no other program measures: what any service would pay that does what
+// this one does. bench/run adds them to a bare receive and a bare insert, and calls the sum the floor.
 
 #include <cstdlib>
 #include <deque>
@@ -31,8 +31,8 @@ void Write(benchmark::State& state) {
     close(file);
 }
 
-/// By the fastest parser that Debian has. All of the text is read and checked, since it comes from outside; its On-Demand
-/// interface would pass over what is not asked for.
+/// By the fastest parser that Debian has. All of the text is read and checked, since it comes from outside;
+/// its On-Demand interface would pass over what is not asked for.
 void Parse(benchmark::State& state) {
     const simdjson::padded_string report(ReportOf180Bytes());
     simdjson::dom::parser parser;

@@ -9,11 +9,12 @@
 
 namespace reportctl::terminal {
 
-/// JSON text that a terminal may show: the control characters that JSON lets stand as they are (U+007F to U+009F) are
-/// escaped.
+/// JSON text that a terminal may show: the control characters that JSON lets stand as they are (U+007F to
+/// U+009F) are escaped.
 std::string ShownJson(std::string_view json);
 
-/// One JSON object on one line, its members in the order in which they are added. What is no UTF-8 becomes U+FFFD.
+/// One JSON object on one line, its members in the order in which they are added. What is no UTF-8 becomes
+/// U+FFFD.
 class JsonObject {
 public:
     JsonObject() : m_writer(m_text) { m_writer.StartObject(); }

@@ -95,7 +95,8 @@ protected:
         return needs == Needs::Nothing ? "" : Files()[static_cast<std::size_t>(needs)];
     }
 
-    /// A command that needs something fails and names it, followed by one of these words; the others do their work.
+    /// A command that needs something fails and names it, followed by one of these words; the others do their
+    /// work.
     void ExpectWords(const Command& command, const Outcome& outcome,
                      const std::vector<std::string>& words) const {
         const auto path = PathOf(command.needs);

@@ -9,8 +9,8 @@
 #include "tests/Tools/reportctl/support/OutboxFile.h"
 #include "tests/Tools/reportctl/support/RowsFixture.h"
 
-/// All that a service leaves behind: store, outbox, log and ledger, with texts in them that would drive a terminal, leave
-/// their field, or are no UTF-8.
+/// All that a service leaves behind: store, outbox, log and ledger, with texts in them that would drive a
+/// terminal, leave their field, or are no UTF-8.
 class ServiceFilesFixture : public RowsFixture {
 protected:
     void SetUp() override {
