@@ -71,7 +71,7 @@ def queue(_, plan, tell):
     """In the real program; then the queue's own part, in a program without sockets and database."""
     full = backlog.measure(subjects.Service, plan.queued_reports)
     tell("the queue alone")
-    full["item_ns"] = {name.split("/")[1]: ns for name, ns in _item_ns("poco_tasker_bench", "^Item/").items()}
+    full["item_ns"] = {name.split("/")[1]: ns for name, ns in _item_ns(plan, "poco_tasker_bench", "^Item/").items()}
     return full
 
 
@@ -85,18 +85,18 @@ def floor(_, plan, tell):
         insert = _inserted(store, rows, "1000", True)["cpu_ns"] / rows
     tell("a bare write, parse and queue")
     return {"receive": received, "insert": insert,
-            **{part.split("/")[0].lower(): ns for part, ns in _item_ns("floor_bench", ".", 5).items()}}
+            **{part.split("/")[0].lower(): ns for part, ns in _item_ns(plan, "floor_bench", ".").items()}}
 
 
-def ledger(*_):
+def ledger(_, plan, __):
     """What the two threads count of a report, alone; and its way through the queue, counted and not."""
-    return _item_ns("ledger_bench", "^(Counted|Queued)", 5)
+    return _item_ns(plan, "ledger_bench", "^(Counted|Queued)")
 
 
-def _item_ns(program, names, tries=1):
+def _item_ns(plan, program, names):
     """Processor time for an item of each benchmark of these names: the least of all tries; a disturbance makes it longer."""
     command = [PROGRAMS / program, f"--benchmark_filter={names}", "--benchmark_format=json",
-               f"--benchmark_repetitions={tries}"]
+               f"--benchmark_repetitions={plan.repetitions}", f"--benchmark_min_time={plan.repetition_seconds}"]
     report = json.loads(subprocess.run(command, capture_output=True, text=True, check=True).stdout)
     times = {}
     for run in report["benchmarks"]:

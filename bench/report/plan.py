@@ -20,11 +20,14 @@ class Plan:
     growth_rounds: int = 3       # in turn, so that a disturbance meets all sizes; the median counts
     queued_reports: int = 1_000_000
     rest_seconds: float = 10
+    repetitions: int = 5         # of the benchmarks of single parts; the least counts
+    repetition_seconds: float = 0.5
 
 
 FULL = Plan()
 
-QUICK = Plan(flood_reports=50_000, probe_seconds=1, probes=3, tries=1, confirm_seconds=1, exactness=4,
+QUICK = Plan(flood_reports=50_000, probe_seconds=0.5, probes=3, tries=1, confirm_seconds=0.5, exactness=4,
              searched=("service", "daemon"), latency_seconds=1, latency_rates=(10, 20_000),
-             baselines=(("1", 10_000), ("1000", 100_000), ("1000 prepared", 100_000)), rows_before=(0, 100_000),
-             growth_reports=50_000, growth_rounds=1, queued_reports=100_000, rest_seconds=1)
+             baselines=(("1", 2_000), ("1000", 50_000), ("1000 prepared", 50_000)), rows_before=(0, 50_000),
+             growth_reports=50_000, growth_rounds=1, queued_reports=30_000, rest_seconds=1, repetitions=1,
+             repetition_seconds=0.02)
