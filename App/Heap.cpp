@@ -1,24 +1,27 @@
-// The settings of the program's heap, which is jemalloc's: it reads them by this name when the process
-// starts. The library finds the name only when the program exports it.
+// The settings of the program's heap, jemalloc. jemalloc looks for a variable of this name when the process
+// starts. It finds the variable only when the program exports it.
 //
-// Each report is allocated on the receiving thread and freed on the storing one. The C library gives such
-// memory back under a lock that the receiving thread needs for its next report, and at a high rate each waits
-// there for the other. It also keeps what a backlog needed until the process ends. jemalloc does neither.
+// Why jemalloc: each report is allocated on the receiving thread and freed on the storing thread. To free it,
+// the C library takes a lock that the receiving thread needs for its next report, so at a high rate the two
+// threads wait for each other. The C library also keeps the memory of a backlog until the process ends.
+// jemalloc does neither.
 
-// Memory that has been free for a second goes back to the system: a backlog may have needed gigabytes, and it
-// is rare. A thread of the heap's own sees to that, which sleeps while there is nothing to give back. Without
-// it, memory goes back only when the program uses the heap much, and a service that gets no reports would
-// keep a backlog's memory.
+// Memory that has been free for a second goes back to the system: a backlog may have needed gigabytes, and
+// backlogs are rare. A background thread of jemalloc does this; it sleeps while there is nothing to give
+// back. Without this thread, memory goes back only while the program uses the heap much, and a service that
+// gets no reports would keep the memory of a backlog.
 //
-// All threads share one arena. A report's memory then serves the next report as soon as it is stored, which
-// is when there is least to spare; with an arena for each thread, it came back to the receiving thread's. And
-// a thread's first allocation makes no new arena: without memory for one, jemalloc 5.3 ends the process.
+// All threads share one arena, so the memory of a stored report can serve any thread at once, also when
+// memory is short. With an arena for each thread, that memory went back to the receiving thread's arena,
+// where only that thread could use it. A second reason: with one arena, the first allocation of a new thread
+// does not make an arena. When there is no memory for a new arena, jemalloc 5.3 ends the process.
 //
-// What goes back, goes back with its addresses. Else a process with a limit of those (ulimit -v) keeps what a
-// backlog needed for ever, and SQLite's own mappings find no room until a restart.
+// retain:false gives the addresses back together with the memory. Otherwise a process with a limit on its
+// address space (ulimit -v) keeps the addresses of a backlog for ever, and SQLite finds no room to map its
+// files until a restart.
 //
-// What the two cost: a queue of a million items takes 134 ms to fill and empty, where it took 109 with an
-// arena for each thread and addresses kept (poco_tasker_bench); that is 25 ns a report.
+// One arena and retain:false cost 25 ns a report: a queue of a million items takes 134 ms to fill and empty,
+// instead of 109 ms with an arena for each thread and with addresses kept (poco_tasker_bench).
 extern "C" {
 extern __attribute__((visibility("default"))) const char* malloc_conf;
 const char* malloc_conf =

@@ -8,7 +8,8 @@ namespace {
 
 namespace Platform = SystemTool::Platform;
 
-/// Under load; a system call for each datagram would cost more than all the counting.
+/// Under load, we ask the kernel for its dropped datagrams once in this time. A system call for each datagram
+/// would take longer than all the counting.
 constexpr std::int64_t LOOK_EACH_MS = 1000;
 
 } // namespace
@@ -31,7 +32,7 @@ void IntakeWatch::Idle() {
 void IntakeWatch::LookAtTheSocket(std::int64_t nowMs) {
     m_lookedAtMs = nowMs;
     if (const auto dropped = Platform::DatagramsDropped(m_socket.impl()->sockfd())) {
-        m_ledger.Dropped(*dropped - m_dropped, nowMs); // also right when the count begins again at 0
+        m_ledger.Dropped(*dropped - m_dropped, nowMs); // right also when the kernel's counter wraps around
         m_dropped = *dropped;
     }
     m_ledger.Tick(nowMs);

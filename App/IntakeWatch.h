@@ -10,10 +10,12 @@
 
 namespace SyncServiceReport {
 
-/// Tells the ledger what only the receiver sees: each datagram, also an empty or a cut one, and what the
-/// kernel dropped. Keeps the ledger's marks in passing.
+/// Counts in the ledger what only the receiver sees: each datagram, also an empty or a cut one, and the
+/// datagrams that the kernel dropped. It also calls the ledger's Tick often enough.
 ///
-/// Threads: the receiving thread only. Keeps both references without owning them.
+/// Threads: the receiving thread only.
+///
+/// Ownership: keeps both references without owning them.
 class IntakeWatch final : public DatagramWatch {
 public:
     IntakeWatch(ReportLedger::Writer& ledger, const Poco::Net::DatagramSocket& socket)
@@ -29,7 +31,7 @@ private:
     ReportLedger::Writer& m_ledger;
     const Poco::Net::DatagramSocket& m_socket;
     std::int64_t m_lookedAtMs = 0;
-    std::uint32_t m_dropped = 0; ///< By the kernel, when it was last asked.
+    std::uint32_t m_dropped = 0; ///< The kernel's count of dropped datagrams when it was last read.
 };
 
 } // namespace SyncServiceReport

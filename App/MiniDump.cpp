@@ -23,27 +23,28 @@ std::string MiniDump::m_strLogName;
 
 namespace {
 
-constexpr mode_t PID_FILE_MODE = 0666; // of every user's instance: the lock is the machine's
+constexpr mode_t PID_FILE_MODE = 0666; // one pid file serves the instances of all users
 
-/// After this long in the handler, SIGALRM's default action ends the process. The fault may have come while
-/// this very thread held a lock that the trace needs, the allocator's for one; a service that hangs there
-/// would keep the instance lock and the port from its successor for ever. Long enough for a trace on a slow
-/// disk.
+/// When the handler takes longer than this, the default action of SIGALRM ends the process. The fault may
+/// have come while this thread held a lock that the trace needs, such as the allocator's. Without the alarm,
+/// the service would hang there for ever and keep the instance lock and the port, so that no new service
+/// could start. The time is long enough for a trace on a slow disk.
 constexpr unsigned CRASH_DEADLINE_SECONDS = 5;
 
 constexpr std::size_t FRAME_ENTRIES = 64;
 constexpr int FRAME_BYTES = FRAME_ENTRIES * sizeof(void*); // 512
 
-/// Where the back trace goes. It is asked for with the array's size in bytes as the number of entries,
-/// deliberately: the people who read the traces want the deep ones whole. A stack of more than 64 frames runs
-/// over the array's end, and into the room behind it.
+/// The memory for the back trace. We pass the size of `frames` in bytes (512) to backtrace as the number of
+/// entries, deliberately: the people who read the traces want deep stacks whole. A stack of more than 64
+/// frames runs over the end of `frames` into `overrun`.
 struct BackTrace {
     void* frames[FRAME_ENTRIES];
     void* overrun[FRAME_BYTES - FRAME_ENTRIES];
 };
 
-/// Locks the file; true, with the reason in errno, when another process holds the lock. One that fails for
-/// another reason (a file system without locks) does not stop the service, deliberately.
+/// Locks the file. True, with the reason in errno, when another process holds the lock. When the lock fails
+/// for another reason (a file system without locks), the result is false, deliberately: that must not stop
+/// the service.
 bool IsLockedElsewhere(int file) {
     struct flock lock {};
     lock.l_type = F_WRLCK;
@@ -51,12 +52,12 @@ bool IsLockedElsewhere(int file) {
     return ::fcntl(file, F_SETLK, &lock) < 0 && (errno == EACCES || errno == EAGAIN);
 }
 
-/// Writes this process's id in decimal; the result of write(2).
+/// Writes this process's id in decimal; returns the result of write(2).
 ssize_t WriteProcessId(int file) {
     char text[16] = {};
     std::snprintf(text, sizeof text, "%d", ::getpid());
-    if (::ftruncate(file, 0) !=
-        0) { // then some digits of an earlier, longer id may stay; the lock is what counts
+    // When this fails, some digits of an earlier, longer id may stay. That is accepted: the lock decides.
+    if (::ftruncate(file, 0) != 0) {
     }
     return ::write(file, text, std::strlen(text));
 }
@@ -69,8 +70,8 @@ void MiniDump::EnableAutoStack(const std::string& logPath, const std::string& lo
     ::signal(SIGSEGV, OnStackCallBack);
 }
 
-// exit is intended, also while other threads run, and this library's strerror has a text of its own for each
-// thread.
+// clang-tidy distrusts exit and strerror here. exit is intended, also while other threads run. The C
+// library's strerror keeps a text of its own for each thread.
 // NOLINTBEGIN(concurrency-mt-unsafe)
 
 void MiniDump::OnStackCallBack(int signal) {
@@ -82,14 +83,15 @@ void MiniDump::OnStackCallBack(int signal) {
     for (int i = 0; symbols != nullptr && i < count; ++i)
         WriteLog({LogLevel::Error, "OnStackCallBack", 252}, "[%s]", symbols[i]);
     std::free(symbols); // NOLINT(cppcoreguidelines-no-malloc): backtrace_symbols asks for it
-    std::exit(0);       // 0 after a crash, deliberately: other codes mean that the service could not start
+    std::exit(0); // 0 after a crash, deliberately: every other code means that the service could not start
 }
 
 bool MiniDump::IsAlreadyRun() {
     ::umask(0);
     const std::string path = Poco::format("/Library/Preferences/hublink/%s.pid", m_strLogName);
-    // Not truncated: an instance that loses must not wipe the winner's id. Not through a link: every user may
-    // put one into that directory, and the file that it names would be emptied.
+    // We do not truncate the file here: a second instance, which does not get the lock, must not erase the id
+    // of the first. We do not follow a link: every user may put one into that directory, and the file that
+    // the link names would be emptied.
     const int file = ::open(path.c_str(), O_RDWR | O_CREAT | O_NOFOLLOW, PID_FILE_MODE);
     if (file < 0) {
         WriteLog({LogLevel::Info, "IsAlreadyRun", 304}, "Open file failed, error : %s", std::strerror(errno));
@@ -108,7 +110,7 @@ bool MiniDump::IsAlreadyRun() {
         ::close(file);
         std::exit(1);
     }
-    return false; // the file stays open, and with it the lock
+    return false; // the file stays open, and keeps the lock
 }
 
 // NOLINTEND(concurrency-mt-unsafe)

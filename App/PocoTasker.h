@@ -17,25 +17,25 @@ public:
     T m_data;
 };
 
-/// Its arrival ends the consumer's loop.
+/// Ends the consumer's loop when it arrives.
 class StopNotification : public Poco::Notification {};
 
-/// Takes values from any thread and hands them, in the order of their arrival and one at a time, to Consume
+/// Takes values from any thread and passes them to Consume, in the order of their arrival and one at a time,
 /// on a thread of its own. The queue has no bound.
 ///
 /// Life: constructed → running (the derived class starts m_thread with this object) → stopped by StopThread.
-/// There is no restart. Values produced before the start wait; those that wait when it stops are dropped. A
-/// derived class calls StopThread in its own destructor: this one's would be too late, Consume is gone by
-/// then.
+/// There is no restart. Values that are produced before the start wait for it. Values that wait when the
+/// thread is stopped are dropped. A derived class must call StopThread in its own destructor: the destructor
+/// of this class would be too late, because Consume no longer exists then.
 template <typename T>
 class PocoTasker : public Poco::Runnable {
 public:
-    /// The consumer's loop. Catches nothing: Consume does.
+    /// The consumer's loop. It catches no exception of Consume, which must not throw.
     void run() override {
         for (;;) {
             const Poco::AutoPtr<Poco::Notification> item(Next());
             if (!item)
-                continue; // woken without an item
+                continue; // woken without an item, or without the memory to wait
             if (dynamic_cast<const StopNotification*>(item.get()) != nullptr)
                 return;
             if (const auto* work = dynamic_cast<const WorkNotification<T>*>(item.get()))
@@ -43,12 +43,12 @@ public:
         }
     }
 
-    /// Queues a copy of `data`; from any thread, and without waiting. Throws std::bad_alloc, and what copying
-    /// throws.
+    /// Queues a copy of `data` without waiting. Any thread may call it. Throws std::bad_alloc, and the
+    /// exceptions that copying `data` throws.
     void Produce(const T& data) { m_queue.enqueueNotification(new WorkNotification<T>(data)); }
 
-    /// Drops what is waiting, lets the consumer finish the value it works on, and joins it. Returns at once
-    /// when nothing runs. From any thread but the consuming one.
+    /// Drops the waiting values, lets the consumer finish its current value, and joins the thread. Returns at
+    /// once when the thread is not running. Any thread except the consuming one may call it.
     void StopThread() {
         if (!m_thread.isRunning())
             return;
@@ -66,8 +66,8 @@ protected:
     Poco::Thread m_thread;
 
 private:
-    /// The next item, waited for. To wait takes memory; where there is none, the thread looks again later and
-    /// does not end.
+    /// Waits for the next item. Waiting needs memory. Without memory, this pauses and returns null, so that
+    /// the thread tries again and does not end.
     Poco::Notification* Next() {
         constexpr long NO_MEMORY_PAUSE_MS = 10;
         try {

@@ -18,8 +18,10 @@ using SystemTool::IO::JsonDocument;
 std::string TimeText(const JsonDocument& createTime) {
     std::string text =
         createTime.IsLongLong() ? std::to_string(createTime.ToLongLong()) : createTime.ToString();
-    if (text.size() == Wire::SECONDS_LENGTH) // in bytes, a minus sign included
-        text += "000"; // by length alone, deliberately: senders give seconds as a number or as a text
+    // Ten bytes, a minus sign included, count as seconds. We look at the length alone, deliberately: senders
+    // give seconds as a number or as a text.
+    if (text.size() == Wire::SECONDS_LENGTH)
+        text += "000";
     return text;
 }
 
@@ -41,8 +43,8 @@ bool ReportServer::Start() {
         m_pFrameWorker = new FrameWorker(this);
         m_pFrameWorker->Init();
         UDPServer::Start(UDP_SERVER_IP, Wire::PORT);
-        // Both bases have a thread and a loop; this is the queue's pair. What is received before waits in the
-        // queue.
+        // Both base classes have a thread and a loop. This starts the thread of the queue. A report that
+        // arrives earlier waits in the queue.
         WorkQueue::m_thread.start(static_cast<WorkQueue&>(*this));
         return true;
     } catch (...) {
@@ -56,8 +58,8 @@ void ReportServer::Stop() {
 }
 
 bool ReportServer::Recv(const std::string& msg) {
-    // The received text is the format string, deliberately. One that boost::format cannot make sense of is
-    // found in the log by its "[BoostLogError]" mark; it is processed like any other.
+    // The received text is the format string, deliberately. People find a text that is no valid format in the
+    // log, by its mark "[BoostLogError]". Such a text is then handled like any other.
     if (!WriteLog({LogLevel::Info, "Recv", 42}, msg))
         m_ledger.CouldNotFormat();
     Produce(msg);
@@ -66,12 +68,12 @@ bool ReportServer::Recv(const std::string& msg) {
 }
 
 bool ReportServer::Consume(const std::string& msg) {
-    // How a report ended is named where that is known; what is named here is what a destination's answer
-    // alone tells.
+    // The ledger counts the first outcome that is named with Ended. The destinations name the causes that
+    // they know. The calls below name an outcome when there is only the destination's result.
     const ReportLedger::Handling handling(m_ledger);
     try {
-        // A search of the raw text and no parse, deliberately: it is what tells the two kinds of message
-        // apart.
+        // We search the raw text and do not parse it, deliberately: this rule separates reports from control
+        // messages, and senders rely on it.
         if (msg.find(Wire::REPORT_MARK) == std::string::npos) {
             Ended(m_pMetrikMgr->Update(msg) ? Outcome::OtherControl : Outcome::Exception);
             return true;
@@ -111,8 +113,8 @@ bool ReportServer::JsonToStruct(const std::string& json, ST_OptLog& out) {
         JsonDocument report;
         report.FromJson(json, error);
         if (!error.empty()) {
-            WriteLog({LogLevel::Error, "JsonToStruct", 123},
-                     error); // the parser's text is the format, deliberately
+            // The parser's error text is the format string, deliberately.
+            WriteLog({LogLevel::Error, "JsonToStruct", 123}, error);
             Ended(Outcome::NotJson);
             return false;
         }

@@ -10,18 +10,20 @@
 #include <Poco/Net/SocketAddress.h>
 #include <Poco/Timespan.h>
 
-#include "Common/Constants.h" // and no more of Common: the rest brings the logger
+#include "Common/Constants.h" // nothing else of Common, because the other headers bring the logger
 
 namespace {
 
-constexpr long POLL_TIMEOUT_MS = 250; // how long a stop may take; spares the loop a socket to be woken by
+// How long Stop may wait for the loop. Because the poll ends this soon, the loop needs no second socket that
+// wakes it.
+constexpr long POLL_TIMEOUT_MS = 250;
 
-/// What is asked of the kernel. Its default holds some hundred datagrams, which a burst fills while this
-/// thread waits for a processor.
+/// The receive buffer that we ask the kernel for. The kernel's default buffer holds some hundred datagrams: a
+/// burst fills it while this thread waits for a processor.
 constexpr int SOCKET_BUFFER_BYTES = 8 * 1024 * 1024;
 
-/// Prints the exception under way. Throws when there is no memory for its text; a line is printed whole or
-/// not at all.
+/// Prints the current exception. Throws when there is no memory for its text, so that a line is printed whole
+/// or not at all.
 void PrintExceptionUnderWay() {
     try {
         throw;
@@ -37,7 +39,8 @@ void PrintExceptionUnderWay() {
     }
 }
 
-/// For `catch (...)`: prints the exception under way; where its text cannot be built, the reason for that.
+/// For `catch (...)`: prints the current exception. When there is no memory for its text, prints that second
+/// exception instead.
 void PrintCaughtException() noexcept {
     try {
         PrintExceptionUnderWay();
@@ -51,8 +54,8 @@ void PrintCaughtException() noexcept {
 
 } // namespace
 
-/// What a datagram is received into. The byte behind the last is always zero, so that a datagram which fills
-/// the buffer ends somewhere too.
+/// The buffer for one datagram. The byte after the room for the largest datagram is always zero, so that the
+/// text ends there also when a datagram fills the buffer.
 class UDPServer::Buffer {
 public:
     void Clear() { m_bytes.fill('\0'); }
@@ -61,7 +64,7 @@ public:
     /// The bytes up to the first zero byte.
     std::string Text() const { return m_bytes.data(); }
 
-    Poco::Net::SocketAddress m_sender; ///< Not checked: every program of this machine may send.
+    Poco::Net::SocketAddress m_sender; ///< The sender is not checked: every program on this machine may send.
 
 private:
     std::array<char, Wire::MAX_BYTES + 1> m_bytes{};
@@ -74,15 +77,15 @@ UDPServer::~UDPServer() {
 bool UDPServer::Start(const std::string& ip, int port) {
     try {
         const Poco::Net::SocketAddress address(ip, static_cast<std::uint16_t>(port));
-        // Both kinds of reuse, so that a service which was just restarted can bind at once.
+        // Address reuse and port reuse, so that a service that was just restarted can bind at once.
         m_socket.bind(address, true, true);
-        // And then not of the address any more: with that, a later socket of any user could bind the same
-        // address, and the kernel would hand the datagrams to that one. The port is still reused by sockets
-        // of this user alone, so the next service binds at once.
+        // Address reuse is switched off again once the port is bound. Otherwise a later socket of any user
+        // could bind the same address, and the kernel would deliver the datagrams to that socket. Port reuse
+        // stays on: only sockets of this user can use it, so the next service still binds at once.
         m_socket.setReuseAddress(false);
         try {
             m_socket.setReceiveBufferSize(SOCKET_BUFFER_BYTES);
-        } catch (const Poco::Exception&) { // what the kernel grants is enough to run with
+        } catch (const Poco::Exception&) { // the service works with the smaller buffer, too
         }
         m_socket.setBlocking(false);
         m_thread.start(*this);
@@ -103,11 +106,12 @@ void UDPServer::run() {
     } while (!m_bStop);
 }
 
-/// Whether a datagram came within the poll timeout. By a set that lasts: the socket's own poll makes, fills,
-/// waits for and closes one each time, which is four system calls instead of one.
+/// Waits until a datagram is there or the poll timeout is over; true when there is a datagram. We keep one
+/// poll set: Poco's own poll of a socket makes, fills, waits for and closes a set in each call, which is four
+/// system calls instead of one.
 ///
-/// A poll that fails (a closed socket) would fail again at once and for ever: it is printed when it begins,
-/// and each one waits out the timeout that it did not use.
+/// A poll that fails (on a closed socket) would fail again at once, for ever. So only the first failure is
+/// printed, and after each failure the thread sleeps for the poll timeout.
 bool UDPServer::WaitForDatagram() {
     const Poco::Timespan timeout(POLL_TIMEOUT_MS * Poco::Timespan::MILLISECONDS);
     try {
@@ -115,7 +119,7 @@ bool UDPServer::WaitForDatagram() {
             m_poll.emplace().add(m_socket, Poco::Net::PollSet::POLL_READ);
         const bool readable = !m_poll->poll(timeout).empty();
         if (!readable)
-            m_poll->add(m_socket, Poco::Net::PollSet::POLL_READ); // throws when the kernel dropped it
+            m_poll->add(m_socket, Poco::Net::PollSet::POLL_READ); // throws when the socket was closed
         m_pollFailed = false;
         if (!readable && m_watch != nullptr)
             m_watch->Idle();
@@ -130,11 +134,11 @@ bool UDPServer::WaitForDatagram() {
     }
 }
 
-/// Whether there was a datagram, so that there may be another one. The socket does not block: while datagrams
-/// come faster than they are handled, each costs one system call and not two.
+/// Receives one datagram, if there is one. True when it did: then there may be another. The socket does not
+/// block, so while datagrams arrive faster than they are handled, each one costs one system call and not two.
 ///
-/// Only a receive that fails drops the set: another one takes a descriptor, which what Recv threw may be the
-/// lack of.
+/// The set is dropped only when the receive fails, not when Recv throws: a new set needs a descriptor, and
+/// Recv may have thrown because there was none.
 bool UDPServer::ReceiveOne(Buffer& buffer) {
     bool received = false;
     try {

@@ -9,61 +9,63 @@
 #include <Poco/Runnable.h>
 #include <Poco/Thread.h>
 
-/// Is told what the receiver sees and its texts do not show. All of it on the receiving thread, and none of
-/// it may throw or wait.
+/// An observer of the receiver: gets the events that the texts do not show. All calls come on the receiving
+/// thread. An implementation must not throw and must not wait.
 class DatagramWatch {
 public:
     virtual ~DatagramWatch() = default;
 
-    /// A datagram of so many bytes was taken from the socket, also one of none, which goes no further.
+    /// A datagram of `bytes` bytes was taken from the socket. An empty datagram is reported here too, but is
+    /// not passed to Recv.
     virtual void Received(std::size_t bytes) = 0;
 
-    /// An exception cost the datagram that was received last.
+    /// The datagram that was received last is lost, because an exception was thrown while it was handled.
     virtual void Failed() = 0;
 
     /// No datagram came within a poll's timeout.
     virtual void Idle() = 0;
 };
 
-/// Receives datagrams on a thread of its own and hands each one, as text, to Recv. Knows nothing of what they
-/// mean.
+/// Receives datagrams on a thread of its own and passes each one, as text, to Recv. It knows nothing of their
+/// meaning.
 ///
 /// Life: constructed → started (Start returned true) → stopping → joined. There is no restart.
 ///
-/// Threads: Recv runs on the receiving thread, everything else on the owner's. A derived class stops in its
-/// own destructor: once that has run, the receiving thread has no Recv to call any more.
+/// Threads: Recv runs on the receiving thread, everything else on the owner's. A derived class must call Stop
+/// in its own destructor: after that destructor, there is no Recv that the receiving thread could call.
 ///
-/// Failure: goes to standard output, never to the log; the receiver must be able to complain without a
-/// logger.
+/// Failure: is printed to standard output and never logged, because the receiver must be able to report a
+/// failure without a logger.
 class UDPServer : public Poco::Runnable {
 public:
     UDPServer() = default;
     UDPServer(const UDPServer&) = delete;
     UDPServer& operator=(const UDPServer&) = delete;
 
-    /// As Stop. An exception on the way ends the process.
+    /// Calls Stop. An exception on the way ends the process.
     ~UDPServer() override;
 
     /// The receive loop; returns when a stop is asked for.
     void run() override;
 
-    /// Binds `ip` and `port` and starts the thread. False after printing why that failed; nothing is running
-    /// then.
+    /// Binds `ip` and `port` and starts the thread. On failure it prints why and returns false; no thread is
+    /// running then.
     bool Start(const std::string& ip, int port);
 
-    /// Stops the loop and joins its thread, which takes one poll timeout (250 ms) at the most beside the Recv
-    /// under way. Returns at once when nothing runs. Not for the receiving thread itself: see StopSelf.
+    /// Stops the loop and joins its thread. It waits at most for the current Recv and one poll timeout (250
+    /// ms). Returns at once when nothing runs. The receiving thread must not call it: see StopSelf.
     void Stop();
 
-    /// Asks the loop to end and does not wait; may be called by Recv.
+    /// Asks the loop to end and does not wait for that. Recv may call it.
     void StopSelf();
 
 protected:
-    /// Called once for each datagram: its bytes up to the first zero byte, 10240 at the most. The result is
-    /// ignored, and an exception costs this datagram only.
+    /// Called once for each datagram, with its bytes up to the first zero byte, at most 10240. An empty
+    /// datagram is not passed on. The result is ignored. An exception loses this datagram only.
     virtual bool Recv(const std::string& msg) = 0;
 
-    /// Tells `watch` from now on, which must live as long as the receiver runs. Before Start.
+    /// Reports to `watch` from now on. `watch` must live as long as the receiver runs. To be called before
+    /// Start.
     void WatchBy(DatagramWatch& watch) { m_watch = &watch; }
 
     Poco::Thread m_thread;
@@ -75,15 +77,15 @@ private:
     bool WaitForDatagram();
     bool ReceiveOne(Buffer& buffer);
 
-    /// Plain on purpose: the stopping thread writes it once, the loop reads it once a pass, and the join
-    /// orders the rest. The worst that the race can cost is one more pass.
+    /// A plain bool on purpose: the stopping thread writes it once, the loop reads it once in each pass, and
+    /// the join orders everything else. At worst, the race costs one more pass.
     bool m_bStop = false;
 
-    /// Made when it is first needed, and anew after a failure. The kernel drops a socket that is closed from
-    /// it, and says nothing.
+    /// Made at the first poll, and made again after a failure. When the socket is closed, the kernel removes
+    /// it from the set silently.
     std::optional<Poco::Net::PollSet> m_poll;
 
-    /// Whether the last poll failed, so that a socket that stays broken is reported once.
+    /// Whether the last poll failed. With it, a socket that stays broken is reported only once.
     bool m_pollFailed = false;
 
     DatagramWatch* m_watch = nullptr; ///< Not owned; may be null.

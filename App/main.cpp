@@ -16,11 +16,11 @@ using namespace SyncServiceReport;
 namespace {
 
 constexpr std::int64_t LOG_FILE_BYTES = 10485760;   // 10 MiB, then the file is rotated
-constexpr std::int64_t LOG_TOTAL_BYTES = 104857600; // 100 MiB, then the oldest rotated file goes
+constexpr std::int64_t LOG_TOTAL_BYTES = 104857600; // 100 MiB, then the oldest rotated file is deleted
 constexpr int FLUSH_EACH_RECORD = 1;
 constexpr int COPY_TO_CONSOLE = 0;
 
-/// Opens the log for the whole process. One that cannot be opened costs the log and nothing else.
+/// Opens the log for the whole process. When that fails, only the log is missing; the service runs.
 void ConfigureLog() {
     if (pSysLog == nullptr)
         return;
@@ -32,8 +32,8 @@ void ConfigureLog() {
     }
 }
 
-/// Behind the instance check, so that a refused second instance does not touch what the first one counts. A
-/// file that cannot be had costs the file and nothing else.
+/// Called after the instance check, so that a refused second instance does not touch the first one's
+/// counters. When the file cannot be used, the ledger counts in memory only.
 void OpenLedger(ReportLedger::Writer& ledger) {
     ledger.Open(Paths::Run(SystemTool::CommonTool::GetUserDataDir()), SystemTool::Version::Number(),
                 SystemTool::Version::BuildId(), SystemTool::Platform::CoarseTimeMs());
@@ -43,8 +43,8 @@ void OpenLedger(ReportLedger::Writer& ledger) {
 
 int main() {
     SystemTool::IO::OpenClosedStandardDescriptors();
-    // The log comes before the instance check, so that a refused second instance leaves its line in the
-    // shared log.
+    // The log is opened before the instance check, so that a refused second instance can write its line into
+    // the shared log.
     ConfigureLog();
     MiniDump::EnableAutoStack(APP_LOG_DIR_PATH, "Report");
     if (MiniDump::IsAlreadyRun()) {
@@ -54,7 +54,7 @@ int main() {
     Poco::Event stopEvent(Poco::Event::EVENT_AUTORESET);
     Poco::SharedPtr<ReportServer> server(new ReportServer);
     OpenLedger(server->Ledger());
-    server->Start();  // a start that failed has been logged; what does run is worth keeping
+    server->Start();  // a failed start has been logged, and the parts that run are kept
     stopEvent.wait(); // for ever: the service ends by a signal
     return 0;
 }
