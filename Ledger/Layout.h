@@ -52,6 +52,7 @@ enum class Begun : std::uint64_t {
     OtherVersion = 2, ///< There was one of another layout; it was set aside.
 };
 
+// NOLINTNEXTLINE(cppcoreguidelines-pro-type-member-init): it lies in a mapped file, and is never constructed
 struct Header {
     std::array<char, 8> magic; ///< Written last when a file is made: without it, its making was cut short.
     std::uint32_t version;     ///< Of the layout.

@@ -199,8 +199,9 @@ private:
         m_modules.push_back(std::move(sdk));
         if (!m_engine)
             StartUploading();
-        m_collector.modules.insert(
-            SystemTool::Text::ValidUtf8(SystemTool::Text::CutUtf8(module.id, MAX_ID_BYTES)));
+        using SystemTool::Text::CutUtf8;
+        const auto valid = SystemTool::Text::ValidUtf8(CutUtf8(module.id, MAX_ID_BYTES));
+        m_collector.modules.emplace(CutUtf8(valid, MAX_ID_BYTES));
     }
 
     void StartUploading() {

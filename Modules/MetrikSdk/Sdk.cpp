@@ -18,6 +18,12 @@ std::string Cut(const std::string& text, std::size_t maxBytes) {
     return std::string(SystemTool::Text::CutUtf8(text, maxBytes));
 }
 
+/// The id as a collector reads it, which gets valid UTF-8 only. So two modules that a collector could not
+/// tell apart are one module of the outbox, and no sequence number comes twice.
+std::string StoredId(const std::string& id) {
+    return Cut(SystemTool::Text::ValidUtf8(Cut(id, MAX_ID_BYTES)), MAX_ID_BYTES);
+}
+
 void Call(IMetrikSdk::Callback callback, const std::string& what, const std::string& detail) {
     try {
         if (callback != nullptr)
@@ -71,7 +77,7 @@ void Sdk::Tell(report::Cause cause, const char* reason) noexcept {
 /// Gives the announcement up once it has served, or told that it cannot.
 bool Sdk::Attach() {
     const auto& given = *m_announcement;
-    m_id = Cut(given.id, MAX_ID_BYTES);
+    m_id = StoredId(given.id);
     process::Membership module{nullptr, given.module.onFailure, given.module.onSuccess,
                                Cut(given.module.version, MAX_TEXT_BYTES),
                                Cut(given.module.name, MAX_TEXT_BYTES)};

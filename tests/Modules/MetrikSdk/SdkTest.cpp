@@ -160,6 +160,21 @@ TEST_F(TheMetrikSdk, CountsAModulesEventsOnAcrossRestarts) {
     EXPECT_EQ(batch.events.size(), 10U);
 }
 
+TEST_F(TheMetrikSdk, CountsTheEventsOfModulesTogetherWhoseIdsACollectorCannotTellApart) {
+    Start();
+    for (const std::string id : {"m\xff\xd3", "m\xff\xc3"}) {
+        const auto module = Load();
+        ASSERT_TRUE(module->GetModule()->InitSdk(id, "", "", "", m_directory.Path(), nullptr, nullptr));
+        EXPECT_TRUE(module->GetModule()->ReportEvent("X|1", "{}"));
+    }
+    Stop();
+    const auto batch = MetrikSdk::outbox::OutboxStore(File(), 5s).Oldest(100, 1'000'000);
+    ASSERT_EQ(batch.events.size(), 2U);
+    EXPECT_EQ(batch.releases.begin()->second.id, "m\uFFFD\uFFFD");
+    EXPECT_EQ(batch.events[0].sequence, 1);
+    EXPECT_EQ(batch.events[1].sequence, 2);
+}
+
 TEST_F(TheMetrikSdk, IsReleasedWithinASecondWhileTheCollectorKeepsItWaiting) {
     LoopbackServer server([](const Request&) {
         Reply never;
