@@ -1,8 +1,8 @@
 #pragma once
 
-// What every source file of the service that logs includes. The order of these headers is also the order in
-// which the statics of a source file are built: the plain constants, the logger, the constants that ask the
-// system.
+// Every source file of the service that logs includes this header. The order of the headers below is also the
+// order in which the statics of a source file are built: the plain constants, the logger, the constants that
+// ask the system.
 #include "Common/Constants.h"
 #include "Common/Logger.h"
 

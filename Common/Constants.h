@@ -4,8 +4,8 @@
 
 #include "Common/Wire.h"
 
-// Every source file has a copy of these of its own, built by its own static initialiser: they may be used
-// during static initialisation, where a shared copy of another file might not exist yet.
+// Each source file has its own copy of these constants, built by its own static initialiser. So they can be
+// used during static initialisation, when another file's shared copy might not exist yet.
 
 static const std::string ORVEK_EMPTY_STRING = "";
 static const std::string ORVEK_SPACE_STRING = " ";

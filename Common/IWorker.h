@@ -4,13 +4,13 @@
 
 namespace SyncServiceReport {
 
-/// Somewhere a report can end. Called on the consuming thread only.
+/// A destination of reports. Called on the consuming thread only.
 class IWorker {
 public:
     virtual ~IWorker() = default;
 
-    /// Takes one report; false when it did not arrive (the worker has logged why, where there is something to
-    /// say).
+    /// Takes one report. False when the report was not delivered. The reason is not always logged here: a
+    /// missing plug-in is logged once, at the start.
     virtual bool Send(const ST_OptLog& log) = 0;
 };
 

@@ -8,21 +8,21 @@
 namespace SyncServiceReport {
 namespace {
 
-/// The numbers in a directive: which argument, width and precision. boost::format computes with them
-/// unchecked, beyond the range of its integers.
+/// The numbers in a directive: argument, width and precision. boost::format calculates with them unchecked,
+/// beyond the range of its integers.
 class NumbersOfDirective {
 public:
-    /// `begin` is behind the percent sign.
+    /// `begin` is the place after the percent sign.
     NumbersOfDirective(const std::string& format, std::size_t begin) : m_format(format), m_at(begin) {}
 
-    /// Throws std::length_error when one has more than nine digits, which no text within the size limits can
-    /// have.
+    /// Throws std::length_error when a number has more than nine digits. No text within the size limits needs
+    /// such a number.
     void Check() {
         Skip('|');
-        const bool isNumbered = Next() != '0' && SkipNumber(); // else a zero is a flag
+        const bool isNumbered = Next() != '0' && SkipNumber(); // a zero here is a flag
         if (isNumbered && Next() == '%')
             return;
-        if (!isNumbered || Skip('$')) { // else that was the width
+        if (!isNumbered || Skip('$')) { // without a dollar sign, the number was the width
             SkipFlags();
             SkipNumberOrAsterisk();
         }
@@ -33,7 +33,7 @@ public:
 private:
     static constexpr std::size_t MAX_DIGITS = 9;
 
-    char Next() const { return m_format[m_at]; } // behind the last character, a zero
+    char Next() const { return m_format[m_at]; } // a zero byte after the last character
 
     bool Skip(char character) {
         const bool isNext = Next() == character;
@@ -41,7 +41,7 @@ private:
         return isNext;
     }
 
-    static bool IsFlag(char character) { // not a search in a text, which would take half of the time
+    static bool IsFlag(char character) { // a search in a text would take half of the time
         return character == '\'' || character == '-' || character == '=' || character == '_' ||
                character == ' ' || character == '+' || character == '0' || character == '#';
     }
@@ -72,8 +72,8 @@ private:
     std::size_t m_at;
 };
 
-/// A text on its way. Beyond its limit it only counts, so that the reason can say how long it would have
-/// become.
+/// A text that is being built. Beyond its limit, bytes are no longer kept and only counted, so that the error
+/// can say how long the text would have become.
 class BoundedText {
 public:
     explicit BoundedText(std::size_t limit) : m_limit(limit) {}
@@ -100,21 +100,24 @@ private:
     std::string m_text;
 };
 
-/// boost::format for a text without arguments: the same reading of each directive, by the same function, and
-/// the same errors. boost::format itself keeps an item for each directive, which takes a tenth of a
-/// millisecond for a datagram of them; and it counts the directives before it makes room for the items, and
-/// counts a tabulation whose fill is a percent sign (`%1T%%|9t|`) as one too few: parsing then writes behind
-/// its array, and such a datagram could end the service.
+/// Gives the text that boost::format gives without arguments: it reads each directive with Boost's own
+/// function and reports the same errors. boost::format itself is not used, for two reasons. It keeps an item
+/// for each directive, which takes a tenth of a millisecond for a datagram full of directives. And it counts
+/// the directives first, to make room for the items, but counts one too few for a tabulation whose fill is a
+/// percent sign (`%1T%%|9t|`). Parsing then writes beyond the end of its array, and such a datagram could end
+/// the service.
 class OutsideFormat {
 public:
     explicit OutsideFormat(const std::string& format)
         : m_format(format), m_text(std::min(format.size() + MAX_LOG_TEXT_GROWTH_BYTES, MAX_LOG_TEXT_BYTES)) {}
 
     std::string Text() {
-        // The count refuses every text that ends in a percent sign, also in a doubled one.
+        // Called for its errors only: it refuses every text that ends in a percent sign, also in a doubled
+        // one.
         boost::io::detail::upper_bound_from_fstring(m_format, '%', m_characters, boost::io::all_error_bits);
         ReadAll();
-        if (m_takesNext && m_highestArgument >= 0) // the two ways to ask for arguments do not mix
+        // Directives with and without an argument number cannot be mixed.
+        if (m_takesNext && m_highestArgument >= 0)
             boost::throw_exception(
                 boost::io::bad_format_string(static_cast<std::size_t>(m_highestArgument), 0));
         if (m_takesNext || m_highestArgument >= 0)
@@ -132,7 +135,7 @@ private:
         std::size_t begin = 0;
         for (std::size_t sign = 0; (sign = m_format.find('%', begin)) != std::string::npos;) {
             m_text.Append({m_format.data() + begin, sign - begin});
-            if (m_format[sign + 1] == '%') { // behind the last character is a zero
+            if (m_format[sign + 1] == '%') { // after the last character is a zero byte
                 m_text.Append("%");
                 begin = sign + 2;
             } else {
@@ -142,7 +145,7 @@ private:
         m_text.Append(std::string_view(m_format).substr(begin));
     }
 
-    /// Where the text goes on behind the directive.
+    /// Reads the directive that begins at `begin`. Returns the place after the directive.
     std::size_t ReadDirective(std::size_t begin) {
         NumbersOfDirective(m_format, begin).Check();
         auto at = m_format.begin() + static_cast<std::ptrdiff_t>(begin);
@@ -155,7 +158,7 @@ private:
 
     void Apply() {
         if (m_item.argN_ == Item::argN_ignored)
-            return; // the next directive goes on with what this one set, as in boost::format
+            return; // the next directive keeps what this one set, as in boost::format
         if (m_item.argN_ == Item::argN_tabulation)
             m_text.FillTo(static_cast<std::size_t>(m_item.fmtstate_.width_), m_item.fmtstate_.fill_);
         else if (m_item.argN_ == Item::argN_no_posit)
@@ -170,8 +173,9 @@ private:
     const std::locale m_locale;
     const std::ctype<char>& m_characters = std::use_facet<std::ctype<char>>(m_locale);
     Item m_item{' '};
-    bool m_takesNext = false;   ///< A directive takes the next argument.
-    int m_highestArgument = -1; ///< Of the directives that name theirs, counted from 0.
+    bool m_takesNext = false; ///< Whether a directive takes the next argument.
+    /// The highest number among directives that name their argument, from 0; -1: none.
+    int m_highestArgument = -1;
 };
 
 } // namespace

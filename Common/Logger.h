@@ -10,28 +10,29 @@
 #include "Plugin/ILogger.h"
 #include "Plugin/ModuleLoader.h"
 
-// The logger of a source file, and the one way to write a log line. Everything here that names pSysLog is
-// static, so that each source file has its own: a shared inline function would mean another file's logger in
-// every file.
+// The logger of a source file, and the only way to write a log line. Every function here that uses pSysLog is
+// static, so that each source file has its own copy. An inline function would be shared: all source files
+// would use the logger of one of them.
 
-/// Loads the logger plug-in; each source file that logs has its own loader. Only the one of App/main is
-/// configured; all of them write into the sink which that configures.
+/// Loads the logger plug-in. Each source file that logs has its own loader and its own logger. Only App/main
+/// configures its logger; all loggers of the process then write into that sink.
 static SystemTool::ModuleLoader<SystemTool::IO::ILogger>
     g_LoggerLoader(SystemTool::IO::Directory::GetExcutableDirectory() + "libBoostLogger.dylib");
 
-/// Null when the plug-in could not be loaded; then nothing is logged and everything else goes on.
+/// Null when the plug-in could not be loaded. Then nothing is logged, and everything else works.
 [[maybe_unused]] static SystemTool::IO::ILogger* pSysLog = g_LoggerLoader.GetModule();
 
 namespace SyncServiceReport {
 
 enum class LogLevel : int {
-    Info = 2,    ///< What arrived, and what was done on a control message.
+    Info = 2,    ///< What arrived, and what a control message changed.
     Warning = 3, ///< Exceptions that were caught, and reports that no destination takes.
     Error = 4,   ///< Failures, the crash trace, and texts that could not be built.
 };
 
-/// Where a record comes from. The source file is the calling one by itself, as its folder and stem. The line
-/// is fixed where people look for it by number, else the site's own.
+/// Where a record comes from. The source file is the calling one, found by the compiler, as its folder and
+/// its name without the extension. The line is fixed where people search for it by number; otherwise it is
+/// the calling line.
 struct LogSite {
     constexpr LogSite(LogLevel levelOfRecord, const char* functionName, int fixedLine = __builtin_LINE(),
                       std::string_view path = __builtin_FILE())
@@ -44,17 +45,18 @@ struct LogSite {
 
     static constexpr std::string_view FolderAndStem(std::string_view path) {
         const auto name = path.rfind('/');
-        const auto folder = path.rfind('/', name - 1) + 1; // without one, npos + 1 is the start of the text
+        // Without a folder, npos + 1 is the start of the text.
+        const auto folder = path.rfind('/', name - 1) + 1;
         return path.substr(folder, path.rfind('.') - folder);
     }
 };
 
-/// Writes one log line. `format` may be a text from outside; that is required behaviour: a percent sign in
-/// it, where boost::format cannot make sense of it, gives an Error line of "[BoostLogError]" and the reason
-/// instead. People search the log for that mark to find datagrams with percent signs.
+/// Writes one log line. `format` may be a text from outside; that is required behaviour. When boost::format
+/// cannot use a percent sign in it, an Error line with "[BoostLogError]" and the reason takes the text's
+/// place. People search the log for that mark to find datagrams with percent signs.
 ///
-/// Never throws, also when the logger throws or the report of a failed write fails: a log line is not worth
-/// a report. False when such an Error line took the text's place.
+/// Never throws, also when the logger throws or when that Error line cannot be written: a report must not be
+/// lost because of a log line. False when such an Error line took the text's place.
 template <typename... Arguments>
 static bool WriteLog(const LogSite& site, const std::string& format, const Arguments&... arguments) noexcept {
     if (pSysLog == nullptr)
@@ -73,12 +75,12 @@ static bool WriteLog(const LogSite& site, const std::string& format, const Argum
             write(LogLevel::Error, std::string("[BoostLogError]") + error.what());
             return false;
         }
-    } catch (...) { // the logger itself is failing: no place is left to report it
+    } catch (...) { // the logger itself fails, so there is nowhere left to log that
     }
     return true;
 }
 
-/// Logs the exception under way. Throws when there is no memory for its text.
+/// Logs the current exception. Throws when there is no memory for its text.
 [[maybe_unused]] static void LogExceptionUnderWay(const LogSite& site) {
     try {
         throw;
@@ -92,10 +94,10 @@ static bool WriteLog(const LogSite& site, const std::string& format, const Argum
     }
 }
 
-/// For the last handler of a public operation, `catch (...) { return LogCaughtException(site); }`: logs the
-/// exception under way in the words that people search the log for, their trailing blanks included. Always
-/// false, the result of an operation that caught one. Where its text cannot be built, the reason for that is
-/// logged instead; without memory for that, nothing is.
+/// For the last handler of a public operation: `catch (...) { return LogCaughtException(site); }`. Logs the
+/// current exception in the words that people search the log for, their trailing blanks included. Always
+/// false, which is the result of an operation that caught an exception. When there is no memory for the text,
+/// it logs that second exception instead. When there is no memory for that either, it logs nothing.
 [[maybe_unused]] static bool LogCaughtException(const LogSite& site) noexcept {
     try {
         LogExceptionUnderWay(site);

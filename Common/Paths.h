@@ -2,11 +2,11 @@
 
 #include <string>
 
-/// Where the service keeps its files below the user's data directory, which
-/// SystemTool::CommonTool::GetUserDataDir tells. Nothing is created here.
+/// Where the service keeps its files below the user's data directory. `userData` is what
+/// SystemTool::CommonTool::GetUserDataDir returns. These functions create nothing.
 namespace SyncServiceReport::Paths {
 
-/// What the suite keeps.
+/// The directory of all files of the suite.
 inline std::string Suite(const std::string& userData) {
     return userData + "/hublink";
 }
@@ -31,7 +31,7 @@ inline std::string ServiceLogs(const std::string& userData) {
     return Logs(userData) + "/metrik";
 }
 
-/// What belongs to the running service: its ledger.
+/// The directory of the running service's own files: its ledger.
 inline std::string Run(const std::string& userData) {
     return Suite(userData) + "/run";
 }

@@ -6,7 +6,7 @@
 #include "SystemTool/CommonTool.h"
 #include "SystemTool/IO/Directory.h"
 
-// One copy in every source file, as in Constants.h and for the same reason.
+// Each source file has its own copy, for the same reason as in Constants.h.
 namespace SyncServiceReport {
 
 /// The directory of "Report.log".

@@ -6,7 +6,7 @@
 
 namespace SystemTool::IO {
 
-/// Owns a file descriptor and closes it. One thread at a time.
+/// Owns a file descriptor and closes it. To be used by one thread at a time.
 class Descriptor {
 public:
     Descriptor() = default;
@@ -18,7 +18,7 @@ public:
     Descriptor& operator=(const Descriptor&) = delete;
     Descriptor(Descriptor&& other) noexcept : m_number(std::exchange(other.m_number, -1)) {}
     Descriptor& operator=(Descriptor&& other) noexcept {
-        std::swap(m_number, other.m_number); // the other one closes what was ours
+        std::swap(m_number, other.m_number); // `other` now has our old descriptor, and closes it
         return *this;
     }
 

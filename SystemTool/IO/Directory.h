@@ -11,9 +11,9 @@ namespace SystemTool::IO::Directory {
 /// suite's programs share it.
 std::string GetExcutableDirectory();
 
-/// Writes `in` into `out` with every backslash turned into a slash. Returns false, and leaves `out` alone,
-/// for a text that can be no path: an empty one, or one that holds a zero byte. `in` and `out` may be the
-/// same string.
+/// Copies `in` to `out` and replaces each backslash by a slash. Returns false and leaves `out` unchanged for
+/// a text that cannot be a path: an empty one, or one with a zero byte. `in` and `out` may be the same
+/// string.
 bool TransformAsUnixPath(const std::string& in, std::string& out);
 
 } // namespace SystemTool::IO::Directory

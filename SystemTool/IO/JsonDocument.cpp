@@ -25,9 +25,9 @@ Value::ConstMemberIterator Find(const Value& object, const std::string& key) {
 
 } // namespace
 
-/// The values of a usual report fit into the room, which is a part of the tree. The allocator's own first
-/// chunk of 64 KiB is more than a heap keeps ready for a thread, and was a quarter of the cost of a document
-/// in the program.
+/// `room` holds the values of a usual report within the tree itself. Without it, the allocator asks the heap
+/// for a first chunk of 64 KiB. A heap does not keep chunks of that size ready for a thread, and this was a
+/// quarter of the cost of a document in the program.
 // NOLINTNEXTLINE(cppcoreguidelines-pro-type-member-init): the room is written before it is read
 struct JsonDocument::Tree {
     static constexpr std::size_t ROOM_BYTES = 768;
@@ -54,7 +54,8 @@ JsonDocument JsonDocument::GetKeyValue(const std::string& key) const {
     return member == m_value->MemberEnd() ? JsonDocument() : JsonDocument(m_tree, &member->value);
 }
 
-/// This document's value, in a tree that no other document holds, as an object.
+/// Makes this document's value an object in a tree that no other document shares, and returns the object.
+/// Copies the value when its tree is shared.
 JsonDocument::Value& JsonDocument::Editable() {
     if (m_value != nullptr && !m_value->IsNull() && !m_value->IsObject())
         throw std::logic_error("A member cannot be set in a JSON value that is no object: " +
@@ -74,16 +75,16 @@ JsonDocument::Value& JsonDocument::Editable() {
     return m_tree->document;
 }
 
-/// After a change that ran out of memory: the object may believe that it has room for a member which it has
-/// not.
+/// Makes this document null after a change that ran out of memory: the object may count a member's room as
+/// its own although it did not get it.
 void JsonDocument::Abandon() {
     *this = JsonDocument();
 }
 
 void JsonDocument::SetMember(const std::string& key, Value& value) {
     Value& object = m_tree->document;
-    // Of const iterators: comparing the others is ambiguous in C++20, where either side may be the one to
-    // convert.
+    // Compares const iterators. A comparison of the others is ambiguous in C++20, where either operand may be
+    // converted.
     const auto isEnd = [&object](Value::ConstMemberIterator member) {
         return member == std::as_const(object).MemberEnd();
     };

@@ -12,45 +12,50 @@ class JsonAllocator;
 
 /// A JSON value with reading and light editing.
 ///
-/// Purpose: reads what comes from outside without ever failing on its shape. Asking for a member that is
-/// absent, or for a member of what is no object, gives the null value; a null gives empty text, 0 and false.
-/// So a caller reads `document.GetKeyValue("a").GetKeyValue("b").ToString()` without a test in between.
+/// Purpose: reads JSON from outside and never fails because of its shape. A member that is absent, or a member
+/// of a value that is no object, reads as null. Null reads as empty text, 0 and false. So a caller can write
+/// `document.GetKeyValue("a").GetKeyValue("b").ToString()` without a test in between.
 ///
-/// Cost: a value shares its text's tree. Copying a JsonDocument, or taking a member, copies a pointer and not
-/// the value, however large; only SetKeyValue copies, and only what it is about to change while another
-/// document holds it. Nothing here recurses on the call stack with the depth of the input.
+/// Cost: all values of a text share one tree. To copy a JsonDocument, or to take a member, copies a pointer
+/// and not the value, however large it is. Only SetKeyValue copies values: the one that it sets, and its own
+/// document when another document shares the tree. No operation uses more of the call stack for a deeper
+/// text.
 ///
-/// Threads: one thread at a time for a document and all that were copied or taken from it, since they share a
-/// tree.
+/// Threads: one thread at a time for all documents that share a tree, which are a document, its copies and
+/// its members.
 ///
-/// Failure: what needs memory throws std::bad_alloc when there is none. Nothing else but SetKeyValue throws.
+/// Failure: an operation that needs memory throws std::bad_alloc when there is none. Only SetKeyValue throws
+/// other exceptions.
 class JsonDocument { // NOLINT(cppcoreguidelines-special-member-functions): see its copy constructor
 public:
-    /// Arrays and objects within each other; a text that goes deeper is refused.
+    /// How deep arrays and objects may be nested. FromJson refuses a deeper text.
     static constexpr int MAX_DEPTH = 128;
 
     /// The null value.
     JsonDocument() = default;
 
-    /// A copy costs a pointer; there is no cheaper move, which would leave a value without its tree behind.
+    /// A copy copies a pointer. There is no move: a document that was moved from would keep a value without
+    /// its tree.
     JsonDocument(const JsonDocument&) = default;
     JsonDocument& operator=(const JsonDocument&) = default;
 
-    /// Parses `text`, fills this document with the result and returns it, since some callers use it one way
-    /// and some the other. `error` is emptied; for a text that is no JSON it receives what is wrong and at
-    /// which byte (counted from 0), and the document becomes null. Errors besides bad grammar: text behind
-    /// the value, invalid UTF-8, a lone surrogate, a zero byte outside a string's escapes, a number beyond
-    /// the range of a double, nesting deeper than MAX_DEPTH. A byte order mark at the start is skipped.
+    /// Parses `text`, makes this document its value, and returns a copy of this document: some callers use
+    /// the copy, others the document itself. Empties `error`. When `text` is no JSON, `error` receives what
+    /// is wrong and at which byte (counted from 0), and the document becomes null. Errors besides bad
+    /// grammar: text after the value, invalid UTF-8, a lone surrogate, a zero byte that is not escaped, a
+    /// number beyond the range of a double, nesting deeper than MAX_DEPTH. A byte order mark at the start is
+    /// skipped.
     JsonDocument FromJson(const std::string& text, std::string& error);
 
-    /// The member `key`, or null. Of members with the same key, the first.
+    /// The member `key`, or null. When several members have that key, the first of them.
     JsonDocument GetKeyValue(const std::string& key) const;
 
-    /// Sets the member `key`. All members of that name are replaced by one, in the first one's place; a new
-    /// one goes to the end. A null document becomes an object first; any other that is no object throws
-    /// std::logic_error, because its content would be lost silently. In a text, bytes that are no UTF-8 are
-    /// replaced by U+FFFD, so that what is printed parses again. A document whose memory ran out on the way
-    /// is null.
+    /// Sets the member `key`. The new member takes the place of the first member with that key; further
+    /// members with that key are removed. Without such a member, the new one is appended. A null document
+    /// first becomes an object. A document that is neither null nor an object throws std::logic_error,
+    /// because otherwise its content would be lost silently. In a text, bytes that are not UTF-8 are replaced
+    /// by U+FFFD, so that the printed text can be parsed again. When memory runs out during the change, the
+    /// document becomes null.
     void SetKeyValue(const std::string& key, const std::string& value);
     void SetKeyValue(const std::string& key, const JsonDocument& value);
 
@@ -62,11 +67,11 @@ public:
     /// The integer, or 0 where IsLongLong is false.
     std::int64_t ToLongLong() const;
 
-    /// The integer when it fits an int; else, and for all other types, 0.
+    /// The integer when it fits an int; 0 for a larger one and for all other types.
     int ToInt() const;
 
-    /// A string's text, decoded; a number as JSON prints it (1.5 as 1.5, an integer of up to 64 bits with
-    /// every digit); true or false; the compact JSON of an object or array; empty for null.
+    /// The decoded text of a string; a number as JSON prints it (1.5 as 1.5, an integer of up to 64 bits with
+    /// every digit); "true" or "false"; the compact JSON of an object or array; empty for null.
     std::string ToString() const;
 
     /// The value as compact JSON, members in their order; "null" for null.

@@ -9,15 +9,16 @@
 #include <rapidjson/stringbuffer.h>
 #include <rapidjson/writer.h>
 
-// RapidJSON's classes with memory of our own. Its own allocators return null when there is none, and nothing
-// in the library looks at that: a report that met the end of the memory ended the process. Use these names,
-// and not the library's.
+// RapidJSON's classes with an allocator of our own. The library's allocators return null when there is no
+// memory, and nothing in the library checks for null: a report that ran out of memory ended the process. Use
+// these names, not the library's.
 namespace SystemTool::IO {
 
-/// Throws std::bad_alloc, and no call returns without the memory that was asked for.
+/// Throws std::bad_alloc when there is no memory. A call that returns has given the memory that was asked
+/// for.
 class JsonAllocator {
 public:
-    static const bool kNeedFree = true; // the library's name: Free must be called
+    static const bool kNeedFree = true; // a name that the library reads: it must call Free
 
     void* Malloc(std::size_t bytes) { return bytes == 0 ? nullptr : ::operator new(bytes); }
 

@@ -20,14 +20,15 @@ std::size_t SkipDigits(std::string_view json, std::size_t at) {
     return std::min(json.find_first_not_of(DIGITS, at), json.size());
 }
 
-/// Behind the string that begins at `at`.
+/// The place after the string that begins at `at`.
 std::size_t SkipString(std::string_view json, std::size_t at) {
     for (++at; at < json.size() && json[at] != '"'; ++at)
         at += json[at] == '\\' ? 1 : 0;
     return at + 1;
 }
 
-/// Behind the number that begins at `at`. What is no part of a number by the grammar is left to the parser.
+/// The place after the number that begins at `at`. Characters that JSON does not allow in a number are left
+/// to the parser.
 std::size_t SkipNumber(std::string_view json, std::size_t at) {
     at = SkipDigits(json, at + (json[at] == '-' ? 1 : 0));
     if (json.substr(at, 1) == "." && IsDigit(json, at + 1))
@@ -39,20 +40,21 @@ std::size_t SkipNumber(std::string_view json, std::size_t at) {
     return IsDigit(json, exponent) ? SkipDigits(json, exponent) : at;
 }
 
-/// A text with the number's value and an exponent that the parser takes; empty when there is none, or no need
-/// of one.
+/// A text with the number's value that the parser accepts. Empty when the value is beyond the range of a
+/// double, and for a zero without an exponent, which the parser accepts as it is.
 std::string StandIn(const std::string& number) {
     const double value = std::strtod(number.c_str(), nullptr);
     if (value == 0)
         return number.find_first_of("eE") == std::string::npos ? "" : std::signbit(value) ? "-0.0" : "0.0";
     std::array<char, 32> text{};
-    // Seventeen digits tell each double from every other one.
+    // Seventeen digits identify each double exactly.
     if (std::isfinite(value))
         std::snprintf(text.data(), text.size(), "%.16e", value);
     return text.data();
 }
 
-/// Spaces may follow a number, so what is behind it stays at its byte.
+/// Replaces the number, if it can. The new text is filled up with spaces, which JSON allows after a number,
+/// so that everything after the number stays at its byte.
 bool Rewrite(std::string& json, std::size_t begin, std::size_t end) {
     std::string text = StandIn(json.substr(begin, end - begin));
     if (text.empty() || text.size() > end - begin)

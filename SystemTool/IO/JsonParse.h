@@ -17,29 +17,29 @@
 #include "SystemTool/IO/JsonNumbers.h"
 #include "SystemTool/Text/Utf8.h"
 
-// How a JSON text is read: JsonDocument and the encoder of analytics events use it, so that both read numbers
-// alike.
+// How a JSON text is read. JsonDocument and the encoder of analytics events both use this, so that they read
+// numbers in the same way.
 namespace SystemTool::IO {
 
-// Numbers come as their texts. The parser's own conversion loses some: 1.84467440737095516155 runs over in
-// its 64 bits and comes out as anything, 10e308 as next to nothing, and 17976931348623159e292 as an infinity,
-// which JSON cannot hold.
+// The parser passes numbers on as texts, because its own conversion gets some numbers wrong:
+// 1.84467440737095516155 overflows its 64 bits and gives an arbitrary value, 10e308 gives almost zero, and
+// 17976931348623159e292 gives infinity, which JSON cannot hold.
 inline constexpr unsigned JSON_PARSE_FLAGS =
     rapidjson::kParseIterativeFlag | rapidjson::kParseNumbersAsStringsFlag;
 
-/// Whether decoded text holds half a surrogate pair: what an escape such as \udc00 on its own decodes to,
-/// which is no UTF-8 and which the parser lets pass.
+/// Whether decoded text holds half a surrogate pair. A lone escape such as \udc00 decodes to that. It is not
+/// valid UTF-8, but the parser accepts it.
 inline bool HasLoneSurrogate(const char* text, rapidjson::SizeType length) {
     constexpr char LEAD = '\xed';
     const char* const end = text + length;
     while ((text = static_cast<const char*>(std::memchr(text, LEAD, static_cast<std::size_t>(end - text)))) !=
            nullptr)
-        if (static_cast<unsigned char>(*++text) >= 0xa0) // in a valid text, a lead byte is never the last
+        if (static_cast<unsigned char>(*++text) >= 0xa0) // in UTF-8, another byte always follows a lead byte
             return true;
     return false;
 }
 
-/// The whole of `text` as an integer, where it is one that fits.
+/// All of `text` as an integer; nothing when it is no integer or does not fit.
 template <typename Integer>
 std::optional<Integer> IntegerOf(std::string_view text) {
     Integer integer{};
@@ -48,7 +48,7 @@ std::optional<Integer> IntegerOf(std::string_view text) {
     return result.ec == std::errc() && result.ptr == end ? std::optional(integer) : std::nullopt;
 }
 
-/// Hands a parser's events on to a document, and ends the parse for what the parser itself would let pass.
+/// Passes the parser's events on to a document. Ends the parse at errors that the parser itself does not see.
 class JsonGuard {
 public:
     using Ch = char;
@@ -62,14 +62,14 @@ public:
     bool Int64(std::int64_t value) { return m_document.Int64(value); }
     bool Uint64(std::uint64_t value) { return m_document.Uint64(value); }
     bool Double(double value) { return m_document.Double(value); }
-    /// `text` ends in a zero byte.
+    /// `text` ends with a zero byte.
     bool RawNumber(const Ch* text, rapidjson::SizeType length, bool) {
         if (const auto integer = IntegerOf<std::int64_t>({text, length}))
             return m_document.Int64(*integer);
         if (const auto integer = IntegerOf<std::uint64_t>({text, length}))
             return m_document.Uint64(*integer);
-        // Not std::from_chars, which the standard library of macOS lacks for doubles. The decimal point is
-        // that of the C locale, which no program of ours leaves.
+        // We do not use std::from_chars: macOS's standard library does not have it for doubles. strtod reads
+        // the decimal point of the C locale, which all our programs keep.
         const double number = std::strtod(text, nullptr);
         return std::isinf(number) ? Refuse("Number too big to be stored in double.")
                                   : m_document.Double(number);
@@ -85,7 +85,7 @@ public:
     bool StartArray() { return Enter() && m_document.StartArray(); }
     bool EndArray(rapidjson::SizeType elements) { return --m_depth, m_document.EndArray(elements); }
 
-    /// Why the parse was ended.
+    /// Why this object ended the parse.
     const char* Refusal() const { return m_refusal; }
 
 private:
@@ -106,7 +106,8 @@ private:
     const char* m_refusal = "";
 };
 
-/// One parse, in the shape that JsonTree::Populate wants: it calls this with itself as the handler.
+/// One parse, as the function object that JsonTree::Populate wants: Populate calls it with the tree as the
+/// handler.
 class JsonParse {
 public:
     explicit JsonParse(const std::string& text, int maxDepth = JsonDocument::MAX_DEPTH)
@@ -121,7 +122,8 @@ public:
                        ? reader.Parse<JSON_PARSE_FLAGS>(bytes, guard)
                        : reader.Parse<JSON_PARSE_FLAGS | rapidjson::kParseValidateEncodingFlag>(bytes, guard);
         m_refusal = guard.Refusal();
-        // The parser takes a zero byte for the end of the text; the text says where it really ends.
+        // The parser takes a zero byte for the end of the text. When the text goes on after it, that is an
+        // error.
         if (!m_result.IsError() && bytes.Tell() != m_text.size() - m_start)
             m_result.Set(rapidjson::kParseErrorDocumentRootNotSingular, bytes.Tell());
         return !m_result.IsError();
@@ -137,7 +139,7 @@ public:
 
     std::size_t ErrorByte() const { return m_start + m_result.Offset(); }
 
-    /// Whether the parser itself refused a number, which may be one that RewriteNumbers helps with.
+    /// Whether the parser itself refused a number as too big. RewriteNumbers may help then.
     bool IsNumberRefused() const { return m_result.Code() == rapidjson::kParseErrorNumberTooBig; }
 
 private:
@@ -145,13 +147,13 @@ private:
 
     const std::string& m_text;
     const int m_maxDepth;
-    const std::size_t m_start; ///< Behind a byte order mark.
+    const std::size_t m_start; ///< Where the JSON begins: after a byte order mark, if there is one.
     rapidjson::ParseResult m_result;
     const char* m_refusal = "";
 };
 
-/// Fills `tree` with the value of `text`. Returns what is wrong with the text and at which byte; empty when
-/// it is JSON, and only then the tree has a value.
+/// Fills `tree` with the value of `text`. Empty when `text` is JSON, and only then the tree has a value.
+/// Otherwise the result says what is wrong and at which byte.
 inline std::string ReadJson(const std::string& text, JsonTree& tree, int maxDepth = JsonDocument::MAX_DEPTH) {
     JsonParse parse(text, maxDepth);
     tree.Populate(parse);

@@ -7,8 +7,9 @@
 // How JsonDocument goes through a value. Only JsonDocument uses it.
 namespace SystemTool::IO {
 
-/// Tells `handler` the whole of `root`, in order, as a parser would. The open arrays and objects are kept on
-/// the heap, where rapidjson's own Accept and CopyFrom call themselves for each level.
+/// Sends the events of the whole value `root` to `handler`, in order, as a parser would. It keeps the open
+/// arrays and objects on the heap. RapidJSON's own Accept and CopyFrom call themselves for each level
+/// instead, and would need a deep stack for a deep value.
 template <typename Handler>
 class JsonWalk {
 public:

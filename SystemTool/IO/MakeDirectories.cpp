@@ -8,11 +8,11 @@
 namespace SystemTool::IO {
 namespace {
 
-/// The error of the failed mkdir, or 0 if there is a directory all the same.
+/// The error of the failed mkdir, or 0 when there is a directory at `path` already.
 int ErrorUnlessDirectory(const std::string& path, int error) {
     struct stat status {};
     if (::stat(path.c_str(), &status) != 0)
-        return error; // that it is not there either explains nothing
+        return error; // mkdir's reason; that of stat would explain nothing
     return S_ISDIR(status.st_mode) ? 0 : ENOTDIR;
 }
 
@@ -22,9 +22,9 @@ int MakeOne(const std::string& path, mode_t mode) {
     struct stat status {};
     if (::lstat(path.c_str(), &status) == 0 && (status.st_mode & 07777) == mode)
         return 0;
-    // The mode is wider than a new directory's, or the umask took rights of the owner away. Not through a
-    // link: another user who may write the parent could have put one there meanwhile.
-    // A file system without modes refuses, which is no reason to have no directory.
+    // The mode is wider than a new directory's, or the umask took rights of the owner away. fchmodat must not
+    // follow a link: another user who may write into the parent could have put one there in the meantime. A
+    // file system without modes refuses this, but the directory can be used all the same.
     [[maybe_unused]] const int ignored = ::fchmodat(AT_FDCWD, path.c_str(), mode, AT_SYMLINK_NOFOLLOW);
     return 0;
 }

@@ -2,15 +2,14 @@
 
 namespace SystemTool::IO {
 
-/// Opens /dev/null for each of the descriptors 0 to 2 that is closed, so that no file, database or socket
-/// that is opened later gets its number: what a library prints would go into that file. First thing in main:
-/// what runs before opens nothing that stays open.
+/// Opens /dev/null for each of the descriptors 0 to 2 that is closed. Otherwise a file, database or socket
+/// that is opened later could get such a number, and text that a library prints would go into that file. Call
+/// it first in main: nothing that runs before main leaves a descriptor open.
 ///
-/// Opened the other way round, for writing in the place of standard input and for reading in the places of
-/// the two others. So reading and writing fail as they do where the descriptor is closed, and a program can
-/// tell.
+/// Standard input is opened for writing only, the other two for reading only. So reading and writing fail
+/// just as on a closed descriptor, and a program can notice that.
 ///
-/// Failure: without /dev/null they stay closed.
+/// Failure: without /dev/null, the descriptors stay closed.
 void OpenClosedStandardDescriptors();
 
 } // namespace SystemTool::IO
