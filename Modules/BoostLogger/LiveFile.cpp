@@ -18,8 +18,8 @@ namespace {
 
 constexpr mode_t FILE_MODE = 0600;
 
-/// The other process holds the lock for one rename and a few unlinks; where it takes longer it is stopped or
-/// its disk hangs, and then the caller must not hang with it.
+/// The other process holds the lock for one rename and a few unlinks. If that takes longer than these 20 ms,
+/// the other process is stopped or its disk hangs. The caller must not hang with it.
 constexpr int LOCK_ATTEMPTS = 20;
 constexpr std::chrono::milliseconds LOCK_PAUSE{1};
 
@@ -31,9 +31,9 @@ FileFailure MakeDirectory(const std::string& path) {
 
 FileFailure LiveFile::Open(const std::string& path) {
     Close();
-    // O_NOFOLLOW: a link planted under the log's name must not have another file of the user's appended to.
-    // O_NONBLOCK: the open of a pipe must fail and not wait for its reader; regular files ignore it.
-    // Readable, for the look at the last byte.
+    // O_NOFOLLOW: another program may plant a link under the log's name. We must not append to its target.
+    // O_NONBLOCK: the open of a pipe or a device must not wait. Examine refuses both; regular files ignore it.
+    // O_RDWR: EndsInHalfLine reads the last byte.
     m_descriptor =
         open(path.c_str(), O_RDWR | O_APPEND | O_CREAT | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK | O_NOCTTY,
              FILE_MODE);
@@ -52,16 +52,17 @@ FileFailure LiveFile::Examine() {
     if (!S_ISREG(status.st_mode))
         return {EINVAL, "use what is no regular file"};
     if ((status.st_mode & 07777) != FILE_MODE)
-        static_cast<void>(
-            fchmod(m_descriptor, FILE_MODE)); // fails on another user's file, which may be written to
+        // This fails on a file of another user. Such a file is used with the mode that it has.
+        static_cast<void>(fchmod(m_descriptor, FILE_MODE));
     m_sizeBytes = status.st_size;
     m_endsInHalfLine = EndsInHalfLine();
     return {};
 }
 
-/// A crash or a full disk leaves half a line, and so does another process's write that is under way: the size
-/// of a file grows page by page. The kernel changes the mode under the lock that a write holds, so after that
-/// the write is done; a size that is still the same belongs to a half line that stays one.
+/// A crash or a full disk leaves half a line at the end of the file. Another process's write that is under
+/// way looks the same, because the file grows page by page. To tell the two apart, we set the mode again: the
+/// kernel does that under the lock that a write holds, so the write is done when fchmod returns. If the size
+/// is still the same, the half line is there to stay.
 bool LiveFile::EndsInHalfLine() const {
     char last = '\n';
     if (m_sizeBytes == 0 || pread(m_descriptor, &last, 1, m_sizeBytes - 1) != 1 || last == '\n')
@@ -99,19 +100,21 @@ FileFailure LiveFile::Append(std::string_view line) {
     } while (written < 0 && errno == EINTR);
     if (written < 0)
         return {errno, "write to the file"};
-    // The offset after an append is the end of the file, with what other processes appended. Asking for it
-    // after each line was a sixth of the line's cost.
+    // After an append, the file offset is the end of the file, so it counts what other processes appended.
+    // Asking for the offset after each line took a sixth of the line's time, so we ask once in LINES_PER_LOOK
+    // lines.
     m_sizeBytes = ++m_lines % LINES_PER_LOOK == 0 ? lseek(m_descriptor, 0, SEEK_CUR) : m_sizeBytes + written;
     if (static_cast<std::size_t>(written) == size) {
         m_endsInHalfLine = false;
         return {};
     }
-    // Cutting the half line off again could cut off what another process appended after it.
+    // We do not cut the half line off. Another process may have appended a line after it, and that line would
+    // be cut off, too.
     m_endsInHalfLine = written > (mends ? 1 : 0) || (written == 0 && mends);
     return {ENOSPC, "write a whole line to the file"};
 }
 
-// What is locked is the file, so neither is const. NOLINTBEGIN(readability-make-member-function-const)
+// They change the lock of the file, so neither is const. NOLINTBEGIN(readability-make-member-function-const)
 
 FileFailure LiveFile::Lock() {
     for (int attempt = 0; attempt < LOCK_ATTEMPTS; ++attempt) {

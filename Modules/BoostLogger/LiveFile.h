@@ -8,12 +8,12 @@
 
 namespace BoostLogger {
 
-/// Makes the directory and its missing parents, each with mode 0700 under any umask. What exists keeps its
-/// mode: it may hold other things than this log.
+/// Makes the directory and its missing parents, each with mode 0700 under any umask. A directory that exists
+/// keeps its mode, because it may hold other things than this log.
 FileFailure MakeDirectory(const std::string& path);
 
-/// The descriptor of the file that records go to, opened for appending; several processes may have the same
-/// file open. Threads: one at a time.
+/// The open file that records are appended to. Several processes may have the same file open. Threads: one at
+/// a time.
 class LiveFile {
 public:
     LiveFile() = default;
@@ -21,33 +21,33 @@ public:
     LiveFile(const LiveFile&) = delete;
     LiveFile& operator=(const LiveFile&) = delete;
 
-    /// Opens, or makes, the file with mode 0600 under any umask; one with a wider mode is narrowed, since
-    /// the records hold what users do. Symbolic links and anything but a regular file are refused. What was
-    /// open before is closed, its lock given up, whether this succeeds or not.
+    /// Opens the file, or makes it, with mode 0600 under any umask. A file with another mode gets this one,
+    /// because the records hold what users do. Symbolic links and everything but a regular file are refused.
+    /// The file that was open before is closed and its lock released, also when this fails.
     FileFailure Open(const std::string& path);
 
     bool IsOpen() const { return m_descriptor >= 0; }
 
-    /// Whether `path` is known to be another file by now, or none: it was rotated by another process or
-    /// deleted. Looks at the size of the file that is open, too.
+    /// Whether `path` is known to lead to another file by now, or to none: another process has rotated or
+    /// deleted our file. Also updates SizeBytes when there is a file at `path`.
     bool IsGoneFrom(const std::string& path);
 
-    /// How many lines are appended between two looks at the size. So many may each writer go beyond a limit
-    /// where several write at once.
+    /// How many lines are appended between two looks at the size. When several processes write at once, each
+    /// of them may exceed a size limit by as many lines.
     static constexpr unsigned LINES_PER_LOOK = 16;
 
-    /// The size of the file, with what other processes appended until the last look.
+    /// The size of the file. It counts the bytes of other processes as of the last look.
     std::int64_t SizeBytes() const { return m_sizeBytes; }
 
     /// Looks at the size now.
     void LookAtSize();
 
-    /// Appends the line, which ends in a newline, with one system call: it is in the file, as a whole and not
-    /// torn by other writers, when this returns. Where only a part of it could be written, the next line
-    /// starts with a newline, so that the two are not glued together.
+    /// Appends the line, which ends in a newline, with one system call. When this returns without a failure,
+    /// the whole line is in the file, and no other process's text is in the middle of it. When only a part
+    /// could be written, the next line starts with a newline, so that the two do not become one line.
     FileFailure Append(std::string_view line);
 
-    /// The exclusive lock that is held while the file is rotated, until Unlock or Close. Waits 20 ms at most.
+    /// Takes the exclusive lock for a rotation. It is held until Unlock or Close. Waits 20 ms at most.
     FileFailure Lock();
     void Unlock();
     void Close();
@@ -58,7 +58,7 @@ private:
 
     int m_descriptor = -1;
     std::int64_t m_sizeBytes = 0;
-    unsigned m_lines = 0; ///< Appended; may run over.
+    unsigned m_lines = 0; ///< How many lines were appended; it may wrap around to 0.
     bool m_endsInHalfLine = false;
 };
 

@@ -4,7 +4,7 @@
 
 namespace BoostLogger {
 
-/// The arguments of one WriteLog; valid while that call lasts.
+/// The arguments of one call of WriteLog. The texts are valid during that call.
 struct LogRecord {
     int level = 0;
     std::string_view tag;

@@ -5,20 +5,23 @@
 
 namespace BoostLogger {
 
-/// What InitLog was told.
+/// The arguments of InitLog.
 struct LogSettings {
     std::string directory; ///< Absolute, so that a later chdir of the program does not move the log.
-    std::string fileName;  ///< Of the live file; the rotated ones are named after it.
-    std::string
-        application;    ///< Together with the module: who is named when the log cannot be opened. Not in the
-    std::string module; ///< records, since a log directory is one program's.
+    std::string fileName;  ///< The name of the live file; the rotated files are named after it.
 
-    std::int64_t maxFileBytes = std::int64_t{10} * 1024 * 1024;   ///< What an editor opens at once.
+    /// These two are named in the error text when the log cannot be opened. They are not in the records,
+    /// because a log directory belongs to one program.
+    std::string application;
+    std::string module;
+
+    /// An editor opens a file of this size at once.
+    std::int64_t maxFileBytes = std::int64_t{10} * 1024 * 1024;
     std::int64_t maxTotalBytes = std::int64_t{100} * 1024 * 1024; ///< Live and rotated files together.
 
-    /// Allows to keep records back when false. Nothing is kept back all the same: a record is one write to
-    /// the file, and keeping them would need a thread that writes them out in time, in a library that lives
-    /// until the very end of the process.
+    /// False allows the logger to keep records back. It does not do so: each record is one write to the file.
+    /// To keep records, it would need a thread that writes them out in time, in a library that lives until
+    /// the very end of the process.
     bool flushEach = true;
     bool console = false;
 

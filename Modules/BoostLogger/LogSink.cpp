@@ -23,8 +23,8 @@ namespace logging = boost::log;
 
 namespace {
 
-/// Carries a whole record through the core. One attribute and not one for each field: every attribute costs
-/// an allocation and a look-up per record.
+/// Carries a whole record through the core of Boost.Log. It is one attribute, not one for each field, because
+/// every attribute takes an allocation and a look-up per record.
 using Payload = const LogRecord*;
 
 const char* const PAYLOAD_NAME = "BoostLoggerRecord";
@@ -45,12 +45,13 @@ public:
     }
 
 private:
-    std::mutex m_mutex; ///< Keeps lines whole where a terminal takes them in pieces.
+    std::mutex m_mutex; ///< Keeps lines whole when a terminal takes a line in several pieces.
 };
 
 } // namespace
 
-/// The backend does its own locking, around the write alone: lines are composed by many threads at once.
+/// Boost.Log takes no lock around this backend. Many threads compose lines at once, and only the write is
+/// locked.
 class LogBackend : public logging::sinks::basic_sink_backend<logging::sinks::concurrent_feeding> {
 public:
     explicit LogBackend(const LogSettings& settings) : m_writer(settings), m_console(settings.console) {}
@@ -59,7 +60,8 @@ public:
 
     void consume(const logging::record_view& view) {
         const auto payload = view.attribute_values()[m_attributeName].extract<Payload>();
-        if (!payload) // another user of Boost.Log in this process; the filter has kept it out
+        // a record of another user of Boost.Log in this process; the filter should have dropped it
+        if (!payload)
             return;
         LineBuffer line;
         ComposeLine(line, **payload, std::chrono::system_clock::now());

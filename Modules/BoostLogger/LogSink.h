@@ -13,23 +13,23 @@ namespace BoostLogger {
 
 class LogBackend;
 
-/// The one sink of the process: a Boost.Log core that it keeps alive, and in it a sink whose backend writes
+/// The one sink of the process. It holds the core of Boost.Log, and in that core a sink whose backend writes
 /// lines into the files.
 ///
-/// Life: made by InitLog, and never destroyed. Threads log while exit() destroys the statics, Boost.Log's own
-/// among them, in any order; the core lives on because this object holds it.
+/// Life: made by InitLog, and never destroyed. Threads still log while exit() destroys the static objects,
+/// those of Boost.Log among them, in any order. The core lives on because this object holds it.
 ///
-/// Threads: Write from any. It does not throw; what cannot be written is counted, and reported in the log
-/// later.
+/// Threads: any may call Write. It does not throw. Records that cannot be written are counted, and a later
+/// record reports their number.
 class LogSink {
 public:
     explicit LogSink(const LogSettings& settings);
 
-    /// Opens the log and puts the sink into the core. Also when the log cannot be opened: the writer loses
-    /// records then, and tries again for as long as there are any.
+    /// Opens the log and puts the sink into the core. It does the latter also when the log cannot be opened.
+    /// Then the writer counts records as lost, and tries again to open the log for as long as records come.
     FileFailure Start();
 
-    /// Takes the sink out of the core: another one takes its place.
+    /// Takes the sink out of the core. To be called when another sink has taken its place.
     void Retire();
 
     void Write(const LogRecord& record) noexcept;

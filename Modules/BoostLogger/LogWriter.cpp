@@ -12,20 +12,21 @@ namespace BoostLogger {
 
 namespace {
 
-/// A full disk fails each of 300,000 attempts a second as well as it fails four.
+/// How long to wait after a failure. On a full disk, four attempts a second are as good as 300,000.
 constexpr std::chrono::milliseconds RETRY_INTERVAL{250};
 
-/// Between two looks at the path, lines may go into a file that was deleted or that another process has
-/// rotated away. A look before each line would cost a third of the line.
+/// How long to wait between two looks at the path. In between, lines may go into a file that was deleted or
+/// that another process has rotated away. A look before each line would take a third of the line's time.
 constexpr std::chrono::milliseconds LOOK_INTERVAL{100};
 
-/// Why records are lost when no step on the files has failed.
+/// The reason for lost records when no step on the files has failed.
 const char* const NO_LINE = "out of memory, or logged by a signal handler inside the logger";
 
 constexpr int WARNING = 3;
 
 /// Set while this thread waits for the writer's lock or holds it. The crash handler logs on the thread that
-/// crashed: should that ever be in here, its records must be lost and not wait for ever.
+/// crashed. If that thread crashed in here, it would wait for the lock for ever, so its records are counted
+/// as lost.
 thread_local bool t_isInside = false;
 
 struct Inside {
@@ -54,7 +55,8 @@ FileFailure LogWriter::Start() {
 void LogWriter::Append(std::string_view line, TimePoint now) noexcept {
     if (t_isInside)
         return CountLost();
-    const Inside inside; // before the lock: a signal between the two would wait for the lock for ever
+    // Set before the lock is taken: a signal handler that logs in between would otherwise wait for ever.
+    const Inside inside;
     const std::lock_guard lock(m_mutex);
     try {
         AppendLocked(line, now);
@@ -99,8 +101,9 @@ FileFailure LogWriter::Reopen() {
     return m_live.Open(m_path);
 }
 
-/// The size from which on the system ends a process that writes on, by SIGXFSZ (`ulimit -f`). A log must not
-/// be what ends its program, and a plug-in must not change what the program does on a signal.
+/// The file size (`ulimit -f`) beyond which a write makes the system end the process, by SIGXFSZ. A log must
+/// not end its program, and a plug-in must not change what the program does on a signal. So the writer itself
+/// stays below the limit.
 std::int64_t LogWriter::FileSizeLimit() {
     rlimit limit{};
     if (::getrlimit(RLIMIT_FSIZE, &limit) != 0 || limit.rlim_cur > static_cast<rlim_t>(NO_LIMIT))
@@ -125,7 +128,7 @@ FileFailure LogWriter::ReportLoss() {
 FileFailure LogWriter::Put(std::string_view line) {
     const auto size = static_cast<std::int64_t>(line.size());
     if (m_systemLimit != NO_LIMIT)
-        m_live.LookAtSize(); // before each line: what another process appended counts, too
+        m_live.LookAtSize(); // before each line, because what another process appended counts, too
     if (m_live.SizeBytes() > 0 &&
         m_live.SizeBytes() + size > std::min(m_settings.maxFileBytes, m_systemLimit))
         if (const FileFailure failure = Rotate())
@@ -135,13 +138,14 @@ FileFailure LogWriter::Put(std::string_view line) {
     return m_live.Append(line);
 }
 
-/// The lock is the live file's own: a process that waited for it finds that the path is another file by then,
-/// which means that the rotation is done already. Opening the new file gives the lock up.
+/// The lock is on the live file itself. A process that waited for the lock may find that the path leads to
+/// another file by then: the rotation is done already. Opening the new file closes the old one and so
+/// releases the lock.
 FileFailure LogWriter::Rotate() {
     if (const FileFailure failure = m_live.Lock())
         return failure;
     if (!m_live.IsGoneFrom(m_path)) {
-        if (m_live.SizeBytes() == 0) { // it was emptied since the last look
+        if (m_live.SizeBytes() == 0) { // another program emptied it since the last look
             m_live.Unlock();
             return {};
         }
@@ -155,7 +159,7 @@ FileFailure LogWriter::Rotate() {
 }
 
 void LogWriter::Prune() {
-    // The live file may grow to its full size until the next rotation, so that much is not to be had.
+    // The live file may grow to its full size until the next rotation, so that size is reserved for it.
     m_rotated.Prune(m_settings.maxTotalBytes - m_settings.maxFileBytes);
 }
 

@@ -13,22 +13,23 @@
 
 namespace BoostLogger {
 
-/// Puts lines into the log's files: rotation, the cap on all files, and the life of the log when the disk
+/// Writes lines into the log's files: rotates them, keeps all files within the cap, and goes on when the disk
 /// fails:
 ///
 ///   writing → (a step fails) → losing: lines are counted and dropped, one attempt a quarter of a second
 ///           → (an attempt succeeds) → a record tells how many were lost and why → writing
 ///
-/// Threads: Append and CountLost from any. Append blocks for no longer than the file system does, and 20 ms
-/// where another process rotates at the same moment.
+/// Threads: any may call Append and CountLost. Append blocks for as long as the file system does, and for up
+/// to 20 ms when another process rotates at the same moment.
 class LogWriter {
 public:
     using TimePoint = std::chrono::steady_clock::time_point;
 
     explicit LogWriter(const LogSettings& settings);
 
-    /// Makes the directory, opens the live file and deletes what an older, larger cap has left. After a
-    /// failure the writer is losing: lines may be appended, and it opens the file once that can be done.
+    /// Makes the directory, opens the live file, and deletes rotated files that are over the cap, for example
+    /// because the cap was larger before. After a failure Append may be called all the same: it opens the
+    /// file as soon as that works.
     FileFailure Start();
 
     /// Appends one line, its newline included. When this returns the line is in the file and survives the end
@@ -58,10 +59,10 @@ private:
     std::mutex m_mutex; ///< Guards everything below, and the order of lines in the file.
     LiveFile m_live;
     RotatedFiles m_rotated;
-    std::int64_t m_systemLimit = NO_LIMIT; ///< When the live file was opened; see FileSizeLimit.
-    TimePoint m_nextLook;                  ///< When to see next whether the path still is our file.
-    TimePoint m_nextAttempt;               ///< After a failure; before that everything is dropped.
-    FileFailure m_failure; ///< The last one; kept after it for the record that reports the loss.
+    std::int64_t m_systemLimit = NO_LIMIT; ///< The limit when the live file was opened; see FileSizeLimit.
+    TimePoint m_nextLook;                  ///< When to check next whether the path still leads to our file.
+    TimePoint m_nextAttempt; ///< When to try again after a failure; lines that come before are dropped.
+    FileFailure m_failure;   ///< The last failure. The record that reports the loss names it.
     bool m_losing = false;
 };
 

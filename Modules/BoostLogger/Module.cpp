@@ -1,4 +1,5 @@
-// The plug-in libBoostLogger.dylib: the ILogger that its two exports hand out, and the process's one sink.
+// The plug-in libBoostLogger.dylib: the ILogger that its two exported functions hand out, and the one sink of
+// the process.
 
 #include <atomic>
 #include <filesystem>
@@ -19,12 +20,12 @@ namespace {
 using SystemTool::BSErrorText;
 using SystemTool::BSException;
 
-/// Null until configured; then the sink for the rest of the process. One that could not be opened is in place
-/// too, and opens its log as soon as that can be done; another InitLog replaces it.
+/// Null until the first InitLog; then the sink, for the rest of the process. A sink that could not open its
+/// log is set, too, and opens the log as soon as that works. Another InitLog replaces such a sink.
 std::atomic<LogSink*> g_sink = nullptr;
 
 std::mutex g_configuring;                ///< Guards g_settings, and lets one InitLog run at a time.
-const LogSettings* g_settings = nullptr; ///< Those of an InitLog that did not throw.
+const LogSettings* g_settings = nullptr; ///< The settings of the InitLog that did not throw; null before.
 
 [[noreturn]] void Refuse(const LogSettings& settings, const std::string& reason,
                          const std::string& systemText) {
@@ -59,7 +60,7 @@ void StartSink(const LogSettings& settings) {
     g_settings = new LogSettings(settings);
 }
 
-/// The same settings again are no error: the caller asks for the log that there is.
+/// InitLog with the same settings again is no error: the caller asks for the log that is open already.
 void Configure(const LogSettings& settings) {
     CheckSettings(settings);
     const std::lock_guard lock(g_configuring);
@@ -89,8 +90,8 @@ public:
     }
 };
 
-/// The object that every loader gets. It has no state, so that one serves all; and it is never destroyed,
-/// because the loaders are destroyed by exit() while other threads still call it.
+/// The object that every loader gets. It has no state, so one object serves all loaders. It is never
+/// destroyed, because exit() destroys the loaders while other threads still call it.
 Logger& TheLogger() {
     static Logger* const logger = new Logger;
     return *logger;

@@ -19,14 +19,14 @@ using SystemTool::Text::AppendEscaped;
 
 namespace {
 
-/// A short text that a thread keeps from record to record. Nothing in it needs a destructor: threads log
-/// during exit(), when thread-local objects are gone already.
+/// A short text that a thread keeps from record to record. No member needs a destructor, because threads
+/// still log during exit(), after their thread-local objects are destroyed.
 struct CachedText {
     char text[48];
     std::size_t size;
 };
 
-thread_local CachedText t_second; ///< "2026-11-20 10:15:30" of t_secondTime.
+thread_local CachedText t_second; ///< The text of t_secondTime: "2026-11-20 10:15:30".
 thread_local std::time_t t_secondTime;
 thread_local CachedText t_thread; ///< "[pid:tid] "
 
@@ -38,14 +38,14 @@ void AppendNumber(LineBuffer& line, long long number) {
 
 void FillSecond(std::time_t second) {
     std::tm local{};
-    if (localtime_r(&second, &local) == nullptr) // a year beyond what an int holds
+    if (localtime_r(&second, &local) == nullptr) // the year does not fit into an int
         local = std::tm{};
     t_second.size = std::strftime(t_second.text, sizeof t_second.text, "%Y-%m-%d %H:%M:%S", &local);
     t_secondTime = second;
 }
 
-/// localtime_r takes a lock of the whole process and costs more than the rest of the line: once a second will
-/// do.
+/// localtime_r takes a lock of the whole process and needs more time than the rest of the line. So a thread
+/// calls it only when the second has changed.
 void AppendTime(LineBuffer& line, std::chrono::system_clock::time_point now) {
     const auto second = std::chrono::floor<std::chrono::seconds>(now);
     const auto milliseconds = std::chrono::floor<std::chrono::milliseconds>(now - second).count();
@@ -70,14 +70,15 @@ void AppendLevel(LineBuffer& line, int level) {
     line.push_back(' ');
 }
 
-/// After a fork the child's only thread is the one that runs this; its ids are new.
+/// Runs in the child after a fork, on its only thread. The ids of the child are new, so the text is
+/// forgotten.
 void ForgetThread() {
     t_thread.size = 0;
 }
 
 [[maybe_unused]] const int g_forkHandler = pthread_atfork(nullptr, nullptr, ForgetThread);
 
-/// Each id is a system call, and a record should make one.
+/// Asking for an id takes a system call. A record should make only one system call, so the text is kept.
 void AppendThread(LineBuffer& line) {
     if (t_thread.size == 0) {
         const auto thread = static_cast<unsigned long long>(SystemTool::Platform::CurrentThreadId());

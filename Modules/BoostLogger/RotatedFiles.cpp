@@ -17,8 +17,8 @@ namespace BoostLogger {
 
 namespace {
 
-/// A number that no rotation reaches: a file of that name is not ours, and must not become our last
-/// one.
+/// No rotation reaches this number. A file whose name has this number or a larger one is not ours, and must
+/// not count as our last rotated file.
 constexpr std::uint64_t MAX_NUMBER = 1'000'000'000'000'000;
 
 struct CloseDirectory {

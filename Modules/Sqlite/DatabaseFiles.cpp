@@ -22,7 +22,8 @@ void RequireOurFile(int directory, const std::string& name, const std::string& s
     }
     if (!S_ISREG(status.st_mode))
         throw UnsafePath(shown + " is not a regular file");
-    if (status.st_nlink != 1) // the other name may be anywhere, and what is written here is written there
+    // A write to this file would change it under its other name, too, which may be anywhere.
+    if (status.st_nlink != 1)
         throw UnsafePath(shown + " has more than one name");
     RequireOursAlone(status, shown);
 }

@@ -11,42 +11,45 @@ namespace Sqlite {
 /// Device and inode.
 using Identity = std::pair<dev_t, ino_t>;
 
-/// Of the file that the path itself names, a link included; nothing when there is none.
+/// The identity of the file that `path` itself names: of a link, not of the link's target. Nothing when the
+/// system cannot find or examine the file.
 std::optional<Identity> IdentityOf(const std::string& path);
 
-/// To be called before SQLite opens the database `name` in `directory`. Throws UnsafePath unless each of its
-/// files that exists is a regular file with one name, belongs to this user or root, and can be written by no
-/// other user.
+/// Call this before SQLite opens the database `name` in `directory`. It checks the database file and its side
+/// files, as far as they exist. Each must be a regular file with only one name, must belong to this user or
+/// root, and no other user may write to it. Throws UnsafePath otherwise.
 ///
-/// SQLite trusts what lies there: it plays a journal back into the database and deletes the file that the
-/// journal names, and a log or an index that shrinks while it is mapped ends the process. `directory` must be
-/// one in which only this user and root can make files (see SafeDirectory); then nothing can be put there
-/// between this check and SQLite's open.
+/// SQLite trusts these files. It plays a journal back into the database, and deletes the file that the
+/// journal names. When the index shrinks while it is mapped, the process ends. In `directory`, only this user
+/// and root must be able to make files (see SafeDirectory): then no other user can put a file there between
+/// this check and SQLite's open.
 ///
-/// `shown` is the directory's path, for the text.
+/// `shown` is the path of `directory`, for the error text.
 void RequireOurFiles(int directory, const std::string& name, const std::string& shown);
 
-/// The same for the file that `path` leads to, and for its directory. Links are followed, as SQLite follows
-/// them. Does nothing when there is no file, or a directory: SQLite says so itself. Throws UnsafePath.
+/// The same check for the file that `path` leads to, and for that file's directory. It follows links, because
+/// SQLite follows them. Does nothing when there is no file, or when `path` is a directory: SQLite reports
+/// both itself. Throws UnsafePath.
 void RequireOurFiles(const std::string& path);
 
-/// Whether the log and the index of an open database still have their names.
+/// Tells whether the log and the index of an open database still have their names.
 ///
-/// A log without a name takes every row that follows, and takes them along when the process ends. The files
-/// belong to the connection that opened them, so they are looked at by name: two system calls, to be made
-/// once a commit and not once a row.
+/// When the log has lost its name, all later rows go into a nameless file, and are lost with it when the
+/// process ends. SQLite does not hand out the descriptors of these files, so this class looks at their names.
+/// That takes two system calls: call it once a commit, not once a row.
 class SideFileWatch {
 public:
     /// For the database at `path`, which has just been opened and read from in write-ahead mode.
     explicit SideFileWatch(std::string path);
 
     bool LogIsInPlace() { return IsInPlace(m_log, m_logIdentity); }
-    /// When the log is not in place: whether another file has its name.
+    /// Whether another file has the log's name now. Call this only when the log is not in place.
     bool HasOtherLog() const { return IdentityOf(m_log).has_value(); }
     bool AreInPlace() { return LogIsInPlace() && IsInPlace(m_index, m_indexIdentity); }
 
 private:
-    /// An empty database has neither file until its first write: one that appears is the connection's own.
+    /// An empty database has neither file until its first write. So a file that appears later is the
+    /// connection's own.
     static bool IsInPlace(const std::string& path, std::optional<Identity>& identity);
 
     std::string m_log;

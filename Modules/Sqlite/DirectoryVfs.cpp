@@ -17,7 +17,8 @@ int TakeAsItIs(sqlite3_vfs* /*vfs*/, const char* path, int size, char* full) {
     return SQLITE_OK;
 }
 
-/// A copy of SQLite's own: its functions work with any object that has the same data behind it.
+/// A copy of SQLite's default VFS, with one function replaced. The other functions work with any object that
+/// has the same data behind it, so they work with the copy.
 sqlite3_vfs Make() {
     const auto* own = ::sqlite3_vfs_find(nullptr);
     if (own == nullptr)

@@ -4,15 +4,15 @@
 
 namespace Sqlite {
 
-/// What an error of SQLite's is about, named for what can be done.
+/// What an error of SQLite is about. The kinds are named for what the caller can do.
 enum class ErrorKind {
-    Wait,      ///< The file is sound: another program's lock, a full disk, no memory. Try again later.
+    Wait,      ///< The file is sound, but locked, or the disk or the memory is full. Try again later.
     Reopen,    ///< The open file cannot be used any more. Open its path again.
-    Damage,    ///< The file is damaged, or no database.
-    Statement, ///< The statement's own fault.
+    Damage,    ///< The file is damaged, or it is no database.
+    Statement, ///< The statement itself is at fault.
 };
 
-/// `code` may be an extended one.
+/// `code` is a result code of SQLite; it may be an extended one.
 inline ErrorKind KindOf(int code) {
     switch (code & 0xff) {
     case SQLITE_BUSY:

@@ -21,7 +21,7 @@ namespace {
 namespace fs = std::filesystem;
 using SystemTool::IO::Descriptor;
 
-constexpr int MAX_LINKS = 40; ///< As many as the system follows.
+constexpr int MAX_LINKS = 40; ///< As many as the operating system follows.
 
 enum class Missing { Make, Leave };
 
@@ -29,13 +29,14 @@ enum class Missing { Make, Leave };
     throw std::system_error(error, std::generic_category(), what);
 }
 
-/// Without dots and doubled separators. Dots are taken out as text: a link before them changes where they
-/// lead, and what they lead to is checked like any other path.
+/// The path without dots and doubled separators. Dots are removed from the text alone: when there is a link
+/// before "..", the result may be another directory than the one that the system would find. That is safe,
+/// because the result is checked like any other path.
 std::string Normal(const std::string& path) {
     if (path.empty() || path.front() != '/' || path.find('\0') != std::string::npos)
         throw UnsafePath("not an absolute path");
     auto normal = fs::path(path).lexically_normal().string();
-    const auto first = normal.find_first_not_of('/'); // two at the beginning are kept as something special
+    const auto first = normal.find_first_not_of('/'); // lexically_normal may keep two slashes at the start
     normal = first == std::string::npos ? "/" : normal.substr(first - 1);
     while (normal.size() > 1 && normal.ends_with('/'))
         normal.pop_back();
@@ -54,8 +55,8 @@ std::vector<std::string> NamesOf(const std::string& path) {
     return names;
 }
 
-/// The data directory without links. Made when it is missing, with its parents, as it is the environment's
-/// word.
+/// The data directory's path without links. With Missing::Make, it makes the directory and its missing
+/// parents: the path comes from the environment, which is trusted.
 std::string RealHome(const std::string& home, Missing missing) {
     if (home.empty() || home.front() != '/')
         return {};
@@ -68,7 +69,8 @@ std::string RealHome(const std::string& home, Missing missing) {
     return error ? normal : Normal(real);
 }
 
-/// One way from the data directory, or from the root, to the directory or to the first link.
+/// The walk along one path, from the data directory or from the root. It ends at the wanted directory, at the
+/// first link, or at the first directory that does not exist and is not to be made.
 class Way {
 public:
     Way(const std::string& path, const std::string& home, Missing missing)
@@ -79,8 +81,8 @@ public:
             throw UnsafePath("the path has too many levels");
     }
 
-    /// Where to begin anew, when there is a link; otherwise the way is gone to its end, or to what is
-    /// missing.
+    /// Returns the path from which to begin again when there is a link. Returns nothing when the walk is at
+    /// its end.
     std::optional<std::string> Go() {
         m_directory = Descriptor(::open(m_path.c_str(), SafeDirectory::LOOK_FLAGS));
         if (m_directory.Number() < 0 && errno == ENOENT && m_missing == Missing::Leave)
@@ -102,7 +104,7 @@ public:
     }
 
     SafeDirectory Result() {
-        for (; m_next < m_names.size(); ++m_next) // what does not exist yet
+        for (; m_next < m_names.size(); ++m_next) // components that do not exist yet
             m_path = Child();
         return {m_path, std::move(m_directory)};
     }
@@ -128,7 +130,7 @@ private:
         m_directory = std::move(child);
     }
 
-    /// False when it is missing and is to stay so.
+    /// False when the component is missing and is not to be made.
     bool Look(struct stat& status) {
         const auto* name = m_names[m_next].c_str();
         if (::fstatat(m_directory.Number(), name, &status, AT_SYMLINK_NOFOLLOW) == 0)
@@ -139,7 +141,8 @@ private:
             throw UnsafePath(Child() + " does not exist, and is only made below the user's data directory");
         if (m_missing == Missing::Leave)
             return false;
-        // The umask can only take rights away from a mode given to mkdirat.
+        // The umask can only take rights away from this mode, so the directory never gets more rights than
+        // this.
         if (::mkdirat(m_directory.Number(), name, SystemTool::IO::PRIVATE_DIRECTORY) != 0 && errno != EEXIST)
             Fail("Cannot make the directory " + Child());
         if (::fstatat(m_directory.Number(), name, &status, AT_SYMLINK_NOFOLLOW) != 0)
@@ -163,7 +166,8 @@ private:
         return target;
     }
 
-    /// What the process lacks for now may be there later; all else is the path's fault.
+    /// A lack of descriptors or memory and a read error may pass, so they throw std::system_error. All other
+    /// errors are the path's fault.
     [[noreturn]] void Refuse() const {
         if (errno == EMFILE || errno == ENFILE || errno == ENOMEM || errno == EIO)
             Fail("Cannot open the directory " + Child());
@@ -174,7 +178,7 @@ private:
     const Missing m_missing;
     const std::vector<std::string> m_names;
     std::size_t m_next = 0;
-    std::string m_path; ///< Of m_directory.
+    std::string m_path; ///< The path of m_directory.
     Descriptor m_directory;
 };
 
