@@ -1,4 +1,4 @@
-/* The same from C: a user signs in, then an event for the store and one for analytics. */
+/* Reporting from C: tells which user signed in, then sends an event for the store and one for analytics. */
 #include <stdio.h>
 
 #include <hublink/report.h>

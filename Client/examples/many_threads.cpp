@@ -1,5 +1,5 @@
-// Several threads, one reporter: any thread may use it at any time. At the end, the counters tell what became
-// of all.
+// Several threads share one reporter: any thread may use it at any time. At the end, the reporter's counters
+// say how many events were sent, and how many were not.
 #include <cstdint>
 #include <cstdio>
 #include <functional>
@@ -12,7 +12,7 @@
 namespace {
 
 constexpr int THREADS = 4;
-constexpr int EVENTS = 25; // of each thread
+constexpr int EVENTS = 25; // that each thread sends
 constexpr std::uint64_t ALL_EVENTS = std::uint64_t{THREADS} * EVENTS;
 
 void Work(hublink::Reporter& reporter, int thread) {

@@ -17,7 +17,7 @@ namespace {
 
 using hublink::Result;
 
-// One list in two languages: a cast goes from one to the other.
+// The values for C++ and for C must be equal, because the functions below cast one to the other.
 static_assert(static_cast<int>(Result::Sent) == HUBLINK_SENT);
 static_assert(static_cast<int>(Result::NobodyListens) == HUBLINK_NOBODY_LISTENS);
 static_assert(static_cast<int>(Result::TooLong) == HUBLINK_TOO_LONG);
@@ -33,7 +33,7 @@ hublink_result InC(Result result) {
     return static_cast<hublink_result>(result);
 }
 
-/// Empty for a null pointer.
+/// The text as a view; an empty view for a null pointer.
 std::string_view TextOf(const char* text) {
     return text == nullptr ? std::string_view() : std::string_view(text);
 }

@@ -12,15 +12,16 @@ namespace {
 
 constexpr std::string_view DEFAULT_MODULE = "A759";
 
-/// Of the value, which stands within the datagram's object. The service reads 128 levels.
+/// The most levels that a value may have. The service reads 128 levels, and the datagram's object around the
+/// value is one of them.
 constexpr std::size_t MAX_LEVELS = 127;
 
 bool IsForAnalytics(std::string_view eventId) {
     return eventId.front() == 'A';
 }
 
-/// A time as the service keeps it: milliseconds since 1970. It treats any ten characters as seconds, so such
-/// a number is written as a text with a zero in front, which makes it eleven.
+/// A time in milliseconds since 1970, as the service keeps it. The service takes every time of ten characters
+/// for seconds. So a number of ten characters is written as a string with a zero in front: eleven characters.
 class TimeText {
 public:
     explicit TimeText(Reporter::Time time) {
@@ -50,9 +51,9 @@ private:
     std::size_t m_length = 0;
 };
 
-/// JSON goes to the store as an object where the service prints it again as it was. Everything else would
-/// come out different (numbers of more digits than the service keeps, deep nesting), and goes as a text,
-/// which stays as it is.
+/// How JSON for the store is written. The service reads an object and prints it again: an object goes as JSON
+/// when that leaves it the same. All other JSON would be stored changed (for example numbers of more digits
+/// than the service keeps, or deep nesting). It goes as a text, which the service does not change.
 wire::ValueForm FormForStore(const wire::JsonFacts& facts) {
     return facts.isObject && facts.fate == wire::Fate::Exact && facts.levels <= MAX_LEVELS
                ? wire::ValueForm::Json
@@ -63,7 +64,9 @@ bool IsFitForAnalytics(const wire::JsonFacts& facts) {
     return facts.isObject && facts.fate != wire::Fate::Lost && facts.levels <= MAX_LEVELS;
 }
 
-/// Judges the value, and decides how the report writes it.
+/// Puts the value into the report and decides in which form it is written. Returns Sent, or the reason why
+/// the
+/// value cannot be sent.
 Result TakeValue(wire::Report& report, const Value& value, bool isForAnalytics) {
     report.value = value.Text();
     if (value.WhatItIs() == Value::Kind::Nothing)
@@ -116,7 +119,7 @@ Result WriteEvent(wire::Buffer& buffer, const GivenEvent& event) {
 }
 
 Result WriteUser(wire::Buffer& buffer, std::string_view openId, std::string_view suiteVersion) {
-    // The service does nothing with an empty open id.
+    // The service ignores an empty open id.
     if (openId.empty() || !wire::IsText(openId) || !wire::IsText(suiteVersion))
         return Result::InvalidText;
     for (const auto text : {openId, suiteVersion})

@@ -16,18 +16,20 @@ struct GivenEvent {
     bool isDayReport = false;
 };
 
-/// The module whose event this is, of a program whose own module is `ownModule` (empty for none): the part
-/// before the bar for analytics, empty for the store. Nothing for an id that the service could not use.
+/// The id of the module that an event belongs to: the part of the event id before the bar for analytics, an
+/// empty text for the store. Returns nothing when the service could not use the event id. `ownModule` is the
+/// id of the program's own module, empty when it has none.
 std::optional<std::string_view> ModuleOf(std::string_view eventId, std::string_view ownModule);
 
-/// Writes the datagram of an event whose id is sound, so that its value arrives as it was given. Sent when it
-/// can be sent; else why not.
+/// Writes an event's datagram so that its value arrives as it was given. ModuleOf must have accepted the
+/// event
+/// id. Returns Sent when the datagram can be sent, else the reason why it cannot.
 Result WriteEvent(wire::Buffer& buffer, const GivenEvent& event);
 
-/// The same of the message that tells who is signed in.
+/// Writes the message that tells who is signed in. Returns what WriteEvent returns.
 Result WriteUser(wire::Buffer& buffer, std::string_view openId, std::string_view suiteVersion);
 
-/// The same of a module's announcement.
+/// Writes a module's announcement. Returns what WriteEvent returns.
 Result WriteAnnouncement(wire::Buffer& buffer, const Module& module);
 
 } // namespace hublink

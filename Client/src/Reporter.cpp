@@ -13,7 +13,8 @@
 namespace hublink {
 namespace {
 
-/// Where a datagram is written; on the stack, which every thread has.
+/// The memory for one datagram. It is put on the stack, so that each thread has its own without an
+/// allocation.
 // NOLINTNEXTLINE(cppcoreguidelines-pro-type-member-init): the bytes are written before they are read
 class Datagram {
 public:
@@ -74,7 +75,7 @@ Reporter::Reporter() noexcept : Reporter(Module()) {}
 Reporter::Reporter(const Module& module, const Options& options) noexcept {
     try {
         m_inside = std::make_unique<Inside>(module, options);
-    } catch (const std::bad_alloc&) { // every call says so
+    } catch (const std::bad_alloc&) { // every call returns SystemError then
     }
 }
 

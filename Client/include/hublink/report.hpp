@@ -20,45 +20,49 @@
 ///     reporter.Event("A100|10001", hublink::Json{R"({"clicks":3})"});
 ///     reporter.Event("B100|10001", "it's a text as it is");
 ///
-/// An event whose id begins with a capital A goes to analytics, any other to the user's local store. A text
-/// arrives in the store exactly as it was given, with any characters; JSON arrives as the same value.
+/// An event whose id begins with a capital A goes to analytics. Any other event goes to the user's local
+/// store. A text arrives in the store exactly as it was given, with any characters; JSON arrives as the same
+/// value.
 namespace hublink {
 
-/// What happened to an event, or to a user that was set. The same names as in C and in Python.
+/// What happened to an event, or to a user that was set. The library has the same names in C and in Python.
 enum class Result {
-    /// The system took it, and a program listens on the service's port. No more is known: there is no answer.
-    /// Linux drops a datagram silently when the listener's buffer is full, after some thousand reports that
-    /// come faster than the service reads them.
+    /// The system took the datagram, and a program listens on the service's port. The library knows no more,
+    /// because the service does not answer. Linux drops a datagram without an error when the listener's
+    /// receive buffer is full: after some thousand reports that come faster than the service reads them.
     Sent,
-    /// The service does not run. The event is lost; nothing is kept for later. The next event tries again.
+    /// No service runs. The event is lost: the library keeps nothing for later. The next event tries again.
     NobodyListens,
-    /// Its datagram would have more than 10240 bytes, with everything escaped that must be.
+    /// The datagram would have more than 10240 bytes. Characters that must be escaped count as escaped.
     TooLong,
-    /// The text is no UTF-8 or has a zero character in it; or an open id is empty.
+    /// A text (an event's, a user's or the module's) is not UTF-8, or it has a zero character in it; or an
+    /// open id is empty.
     InvalidText,
-    /// What was given as Json is none (half a surrogate pair, as in "\ud800", is none either); or an event
-    /// for analytics has a value that is neither nothing nor an object which the service can read: at most
-    /// 127 levels, integers of at most 64 bits, numbers within the range of a double.
+    /// A value that was given as Json is not JSON; half a surrogate pair, as in "\ud800", is not JSON either.
+    /// Or the value of an event for analytics is given, but is not an object that the service can read: at
+    /// most 127 levels, integers of at most 64 bits, other numbers within the range of a double.
     InvalidJson,
-    /// The event id is empty, is no UTF-8 or has a zero character in it; or it begins with a capital A and
-    /// has no bar, or a module before the bar that is neither this reporter's nor "A759".
+    /// The event id is empty, is not UTF-8 or has a zero character in it. Or it begins with a capital A, but
+    /// has no bar, or the module before the bar is neither this reporter's module nor "A759".
     InvalidEventId,
-    /// A single quote in an open id or a suite version. No spelling of it is right for both the store and
-    /// analytics.
+    /// An open id or a suite version has a single quote in it. The store needs a quote written twice, and
+    /// analytics needs it written once, so no text would be right for both.
     QuoteInUser,
-    /// The service that listens runs for another user, whose store would get the report. See Options.
+    /// The service that listens runs for another user and would put the report into that user's store. See
+    /// Options.
     OtherUsersService,
     /// The system's send buffer is full.
     WouldBlock,
-    /// Anything else: no memory, no descriptor, a firewall.
+    /// Any other reason, such as no memory, no free descriptor or a firewall.
     SystemError,
 };
 
-/// The result's name, such as "NobodyListens". For a value that is none of the above, "Unknown".
+/// The result's name, such as "NobodyListens"; "Unknown" for a value that is not in the list.
 [[nodiscard]] HUBLINK_EXPORT const char* ToString(Result result) noexcept;
 
-/// A program of the suite that reports to analytics. The id is what stands before the bar in its event ids,
-/// and so begins with a capital A. The service keeps 64 bytes of the id and 256 of the others.
+/// A program of the suite that reports to analytics. Its event ids begin with the module's id and a bar, so
+/// the module's id begins with a capital A. The service keeps the first 64 bytes of the id, and the first 256
+/// bytes of the version and of the name.
 struct Module {
     std::string id = {};
     std::string version = {};
@@ -66,18 +70,20 @@ struct Module {
 };
 
 struct Options {
-    /// One service runs on a machine, for one user. Without this, a program of another user does not report
-    /// to it: its user's reports would end in a store that is not theirs. Known on Linux only; elsewhere as
-    /// if it were true.
+    /// A machine runs one service, for one user. By default, a program of another user does not report to it,
+    /// because the reports would end in a store that is not its user's: calls return OtherUsersService. Set
+    /// this to true to report all the same. Only on Linux the library can see whose service it is; on other
+    /// systems it always reports.
     bool allowOtherUsersService = false;
 };
 
-/// A text that is JSON. It is checked when it is sent.
+/// A text that is JSON. It is checked when the event is sent. It refers to the text and does not own it.
 struct Json {
     std::string_view text;
 };
 
-/// What there is to say about an event: nothing, a text, or JSON. Refers to the text and does not own it.
+/// The value of an event: nothing, a text, or JSON. It refers to the text and does not own it: the text must
+/// live until Reporter::Event has returned.
 class Value {
 public:
     enum class Kind { Nothing, Text, Json };
@@ -85,15 +91,15 @@ public:
     constexpr Value() noexcept = default;
     constexpr Value(std::nullopt_t) noexcept {}
     constexpr Value(std::string_view text) noexcept : m_kind(Kind::Text), m_text(text) {}
-    /// A null pointer is nothing.
+    /// A null pointer means no value.
     constexpr Value(const char* text) noexcept
         : m_kind(text == nullptr ? Kind::Nothing : Kind::Text),
           m_text(text == nullptr ? std::string_view() : std::string_view(text)) {}
     Value(const std::string& text) noexcept : m_kind(Kind::Text), m_text(text) {}
     constexpr Value(hublink::Json json) noexcept : m_kind(Kind::Json), m_text(json.text) {}
 
-    /// A number has no one text: hublink::Json{"1.5"}, or a text. Else 0 would be a null pointer, and so
-    /// nothing.
+    /// A number does not compile, because it can be written in several ways: give hublink::Json{"1.5"}, or a
+    /// text. Without this, a literal 0 would be a null pointer and so mean no value.
     template <typename Number, typename = std::enable_if_t<std::is_arithmetic_v<Number>>>
     Value(Number) = delete;
 
@@ -105,31 +111,34 @@ private:
     std::string_view m_text;
 };
 
-/// Sends events, each as one datagram over one socket of its own.
+/// Sends events, each as one datagram. A reporter has a socket of its own.
 ///
-/// Announcements: the service must know a module before its first event, and forgets module and user when it
-/// ends. The reporter announces its module before the module's first event, and the user that was set, and
-/// does it again when the service was found gone or was restarted. A restart that no event fell into is
-/// noticed within a second of events, by the service's socket in /proc/net/udp; where there is no such file,
-/// everything is announced again every three minutes.
+/// Announcements: the service must know a module before the module's first event. It forgets modules and user
+/// when it ends. The reporter announces its module before the module's first event, and it announces the user
+/// that was set. It announces both again before the next event after the service was gone or was restarted.
+/// When no event was sent between the service's end and its new start, the reporter finds the restart by the
+/// service's socket in /proc/net/udp, where it looks at most once a second; events of that second can get
+/// lost. On a system without that file, it announces everything again every three minutes.
 ///
-/// Threads: any thread, at any time. Threads wait for each other only while one of them hands a datagram to
-/// the system. There is no thread of the library's own.
+/// Threads: any thread may call at any time. Threads wait for each other only while one of them hands a
+/// datagram to the system or looks for the service's socket. The library starts no thread.
 ///
-/// Fork: safe in the child, which gets a socket of its own. A program that closes descriptors that it does
-/// not know, except between fork and exec, closes the reporter's, too; the reporter opens another one when it
-/// notices.
+/// Fork: a reporter may be used in the child, where it opens a socket of its own. Some programs close all
+/// descriptors that they do not know, and so the reporter's socket, too. The reporter opens another socket
+/// when a call shows that its own was closed.
 ///
-/// Failure: nothing throws, blocks or writes to the terminal. A reporter for which there was no memory
-/// answers every call with SystemError.
+/// Failure: no call throws, blocks or writes to the terminal. When there was no memory to make the reporter,
+/// Event and SetUser return SystemError.
 class Reporter {
 public:
     using Time = std::chrono::system_clock::time_point;
 
-    /// For the local store, and for the analytics module "A759", which is there from the start.
+    /// Makes a reporter for the local store, and for the analytics module "A759", which the service knows
+    /// from
+    /// its start.
     HUBLINK_EXPORT Reporter() noexcept;
 
-    /// For these and for a module of the program's own, which is copied.
+    /// Makes a reporter for the same, and for the program's own module. The module is copied.
     HUBLINK_EXPORT explicit Reporter(const Module& module, const Options& options = {}) noexcept;
 
     HUBLINK_EXPORT ~Reporter();
@@ -138,22 +147,26 @@ public:
 
     /// Reports that something happened.
     ///
-    /// `value`: for the store a text, which is stored byte for byte, or JSON of any kind, which is stored
-    /// without white space; for analytics nothing, or JSON of an object. Of that, the service sets the
-    /// members "openid" and "sys_version" itself.
-    /// `time`: when it happened, to the millisecond; without it, now. (Times of a few months of 1970, whose
-    /// milliseconds have ten digits and would be taken for seconds, are stored with a zero in front.)
-    /// `isDayReport`: whether it is a report about a day.
+    /// `value`: for the store nothing, a text, or JSON of any kind; a text is stored byte for byte, and JSON
+    /// without white space. For analytics nothing, or a JSON object, in which the service itself sets the
+    /// members "openid" and "sys_version".
+    /// `time`: when it happened, in milliseconds; without it, now. (The service takes a time of ten digits
+    /// for
+    /// seconds. So a time of ten digits in milliseconds, in some months of 1970, is sent and stored with a
+    /// zero in front.)
+    /// `isDayReport`: whether the event is a report about a day.
     HUBLINK_EXPORT Result Event(std::string_view eventId, Value value = {},
                                 std::optional<Time> time = std::nullopt, bool isDayReport = false) noexcept;
 
-    /// Tells who is signed in, and the version of the suite, which go with every report that comes after; of
-    /// all programs, since the service has one user. An empty version leaves the one that is known. It is
-    /// sent at once; what could not be sent for another reason than its own text is sent before the next
-    /// event.
+    /// Tells the service who is signed in, and the version of the suite. The service adds both to every later
+    /// report, also to those of other programs, because it knows one user only. With an empty version, the
+    /// service keeps the version that it knows. The message is sent at once. When a text in it cannot be sent
+    /// (InvalidText, QuoteInUser, TooLong), nothing changes. When the system does not take the message now,
+    /// it
+    /// is sent before the next event.
     HUBLINK_EXPORT Result SetUser(std::string_view openId, std::string_view suiteVersion = {}) noexcept;
 
-    /// How many calls of Event and SetUser ended so.
+    /// How many calls of Event and SetUser returned this result.
     [[nodiscard]] HUBLINK_EXPORT std::uint64_t Count(Result result) const noexcept;
 
 private:

@@ -9,11 +9,15 @@
 namespace hublink {
 namespace {
 
-/// How long events may get lost after a restart that none of them fell into. Asking costs 15 µs, and so 15
-/// millionths of the time.
+/// How often the reporter looks who listens, when events are sent. A service that was restarted between two
+/// events can lose the events of this time, because it does not know the module yet. A look takes 15 µs, so
+/// it
+/// uses 15 millionths of the time.
 constexpr std::chrono::seconds LOOK_INTERVAL{1};
 
-/// Where a restart cannot be seen: a user does not miss the events of so long, and a datagram is nothing.
+/// How often everything is announced again on a system where a restart cannot be seen. A restarted service
+/// can
+/// lose the events of this time, which is accepted; one datagram in this time is no load.
 constexpr std::chrono::minutes TELL_INTERVAL{3};
 
 Result ResultOf(Socket::Outcome outcome) {
@@ -61,7 +65,7 @@ Result Channel::SetUser(std::string datagram) noexcept {
     return Deliver({}, false);
 }
 
-/// A datagram, or only the announcements.
+/// Sends the announcements that are due, then the datagram unless it is empty.
 Result Channel::Deliver(std::string_view datagram, bool isOfModule) noexcept {
     if (isOfModule && m_module.isWritten != Result::Sent)
         return m_module.isWritten;
@@ -103,8 +107,8 @@ bool Channel::IsOthersService(Clock::time_point now) noexcept {
     return m_isOthers && !m_allowsOthers;
 }
 
-/// The system may not report a refusal: a flood can fill the buffer for such messages. So where no program
-/// was seen to listen, a second look decides.
+/// The system can fail to report a refusal, because a flood of datagrams can fill the buffer for such
+/// messages. So when the last look found no listener, we look again after the datagram was sent.
 bool Channel::IsNobodyThere() noexcept {
     if (!m_isServiceKnown)
         LookWhoListens(Clock::now());
@@ -134,7 +138,9 @@ void Channel::AnnounceAgain() noexcept {
     m_user.isDue = true;
 }
 
-/// The parent's socket would mix up whose datagram was refused.
+/// The child opens a socket of its own. With a shared socket, parent and child could each get the error of
+/// the
+/// other's datagram.
 void Channel::BeginInChild() noexcept {
     m_socket.Close();
 }

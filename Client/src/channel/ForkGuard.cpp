@@ -5,15 +5,17 @@
 namespace hublink {
 namespace {
 
-/// Guards the list and is taken before any guard's own lock. Both are never destroyed: a reporter may be
-/// static.
+/// Guards the list of all guards. A thread takes it before a guard's own lock. List and lock need no
+/// destructor, because a static reporter may use them at the program's end.
 std::mutex g_listMutex;
 ForkGuard* g_first = nullptr;
 
 } // namespace
 
-/// When the library is loaded, and not with the first guard, which a fork might fall into. Without memory for
-/// the handlers a child shares its parent's socket, which works, but mixes up their errors.
+/// The handlers are registered when the library is loaded. With the first guard would be too late: a fork in
+/// another thread could happen at that moment. Without memory for the handlers, a child shares its parent's
+/// socket, and each can get the error of the other's datagram; a lock that another thread held at the fork
+/// stays locked in the child.
 const int ForkGuard::HANDLERS = ::pthread_atfork(&BeforeFork, &AfterForkInParent, &AfterForkInChild);
 
 void ForkGuard::Enlist() noexcept {

@@ -16,11 +16,13 @@
 namespace hublink {
 namespace {
 
-/// Linux; of the calling thread's network, and of the process's where the first is not there.
+/// Linux's tables of UDP sockets: of the calling thread's network namespace, and where that file does not
+/// exist, of the process's.
 constexpr std::array TABLES = {"/proc/thread-self/net/udp", "/proc/net/udp"};
 constexpr std::size_t LINE_BYTES = 128;
 
-/// An address and a port as the table writes them: the address's bytes as one number of this machine.
+/// An address and the service's port as the table writes them: the four bytes of the address as one number in
+/// this machine's byte order.
 class PrintedAddress {
 public:
     explicit PrintedAddress(in_addr_t host) {
@@ -35,7 +37,7 @@ private:
     std::size_t m_length = 0;
 };
 
-/// The next word of a line, which is moved behind it.
+/// Returns the next word of the line and removes it from the line.
 std::string_view TakeWord(std::string_view& line) {
     const auto begin = line.find_first_not_of(' ');
     if (begin == std::string_view::npos)
@@ -53,7 +55,7 @@ Number NumberOf(std::string_view word) {
     return number;
 }
 
-/// Finds the listener in the table's lines, one after the other.
+/// Finds the listener in the table's lines; TakeLine gets them one after the other.
 class Search {
 public:
     void TakeLine(std::string_view line) {
@@ -67,7 +69,7 @@ public:
         const auto owner = NumberOf<uid_t>(TakeWord(line));
         TakeWord(line); // timeout
         const auto socket = NumberOf<std::uint64_t>(TakeWord(line));
-        if (isExact && m_isExact && owner == ::geteuid()) // of several sockets, one of another user's counts
+        if (isExact && m_isExact && owner == ::geteuid()) // of several exact sockets, another user's counts
             return;
         m_isExact = isExact;
         m_listener = {true, owner, socket};
@@ -78,14 +80,14 @@ public:
 private:
     const PrintedAddress m_loopback{INADDR_LOOPBACK};
     const PrintedAddress m_anyAddress{INADDR_ANY};
-    bool m_isExact = false; ///< What was found is bound to this very address, and so gets what is sent there.
+    bool m_isExact = false; ///< The socket found is bound to 127.0.0.1 itself, so it gets our datagrams.
     Listener m_listener;
 };
 
-/// A descriptor that is closed at the end.
+/// A file that is open for reading. The destructor closes it.
 class File {
 public:
-    /// The first of them that can be opened.
+    /// Opens the first of the paths that can be opened.
     template <typename Paths>
     explicit File(const Paths& paths) {
         for (const char* path : paths)
@@ -112,7 +114,8 @@ private:
     int m_descriptor = -1;
 };
 
-/// Hands over the complete lines in the first `bytes` of the buffer and moves what is left to its begin.
+/// Hands the complete lines in the first `bytes` of the buffer to `search`, and moves the incomplete rest to
+/// the buffer's start. Returns the size of that rest.
 std::size_t TakeLines(char* buffer, std::size_t bytes, Search& search) {
     std::string_view rest(buffer, bytes);
     for (auto end = rest.find('\n'); end != std::string_view::npos; end = rest.find('\n')) {
@@ -139,7 +142,7 @@ std::optional<Listener> FindListener() noexcept {
         if (count == 0)
             return search.Found();
         kept = TakeLines(buffer.data(), kept + static_cast<std::size_t>(count), search);
-        if (kept == buffer.size()) // a line of 4 KiB is none of this table
+        if (kept == buffer.size()) // no line of this table has 4 KiB
             return std::nullopt;
     }
 }

@@ -19,7 +19,8 @@ constexpr int SEND_FLAGS = MSG_NOSIGNAL | MSG_DONTWAIT;
 constexpr int SEND_FLAGS = MSG_DONTWAIT;
 #endif
 
-/// Four of the longest reports and some. The default of macOS, 9216 bytes, is less than one.
+/// Room for more than four of the longest reports. The default of macOS, 9216 bytes, is less than one report
+/// can have.
 constexpr int LEAST_SEND_BUFFER_BYTES = 65536;
 
 int NewSocket() {
@@ -43,8 +44,8 @@ bool Connect(int descriptor) {
     return ::connect(descriptor, reinterpret_cast<const sockaddr*>(&service), sizeof service) == 0;
 }
 
-/// What an open socket that is ours answers to no call: the program closed the descriptor, and may use it for
-/// another file.
+/// Whether the error is one that a connected socket of ours never returns. Then the program has closed our
+/// descriptor, and its number may belong to another file of the program now.
 bool IsNotOurs(int error) {
     return error == EBADF || error == ENOTSOCK || error == EDESTADDRREQ || error == ENOTCONN;
 }
@@ -80,14 +81,14 @@ void Socket::Close() noexcept {
     m_descriptor = -1;
 }
 
-/// Asking takes the error from the socket.
+/// Returns the socket's pending error, 0 when there is none. Reading the error also clears it.
 int Socket::TakeError() const noexcept {
     int error = 0;
     socklen_t length = sizeof error;
     return ::getsockopt(m_descriptor, SOL_SOCKET, SO_ERROR, &error, &length) == 0 ? error : errno;
 }
 
-/// 0, or the error.
+/// Returns 0, or the error number.
 int Socket::SendOnce(std::string_view datagram) const noexcept {
     while (::send(m_descriptor, datagram.data(), datagram.size(), SEND_FLAGS) < 0)
         if (errno != EINTR)
@@ -100,14 +101,14 @@ Socket::Outcome Socket::Send(std::string_view datagram) noexcept {
         return Outcome::Failed;
     int error = SendOnce(datagram);
     if (IsNotOurs(error)) {
-        m_descriptor = -1; // not closed: it may be another file of the program by now
+        m_descriptor = -1; // we do not close it: the number may belong to another file of the program now
         if (!Open())
             return Outcome::Failed;
         error = SendOnce(datagram);
     }
     if (error != 0)
         return OutcomeOf(error);
-    switch (TakeError()) { // over loopback, Linux has told of a refusal by now
+    switch (TakeError()) { // over loopback, Linux has set the error of a refusal before send returns
     case 0:
         return Outcome::Sent;
     case ECONNREFUSED:

@@ -4,7 +4,8 @@
 
 namespace hublink {
 
-/// A socket that is connected to the service's port, so that the system tells when no program has bound it.
+/// A socket that is connected to the service's port. Only for a connected socket the system reports that no
+/// program has bound the port.
 ///
 /// Threads: one at a time.
 class Socket {
@@ -12,8 +13,8 @@ public:
     enum class Outcome {
         Sent,
         Refused,        ///< No program listens: this datagram is lost.
-        RefusedEarlier, ///< The system told it now of an earlier datagram. This one was not sent.
-        Full,           ///< The send buffer is.
+        RefusedEarlier, ///< The system reports the refusal of an earlier datagram; it did not send this one.
+        Full,           ///< The send buffer is full.
         TooLong,
         Failed,
     };
@@ -23,7 +24,7 @@ public:
     Socket(const Socket&) = delete;
     Socket& operator=(const Socket&) = delete;
 
-    /// Sends one datagram, on a new socket where there is none. Never blocks.
+    /// Sends one datagram. Opens the socket first when it is not open. Never blocks.
     Outcome Send(std::string_view datagram) noexcept;
 
     void Close() noexcept;

@@ -6,11 +6,11 @@
 
 namespace hublink::wire {
 
-/// What the service receives a datagram into; it cuts what is longer.
+/// The room that the service has for one datagram. It cuts off what is longer.
 inline constexpr std::size_t MAX_DATAGRAM_BYTES = 10240;
 
-/// A text that is put together in memory of the caller's, without an allocation. What no longer fits is
-/// dropped, and remembered: a caller appends everything and asks once.
+/// Puts a text together in the caller's memory, without an allocation. A piece that does not fit is dropped,
+/// and the buffer remembers it: a caller appends everything and asks IsTooShort once, at the end.
 class Buffer {
 public:
     Buffer(char* begin, std::size_t capacity) : m_begin(begin), m_at(begin), m_end(begin + capacity) {}
@@ -20,7 +20,7 @@ public:
             m_isTooShort = true;
             return;
         }
-        if (!text.empty()) // whose data may be a null pointer
+        if (!text.empty()) // an empty text's data may be a null pointer
             std::memcpy(m_at, text.data(), text.size());
         m_at += text.size();
     }

@@ -6,8 +6,8 @@
 
 namespace hublink::wire {
 
-/// Some bytes, each looked up in one step. The standard library's find_first_of searches the whole set for
-/// each byte, which made JSON cost an event as much as the datagram does.
+/// A set of bytes; looking one up is a single step. The standard library's find_first_of searches the whole
+/// set for each byte: with it, an event's JSON took as long as its datagram.
 class ByteSet {
 public:
     constexpr explicit ByteSet(std::string_view bytes) {
@@ -25,7 +25,9 @@ public:
 
     constexpr bool Has(char byte) const { return m_has[static_cast<unsigned char>(byte)]; }
 
-    /// Where the first one stands in the text from there on; the text's size when there is none.
+    /// The position of the first byte of the set in the text, at or after `from`. The text's size when there
+    /// is
+    /// no such byte.
     std::size_t FindIn(std::string_view text, std::size_t from = 0) const {
         while (from < text.size() && !Has(text[from]))
             ++from;

@@ -23,7 +23,7 @@ int HexDigit(char c) {
     return lower >= 'a' && lower <= 'f' ? lower - 'a' + 10 : -1;
 }
 
-/// The number of an escape such as \u00e4 at the start of the text; -1 when there is none.
+/// The number in an escape such as \u00e4 at the start of the text; -1 when the text does not start with one.
 int UnitAt(std::string_view text) {
     if (text.size() < UNIT_LENGTH || text[0] != '\\' || text[1] != 'u')
         return -1;
@@ -37,8 +37,8 @@ int UnitAt(std::string_view text) {
     return unit;
 }
 
-/// The length of the escape at the start of the text, of both halves of a surrogate pair; 0 when there is
-/// none.
+/// The length of the escape at the start of the text; 0 when there is no valid escape. A surrogate pair, two
+/// escapes, counts as one.
 std::size_t EscapeLength(std::string_view text) {
     constexpr std::string_view SIMPLE = "\"\\/bfnrt";
     if (text.size() > 1 && SIMPLE.find(text[1]) != std::string_view::npos)
@@ -52,7 +52,7 @@ std::size_t EscapeLength(std::string_view text) {
     return second >= 0xdc00 && second <= 0xdfff ? 2 * UNIT_LENGTH : 0;
 }
 
-/// The length of the string at the start of the text, quotes included; 0 when there is none.
+/// The length of the JSON string at the start of the text, with its quotation marks; 0 when it is not valid.
 std::size_t StringLength(std::string_view text) {
     for (std::size_t at = STRING_STOPS.FindIn(text, 1); at < text.size();
          at = STRING_STOPS.FindIn(text, at)) {
@@ -66,7 +66,7 @@ std::size_t StringLength(std::string_view text) {
     return 0;
 }
 
-/// A bit for each level. Only those that are used cost anything, which is why it is no std::bitset.
+/// One bit for each level. Only the words in use are written. A std::bitset would clear all of them first.
 // NOLINTNEXTLINE(cppcoreguidelines-pro-type-member-init): a word is written when its first level is
 class Levels {
 public:
@@ -87,10 +87,10 @@ private:
     std::array<std::uint64_t, MAX_LEVELS / WORD_BITS> m_words;
 };
 
-/// One pass over a text, which does not recurse however deep its levels are.
+/// Reads a text in one pass. It does not recurse, so deep nesting cannot exhaust the stack.
 class Reader {
 public:
-    // NOLINTNEXTLINE(cppcoreguidelines-pro-type-member-init): the levels' words, as above
+    // NOLINTNEXTLINE(cppcoreguidelines-pro-type-member-init): m_isObject, for the reason given at Levels
     explicit Reader(std::string_view text) : m_rest(text) {}
 
     JsonFacts Read() {
@@ -132,7 +132,7 @@ private:
 
     bool TakeKey() { return Next() == '"' && Take(StringLength(m_rest)) && TakeIf(':'); }
 
-    /// A scalar, or the beginning of an object or array with its first key.
+    /// Takes a scalar, or the bracket that opens an object or an array.
     bool TakeValue() {
         switch (Next()) {
         case '{':
@@ -166,7 +166,7 @@ private:
         return Take(1);
     }
 
-    /// In the innermost level: its end, or its next value.
+    /// Takes the end of the innermost level, or its next value.
     bool Continue() {
         const bool isObject = m_isObject[m_open - 1];
         const bool isFirst = m_isBegun;
@@ -185,8 +185,8 @@ private:
     bool m_isBegun = false; ///< The innermost level has no value yet.
 };
 
-/// Hands the parts of a JSON text to `take`, without white space: each string, quotes included, and what
-/// stands between.
+/// Hands the parts of a JSON text to `take`, without white space: each string with its quotation marks, and
+/// each piece between strings.
 template <typename Take>
 void ForEachPart(std::string_view json, Take take) {
     while (!json.empty()) {
@@ -200,7 +200,7 @@ void ForEachPart(std::string_view json, Take take) {
     }
 }
 
-/// A part with each quote written twice, whether it stands there as itself or as an escape.
+/// Appends a part with each single quote written twice, also a quote that is written as an escape.
 void AppendQuotesDoubled(Buffer& buffer, std::string_view part) {
     while (!part.empty()) {
         const std::size_t at = QUOTES_AND_ESCAPES.FindIn(part);
@@ -222,7 +222,7 @@ JsonFacts ReadJson(std::string_view text) {
 }
 
 void AppendJson(Buffer& buffer, std::string_view json, Quotes quotes, bool isCompact) {
-    // What programs write has no white space and mostly no quote: then it is copied as it is.
+    // Programs mostly write JSON without white space and without single quotes. It is copied as it is.
     const auto hasNone = [json](char c) { return json.find(c) == std::string_view::npos; };
     if (isCompact && (quotes == Quotes::AsTheyAre || (hasNone('\'') && hasNone('\\'))))
         return buffer.Append(json);

@@ -9,28 +9,33 @@
 
 namespace hublink::wire {
 
-/// What a text is as JSON.
+/// What ReadJson finds out about a text. Unless `isJson`, the other facts are those of the part that was
+/// read.
 struct JsonFacts {
     bool isJson = false;
     bool isObject = false;
-    Fate fate = Fate::Exact; ///< Of the number that fares worst.
-    std::size_t levels = 0;  ///< Of objects and arrays within each other.
-    bool isCompact = true;   ///< There is no white space between its parts.
+    Fate fate = Fate::Exact; ///< The worst fate of all its numbers.
+    std::size_t levels = 0;  ///< How deep its objects and arrays are nested.
+    bool isCompact = true;   ///< It has no white space outside its strings.
 };
 
-/// More levels make a datagram that is too long; what is nested deeper is not read to its end, and counts as
-/// no JSON.
+/// A text with more levels than this is too long for a datagram. ReadJson stops there and says that the text
+/// is
+/// not JSON, with this number of levels.
 inline constexpr std::size_t MAX_LEVELS = MAX_DATAGRAM_BYTES;
 
-/// Reads a valid text (IsText) by JSON's grammar; an escape must be a whole character. Does not recurse.
+/// Reads a valid text (IsText) by JSON's grammar. An escape must be a whole character: half a surrogate pair
+/// is
+/// an error. Does not recurse.
 JsonFacts ReadJson(std::string_view text);
 
-/// Appends JSON (ReadJson) as a JSON value, without white space. With doubled quotes, those behind an escape
-/// too.
-/// `isCompact`: there is no white space, as JsonFacts says.
+/// Appends a text that ReadJson found to be JSON, as a JSON value and without white space. Quotes::Doubled
+/// also
+/// doubles a quote that is written as an escape.
+/// `isCompact`: JsonFacts::isCompact of the text; false when it is not known.
 void AppendJson(Buffer& buffer, std::string_view json, Quotes quotes, bool isCompact);
 
-/// Appends JSON, without white space, as the inside of a JSON string.
+/// Appends a text that ReadJson found to be JSON, without white space, as the inside of a JSON string.
 void AppendJsonEscaped(Buffer& buffer, std::string_view json, Quotes quotes);
 
 } // namespace hublink::wire

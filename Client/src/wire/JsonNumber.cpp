@@ -28,14 +28,15 @@ bool FitsIn64Bits(std::string_view digits, bool isNegative) {
 }
 
 Fate FateOfInteger(std::string_view number) {
-    if (number == "-0") // an integer has no negative zero
+    if (number == "-0") // the service keeps it as the integer 0, which has no sign
         return Fate::Rounded;
     const bool isNegative = number.front() == '-';
     return FitsIn64Bits(number.substr(isNegative ? 1 : 0), isNegative) ? Fate::Exact : Fate::Lost;
 }
 
-/// A number with a fraction or an exponent: its digits from the first to the last that are not zero, and the
-/// power of ten of the first.
+/// A number with a fraction or an exponent, taken apart: its digits from the first that is not zero to the
+/// last
+/// that is not zero, and the power of ten of the first of these digits. The sign is dropped.
 class Decimal {
 public:
     explicit Decimal(std::string_view number) {
@@ -51,7 +52,7 @@ public:
     std::size_t Length() const { return m_length; }
     std::int64_t Power() const { return m_power; }
 
-    /// The first of them, at most MOST.
+    /// The first digits, at most MOST of them.
     std::string_view Digits() const { return {m_digits, std::min(m_length, MOST)}; }
 
 private:
@@ -71,7 +72,7 @@ private:
     }
 
     static std::int64_t Exponent(std::string_view text) {
-        constexpr std::int64_t ENOUGH = 1'000'000'000; // more than any text has digits
+        constexpr std::int64_t ENOUGH = 1'000'000'000; // no text here has so many digits
         std::int64_t exponent = 0;
         for (const char c : text)
             if (IsDigit(c))
@@ -85,11 +86,12 @@ private:
 };
 
 Fate FateOfDecimal(const Decimal& decimal) {
-    // A double keeps any number of so many digits, but for those next to its bounds.
+    // A double keeps every number of 15 digits whose power of ten is not close to the double's limits.
     constexpr std::size_t DIGITS_OF_DOUBLE = 15;
     constexpr std::int64_t SAFE_POWER = 300;
     constexpr std::int64_t LARGEST_POWER = 308;
-    constexpr std::string_view ROUNDS_TO_INFINITY = "17976931348623158079"; // e308, and what follows
+    // From these digits on, a number of the largest power is infinity as a double.
+    constexpr std::string_view ROUNDS_TO_INFINITY = "17976931348623158079";
     if (decimal.IsZero())
         return Fate::Exact;
     if (decimal.Power() > LARGEST_POWER ||

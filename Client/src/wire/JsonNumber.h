@@ -4,19 +4,20 @@
 
 namespace hublink::wire {
 
-/// What becomes of a number on its way through the service, which reads it and prints it again: an integer of
-/// 64 bits digit for digit, anything else as a double.
+/// What happens to a number in the service, which reads it and prints it again. The service keeps an integer
+/// of
+/// 64 bits digit for digit, and any other number as a double.
 enum class Fate {
-    Exact,   ///< It arrives as the same number, digit for digit.
-    Rounded, ///< As the double that is nearest to it, as most readers of JSON would take it anyway.
-    Lost,    ///< An integer that needs more than 64 bits, or a number beyond the doubles.
+    Exact,   ///< It stays the same number, digit for digit.
+    Rounded, ///< It becomes the nearest double, which is what most JSON readers make of it anyway.
+    Lost,    ///< The service cannot read it: an integer of more than 64 bits, or too large for a double.
 };
 
-/// The number's fate. Decided by its digits alone: the C library's conversion would depend on the program's
-/// locale.
+/// The number's fate. Only its digits are looked at, because the C library's conversion depends on the
+/// program's locale.
 Fate FateOf(std::string_view number);
 
-/// How long the number at the start of `text` is by JSON's grammar; 0 when there is none.
+/// The length of the number at the start of `text` by JSON's grammar; 0 when there is none.
 std::size_t NumberLength(std::string_view text);
 
 } // namespace hublink::wire

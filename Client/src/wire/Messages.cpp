@@ -25,8 +25,10 @@ void AppendValue(Buffer& buffer, const Report& report) {
     }
 }
 
-/// The inside of a JSON string in a control message. The service takes any text with these letters in it for
-/// a report; with one of them escaped, they read the same.
+/// Appends the inside of a JSON string of a control message. The service takes every datagram with the
+/// letters
+/// eventID in it for a report. So one of the letters is written as an escape, which a JSON reader turns back
+/// into the letter.
 void AppendMasked(Buffer& buffer, std::string_view text) {
     constexpr std::string_view MARK = "eventID";
     constexpr std::string_view MASKED = "event\\u0049D";

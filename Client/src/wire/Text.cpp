@@ -13,7 +13,7 @@ constexpr unsigned char Byte(char c) {
     return static_cast<unsigned char>(c);
 }
 
-/// How many of the first bytes are ASCII without a zero byte; counts eight at a time.
+/// The number of bytes at the start that are ASCII and not zero. Checks eight bytes at a time.
 std::size_t PlainLength(std::string_view text) {
     constexpr std::uint64_t HIGH_BITS = 0x8080808080808080;
     constexpr std::uint64_t LOW_BITS = 0x0101010101010101;
@@ -32,7 +32,7 @@ bool IsContinuation(std::string_view text, std::size_t at) {
     return at < text.size() && (Byte(text[at]) & 0xc0) == 0x80;
 }
 
-/// The length of the character of several bytes at the start; 0 when there is none.
+/// The length of the character of two to four bytes at the start of the text; 0 when it is not valid.
 std::size_t CharacterLength(std::string_view text) {
     const unsigned lead = Byte(text[0]);
     if (!IsContinuation(text, 1))
@@ -42,14 +42,14 @@ std::size_t CharacterLength(std::string_view text) {
         return 2;
     if (!IsContinuation(text, 2))
         return 0;
-    if (lead >= 0xe0 && lead <= 0xef) // not overlong, no surrogate
+    if (lead >= 0xe0 && lead <= 0xef) // refuses overlong forms and surrogates
         return (lead == 0xe0 && second < 0xa0) || (lead == 0xed && second >= 0xa0) ? 0 : 3;
-    if (lead >= 0xf0 && lead <= 0xf4 && IsContinuation(text, 3)) // not overlong, not beyond U+10FFFF
+    if (lead >= 0xf0 && lead <= 0xf4 && IsContinuation(text, 3)) // refuses overlong forms and over U+10FFFF
         return (lead == 0xf0 && second < 0x90) || (lead == 0xf4 && second >= 0x90) ? 0 : 4;
     return 0;
 }
 
-/// What stands in a JSON string of ours as something else.
+/// The characters that AppendEscaped may write in another form.
 constexpr ByteSet SPECIAL = ByteSet("\"\\'").AndControls();
 
 void AppendControl(Buffer& buffer, char c) {
