@@ -32,7 +32,7 @@ FileFailure MakeDirectory(const std::string& path) {
 FileFailure LiveFile::Open(const std::string& path) {
     Close();
     // O_NOFOLLOW: another program may plant a link under the log's name. We must not append to its target.
-    // O_NONBLOCK: the open of a pipe or a device must not wait. Examine refuses both; regular files ignore it.
+    // O_NONBLOCK: opening a pipe or a device must not wait. Examine refuses both. Regular files ignore it.
     // O_RDWR: EndsInHalfLine reads the last byte.
     m_descriptor =
         open(path.c_str(), O_RDWR | O_APPEND | O_CREAT | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK | O_NOCTTY,

@@ -28,7 +28,7 @@ int NumberIn(guard::Statement& statement) {
 
 } // namespace
 
-/// One operation's time inside: the lock, and which thread has it.
+/// The time that one operation spends inside the object. It holds the lock and remembers the thread.
 class Database::Entry {
 public:
     explicit Entry(Database& database) : m_lock(database.m_mutex), m_database(database) {
@@ -46,7 +46,8 @@ private:
 
 bool Database::Open(const std::string& path) {
     const Entry entry(*this);
-    // What the old file did not take goes to the new one: it was accepted, and this is the store from now on.
+    // When the old file does not take the kept statements, they go to the new file: they were accepted, and
+    // the new file is the store from now on.
     KeepError([&] { m_group.Commit(); });
     return KeepError([&] {
         m_file.Set(path);
@@ -56,7 +57,8 @@ bool Database::Open(const std::string& path) {
 
 bool Database::CreateTable(const std::string& sql) {
     const Entry entry(*this);
-    // Kept statements go first, but may wait for this very table.
+    // The kept statements come first. Their commit may fail because they need this very table; then they stay
+    // kept.
     KeepError([&] { m_group.Commit(); });
     return KeepError([&] {
         m_file.Run([&](file::Connection& connection) {
@@ -113,10 +115,11 @@ std::string Database::GetLastErrorMsg() {
 }
 
 bool Database::Finish() {
-    // First: a thread that runs statement after statement would hardly let us have the object.
+    // Set before the lock is taken. It ends the operations of a thread that runs one statement after the
+    // other; otherwise that thread would hardly ever leave the lock to us.
     m_isFinished = true;
     if (m_inside == std::this_thread::get_id() || m_committer.IsThisThread())
-        return false; // the thread that crashed in here is not coming back
+        return false; // this thread crashed in here, so its operation never ends
     const bool isOwnersThread =
         m_lastInside == std::thread::id() || m_lastInside == std::this_thread::get_id();
     if (!LockBefore(group::Clock::now() + m_settings.group.exitWait))
@@ -136,7 +139,7 @@ bool Database::RunAfterCommit(const file::LiveFile::Operation& operation) {
     });
 }
 
-/// The one place where failures become texts.
+/// The one place where failures become the text of GetLastErrorMsg.
 template <typename Action>
 bool Database::KeepError(Action action) {
     try {
@@ -161,11 +164,11 @@ void Database::Tell(const std::exception& error) noexcept {
 }
 
 void Database::TellNoMemory() noexcept {
-    m_lastError = "out of memory"; // short enough to need none itself
+    m_lastError = "out of memory"; // so short that it needs no memory itself
 }
 
-/// By looking again and again: a mutex that can be waited for with a deadline is a slower one, and this is
-/// once in an object's life.
+/// Tries to lock again and again. A mutex that can be waited for with a deadline is slower, and this runs
+/// only once in an object's life.
 bool Database::LockBefore(group::Clock::time_point deadline) {
     while (!m_mutex.try_lock()) {
         if (group::Clock::now() > deadline)

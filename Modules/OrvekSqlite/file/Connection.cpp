@@ -16,7 +16,7 @@ namespace fs = std::filesystem;
 
 constexpr auto PRIVATE = fs::perms::owner_read | fs::perms::owner_write;
 
-/// Gives the file this mode; one of another owner stays as it is, as that owner decides.
+/// Gives the file this mode. A file of another owner keeps its mode, because that owner decides about it.
 void SetMode(const fs::path& path, fs::perms mode) {
     std::error_code ignored;
     const auto status = fs::status(path, ignored);
@@ -29,7 +29,7 @@ fs::perms ModeOf(const fs::path& path) {
     return fs::status(path, ignored).permissions();
 }
 
-/// What SQLite would read or play back, and another user could have put there, is not opened.
+/// Refuses files that SQLite would read or play back and that another user could have put there.
 void RequireOurFiles(const std::string& path) {
     try {
         Sqlite::RequireOurFiles(path);
@@ -38,25 +38,25 @@ void RequireOurFiles(const std::string& path) {
     }
 }
 
-/// Takes the right to read the file away from everybody but its owner, before SQLite first looks at its mode:
-/// SQLite gives the side files that it makes the mode of the database, under any umask of the process.
+/// Takes all rights to the file away from other users. This must come before SQLite first looks at the file's
+/// mode: SQLite gives that mode to the side files that it makes, whatever the umask of the process is.
 const std::string& MadePrivate(const std::string& path) {
     RequireOurFiles(path);
     SetMode(path, ModeOf(path) & PRIVATE);
     return path;
 }
 
-/// Gives the side files that are there already the database's mode, before SQLite opens them. They may be too
-/// wide, made by another process before the database was private, or too narrow, made while the database was
-/// read-only. Named by SQLite, which resolved symbolic links first.
+/// Gives side files that exist already the mode of the database, before SQLite opens them. Their mode may be
+/// too wide, when another process made them before the database was private. It may be too narrow, when they
+/// were made while the database was read-only. The path comes from SQLite, which has resolved symbolic links.
 void AlignSideFiles(sqlite3* connection) {
     const std::string file = sqlite3_db_filename(connection, "main");
     for (const auto* suffix : Sqlite::SIDE_FILE_SUFFIXES)
         SetMode(file + suffix, ModeOf(file));
 }
 
-/// The schema is a text from outside: it may not call functions that reach outside the database, and only
-/// CREATE and DROP may change it. A text in double quotes is a name, never a literal.
+/// The schema comes from outside. It may not call functions that reach outside the database, and only CREATE
+/// and DROP may change it. A text in double quotes is a name, never a literal.
 void Harden(sqlite3* connection) {
     sqlite3_db_config(connection, SQLITE_DBCONFIG_DEFENSIVE, 1, nullptr);
     sqlite3_db_config(connection, SQLITE_DBCONFIG_TRUSTED_SCHEMA, 0, nullptr);
@@ -64,7 +64,7 @@ void Harden(sqlite3* connection) {
     sqlite3_db_config(connection, SQLITE_DBCONFIG_DQS_DDL, 0, nullptr);
 }
 
-/// The library's own mutexes are left out: one thread at a time is the plug-in's rule.
+/// SQLite's own mutexes are switched off, because the plug-in lets in one thread at a time.
 constexpr int OPEN_FLAGS = SQLITE_OPEN_READWRITE | SQLITE_OPEN_NOMUTEX;
 
 } // namespace
@@ -77,25 +77,26 @@ Connection::Connection(const std::string& path, const Settings& settings)
     m_guard.Install(connection, settings.limits);
     Harden(connection);
     AlignSideFiles(connection);
-    // The first statement that reads the file: what is no database is found out here.
+    // This statement is the first one that reads the file, so it fails when the file is no database.
     m_database.exec("pragma journal_mode = wal");
     m_database.exec("pragma synchronous = normal");
-    // Checkpoints stay SQLite's: one in a thousand pages, which is some 25,000 rows and 25 ms of waiting for
-    // the disk, within the call of the statement whose commit is due. Ten times as many pages saved 3 % of
-    // the thread's time, and cost 40 MB of disk.
+    // SQLite does the checkpoints itself: one for every thousand pages, which are some 25,000 rows. A
+    // checkpoint waits 25 ms for the disk, in the call of the statement that leads to a commit. A checkpoint
+    // for every ten thousand pages saved 3 % of the thread's time, but took 40 MB of disk.
     m_database.exec("pragma journal_size_limit = " + std::to_string(settings.journalBytes));
     m_sideFiles.emplace(sqlite3_db_filename(connection, "main"));
 }
 
-/// SQLite checkpoints on closing, unless the file has lost its name. Then the write-ahead log keeps its own
-/// name and its rows, and SQLite would read the next database at that path through it and damage that
-/// database. Emptying the log into the file that it belongs to keeps both databases whole. A file that kept
-/// its name and was damaged gets its rows, too, for the same reason.
+/// SQLite does a checkpoint when it closes a file, unless the file has lost its name. Without the checkpoint,
+/// the write-ahead log keeps its name and its rows. SQLite would then read the next database at that path
+/// through this log, and damage that database. So we empty the log into the file that it belongs to, and both
+/// databases stay whole. For the same reason, SQLite's own checkpoint also empties the log into a damaged
+/// file that kept its name.
 Connection::~Connection() {
     RollBack();
     if (!HasLostItsName())
         return;
-    sqlite3_busy_timeout(m_database.getHandle(), 0); // a reader that stays is no reason to wait here
+    sqlite3_busy_timeout(m_database.getHandle(), 0); // do not wait here: a reader may stay for long
     sqlite3_wal_checkpoint_v2(m_database.getHandle(), "main", SQLITE_CHECKPOINT_TRUNCATE, nullptr, nullptr);
 }
 
@@ -110,7 +111,7 @@ bool Connection::IsInPlace() {
 
 Connection::Rescue Connection::RescueRows() noexcept {
     RollBack();
-    if (HasLostItsName() || m_sideFiles->AreInPlace()) // the destructor knows what to do
+    if (HasLostItsName() || m_sideFiles->AreInPlace()) // the destructor handles both cases
         return Rescue::NotNeeded;
     return Sqlite::RescueDeletedLog(m_database.getHandle(), *m_sideFiles) ? Rescue::Done : Rescue::Failed;
 }
@@ -126,8 +127,8 @@ bool Connection::HasLostItsName() {
     return moved != 0;
 }
 
-/// Read through SQLite's own handle of the file: opening the file a second time and closing it would drop
-/// this process's POSIX locks on it, SQLite's among them.
+/// Reads through SQLite's own handle of the file. If we opened the file a second time and closed it, this
+/// process would lose its POSIX locks on the file, SQLite's among them.
 bool Connection::HasDatabaseHeader() {
     static constexpr std::string_view MAGIC("SQLite format 3\0", 16);
     sqlite3_file* file = nullptr;

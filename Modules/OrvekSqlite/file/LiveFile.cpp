@@ -10,20 +10,22 @@
 namespace OrvekSqlite::file {
 namespace {
 
-/// Errors of the open file, and not of the statement. To look at the path again may be the remedy.
+/// Whether the error is about the open file and not about the statement. Opening the path again may help
+/// then.
 bool IsAboutTheFile(const SQLite::Exception& error) {
     const auto kind = Sqlite::KindOf(error.getErrorCode());
     return kind == Sqlite::ErrorKind::Reopen || kind == Sqlite::ErrorKind::Damage;
 }
 
-/// A file may be replaced again while it is opened anew, by a busy script. One that is replaced each time is
-/// no store.
+/// How often the file is opened for one operation. A busy script may replace the file again while it is being
+/// opened. A file that is replaced each time cannot be used.
 constexpr int MAX_ATTEMPTS = 3;
 
 constexpr std::size_t PATH_ROOM_BYTES = 4096; ///< The longest path that the system takes.
 
-/// A later change of the working directory must not lead to another file, and no name is special to SQLite
-/// (":memory:") once it starts with a slash. An empty path stays empty.
+/// A later change of the working directory must not lead to another file, so the path is made absolute. A
+/// name that starts with a slash is also never special to SQLite, as ":memory:" is. An empty path stays
+/// empty.
 std::string AsAbsolute(const std::string& path) {
     std::error_code error;
     const auto absolute = std::filesystem::absolute(path, error);
@@ -33,19 +35,20 @@ std::string AsAbsolute(const std::string& path) {
 } // namespace
 
 LiveFile::LiveFile(const Settings& settings) : m_settings(settings) {
-    // The path comes once, when the program begins: no memory for it then must not cost every row until a
-    // restart.
+    // The path is set once, when the program begins. Without memory for it at that moment, every row would be
+    // lost until a restart. So its memory is reserved here.
     m_path.reserve(PATH_ROOM_BYTES);
 }
 
 void LiveFile::Set(const std::string& path) {
     LetGo();
-    m_path = path; // for which there is room
+    m_path = path; // the constructor has reserved the room
     const std::string absolute = AsAbsolute(path);
-    m_path = absolute; // copied, so that the room stays
+    m_path = absolute; // copied and not moved, so that the reserved room stays
 }
 
-/// A connection that was opened for this very operation and fails has nothing newer to offer.
+/// When a connection that was opened for this very operation fails, the error goes to the caller. A newer
+/// connection would not help.
 void LiveFile::Run(const Operation& operation) {
     for (int attempt = 0; attempt < MAX_ATTEMPTS; ++attempt) {
         const bool isNew = !m_connection;
@@ -57,7 +60,8 @@ void LiveFile::Run(const Operation& operation) {
             if ((wasInTransaction && m_connection->InTransaction()) || m_connection->IsInPlace())
                 return;
             const bool isCommitted = !m_connection->InTransaction();
-            if (LetGo() && isCommitted) // run again, its rows would be there twice
+            // When the committed rows are safe, running the operation again would store them twice.
+            if (LetGo() && isCommitted)
                 return;
         } catch (const SQLite::Exception& error) {
             if (!IsAboutTheFile(error) && m_connection->IsInPlace())
@@ -70,7 +74,8 @@ void LiveFile::Run(const Operation& operation) {
     throw SQLite::Exception("the database file is being replaced again and again", SQLITE_CANTOPEN);
 }
 
-/// Whether a file beside the database was deleted and all that was committed is in the database all the same.
+/// Closes the connection. True when a file beside the database was deleted, but all committed rows are in the
+/// database.
 bool LiveFile::LetGo() noexcept {
     if (!m_connection)
         return false;
@@ -90,7 +95,7 @@ void LiveFile::RollBack() noexcept {
     if (!m_connection)
         return;
     m_connection->RollBack();
-    if (m_connection->InTransaction()) // without the memory for a rollback, closing is one
+    if (m_connection->InTransaction()) // no memory for a rollback: closing the connection rolls back, too
         LetGo();
 }
 
@@ -112,7 +117,7 @@ void LiveFile::SetPatience(std::chrono::milliseconds patience) {
 }
 
 void LiveFile::Connect() {
-    // SQLite would take an empty name for a database in memory, and a zero byte for the end of the name.
+    // SQLite would take an empty path for a temporary database, and a zero byte for the end of the path.
     if (m_path.empty() || m_path.find('\0') != std::string::npos)
         throw SQLite::Exception(sqlite3_errstr(SQLITE_CANTOPEN), SQLITE_CANTOPEN);
     auto settings = m_settings;

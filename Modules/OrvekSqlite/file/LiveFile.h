@@ -10,8 +10,8 @@
 
 namespace OrvekSqlite::file {
 
-/// A path and the connection to the database that is there now: opened when it can be, and again when the
-/// file was replaced.
+/// A path, and the connection to the database that is at that path now. The connection is opened as soon as
+/// that works, and again when the file was replaced.
 ///
 /// Threads: one at a time.
 /// Failure: throws SQLite::Exception.
@@ -21,31 +21,31 @@ public:
 
     explicit LiveFile(const Settings& settings);
 
-    /// Lets go of the file that is open, and leads all later operations to `path`.
+    /// Closes the file that is open. All later operations go to `path`.
     void Set(const std::string& path);
 
-    /// Runs the operation, and once more on a new connection when the old one turns out to have lost its
-    /// file: then the first run had no effect that counts. A transaction that was open on the old connection
-    /// is gone; the operation finds out by Connection::InTransaction.
+    /// Runs the operation. When it turns out that the connection has lost its file, runs the operation once
+    /// more on a new connection, because the first run had no effect that counts. A transaction that was open
+    /// on the old connection is gone. The operation can find that out by Connection::InTransaction.
     ///
-    /// A file beside the database that was deleted costs a new connection, and no row that the operation
-    /// committed.
+    /// When a file beside the database was deleted, the connection is replaced, too, but no row is lost that
+    /// the operation committed.
     ///
-    /// Within a transaction that was open before and is so afterwards, the file is not looked for: that takes
-    /// a microsecond, and who commits will look.
+    /// When a transaction was open before the operation and still is afterwards, this does not check the
+    /// file's place. The check takes a microsecond or two, and the commit does it anyway.
     void Run(const Operation& operation);
 
     bool InTransaction() const { return m_connection && m_connection->InTransaction(); }
     bool IsShared() { return m_connection && m_connection->IsShared(); }
     void RollBack() noexcept;
 
-    /// Runs `action`, whose operations on this file fail at once where another program has the lock. All
-    /// other operations wait for it, up to Settings::busyTimeout.
+    /// Runs `action`. Its operations on this file fail at once when another program has the lock. All other
+    /// operations wait for the lock, up to Settings::busyTimeout.
     void WithoutWaiting(const std::function<void()>& action);
 
     void Close() { LetGo(); }
 
-    /// Throws, once, when rows that had been committed were lost since the last call.
+    /// Throws when committed rows were lost since the last call.
     void TellLoss();
 
 private:
@@ -57,7 +57,7 @@ private:
     std::string m_path;
     std::chrono::milliseconds m_patience = m_settings.busyTimeout;
     bool m_hasLostRows = false;
-    std::unique_ptr<Connection> m_connection; ///< null: to be opened by the next operation
+    std::unique_ptr<Connection> m_connection; ///< null: the next operation opens it
 };
 
 } // namespace OrvekSqlite::file

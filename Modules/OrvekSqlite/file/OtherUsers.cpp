@@ -7,10 +7,11 @@
 namespace OrvekSqlite::file {
 namespace {
 
-/// A new descriptor gets the lowest free number, and the service has some twenty.
+/// The search for a descriptor ends here. A new descriptor gets the lowest free number, and the service has
+/// some twenty.
 constexpr int MAX_DESCRIPTOR = 1024;
 
-/// Where SQLite locks a database file: the documented bytes behind the first gigabyte.
+/// The bytes that SQLite locks in a database file. SQLite documents them; they come after the first gigabyte.
 constexpr off_t SHARED_FIRST = 0x40000000 + 2;
 constexpr off_t SHARED_BYTES = 510;
 
@@ -33,7 +34,8 @@ bool OtherUsers::Exist() {
     lock.l_whence = SEEK_SET;
     lock.l_start = SHARED_FIRST;
     lock.l_len = SHARED_BYTES;
-    // Only asked, never taken. Locks of this process are not in the way of its own, so they do not count.
+    // This asks for the lock and does not take it. The locks of this process do not count: it asks about
+    // others.
     return ::fcntl(m_descriptor, F_GETLK, &lock) != 0 || lock.l_type != F_UNLCK;
 }
 
@@ -42,8 +44,8 @@ bool OtherUsers::IsOurFile(int descriptor) const {
     return ::fstat(descriptor, &file) == 0 && file.st_dev == m_device && file.st_ino == m_inode;
 }
 
-/// SQLite's own descriptor of the file, which it does not hand out. One of ours would be a trap: closing any
-/// descriptor of a file drops all locks of the process on it, SQLite's among them.
+/// Finds SQLite's own descriptor of the file, which SQLite does not hand out. We must not open one of our
+/// own: closing any descriptor of a file drops all locks of the process on that file, SQLite's among them.
 void OtherUsers::FindDescriptor() {
     m_descriptor = -1;
     for (int descriptor = 0; descriptor < MAX_DESCRIPTOR && m_descriptor < 0; ++descriptor)

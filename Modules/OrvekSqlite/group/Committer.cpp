@@ -18,7 +18,8 @@ void Committer::Start() {
     try {
         m_thread = std::thread(&Committer::Run, this);
     } catch (const std::exception&) {
-        m_group.CommitWithoutWaiting(); // no thread to be had: then a group is one statement, until there is
+        // No thread can be made: until one can, each group is a single statement.
+        m_group.CommitWithoutWaiting();
     }
 }
 

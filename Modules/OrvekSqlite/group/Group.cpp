@@ -7,7 +7,8 @@
 namespace OrvekSqlite::group {
 namespace {
 
-/// A lock, which is waited for, or memory, which may be there again for the next statement.
+/// Whether the reason of a failure may soon be gone. Another program's lock can be waited for. Memory may be
+/// free again for the next statement.
 bool MaySoonPass(const std::exception& error) {
     const auto* refusal = dynamic_cast<const SQLite::Exception*>(&error);
     return refusal == nullptr || refusal->getErrorCode() == SQLITE_BUSY ||
@@ -17,7 +18,9 @@ bool MaySoonPass(const std::exception& error) {
 } // namespace
 
 void Group::Execute(const std::string& sql) {
-    m_file.TellLoss(); // the log line of a refused statement is the only place where it can be told
+    // This plug-in cannot log, but the service logs the error of a refused statement. So one statement is
+    // refused to report the loss.
+    m_file.TellLoss();
     const auto now = Clock::now();
     try {
         RefuseWhileUncommitted(now);
@@ -59,19 +62,20 @@ void Group::ExecuteInGroup(const std::string& sql, Clock::time_point now) {
     m_state = State::Open;
 }
 
-/// Usually, the transaction is as it was. But a full disk, or RAISE(ROLLBACK) in a trigger, ends the whole
-/// transaction: then the statements before this one are tried again at once.
+/// Usually the transaction is unchanged. But a full disk, or RAISE(ROLLBACK) in a trigger, ends the whole
+/// transaction. Then the statements before this one are run again and committed at once.
 void Group::AfterFailedStatement() noexcept {
     if (m_kept.IsEmpty()) {
-        m_file.RollBack(); // a group of nothing holds no lock
+        m_file.RollBack(); // an empty group must not hold the lock
         m_state = State::Empty;
     } else if (!m_file.InTransaction()) {
         TryToCommit();
     }
 }
 
-/// Commits a group that is complete, whether the statement was run or refused. A caller whose statements are
-/// all refused takes the mutex again so quickly that the committer would get it too late.
+/// Commits a complete group, also after a statement that was refused. The committer alone would be too late:
+/// a caller whose statements are all refused takes the mutex again so quickly that the committer hardly gets
+/// it.
 void Group::EndStatement(Clock::time_point now) noexcept {
     m_last = now;
     if (m_state == State::Open && m_policy.IsComplete(m_kept.Count(), m_kept.Bytes(), m_began, now))
@@ -87,7 +91,7 @@ void Group::Commit() {
             connection.Commit();
         });
     } catch (const std::exception& error) {
-        m_file.RollBack(); // another program may need the lock to remove the reason
+        m_file.RollBack(); // gives the lock free: another program may need it to remove the reason
         m_state = State::Uncommitted;
         m_lastTry = Clock::now();
         m_reason = std::current_exception();
@@ -123,7 +127,7 @@ std::optional<Clock::time_point> Group::Due() const {
     return m_policy.NextTry(m_lastTry);
 }
 
-/// Begins the transaction, unless it is open, and brings it to where the kept statements had it.
+/// Begins a transaction, unless one is open, and runs the kept statements in it again.
 void Group::Begin(file::Connection& connection) {
     if (connection.InTransaction())
         return;
@@ -137,9 +141,9 @@ void Group::Begin(file::Connection& connection) {
     }
 }
 
-/// Drops a statement that a constraint refuses now, in another file or after another program's change. It
-/// would have been refused had it come now, and if it were kept, all others would wait for it for ever. Any
-/// other error, such as a missing table, can be remedied: then the group waits.
+/// Drops a statement that a constraint refuses now, in another file or after another program's change. If it
+/// came now for the first time, it would be refused as well. If it were kept, all other statements would wait
+/// for it for ever. Any other error, such as a missing table, can be remedied, so the group waits.
 void Group::RunAgain(file::Connection& connection) {
     for (std::size_t i = 0; i < m_kept.Count();) {
         try {
@@ -149,7 +153,7 @@ void Group::RunAgain(file::Connection& connection) {
             if (error.getErrorCode() != SQLITE_CONSTRAINT)
                 throw;
             m_kept.Remove(i);
-            if (!connection.InTransaction()) { // a trigger rolled back the statements before it, too
+            if (!connection.InTransaction()) { // a trigger has rolled back the statements before it, too
                 connection.Begin();
                 i = 0;
             }

@@ -17,33 +17,36 @@ namespace OrvekSqlite::group {
 ///                                             │
 ///                                             └─ failure ─→ Uncommitted ── run again and committed ─→ Empty
 ///
-/// A statement that was accepted is kept, as its text, until it is committed.
+/// A statement that was accepted is kept as a text until it is committed.
 ///
 /// Threads: one at a time.
-/// Failure: throws; what is kept stays kept.
+/// Failure: throws; the kept statements stay kept.
 class Group {
 public:
     Group(file::LiveFile& file, const GroupSettings& settings) : m_file(file), m_policy(settings) {}
 
-    /// Runs one statement, and throws its error.
+    /// Runs one statement. Throws the error of the statement.
     ///
-    /// A statement that comes alone is committed when this returns. In a burst it joins the group: it is
-    /// committed with the group, and run again if that fails. Its own error leaves the group as it was.
+    /// A statement that comes alone is committed when this returns. A statement in a burst joins the group.
+    /// It is committed with the group, and is run again when that commit fails. A statement that fails leaves
+    /// the group as it was.
     ///
     /// While the group is uncommitted, every statement is refused with the reason. Once in
-    /// GroupSettings::retry one of them tries to commit the group first, and is run if that works. If another
-    /// program's lock is the reason, each of them tries, and waits for the lock.
+    /// GroupSettings::retry, a statement tries to commit the group first, and is run when that works. When
+    /// the reason is another program's lock, or a lack of memory, every statement tries; it also waits for
+    /// the lock.
     ///
-    /// After rows were lost, one statement is refused with that for its reason.
+    /// After committed rows were lost, one statement is refused with the loss as its reason.
     void Execute(const std::string& sql);
 
-    /// Commits what is kept. Throws when that failed.
+    /// Commits the kept statements. Throws when that fails.
     void Commit();
 
-    /// The same for the committer: never waits for another program's lock, and keeps the reason of a failure.
+    /// The same for the committer. It never waits for another program's lock. It does not throw, but keeps
+    /// the reason.
     void CommitWithoutWaiting() noexcept;
 
-    /// When Commit is to be called; nothing while the group is empty.
+    /// When to call Commit; nothing while the group is empty.
     std::optional<Clock::time_point> Due() const;
 
 private:
@@ -65,16 +68,16 @@ private:
 
     file::LiveFile& m_file;
     const GroupPolicy m_policy;
-    KeptStatements m_kept;                   ///< accepted, and not known to be committed
-    State m_state = State::Empty;            ///< of m_kept
+    KeptStatements m_kept;                   ///< accepted statements that are not known to be committed
+    State m_state = State::Empty;            ///< the state of m_kept
     Clock::time_point m_began;               ///< while Open: when the transaction began
-    std::optional<Clock::time_point> m_last; ///< end of the statement before
-    Clock::time_point m_freeUntil;           ///< others may have the lock until then
+    std::optional<Clock::time_point> m_last; ///< when the last statement ended
+    Clock::time_point m_freeUntil;           ///< the lock is left to others until then
 
-    // While Uncommitted: the last try to commit.
+    // About the last try to commit; used while the state is Uncommitted.
     Clock::time_point m_lastTry;
-    std::exception_ptr m_reason; ///< why it failed
-    bool m_maySoonPass = false;  ///< whether that is another program's lock, or no memory
+    std::exception_ptr m_reason; ///< why the try failed
+    bool m_maySoonPass = false;  ///< whether the reason is another program's lock, or a lack of memory
 };
 
 } // namespace OrvekSqlite::group

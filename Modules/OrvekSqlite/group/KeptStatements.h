@@ -6,15 +6,15 @@
 
 namespace OrvekSqlite::group {
 
-/// Texts of statements in their order, all in one block of memory: keeping one costs a copy of its bytes and
-/// no allocation.
+/// The texts of statements in their order, all in one block of memory. So keeping a text takes a copy of its
+/// bytes and no allocation.
 class KeptStatements {
 public:
     bool IsEmpty() const { return m_ends.empty(); }
     std::size_t Count() const { return m_ends.size(); }
     std::size_t Bytes() const { return m_texts.size(); }
 
-    /// Makes room for one more, so that Add does not fail after the statement ran.
+    /// Makes room for one more text, so that Add does not fail after the statement was run.
     void Reserve(const std::string& sql) {
         if (m_texts.capacity() < m_texts.size() + sql.size())
             m_texts.reserve(2 * (m_texts.size() + sql.size()));
@@ -47,12 +47,13 @@ public:
     }
 
 private:
-    static constexpr std::size_t MAX_RESERVE = 1'048'576; ///< what a group of unusually long texts may leave
+    /// After a group of unusually long texts, memory over this is given back.
+    static constexpr std::size_t MAX_RESERVE = 1'048'576;
 
     std::size_t Start(std::size_t index) const { return index == 0 ? 0 : m_ends[index - 1]; }
 
     std::string m_texts;
-    std::vector<std::size_t> m_ends; ///< of each text in m_texts
+    std::vector<std::size_t> m_ends; ///< the end of each text in m_texts
 };
 
 } // namespace OrvekSqlite::group

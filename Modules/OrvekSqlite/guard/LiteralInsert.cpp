@@ -9,15 +9,16 @@ namespace {
 constexpr std::string_view BEGIN = "insert into ";
 constexpr std::string_view VALUES = "values(";
 constexpr std::string_view DIGITS = "0123456789";
-constexpr std::size_t MAX_DIGITS = 18; // any number of so many fits into 64 bits
+constexpr std::size_t MAX_DIGITS = 18; // every number of so many digits fits into 64 bits
 
-/// Whether a list of names is made of it.
+/// Whether `c` may be a part of a list of names.
 bool IsOfNames(char c) {
     return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9') || c == '_' ||
            c == ' ' || c == ',' || c == '(' || c == ')';
 }
 
-/// The text in quotes at the start of `rest`, which is moved behind it; nothing when the quotes do not end.
+/// The text in quotes at the start of `rest`; nothing when the closing quote is missing. Moves `rest` to what
+/// comes after the text.
 std::optional<Literal> TakeText(std::string_view& rest) {
     bool hasDoubledQuotes = false;
     std::size_t end = rest.find('\'', 1);
@@ -41,7 +42,7 @@ std::optional<Literal> TakeInteger(std::string_view& rest) {
     return literal;
 }
 
-/// The literals up to the parenthesis that ends `rest`; nothing when there is anything else.
+/// The literals up to the parenthesis that ends `rest`; nothing when `rest` holds anything else.
 std::optional<std::vector<Literal>> TakeLiterals(std::string_view rest) {
     std::vector<Literal> literals;
     literals.reserve(LiteralInsert::MAX_LITERALS / 4);

@@ -7,27 +7,27 @@
 
 namespace OrvekSqlite::guard {
 
-/// A value that stands in a statement's text.
+/// A value in the text of a statement.
 struct Literal {
-    bool isText;           ///< else an integer of at most 18 digits
-    bool hasDoubledQuotes; ///< within `text`
+    bool isText;           ///< false: an integer of at most 18 digits
+    bool hasDoubledQuotes; ///< whether `text` holds a doubled quote
     std::string_view text; ///< without the quotes around it
 };
 
-/// The text of an INSERT whose values are literals and nothing else, taken apart: what it says before them is
-/// the same for each of its kind.
+/// The parts of an INSERT whose values are all literals. The part before the values is the same for all
+/// INSERTs of one kind.
 ///
-/// Views into the text; they live as long as that does.
+/// The parts are views into the text, and are valid as long as the text.
 struct LiteralInsert {
     /// More than the store's statement needs.
     static constexpr std::size_t MAX_LITERALS = 32;
 
-    std::string_view head; ///< up to and with the parenthesis behind "values"
+    std::string_view head; ///< everything up to the parenthesis after "values", with that parenthesis
     std::vector<Literal> literals;
 
-    /// Nothing for any other text, and when in doubt: an expression, a comment, a sign, a zero byte,
-    /// upper-case keywords, anything behind the closing parenthesis. Such a text is no error, it is SQLite's
-    /// to judge.
+    /// Returns nothing for any other text, and in doubtful cases: an expression, a comment, a sign, a zero
+    /// byte, upper-case keywords, anything after the closing parenthesis. Such a text is no error; SQLite
+    /// decides about it.
     static std::optional<LiteralInsert> Of(std::string_view sql);
 };
 

@@ -19,7 +19,7 @@ std::string WithSingleQuotes(std::string_view text) {
     std::string single;
     for (std::size_t i = 0; i < text.size(); ++i) {
         single += text[i];
-        i += text[i] == '\'' ? 1 : 0; // over the second of two
+        i += text[i] == '\'' ? 1 : 0; // skips the second of two quotes
     }
     return single;
 }
@@ -33,7 +33,7 @@ std::int64_t NumberOf(std::string_view digits) {
 int BindTo(sqlite3_stmt* statement, int place, const Literal& literal) {
     if (!literal.isText)
         return sqlite3_bind_int64(statement, place, NumberOf(literal.text));
-    if (!literal.hasDoubledQuotes) // the statement's text outlives the step
+    if (!literal.hasDoubledQuotes) // no copy: the statement's text lives longer than the step
         return sqlite3_bind_text(statement, place, literal.text.data(), static_cast<int>(literal.text.size()),
                                  SQLITE_STATIC);
     const std::string text = WithSingleQuotes(literal.text);
@@ -42,9 +42,9 @@ int BindTo(sqlite3_stmt* statement, int place, const Literal& literal) {
 
 } // namespace
 
-/// While it lives, the connection's statements may have parameters, and the guard takes what is run for an
-/// INSERT. SQLite compiles the statement again by itself where another program has changed the tables, so
-/// also while it runs.
+/// While this object lives, statements of the connection may have parameters, and the guard treats the
+/// statement as an INSERT. This must hold while the statement runs, too: SQLite compiles it again by itself
+/// when another program has changed the tables.
 class PreparedInsert::Use {
 public:
     explicit Use(PreparedInsert& owner) : m_owner(owner) {

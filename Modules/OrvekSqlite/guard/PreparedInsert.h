@@ -9,12 +9,11 @@
 
 namespace OrvekSqlite::guard {
 
-/// Runs INSERTs of literals with a statement that was prepared once, for as long as they differ in their
-/// literals only. SQLite needs two thirds of the time of a statement to compile its text, and the text of the
-/// store is always the same otherwise. What a text does, and which error it gives, is what it would be
-/// without this.
+/// Runs INSERTs of literals with one prepared statement, as long as they differ only in their literals.
+/// Compiling a text takes two thirds of a statement's time, and the texts of the store differ only in their
+/// literals. What a text does, and which error it gives, is the same as without this class.
 ///
-/// Ownership: of the connection that it is made with, and destroyed before that is closed.
+/// Ownership: belongs to the connection that it is made with, and must be destroyed before that is closed.
 /// Threads: those of the connection.
 /// Failure: throws SQLite::Exception.
 class PreparedInsert {
@@ -25,8 +24,8 @@ public:
     PreparedInsert(const PreparedInsert&) = delete;
     PreparedInsert& operator=(const PreparedInsert&) = delete;
 
-    /// Runs `sql`. False, and nothing happened, when it is no INSERT of literals alone, or none that can be
-    /// prepared: it is to be run as it stands, and to give its own error.
+    /// Runs `sql`. Returns false, without any effect, when `sql` is not an INSERT of literals alone, or
+    /// cannot be prepared as one. Then the caller must run it as it stands, so that it gives its own error.
     bool Execute(const std::string& sql);
 
 private:
@@ -39,7 +38,7 @@ private:
     sqlite3* m_connection;
     StatementGuard& m_guard;
     sqlite3_stmt* m_statement = nullptr;
-    std::string m_text; ///< Of m_statement, with parameters in the literals' places.
+    std::string m_text; ///< The text of m_statement, with parameters in the places of the literals.
 };
 
 } // namespace OrvekSqlite::guard

@@ -30,8 +30,9 @@ void Statement::Prepare(const std::string& sql) {
     if (sql.find('\0') != std::string::npos)
         throw SQLite::Exception("the statement holds a zero byte", SQLITE_MISUSE);
     if (sql.size() >= static_cast<std::size_t>(sqlite3_limit(m_connection, SQLITE_LIMIT_SQL_LENGTH, -1)))
-        throw SQLite::Exception(sqlite3_errstr(SQLITE_TOOBIG), SQLITE_TOOBIG); // before the int below
-    // The length with the closing zero: SQLite then need not copy the text to append one.
+        // Must be checked before the size becomes an int below.
+        throw SQLite::Exception(sqlite3_errstr(SQLITE_TOOBIG), SQLITE_TOOBIG);
+    // The length counts the closing zero. So SQLite need not copy the text to append a zero.
     const char* rest = nullptr;
     const int code =
         sqlite3_prepare_v2(m_connection, sql.c_str(), static_cast<int>(sql.size() + 1), &m_statement, &rest);
@@ -42,8 +43,9 @@ void Statement::Prepare(const std::string& sql) {
     RefuseFurtherStatements(rest, sql.c_str() + sql.size());
 }
 
-/// Only SQLite can tell a comment from a statement, so it is asked: preparing a text that holds only the
-/// former succeeds and yields nothing. Nothing runs by being prepared, as pragmas, which would, are refused.
+/// Only SQLite can tell a comment from a statement, so we let SQLite prepare the rest. Preparing a text of
+/// comments succeeds and yields no statement. Preparing runs nothing: only a pragma would run, and pragmas
+/// are refused.
 void Statement::RefuseFurtherStatements(const char* text, const char* end) const {
     while (text < end) {
         sqlite3_stmt* further = nullptr;
@@ -86,7 +88,7 @@ std::string Statement::Text(int column) const {
     if (sqlite3_column_type(m_statement, column) == SQLITE_NULL)
         return {};
     const auto* text = reinterpret_cast<const char*>(sqlite3_column_text(m_statement, column));
-    if (text == nullptr) // the conversion to text found no memory
+    if (text == nullptr) // no memory for the conversion to text
         throw std::bad_alloc();
     return {text, static_cast<std::size_t>(sqlite3_column_bytes(m_statement, column))};
 }
@@ -94,8 +96,9 @@ std::string Statement::Text(int column) const {
 void Statement::Fail(int code) const {
     if (m_guard.Refusal() != nullptr)
         throw SQLite::Exception(m_guard.Refusal(), code);
-    // Stopped by the guard when it begins to attach its copy, or before that by a transaction around it: what
-    // a statement is told must not depend on whether others came just before.
+    // VACUUM is stopped in one of two places: by the guard, when VACUUM attaches its copy, or earlier by
+    // SQLite, when a transaction is open. The error text must be the same for both, because it must not
+    // depend on whether other statements came just before.
     if (std::string_view(sqlite3_errmsg(m_connection)).starts_with("cannot VACUUM"))
         throw SQLite::Exception("not authorized: VACUUM", SQLITE_AUTH);
     throw SQLite::Exception(m_connection, code);

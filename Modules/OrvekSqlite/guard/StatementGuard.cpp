@@ -6,7 +6,8 @@
 namespace OrvekSqlite::guard {
 namespace {
 
-/// Steps of the virtual machine between two looks at the budget. An INSERT takes fewer, so it pays nothing.
+/// Steps of the virtual machine between two checks of the budget. An INSERT takes fewer, so it is never
+/// checked.
 constexpr int STEPS_PER_LOOK = 1000;
 
 const char* ForbiddenToAll(int action, const char* function) {
@@ -31,7 +32,7 @@ const char* ForbiddenToAll(int action, const char* function) {
     }
 }
 
-/// CREATE and its kin are written by SQLite as inserts into its own table of contents.
+/// SQLite runs CREATE and similar statements as inserts into its own table of contents.
 bool IsTableOfContents(const char* table) {
     const std::string_view name = table != nullptr ? table : "";
     return name == "sqlite_master" || name == "sqlite_temp_master";
@@ -45,7 +46,7 @@ void SetLimits(sqlite3* connection, const Limits& limits) {
     sqlite3_limit(connection, SQLITE_LIMIT_LIKE_PATTERN_LENGTH, limits.likePatternBytes);
     sqlite3_limit(connection, SQLITE_LIMIT_TRIGGER_DEPTH, limits.triggerDepth);
     sqlite3_limit(connection, SQLITE_LIMIT_ATTACHED, 0);
-    sqlite3_limit(connection, SQLITE_LIMIT_VARIABLE_NUMBER, 0); // a text comes complete
+    sqlite3_limit(connection, SQLITE_LIMIT_VARIABLE_NUMBER, 0); // the text of a statement has no parameters
     sqlite3_limit(connection, SQLITE_LIMIT_WORKER_THREADS, 0);
 }
 
@@ -81,8 +82,8 @@ bool StatementGuard::IsAllowed(int action, const char* first, const char* second
     if (trigger != nullptr)
         return true;
     if (action == SQLITE_INSERT && !IsTableOfContents(first)) {
-        // SQLite reports the insert before anything inside it. Should a version ever not, the statement is
-        // refused rather than let through.
+        // SQLite reports the insert before anything inside it. If a later version does not, the statement is
+        // refused and not let through.
         m_isInsert = true;
         return !m_didOtherThanInsert || Refuse("not authorized: an INSERT within another statement");
     }

@@ -8,30 +8,31 @@
 
 namespace OrvekSqlite::guard {
 
-/// What a statement is for, which decides what it may do.
+/// What a statement is for. This decides what it may do.
 enum class Permission {
-    Own,         ///< the plug-in's own text (pragmas, BEGIN, COMMIT): anything
-    CreateTable, ///< as Write, and a table must be what it creates
-    Write,       ///< one that changes data; an INSERT may hold nothing but literals and operators
+    Own,         ///< the plug-in's own text (pragmas, BEGIN, COMMIT): may do anything
+    CreateTable, ///< as Write, but it must create a table
+    Write,       ///< changes data; an INSERT may hold nothing but literals and operators
     Read,        ///< a query
 };
 
-/// Stands between a statement's text and SQLite, for one connection.
+/// Checks the statements of one connection, when they are prepared and while they run.
 ///
-/// The service builds its INSERT without escaping what a report says, deliberately, so a report can end its
-/// own literal and continue in SQL. This is where that ends:
+/// The service deliberately builds its INSERT without escaping the texts of a report. So a report can end its
+/// own literal and continue in SQL. This class limits what such SQL can do:
 ///
-/// - No statement may attach a database, use a pragma, load an extension, open a transaction or make a virtual
-///   table.
-/// - An INSERT may hold only literals and operators. No function: `printf('%.*c',1000000000,'x')` is a single
-///   step of the virtual machine and so passes any progress handler. No sub-select: a cross join needs
-///   neither function nor recursion to run for ever. No column of any table, so no RETURNING and no upsert
-///   that reads. Several rows in VALUES are a compound SELECT to SQLite, so an INSERT adds one row at most.
-/// - A trigger that the table's owner put there keeps working: what its body does comes from the schema, not
-///   from the statement.
-/// - What is left is bounded by the limits on sizes and by a progress handler.
+/// - No statement may attach a database, use a pragma, load an extension, open a transaction or make a
+///   virtual table.
+/// - An INSERT may hold only literals and operators. It may hold no function: `printf('%.*c',1000000000,'x')`
+///   is a single step of the virtual machine, so no progress handler stops it. It may hold no sub-select: a
+///   cross join can run for ever without a function or a recursion. It may hold no column of any table, so no
+///   RETURNING and no upsert that reads. SQLite treats several rows in VALUES as a compound SELECT, so an
+///   INSERT adds one row at most.
+/// - A trigger that the table's owner made keeps working: what it does comes from the schema, not from the
+///   statement.
+/// - The limits on sizes and a progress handler bound everything else.
 ///
-/// Threads: those of the connection. Must stay where it is while the connection lives.
+/// Threads: those of the connection. The object must not move while the connection lives.
 class StatementGuard {
 public:
     StatementGuard() = default;
@@ -45,16 +46,16 @@ public:
     /// A statement of this kind is prepared and run from here on.
     void Begin(Permission permission);
 
-    /// After Begin: the statement is an INSERT that was let through when it was prepared.
+    /// Call this after Begin: the statement is an INSERT that was let through when it was prepared.
     void ExpectInsert() { m_isInsert = true; }
 
-    /// The statement is gone; what follows is the plug-in's own.
+    /// The statement is destroyed. What follows is the plug-in's own.
     void End() { Begin(Permission::Own); }
 
-    /// Why the statement was refused or stopped, for a person; null when it was not.
+    /// Why the statement was refused or stopped, as a text for a person; null when it was not.
     const char* Refusal() const { return m_refusal; }
 
-    /// Whether the statement prepared last creates a table.
+    /// Whether the statement that was prepared last creates a table.
     bool CreatesTable() const { return m_createsTable; }
 
 private:
@@ -69,7 +70,7 @@ private:
 
     Limits m_limits;
     Permission m_permission = Permission::Own;
-    const char* m_refusal = nullptr; ///< always a literal: the callbacks must not throw
+    const char* m_refusal = nullptr; ///< always a literal, because the callbacks must not throw
     std::int64_t m_steps = 0;
     bool m_isInsert = false;
     bool m_didOtherThanInsert = false;
