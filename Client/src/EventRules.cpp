@@ -65,8 +65,7 @@ bool IsFitForAnalytics(const wire::JsonFacts& facts) {
 }
 
 /// Puts the value into the report and decides in which form it is written. Returns Sent, or the reason why
-/// the
-/// value cannot be sent.
+/// the value cannot be sent.
 Result TakeValue(wire::Report& report, const Value& value, bool isForAnalytics) {
     report.value = value.Text();
     if (value.WhatItIs() == Value::Kind::Nothing)

@@ -22,8 +22,7 @@ struct GivenEvent {
 std::optional<std::string_view> ModuleOf(std::string_view eventId, std::string_view ownModule);
 
 /// Writes an event's datagram so that its value arrives as it was given. ModuleOf must have accepted the
-/// event
-/// id. Returns Sent when the datagram can be sent, else the reason why it cannot.
+/// event id. Returns Sent when the datagram can be sent, else the reason why it cannot.
 Result WriteEvent(wire::Buffer& buffer, const GivenEvent& event);
 
 /// Writes the message that tells who is signed in. Returns what WriteEvent returns.

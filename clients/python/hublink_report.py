@@ -6,21 +6,22 @@
     reporter.event("A100|10001", {"page": "start"})  # begins with A: to analytics
     reporter.event("B100|10001", "it's open")        # any other: to the local store
 
-Purpose: a text arrives exactly as it was given, or the result says why it was not sent. The module doubles quotes for
-the store, escapes JSON, announces its own module, tells the signed-in user, and does both again when the service was
-restarted.
+Purpose: a text arrives exactly as it was given, or the result says why it was not sent. A reporter doubles quotes for
+the store and escapes JSON. It announces its own module and tells the service who is signed in, and it does both again
+after the service was restarted.
 
-Threads: every operation may be called from any thread, and in a child after a fork, which has a socket of its own.
-The module starts no thread.
+Threads: every operation may be called from any thread, and in the child of a fork, where the reporter opens a socket of
+its own. This library starts no thread.
 
-Failure: `event` and `set_user` never raise, whatever they are given, never wait, and write nothing to the terminal. An
-argument of a wrong type counts as one that cannot be sent. Only KeyboardInterrupt and the like pass through.
+Failure: `event` and `set_user` never raise, with any arguments. They never wait, and they write nothing to the
+terminal. An argument of a wrong type gives a result that says that it cannot be sent. Only exceptions such as
+KeyboardInterrupt, which are not errors, pass through.
 
-What `Result.SENT` promises: the system took the datagram, and a program listens. Linux drops without a word what does
-not fit into the listener's buffer, so some of a long burst that comes faster than the service takes it are lost. A busy
-system may tell a moment late that no program listens; then it is the next event that learns of it.
+What `Result.SENT` promises: the system took the datagram, and a program listens. Linux drops a datagram without an
+error when the listener's buffer is full. So events of a long burst that come faster than the service reads them can be
+lost. A busy system can report a moment late that no program listens; then only the next event gets that result.
 
-Standard library only; Python 3.9 and later.
+Uses the standard library only. Needs Python 3.9 or later.
 """
 
 from __future__ import annotations
@@ -44,34 +45,40 @@ from typing import Any, Callable, Dict, List, NamedTuple, Optional, Type, Union
 __all__ = ["Json", "Module", "ReportHandler", "Reporter", "Result", "Value"]
 
 _HOST, _PORT = "127.0.0.1", 9997
-_MAX_BYTES = 10240  # the service cuts a datagram off there
-_MAX_DEPTH = 127  # of a value: the service reads 128 levels, and the report around the value is one
-_SEND_BUFFER_BYTES = 65536  # macOS grants 9216 unasked, less than a report may have
-_LOOK_SECONDS = 1.0  # between two looks at the system's table of sockets, which cost some 50 microseconds each
-_REPEAT_SECONDS = 180.0  # between two announcements where there is no such table
-_DEFAULT_MODULE = "A759"  # the service knows it from its start
+_MAX_BYTES = 10240  # the service cuts off what is longer
+_MAX_DEPTH = 127  # levels of a value: the service reads 128, and the report's object around the value is one of them
+_SEND_BUFFER_BYTES = 65536  # the default of macOS is 9216, and a report may be longer
+_LOOK_SECONDS = 1.0  # between two looks at the system's table of sockets; a look takes about 50 microseconds
+_REPEAT_SECONDS = 180.0  # between two announcements on a system without such a table
+_DEFAULT_MODULE = "A759"  # the service knows this module from its start
 
 
 class Result(enum.Enum):
-    """What became of an event, or of a user."""
+    """What happened to an event, or to a user that was set."""
 
-    SENT = 0
-    NOBODY_LISTENS = 1
-    TOO_LONG = 2  #: more than 10240 bytes as a datagram
-    INVALID_TEXT = 3  #: half a surrogate pair, which UTF-8 cannot hold, or a zero character; an empty open id
-    #: No JSON. For analytics, a value that is neither nothing nor an object which the service can read: at most 127
-    #: levels, integers of at most 64 bits, numbers within the range of a double.
+    SENT = 0  #: the system took the datagram, and a program listens; see the top of the file
+    NOBODY_LISTENS = 1  #: no service runs; the event is lost, and the next event tries again
+    TOO_LONG = 2  #: the datagram would have more than 10240 bytes
+    #: A text has half a surrogate pair, which UTF-8 cannot hold, or a zero character. Or an open id is empty, or a part
+    #: of a user is not a str.
+    INVALID_TEXT = 3
+    #: The value is not JSON, or the time is not an int of 64 bits. Or the value of an event for analytics is given, but
+    #: is not an object that the service can read: at most 127 levels, integers of at most 64 bits, other numbers within
+    #: the range of a double.
     INVALID_JSON = 4
-    #: Empty, no text as above; or for analytics, without the reporter's module or A759 before a bar.
+    #: The event id is empty, or is not a valid text (see INVALID_TEXT). Or it is for analytics, and has no bar, or the
+    #: module before the bar is neither the reporter's nor A759.
     INVALID_EVENT_ID = 5
-    QUOTE_IN_USER = 6  #: no spelling of a quote in a user is right for both store and analytics
-    OTHER_USERS_SERVICE = 7  #: the report would end in another user's database
-    WOULD_BLOCK = 8  #: this process's send buffer is full
-    SYSTEM_ERROR = 9
+    #: An open id or a suite version has a single quote in it. The store needs a quote written twice, and analytics
+    #: needs it written once, so no text would be right for both.
+    QUOTE_IN_USER = 6
+    OTHER_USERS_SERVICE = 7  #: the service runs for another user and would put the report into that user's store
+    WOULD_BLOCK = 8  #: the send buffer of the reporter's socket is full
+    SYSTEM_ERROR = 9  #: any other reason
 
 
 class Module(NamedTuple):
-    """The module of the suite that reports. Its id begins with A and stands before the bar of its event ids."""
+    """The module of the suite that reports. Its event ids begin with its id and a bar, and its id begins with A."""
 
     id: str
     version: str = ""
@@ -80,12 +87,12 @@ class Module(NamedTuple):
 
 @dataclass(frozen=True)
 class Json:
-    """A value that is given as JSON text. It is checked when it is sent."""
+    """A value that is given as JSON text. The text is checked when the event is sent."""
 
     text: str
 
 
-#: What an event may say: nothing, a text, or JSON.
+#: The value of an event: nothing, a text, or JSON.
 Value = Union[None, str, Json, Dict[str, Any], List[Any]]
 
 
@@ -101,7 +108,7 @@ _ENCODER = json.JSONEncoder(ensure_ascii=False, allow_nan=False, separators=(","
 
 
 def _any_number(text: str) -> None:
-    """Python's own reader may take the digits of other scripts."""
+    """Refuses digits of other scripts, which Python's own reader may accept."""
     if not text.isascii():
         raise ValueError(text + " is no JSON")
 
@@ -125,7 +132,7 @@ def _exact_integer(text: str) -> None:
 
 
 def _exact_real(text: str) -> None:
-    """A double keeps any number of 15 digits, but for those next to its bounds."""
+    """Refuses a number that a double may change. A double keeps 15 digits, except close to its limits."""
     _kept_real(text)
     number = float(text)
     if repr(number) != text and (len(text) > 15 or not 1e-300 < abs(number) < 1e300):
@@ -136,7 +143,8 @@ def _no_number(text: str) -> None:
     raise ValueError(text + " is no JSON")
 
 
-#: What is JSON; of that, what the service reads; of that, what it prints again as the same value.
+#: Three readers, each stricter than the one before. _JSON reads all JSON, _KEPT_JSON what the service can read, and
+#: _EXACT_JSON what the service also prints again as the same value.
 _JSON = json.JSONDecoder(parse_int=_any_number, parse_float=_any_number, parse_constant=_no_number)
 _KEPT_JSON = json.JSONDecoder(parse_int=_kept_integer, parse_float=_kept_real, parse_constant=_no_number)
 _EXACT_JSON = json.JSONDecoder(parse_int=_exact_integer, parse_float=_exact_real, parse_constant=_no_number)
@@ -157,7 +165,7 @@ def _is_read(text: str, decoder: json.JSONDecoder) -> bool:
 
 
 def _is_flat(text: str) -> bool:
-    """Whether the service reads all levels."""
+    """Whether the service can read all levels of the JSON."""
     if text.count("[") + text.count("{") <= _MAX_DEPTH:
         return True
     depth = deepest = 0
@@ -168,7 +176,8 @@ def _is_flat(text: str) -> bool:
 
 
 def _has_lone_surrogate(text: str) -> bool:
-    """Whether an escape such as \\udc00 stands alone. An escaped backslash before a "u" is no such escape."""
+    """Whether one half of a surrogate pair, such as \\udc00, stands alone as an escape. A "u" after an escaped
+    backslash is not an escape."""
     return "\\u" in text and _SURROGATE.search(_PAIR.sub("", text.replace("\\\\", "--"))) is not None
 
 
@@ -186,20 +195,20 @@ def _checked_text(text: str) -> str:
 
 
 def _doubled(text: str) -> str:
-    """For the store: the service puts its texts into an SQL statement as they are."""
+    """Doubles the quotes of a text for the store, because the service puts it unchanged into an SQL statement."""
     return text.replace("'", "''")
 
 
 def _doubled_in_json(text: str) -> str:
-    """The same within the strings of an object or array, which the service prints anew: an escaped quote becomes a
-    quote there, too."""
+    """Doubles the quotes in the strings of an object or array. The service reads it and prints it again, so a quote
+    that is written as an escape becomes a quote there, too."""
     if "'" not in text and "\\u0027" not in text:
         return text
     return _QUOTE.sub(lambda found: found[0] if found[0] == "\\\\" else "''", text)
 
 
 def _json_text(value: Union[Json, Dict[str, Any], List[Any]]) -> str:
-    """`value` as JSON without white space."""
+    """Returns `value` as JSON without white space."""
     if isinstance(value, Json) and isinstance(value.text, str):
         text = _checked_text(value.text)
     elif isinstance(value, (dict, list)):
@@ -214,12 +223,12 @@ def _json_text(value: Union[Json, Dict[str, Any], List[Any]]) -> str:
 def _encoded(value: Union[Dict[str, Any], List[Any]]) -> str:
     try:
         return _ENCODER.encode(value)
-    except (TypeError, ValueError, RecursionError, RuntimeError):  # the last: another thread is changing it
+    except (TypeError, ValueError, RecursionError, RuntimeError):  # RuntimeError: another thread changes the value
         raise _Refusal(Result.INVALID_JSON) from None
 
 
 def _value_for_store(value: Value) -> Optional[str]:
-    """The report's member "value", as JSON."""
+    """The report's member "value", as JSON; None when the report has none."""
     if value is None:
         return None
     if isinstance(value, str):
@@ -227,8 +236,8 @@ def _value_for_store(value: Value) -> Optional[str]:
     text = _json_text(value)
     if text[0] in "{[" and _is_flat(text) and _is_read(text, _EXACT_JSON):
         return _doubled_in_json(text)
-    # The service would print it as another value: a string without its quotation marks, null as nothing. As a text, it
-    # is not touched.
+    # As JSON, the service would print this as another value: a string without its quotation marks, null as nothing. It
+    # does not change a text, so the JSON goes as a text.
     return _ENCODER.encode(_doubled(text))
 
 
@@ -244,7 +253,8 @@ def _value_for_analytics(value: Value) -> Optional[str]:
 
 
 def _time(time_ms: Optional[int]) -> str:
-    """The service takes a time of ten characters for seconds. One of ten in milliseconds gets a leading zero."""
+    """The time as JSON, in milliseconds. The service takes a time of ten characters for seconds. So a number of ten
+    characters is written as a string with a leading zero."""
     if time_ms is None:
         return str(time.time_ns() // 1_000_000)
     if not isinstance(time_ms, int) or not -(2**63) <= time_ms < 2**63:
@@ -277,7 +287,8 @@ def _report(event_id: str, value: Value, time_ms: Optional[int], day_report: boo
 
 
 def _control(kind: str, **exdata: str) -> bytes:
-    """The service takes any text with the letters eventID in it for a report. Escaped, they read the same."""
+    """Writes a control message. The service takes every datagram with the letters eventID in it for a report. So one of
+    the letters is written as an escape, which a JSON reader turns back into the letter."""
     for text in exdata.values():
         _checked_text(text)
     message = _ENCODER.encode({"msgType": kind, "exdata": exdata})
@@ -285,7 +296,7 @@ def _control(kind: str, **exdata: str) -> bytes:
 
 
 def _announcement(module: Module) -> Union[bytes, Result]:
-    """Or why the module's events cannot be sent."""
+    """The datagram that announces the module, or the reason why the module's events cannot be sent."""
     try:
         return _control(
             "init",
@@ -303,7 +314,7 @@ def _announcement(module: Module) -> Union[bytes, Result]:
 
 def _user(open_id: str, suite_version: str) -> bytes:
     if not isinstance(open_id, str) or not isinstance(suite_version, str) or not open_id:
-        raise _Refusal(Result.INVALID_TEXT)  # an empty one, the service does nothing with
+        raise _Refusal(Result.INVALID_TEXT)  # the service ignores an empty open id
     if "'" in _checked_text(open_id) or "'" in _checked_text(suite_version):
         raise _Refusal(Result.QUOTE_IN_USER)
     return _control("updateOpenID", openID=open_id, hublinkVersion=suite_version)
@@ -319,7 +330,7 @@ class _Listener(NamedTuple):
 
 
 def _in_table(address: bytes) -> str:
-    """As the kernel's tables have it: words of 32 bits in the machine's order of bytes."""
+    """The address as the kernel's tables write it: words of 32 bits in the machine's byte order."""
     words = [address[at : at + 4] for at in range(0, len(address), 4)]
     return "".join(f"{int.from_bytes(word, sys.byteorder):08X}" for word in words)
 
@@ -340,27 +351,30 @@ def _listeners(table: str, user: int) -> List[_Listener]:
 
 
 def _listener() -> Optional[_Listener]:
-    """The socket that a datagram to the service ends in. Raises OSError where the system has no table to look into.
+    """The socket that receives a datagram to the service; None when there is none. Raises OSError when the system has
+    no table of its sockets.
 
-    A socket of the very address comes before one of all addresses. Of two alike, another user's is named.
+    A socket that is bound to 127.0.0.1 itself comes before one that is bound to all addresses. Of several such sockets,
+    one of another user is returned.
     """
-    # As bytes: a text's codec is imported when it is first used, and a fork in the midst of an import leaves the child
-    # a lock that no thread gives back.
+    # We read bytes, not text: Python imports a text's codec at its first use. A fork during an import would leave the
+    # child a lock that no thread releases.
     table = _TABLES[0].read_bytes()
-    if _TABLES[1].exists():  # not where IPv6 is switched off
+    if _TABLES[1].exists():  # the file is missing when IPv6 is switched off
         table += _TABLES[1].read_bytes()
     return min(_listeners(table.decode(), os.geteuid()), default=None)
 
 
-#: What an open socket of ours answers to no call. The program closed all of its files, and the number may be another
-#: file's now.
+#: Errors that an open, connected socket never returns. Then the program has closed our descriptor, and its number may
+#: belong to another file now.
 _NOT_OURS = {errno.EBADF, errno.ENOTSOCK, errno.EDESTADDRREQ, errno.ENOTCONN}
 
 # --- Sending --------------------------------------------------------------------------------------------------------
 
 
 def _connected() -> socket.socket:
-    """Connected, because only such a socket is told that nobody listens."""
+    """A new socket that is connected to the service's port. Only for a connected socket the system reports that no
+    program listens."""
     made = socket.socket(socket.AF_INET, socket.SOCK_DGRAM)
     try:
         made.setblocking(False)
@@ -374,10 +388,10 @@ def _connected() -> socket.socket:
 
 
 class Reporter:
-    """Sends events and tells who is signed in. See the top of the file for threads and failure.
+    """Sends events and tells the service who is signed in. See the top of the file for threads and failure.
 
-    Without a module, events go to the local store or to the default module A759. A service of another user is not
-    sent to, unless `allow_other_users_service` is set.
+    Without a module of its own, a reporter sends events for the local store and for the default module A759 only. It
+    sends nothing to a service that runs for another user, unless `allow_other_users_service` is set.
     """
 
     def __init__(self, module: Optional[Module] = None, *, allow_other_users_service: bool = False) -> None:
@@ -386,13 +400,15 @@ class Reporter:
         self._module_id = None if module is None else module.id
         self._announcement = None if module is None else _announcement(module)
         self._allow_others = allow_other_users_service
-        self._lock = threading.RLock()  # guards all below; a signal handler may report while its thread does
+        # Guards all members below. It is recursive, because a signal handler may report while its thread
+        # reports.
+        self._lock = threading.RLock()
         self._counts = dict.fromkeys(Result, 0)
         self._socket: Optional[socket.socket] = None
         self._user: Optional[bytes] = None
         self._user_is_told = False
         self._module_is_told = False
-        self._service: Optional[str] = None  # the inode of its socket
+        self._service: Optional[str] = None  # the inode of the service's socket
         self._is_others = False
         self._next_look = 0.0
         self._next_repeat = 0.0
@@ -401,26 +417,28 @@ class Reporter:
     def event(
         self, event_id: str, value: Value = None, *, time_ms: Optional[int] = None, day_report: bool = False
     ) -> Result:
-        """Sends an event of this moment, or of `time_ms` milliseconds after 1970.
+        """Sends an event that happened now, or `time_ms` milliseconds after the beginning of 1970.
 
-        For an event id that begins with A, the value must be nothing or an object; the service writes its own members
-        "openid" and "sys_version" into it.
+        For an event id that begins with A, the value must be None or an object; the service itself sets the members
+        "openid" and "sys_version" in it.
         """
         return self._counted(lambda: self._event(event_id, value, time_ms, day_report))
 
     def set_user(self, open_id: str, suite_version: str = "") -> Result:
-        """Tells at once who is signed in, and again whenever the service was restarted. It accompanies every event
-        that comes after. An empty `suite_version` leaves the one that the service knows. A user that is refused as such
-        changes nothing; one that could not be sent is sent before the next event."""
+        """Tells the service who is signed in: now, and again whenever the service was restarted. The service adds the
+        user to every later report, also to those of other programs, because it knows one user only. With an empty
+        `suite_version`, it keeps the version that it knows. When a text cannot be sent (INVALID_TEXT, QUOTE_IN_USER,
+        TOO_LONG), nothing changes. When the system does not take the message now, it is sent before the next event."""
         return self._counted(lambda: self._set_user(open_id, suite_version))
 
     def count(self, result: Result) -> int:
-        """How many calls of event and set_user ended so. After a fork, the child counts on."""
+        """How many calls of event and set_user returned this result. The child of a fork starts with its parent's
+        counts."""
         with self._lock:
             return self._counts[result]
 
     def close(self) -> None:
-        """Gives the socket back. A later event opens another one."""
+        """Closes the socket. A later event opens another one."""
         with self._lock:
             self._drop_socket()
 
@@ -433,7 +451,7 @@ class Reporter:
         self.close()
 
     def __del__(self) -> None:
-        # Else the interpreter may print that a socket was left open.
+        # Without this, the interpreter may print a warning that a socket was left open.
         if getattr(self, "_socket", None) is not None:
             self._drop_socket()
 
@@ -442,7 +460,7 @@ class Reporter:
             result = work()
         except _Refusal as refusal:
             result = refusal.result
-        except Exception:  # a reporter that fails must not end the program that reports
+        except Exception:  # an error in the reporter must not end the program that reports
             result = Result.SYSTEM_ERROR
         with self._lock:
             self._counts[result] += 1
@@ -462,7 +480,7 @@ class Reporter:
             return self._deliver(None, None)
 
     def _announcement_for(self, event_id: str) -> Optional[bytes]:
-        """What must come before the event; nothing for the store and the default module."""
+        """The announcement that must be sent before the event; None for the store and for the default module."""
         if not isinstance(event_id, str) or not event_id or not _is_text(event_id):
             raise _Refusal(Result.INVALID_EVENT_ID)
         if not _is_for_analytics(event_id):
@@ -476,7 +494,7 @@ class Reporter:
             raise _Refusal(self._announcement)
         return self._announcement
 
-    # What follows is called with the lock held.
+    # The methods below are called with self._lock held.
 
     def _deliver(self, message: Optional[bytes], announcement: Optional[bytes]) -> Result:
         result = Result.SYSTEM_ERROR
@@ -484,7 +502,8 @@ class Reporter:
             try:
                 return self._try_to_deliver(message, announcement)
             except ConnectionRefusedError:
-                # About an earlier datagram, which the system told late: the service may be back meanwhile.
+                # The system reports late that an earlier datagram was refused. The service may run again by now, so we
+                # try once more.
                 self._forget_service()
                 result = Result.NOBODY_LISTENS
             except OSError as error:
@@ -524,7 +543,7 @@ class Reporter:
         self._is_others = False
         try:
             listener = _listener()
-        except (OSError, ValueError, IndexError):  # no such table here, or not one that we can read
+        except (OSError, ValueError, IndexError):  # this system has no such table, or one that we cannot read
             if now >= self._next_repeat:
                 self._forget_service()
                 self._next_repeat = now + _REPEAT_SECONDS
@@ -536,11 +555,12 @@ class Reporter:
             return
         self._service = listener.inode
         self._is_others = not listener.is_own and not self._allow_others
-        # Another user's may make room for this user's at any time.
+        # While another user's service has the port, we look before each event: this user's service may take its place
+        # at any time.
         self._next_look = now if self._is_others else now + _LOOK_SECONDS
 
     def _forget_service(self) -> None:
-        """A service that was restarted knows neither module nor user."""
+        """Makes the announcements due again: a service that was restarted knows neither the module nor the user."""
         self._service = None
         self._user_is_told = False
         self._module_is_told = False
@@ -561,8 +581,8 @@ class Reporter:
         self._socket = None
 
     def _begin_in_child(self) -> None:
-        self._lock = threading.RLock()  # the old one may be held by a thread that the child does not have
-        self._drop_socket()  # on a shared socket, one process would be told of the other's errors
+        self._lock = threading.RLock()  # a thread that the child does not have may hold the old lock
+        self._drop_socket()  # on a shared socket, parent and child could each get the other's errors
 
 
 _REPORTERS: weakref.WeakSet[Reporter] = weakref.WeakSet()
@@ -583,17 +603,18 @@ _EventIdOf = Union[str, Callable[[logging.LogRecord], str]]
 
 
 class ReportHandler(logging.Handler):
-    """Sends each log record as an event, for Python's own logging.
+    """A handler for Python's own logging. It sends each log record as an event.
 
         logging.getLogger().addHandler(ReportHandler(reporter, "B100|%(name)s", level=logging.WARNING))
 
-    `event_id` is a text in which "%(name)s" and the record's other attributes are filled in, or a function of the
-    record. The value is an object with "level", "logger", "message", "file" and "line"; the message is what the
-    handler's formatter makes of the record, by default the message and the exception's trace. One that is too long for
-    a datagram is cut at its end, and the object has "cut" then.
+    `event_id` is a text in which "%(name)s" and the record's other attributes are filled in, or a function that gets
+    the record and returns the event id. The value is an object with "level", "logger", "message", "file" and "line".
+    The message is what the handler's formatter makes of the record: by default the message and the exception's trace.
+    A message that is too long for a datagram is cut at its end; the object then has "cut": true.
 
-    Failure: nothing is raised or printed. `failed` counts the records that could not be formatted, and those that were
-    logged while a record of the same thread was being sent; what became of the others, the reporter counts.
+    Failure: the handler raises and prints nothing. `failed` counts the records that could not be formatted, and those
+    that were logged while the handler was sending another record of the same thread. The reporter counts the results of
+    all other records.
     """
 
     def __init__(self, reporter: Reporter, event_id: _EventIdOf = "Log|%(name)s", level: int = logging.NOTSET) -> None:
@@ -604,7 +625,7 @@ class ReportHandler(logging.Handler):
         self._thread = threading.local()
 
     def emit(self, record: logging.LogRecord) -> None:
-        if getattr(self._thread, "is_busy", False):  # a text of the record logs while it is made
+        if getattr(self._thread, "is_busy", False):  # sending a record has logged this record in the same thread
             self.failed += 1
             return
         self._thread.is_busy = True
@@ -633,7 +654,8 @@ class ReportHandler(logging.Handler):
 
 
 def _readable(text: str) -> str:
-    """File names that are no UTF-8 reach Python as lone surrogates. A log says them in escapes, rather than nothing."""
+    """The text with each lone surrogate written as an escape. Python reads a file name that is not UTF-8 with lone
+    surrogates; without the escapes, such a record could not be sent."""
     return text.encode("utf-8", "backslashreplace").decode()
 
 

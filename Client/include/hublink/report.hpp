@@ -134,8 +134,7 @@ public:
     using Time = std::chrono::system_clock::time_point;
 
     /// Makes a reporter for the local store, and for the analytics module "A759", which the service knows
-    /// from
-    /// its start.
+    /// from its start.
     HUBLINK_EXPORT Reporter() noexcept;
 
     /// Makes a reporter for the same, and for the program's own module. The module is copied.
@@ -151,9 +150,8 @@ public:
     /// without white space. For analytics nothing, or a JSON object, in which the service itself sets the
     /// members "openid" and "sys_version".
     /// `time`: when it happened, in milliseconds; without it, now. (The service takes a time of ten digits
-    /// for
-    /// seconds. So a time of ten digits in milliseconds, in some months of 1970, is sent and stored with a
-    /// zero in front.)
+    /// for seconds. So a time of ten digits in milliseconds, in some months of 1970, is sent and stored with
+    /// a zero in front.)
     /// `isDayReport`: whether the event is a report about a day.
     HUBLINK_EXPORT Result Event(std::string_view eventId, Value value = {},
                                 std::optional<Time> time = std::nullopt, bool isDayReport = false) noexcept;
@@ -162,8 +160,7 @@ public:
     /// report, also to those of other programs, because it knows one user only. With an empty version, the
     /// service keeps the version that it knows. The message is sent at once. When a text in it cannot be sent
     /// (InvalidText, QuoteInUser, TooLong), nothing changes. When the system does not take the message now,
-    /// it
-    /// is sent before the next event.
+    /// it is sent before the next event.
     HUBLINK_EXPORT Result SetUser(std::string_view openId, std::string_view suiteVersion = {}) noexcept;
 
     /// How many calls of Event and SetUser returned this result.

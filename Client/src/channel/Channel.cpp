@@ -9,15 +9,13 @@
 namespace hublink {
 namespace {
 
-/// How often the reporter looks who listens, when events are sent. A service that was restarted between two
-/// events can lose the events of this time, because it does not know the module yet. A look takes 15 µs, so
-/// it
-/// uses 15 millionths of the time.
+/// The time between two looks for the listener while events are sent. After a restart between two events, the
+/// service can lose the events of this time, because it does not know the module yet. A look takes 15 µs, so
+/// looking uses 15 millionths of the time.
 constexpr std::chrono::seconds LOOK_INTERVAL{1};
 
 /// How often everything is announced again on a system where a restart cannot be seen. A restarted service
-/// can
-/// lose the events of this time, which is accepted; one datagram in this time is no load.
+/// can lose the events of this time, which is accepted; one datagram in this time is no load.
 constexpr std::chrono::minutes TELL_INTERVAL{3};
 
 Result ResultOf(Socket::Outcome outcome) {
@@ -139,8 +137,7 @@ void Channel::AnnounceAgain() noexcept {
 }
 
 /// The child opens a socket of its own. With a shared socket, parent and child could each get the error of
-/// the
-/// other's datagram.
+/// the other's datagram.
 void Channel::BeginInChild() noexcept {
     m_socket.Close();
 }

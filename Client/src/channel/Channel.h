@@ -20,9 +20,9 @@ namespace hublink {
 ///        └── the next event asks anew
 ///
 /// After "gone" and "restarted", both announcements are due. The announcements that are due are sent before
-/// the
-/// datagram: the user, when one was set, and the module, when the event belongs to it. When an announcement
-/// cannot be sent, the event is not sent either: the service would lose it or store it for the wrong user.
+/// the datagram: the user, when one was set, and the module, when the event belongs to it. When an
+/// announcement cannot be sent, the event is not sent either: the service would lose it or store it for the
+/// wrong user.
 ///
 /// Threads: any.
 class Channel final : private ForkGuard {

@@ -5,10 +5,8 @@
 namespace hublink {
 
 /// A lock that also works in the child of a fork. A plain lock that another thread holds at the fork would
-/// stay
-/// locked in the child for ever. So the fork's handlers lock all guards before the fork, and unlock them
-/// after
-/// it in the parent and in the child.
+/// stay locked in the child for ever. So the fork's handlers lock all guards before the fork, and unlock them
+/// after it in the parent and in the child.
 ///
 /// Threads: any. Destroy it when no thread uses it any more.
 class ForkGuard {
@@ -22,8 +20,7 @@ protected:
 
     /// Puts the guard into the list that the fork's handlers use, and takes it out again. The derived class
     /// calls Enlist last in its constructor and Delist first in its destructor, because another thread may
-    /// fork
-    /// at any moment, and BeginInChild needs a complete object.
+    /// fork at any moment, and BeginInChild needs a complete object.
     void Enlist() noexcept;
     void Delist() noexcept;
 

@@ -26,8 +26,7 @@ public:
     constexpr bool Has(char byte) const { return m_has[static_cast<unsigned char>(byte)]; }
 
     /// The position of the first byte of the set in the text, at or after `from`. The text's size when there
-    /// is
-    /// no such byte.
+    /// is no such byte.
     std::size_t FindIn(std::string_view text, std::size_t from = 0) const {
         while (from < text.size() && !Has(text[from]))
             ++from;

@@ -20,18 +20,15 @@ struct JsonFacts {
 };
 
 /// A text with more levels than this is too long for a datagram. ReadJson stops there and says that the text
-/// is
-/// not JSON, with this number of levels.
+/// is not JSON, with this number of levels.
 inline constexpr std::size_t MAX_LEVELS = MAX_DATAGRAM_BYTES;
 
 /// Reads a valid text (IsText) by JSON's grammar. An escape must be a whole character: half a surrogate pair
-/// is
-/// an error. Does not recurse.
+/// is an error. Does not recurse.
 JsonFacts ReadJson(std::string_view text);
 
 /// Appends a text that ReadJson found to be JSON, as a JSON value and without white space. Quotes::Doubled
-/// also
-/// doubles a quote that is written as an escape.
+/// also doubles a quote that is written as an escape.
 /// `isCompact`: JsonFacts::isCompact of the text; false when it is not known.
 void AppendJson(Buffer& buffer, std::string_view json, Quotes quotes, bool isCompact);
 

@@ -35,8 +35,7 @@ Fate FateOfInteger(std::string_view number) {
 }
 
 /// A number with a fraction or an exponent, taken apart: its digits from the first that is not zero to the
-/// last
-/// that is not zero, and the power of ten of the first of these digits. The sign is dropped.
+/// last that is not zero, and the power of ten of the first of these digits. The sign is dropped.
 class Decimal {
 public:
     explicit Decimal(std::string_view number) {

@@ -5,8 +5,7 @@
 namespace hublink::wire {
 
 /// What happens to a number in the service, which reads it and prints it again. The service keeps an integer
-/// of
-/// 64 bits digit for digit, and any other number as a double.
+/// of 64 bits digit for digit, and any other number as a double.
 enum class Fate {
     Exact,   ///< It stays the same number, digit for digit.
     Rounded, ///< It becomes the nearest double, which is what most JSON readers make of it anyway.

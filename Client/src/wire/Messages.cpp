@@ -26,9 +26,8 @@ void AppendValue(Buffer& buffer, const Report& report) {
 }
 
 /// Appends the inside of a JSON string of a control message. The service takes every datagram with the
-/// letters
-/// eventID in it for a report. So one of the letters is written as an escape, which a JSON reader turns back
-/// into the letter.
+/// letters eventID in it for a report. So one of the letters is written as an escape, which a JSON reader
+/// turns back into the letter.
 void AppendMasked(Buffer& buffer, std::string_view text) {
     constexpr std::string_view MARK = "eventID";
     constexpr std::string_view MASKED = "event\\u0049D";
