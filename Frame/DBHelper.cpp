@@ -48,10 +48,11 @@ bool DBHelper::BatExecSql(std::vector<std::string> sqls) {
     for (int attempt = 0; attempt < BATCH_ATTEMPTS; ++attempt) {
         if (m_pSqliteDb->BatExecSql(sqls))
             return true;
-        // The error text is the format string, deliberately: one with a percent sign is found in the log by
-        // the mark "[BoostLogError]".
+        // The error text is the format string, deliberately: people find an error text with a percent sign in
+        // the log, by the mark "[BoostLogError]".
         WriteLog({LogLevel::Error, "BatExecSql"}, m_pSqliteDb->GetLastErrorMsg());
-        // After the last failure too: a caller that starts over at once does not hammer a busy database.
+        // It pauses after the last failure, too: a caller that starts over at once must not overload a busy
+        // database.
         Poco::Thread::sleep(BATCH_PAUSE_MS);
     }
     return false;
@@ -59,12 +60,12 @@ bool DBHelper::BatExecSql(std::vector<std::string> sqls) {
 
 bool DBHelper::GetTotalCount(const std::string& sql, int& count) {
     count = 0;
-    // No test for a missing object here, deliberately: to count before Init is the caller's mistake, and must
-    // not look like an ordinary failure.
+    // There is no test for a null object here, deliberately: to count before Init is the caller's mistake,
+    // and must not look like an ordinary failure.
     return m_pSqliteDb->GetTotalCount(sql, count) || Report("GetTotalCount", __LINE__, sql);
 }
 
-/// Logs why the plug-in's operation failed; always false.
+/// Logs why an operation of the plug-in failed; always false.
 bool DBHelper::Report(const char* function, int line, const std::string& sql) const {
     WriteLog({LogLevel::Error, function, line}, "%s-%s", m_pSqliteDb->GetLastErrorMsg(), sql);
     return false;

@@ -29,8 +29,8 @@ bool FrameWorker::Init() {
             WriteLog({LogLevel::Error, "Init"}, "Failed to load sqlite plugin:" + library);
             return false;
         }
-        // The result is not looked at, deliberately: the file may be made later, and until then each insert
-        // that fails says so.
+        // The result is ignored, deliberately: the file may be made later. Until then, each insert fails and
+        // logs that.
         m_pSqliteDb->Open(Paths::Store(m_pServer->GetBaseInfo().userDataDir));
         DBHelper::instance().Init(m_pSqliteDb);
         SetUserBaseInfo();
@@ -48,10 +48,10 @@ void FrameWorker::SetUserBaseInfo() {
     std::map<std::string, std::string> settings;
     for (const auto& row : rows)
         if (row.size() >= 2)
-            settings[row[0]] = row[1]; // of rows with the same key, the last counts
+            settings[row[0]] = row[1]; // when rows have the same key, the last row counts
 
-    // A missing key passes the record's default on, and the server takes it over: it ignores empty texts, not
-    // defaults.
+    // When a key is missing, `info` passes its default on, and the server accepts that: it ignores empty
+    // texts but not defaults.
     ST_BaseInfo info;
     if (const auto found = settings.find("OpenID"); found != settings.end())
         info.openID = found->second;
@@ -63,10 +63,10 @@ void FrameWorker::SetUserBaseInfo() {
 bool FrameWorker::Send(const ST_OptLog& log) {
     try {
         const ST_BaseInfo& info = m_pServer->GetBaseInfo();
-        // The texts go in as they are, deliberately: a sender may double its quotes itself, and escaping
-        // again would store them doubled. A text with a lone quote makes a statement that the database
-        // rejects. What a text may do inside the statement, the plug-in limits.
-        // Poco::format would give the same text, ten times slower: it makes a stream for each value.
+        // The texts are not escaped, deliberately: a sender may double its quotes itself, and to escape them
+        // again would store them doubled. A text with a single quote makes a statement that the database
+        // rejects. The plug-in limits what a text can do inside the statement. We use fmt because
+        // Poco::format, which gives the same text, takes ten times as long: it makes a stream for each value.
         const std::string sql =
             fmt::format("insert into OperLog (eventID,value,createTime,pType,extData3,extData4) "
                         "values('{}', '{}','{}',{},'{}','{}')",

@@ -12,15 +12,15 @@ namespace SyncServiceReport {
 
 class ReportServer;
 
-/// The local store: appends each report to the table OperLog of "Report.db" in the user's data directory, and
-/// reads the stored open id and suite version from the table BaseInfo at the start. It makes neither the file
-/// nor the tables.
+/// The local store. It appends each report to the table OperLog of "Report.db" in the user's data directory.
+/// At the start it reads the stored open id and suite version from the table BaseInfo. It makes neither the
+/// file nor the tables.
 ///
 /// Life: constructed → initialised. Until Init has given the plug-in's object to DBHelper, every Send returns
-/// false silently; when Init fails after that, Send still tries.
+/// false and logs nothing. When Init fails after that step, Send still tries.
 ///
 /// Ownership: keeps the server without owning it; owns the plug-in through its loader. The destructor unloads
-/// the plug-in, and DBHelper must not be called from then on.
+/// the plug-in; after that, DBHelper must not be called.
 ///
 /// Threads: Init on the starting thread, before any report; Send on the consuming thread only.
 ///
@@ -33,15 +33,16 @@ public:
     FrameWorker(const FrameWorker&) = delete;
     FrameWorker& operator=(const FrameWorker&) = delete;
 
-    /// Loads the SQLite plug-in, opens the database and reads the base information. True when all of that ran
-    /// to its end; a database that does not open shows later, as failing statements.
+    /// Loads the SQLite plug-in, opens the database and reads the base information. False when there is no
+    /// plug-in or a step threw. A database that cannot be opened does not make it false: the statements fail
+    /// later.
     bool Init();
 
-    /// Reads the stored open id and suite version into the server; leaves the server's alone when there is no
-    /// row at all. Exceptions go to the caller.
+    /// Reads the stored open id and suite version and gives them to the server. When the table has no row at
+    /// all, the server keeps its values. Exceptions go to the caller.
     void SetUserBaseInfo();
 
-    /// Inserts one row. Nothing is retried or kept.
+    /// Inserts one row. A row that fails is not kept here and not tried again.
     bool Send(const ST_OptLog& log) override;
 
 private:

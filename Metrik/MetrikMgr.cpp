@@ -40,8 +40,8 @@ void MetrikMgr::AddWorker(const ST_InitMsg& msg) {
         return;
     Poco::SharedPtr<MetrikWorker> worker(new MetrikWorker(m_pServer));
     m_pNewest = worker;
-    // The result is not looked at, deliberately: a worker whose SDK did not start is registered all the same,
-    // so that a module which announces itself again and again does not load the SDK again and again.
+    // The results below are ignored, deliberately: a worker whose SDK did not start is registered, too.
+    // Otherwise a module that announces itself repeatedly would load the SDK each time.
     if (msg.moduleID == DEFAULT_MODULE_ID)
         worker->InitDefalut();
     else
@@ -56,7 +56,7 @@ bool MetrikMgr::Update(const std::string& json) {
         JsonDocument parser;
         const JsonDocument message = parser.FromJson(json, error);
         if (!error.empty()) {
-            // The log's readers search for this spelling.
+            // People search the log for this spelling.
             WriteLog({LogLevel::Error, "Update", 53}, "json formate error :%s", error);
             Ended(Outcome::NotJson);
             return false;
@@ -74,7 +74,8 @@ bool MetrikMgr::Update(const std::string& json) {
             openID = exdata.GetKeyValue("openID").ToString();
             version = exdata.GetKeyValue("hublinkVersion").ToString();
         }
-        if (!openID.empty()) { // a version alone is not passed on, deliberately: it belongs to a user
+        // A version without an open id is not passed on, deliberately: it belongs to a user.
+        if (!openID.empty()) {
             ST_BaseInfo info;
             info.openID = openID;
             info.suiteVersion = version;

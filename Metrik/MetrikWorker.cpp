@@ -52,10 +52,10 @@ bool MetrikWorker::Init(const ST_InitMsg& msg) {
     return true;
 }
 
-/// Loads a plug-in of this worker's own; its object, or null after logging in the name of `function` what is
-/// missing.
+/// Loads the plug-in for this worker alone and returns the plug-in's object. When something is missing, this
+/// logs what, with `function` as the function's name, and returns null.
 IMetrikSdk* MetrikWorker::LoadSdk(const char* function, int loaderLine, int interfaceLine) {
-    m_pSdk = nullptr; // it goes with the loader that held it
+    m_pSdk = nullptr; // the old object is destroyed with the loader that held it
     const std::string library = ORVEK_EXCUTABLE_PATH + "libMetrikSdk.dylib";
     m_pSdkLoader = new SdkLoader(library);
     if (m_pSdkLoader.isNull()) {
@@ -83,8 +83,8 @@ bool MetrikWorker::Send(const ST_OptLog& log) {
             JsonDocument value;
             eventData = value.FromJson(log.value, error);
             if (!error.empty()) {
-                WriteLog({LogLevel::Error, "Send", 107},
-                         error); // the parser's text is the format, deliberately
+                // The parser's error text is the format string, deliberately.
+                WriteLog({LogLevel::Error, "Send", 107}, error);
                 Ended(Outcome::ValueNotJson);
                 return false;
             }

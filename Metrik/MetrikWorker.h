@@ -12,10 +12,10 @@ namespace SyncServiceReport {
 
 class ReportServer;
 
-/// Told by the SDK, on any of its threads, that something failed: logged.
+/// The SDK calls this, on any of its threads, when something failed. Logs both texts.
 void FailCallBackFun(std::string a, std::string b);
 
-/// Told by the SDK that something succeeded: ignored, the log is for what needs looking at.
+/// The SDK calls this when something succeeded. Does nothing: the log is for what needs attention.
 void SuccCallBackFun(std::string a, std::string b);
 
 /// Connects one module to the analytics SDK: each worker has an SDK object of its own.
@@ -23,12 +23,12 @@ void SuccCallBackFun(std::string a, std::string b);
 /// Life: created → initialised by one successful InitDefalut or Init. A worker whose initialisation failed
 /// answers every Send with false and is not tried again.
 ///
-/// Ownership: keeps the server without owning it; owns the plug-in through its loader, which takes the SDK
-/// object back when the worker goes.
+/// Ownership: keeps the server without owning it; owns the plug-in through its loader. The destructor gives
+/// the SDK object back to the plug-in.
 ///
-/// Threads: one at a time, the consuming thread once the service runs.
+/// Threads: one at a time; once the service runs, only the consuming thread.
 ///
-/// Failure: no exception leaves InitDefalut or Send; one leaves Init, for the manager to log.
+/// Failure: no exception leaves InitDefalut or Send. Exceptions leave Init, and the manager logs them.
 class MetrikWorker : public IWorker {
 public:
     explicit MetrikWorker(ReportServer* server);
@@ -37,15 +37,15 @@ public:
     MetrikWorker(const MetrikWorker&) = delete;
     MetrikWorker& operator=(const MetrikWorker&) = delete;
 
-    /// Starts the SDK for the built-in module, in the user's data directory. The misspelling is part of the
+    /// Starts the SDK for the default module, in the user's data directory. The misspelling is part of the
     /// name.
     bool InitDefalut();
 
-    /// Starts the SDK for a module that announced itself, with the texts as it gave them, empty ones
-    /// included.
+    /// Starts the SDK for a module that announced itself. The SDK gets the module's texts unchanged, also
+    /// empty ones.
     bool Init(const ST_InitMsg& msg);
 
-    /// Hands the report to the SDK and returns the SDK's answer.
+    /// Passes the report to the SDK and returns the SDK's answer.
     bool Send(const ST_OptLog& log) override;
 
 private:

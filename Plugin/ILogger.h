@@ -7,20 +7,21 @@ namespace SystemTool::IO {
 
 /// The logger that the plug-in libBoostLogger.dylib implements.
 ///
-/// Ownership: objects are made and destroyed by their plug-in alone ("CreateModule", "DestoryModule").
+/// Ownership: only the plug-in makes and destroys its objects ("CreateModule", "DestoryModule").
 /// Threads: WriteLog from any thread; InitLog once, before the threads that log are started.
 class ILogger {
 public:
-    /// Configures the one sink of the process; every instance, this one and all others, writes into it from
-    /// then on. Until then nothing is written anywhere.
+    /// Configures the one sink of the process. From then on, every logger object of the process writes into
+    /// it. Until then, nothing is written anywhere.
     ///
-    /// Makes `logDir` where it is missing and opens `fileName` in it for appending. The file is rotated at
-    /// `maxFileBytes`; the oldest rotated files are deleted so that all of them with the live one stay within
-    /// `maxTotalBytes`. `flushEach` other than 0: a record is in the file when WriteLog returns. `console`
-    /// other than 0: records are copied to standard output.
+    /// Makes `logDir` when it is missing, and opens `fileName` in it for appending. The file is rotated at
+    /// `maxFileBytes`. The oldest rotated files are deleted, so that the live file and all rotated ones
+    /// together stay within `maxTotalBytes`. When `flushEach` is not 0, a record is in the file when WriteLog
+    /// returns. When `console` is not 0, records are also copied to standard output.
     ///
-    /// Throws SystemTool::BSException when the directory or the file cannot be used. Records are lost then,
-    /// and the log begins, with their number, as soon as it can be written.
+    /// Throws SystemTool::BSException when the directory or the file cannot be used. Records are lost from
+    /// then on. As soon as the file can be written, the log begins with a record that says how many were
+    /// lost.
     virtual void InitLog(const std::string& logDir, const std::string& fileName, const std::string& appName,
                          const std::string& moduleName, std::int64_t maxFileBytes, std::int64_t maxTotalBytes,
                          int flushEach, int console) = 0;

@@ -6,18 +6,22 @@
 /// The local database that the plug-in libOrvekSqlite.dylib implements. The order of the operations is the
 /// plug-in's binary interface.
 ///
-/// Ownership: objects are made and destroyed by their plug-in alone ("CreateModule", "DestoryModule").
+/// Ownership: only the plug-in makes and destroys its objects ("CreateModule", "DestoryModule").
 /// Threads: one thread at a time.
-/// Failure: an operation that returns false has left its reason for GetLastErrorMsg.
-/// Durability: after ExecSql returned true for a statement that came alone (nothing for 10 ms before it), its
-/// effect survives kill -9. In a burst, statements share a transaction that is committed after at most 10 ms
-/// or 1,000 statements, also when nothing follows, so that kill -9 loses at most the last 10 ms of the burst;
-/// a statement that runs for longer by itself holds its transaction up. A statement's own error is its own
-/// result and leaves the others alone. A commit that fails loses nothing: the statements are kept and
-/// committed, in order, once the database takes them, and new ones fail with the error's text meanwhile; one
-/// that a constraint refuses then, after another program's change, is dropped without a word. Every other
+/// Failure: an operation that returns false has stored its reason for GetLastErrorMsg.
+///
+/// Durability: when a statement comes alone (no other statement in the 10 ms before it) and ExecSql returns
+/// true, its effect survives kill -9. In a burst, statements share a transaction. It is committed after at
+/// most 10 ms or 1,000 statements, also when no further statement comes, so that kill -9 loses at most the
+/// last 10 ms of the burst. Only a single statement that itself runs longer delays the commit. Every other
 /// operation on the database commits first.
-/// Other programs: the write lock is free between transactions, and held for one of them at the longest.
+///
+/// Errors in a burst: a statement's own error is its own result and does not affect the others. A commit that
+/// fails loses nothing: the plug-in keeps the statements and commits them, in order, once the database
+/// accepts them. Until then, new statements fail with the error's text. A kept statement that a constraint
+/// then refuses, after a change by another program, is dropped without a message.
+///
+/// Other programs: the write lock is free between transactions, and is held for one transaction at most.
 class ISqliteDatabase {
 public:
     /// Opens the SQLite database file at `path` for all later operations.

@@ -12,30 +12,30 @@ namespace SystemTool {
 
 /// Owns one plug-in library and the object of interface `T` that the library makes.
 ///
-/// A plug-in exports two functions with C linkage: "CreateModule" returns a new object, "DestoryModule" takes
-/// it back. The second name is misspelled on purpose: every plug-in of the suite exports it so.
+/// A plug-in exports two functions with C linkage: "CreateModule" returns a new object, and "DestoryModule"
+/// destroys it. The second name is misspelled on purpose: every plug-in of the suite exports it so.
 ///
-/// Life: constructed → loaded (GetModule gives the object) → unloaded (the object is gone, its pointer is not
-/// cleared and must not be used any more). A failed load can be tried again by calling Load.
+/// Life: constructed → loaded (GetModule gives the object) → unloaded (the object is destroyed; its pointer
+/// stays as it was and must not be used any more). A load that failed can be tried again by calling Load.
 ///
-/// Threads: Load and Unload from any thread. Using the object is the plug-in's affair; nothing is locked
-/// meanwhile.
+/// Threads: Load and Unload from any thread. The lock does not cover the use of the object: the plug-in's
+/// interface says which threads may use it.
 ///
-/// Failure: never logged here, because the logger itself comes through a loader. Load's result and
-/// GetLastError tell.
+/// Failure: the result of Load, and GetLastError. Nothing is logged here, because the logger itself is loaded
+/// by this class.
 template <typename T>
 class ModuleLoader {
 public:
-    /// Loads at once the library at `path`, the full path of the file, used exactly as given. Callers test
-    /// GetModule.
+    /// Loads the library at once. `path` is the full path of the file, and is used exactly as given. When the
+    /// load fails, GetModule returns null: callers test that.
     explicit ModuleLoader(const std::string& path) : m_strModulePath(path) {
         ConfigureModuleName();
         m_pDllLoader = std::make_unique<DllLoader>();
         Load();
     }
 
-    /// Unloads, once. A library without "DestoryModule" ends the process here: its object cannot be given
-    /// back, and an exception cannot leave a destructor.
+    /// Calls Unload, once. When the library has no "DestoryModule", this ends the process: the object cannot
+    /// be destroyed, and an exception cannot leave a destructor.
     ~ModuleLoader() {
         if (m_bReleased)
             return;
@@ -47,8 +47,8 @@ public:
     ModuleLoader(const ModuleLoader&) = delete;
     ModuleLoader& operator=(const ModuleLoader&) = delete;
 
-    /// Sets the module's name to the file-name part of the path. A path without any directory gives an empty
-    /// name; that is deliberate, callers use the name only to tell installed plug-ins apart, and those have
+    /// Sets the module's name to the file-name part of the path. A path without a directory gives an empty
+    /// name. That is deliberate: callers use the name only to distinguish installed plug-ins, and those have
     /// full paths.
     void ConfigureModuleName() {
         if (m_strModulePath.empty()) {
@@ -62,8 +62,8 @@ public:
         m_strModuleName = separator == std::string::npos ? std::string() : path.substr(separator + 1);
     }
 
-    /// Opens the library and has it make its object; true when that is done or was done before. A library
-    /// that opened but lacks "CreateModule" stays open, so that the next call returns true without an object.
+    /// Opens the library and calls its "CreateModule". True when that succeeded now or before. A library
+    /// without "CreateModule" stays open, so the next call returns true although there is no object.
     bool Load() {
         const std::lock_guard lock(m_mutex);
         if (m_strModulePath.empty())
@@ -81,7 +81,7 @@ public:
         return true;
     }
 
-    /// Gives the object back and closes the library; true also when no library was open. Throws
+    /// Destroys the object and closes the library; true also when no library was open. Throws
     /// boost::system::system_error when the library has no "DestoryModule".
     bool Unload() {
         if (!m_pDllLoader)
@@ -104,8 +104,8 @@ public:
     const std::string& GetModuleName() const { return m_strModuleName; }
 
 private:
-    /// A plug-in that throws stays open for the rest of the process: its exception may be of a class of its
-    /// own, whose code must be there for as long as the exception exists.
+    /// When "CreateModule" throws, the plug-in stays open until the process ends: the exception may be of a
+    /// class of the plug-in, whose code must stay loaded for as long as the exception exists.
     T* Create() {
         try {
             return m_pDllLoader->template get<T*()>("CreateModule")();

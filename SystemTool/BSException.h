@@ -12,8 +12,8 @@ namespace SystemTool {
 /// BSErrorText("...")`.
 using BSErrorText = boost::error_info<struct BSErrorTextTag, std::string>;
 
-/// The exception that crosses the border between a plug-in and the program. Its type is visible to both on
-/// purpose: a handler in the program must recognise what the plug-in threw.
+/// The exception that a plug-in may throw into the program. Its type is exported on purpose: otherwise a
+/// handler in the program would not recognise what the plug-in threw.
 class __attribute__((visibility("default"))) BSException : public std::exception, public boost::exception {
 public:
     explicit BSException(std::string text) : m_text(std::move(text)) {}

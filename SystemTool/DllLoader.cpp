@@ -7,8 +7,8 @@ bool DllLoader::Load(const std::string& path) {
         load(path, boost::dll::load_mode::rtld_now | boost::dll::load_mode::rtld_local);
         return true;
     } catch (const std::exception& error) {
-        // Of the two forms that take no exception, neither keeps the system's own words ("file too short",
-        // "undefined symbol: ..."), which are what a person needs.
+        // We use the form of load that throws. The two forms that return an error code lose the system's own
+        // words ("file too short", "undefined symbol: ..."), and a person needs those.
         m_strLastError = "Cannot open the library " + path + ": " + error.what();
         return false;
     }

@@ -6,13 +6,13 @@
 
 namespace SystemTool {
 
-/// A shared library that is opened at run time. Closed by the destructor.
-/// One thread at a time; a symbol that was fetched must not be used after Unload.
+/// A shared library that is opened at run time. The destructor closes it. One thread at a time. A symbol of
+/// the library must not be used after Unload.
 class DllLoader : public boost::dll::shared_library {
 public:
-    /// Opens the library at `path`, used exactly as given (no prefix, no suffix), with all its symbols
-    /// resolved, so that an incomplete library fails here and not in the middle of a call. Returns false on
-    /// failure; GetLastError then tells why. A library that was open before is closed first.
+    /// Opens the library at `path`, which is used exactly as given (no prefix, no suffix). All its symbols
+    /// are resolved at once, so that an incomplete library fails here and not in the middle of a call. A
+    /// library that was open before is closed first. False on failure; GetLastError then gives the reason.
     bool Load(const std::string& path);
 
     bool IsLoad() const { return is_loaded(); }

@@ -3,14 +3,14 @@
 #include <algorithm>
 #include <array>
 
-// Linked into programs and plug-ins as an object, because the linker leaves out of a library what is not
+// This file is linked as an object and not as a library: from a library, the linker leaves out what is not
 // called.
 namespace SystemTool::PackageNote {
 namespace {
 
 constexpr char TEXT[] = R"({"type":"program","name":"sync-service-report","version":")" SSR_VERSION R"("})";
 
-/// As the ELF format lays a note out: three words, the owner and the text, each padded to a word.
+/// A note as the ELF format defines it: three words, the owner and the text, each padded to a word.
 struct alignas(std::uint32_t) Note {
     std::uint32_t ownerBytes = sizeof OWNER;
     std::uint32_t textBytes = sizeof TEXT;
@@ -27,8 +27,8 @@ constexpr Note Make() {
     return note;
 }
 
-// The alignment by name: the compiler would align a record of this size by more than a reader of notes
-// accepts.
+// We set the alignment ourselves: the compiler would align a record of this size to more than readers of
+// notes accept.
 [[gnu::section(".note.package"), gnu::used, gnu::aligned(sizeof(std::uint32_t))]] constexpr Note NOTE =
     Make();
 

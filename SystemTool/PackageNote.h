@@ -2,8 +2,8 @@
 
 #include <cstdint>
 
-/// The note in each program and plug-in of ours that tells its version: the desktop's common form for such
-/// notes, which core dump tools read as well. Its text is JSON.
+/// The note with the version, which each of our programs and plug-ins holds. It has the common form for such
+/// notes on Linux, which core dump tools read, too. Its text is JSON.
 namespace SystemTool::PackageNote {
 
 constexpr char OWNER[] = "FDO";

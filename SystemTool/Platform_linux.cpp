@@ -16,8 +16,7 @@
 namespace SystemTool::Platform {
 namespace {
 
-constexpr std::size_t PASSWORD_ENTRY_BYTES =
-    16384; // what glibc suggests by _SC_GETPW_R_SIZE_MAX, and then some
+constexpr std::size_t PASSWORD_ENTRY_BYTES = 16384; // more than glibc suggests by _SC_GETPW_R_SIZE_MAX
 
 std::string HomeOfPasswordEntry() {
     passwd entry{};
@@ -34,8 +33,8 @@ std::string WithoutTrailingSeparators(std::string path) {
     return path;
 }
 
-/// The text of an absolute path in the environment; empty for an unset, empty or relative one, which the
-/// desktop's base directory rules tell programs to ignore.
+/// The absolute path in an environment variable. Empty when the variable is not set, is empty or holds a
+/// relative path: the desktop's base directory rules tell programs to ignore such values.
 std::string AbsolutePathFromEnvironment(const char* name) {
     const char* value = std::getenv(name); // NOLINT(concurrency-mt-unsafe): no thread sets any
     return value != nullptr && value[0] == '/' ? value : "";
@@ -63,8 +62,8 @@ std::string PrettyNameOf(const char* osReleasePath) {
     return {};
 }
 
-/// A lock of the opening and not of the process: it does not go when another opening of the same file is
-/// closed.
+/// This lock belongs to the open file and not to the process: it stays when the process closes another
+/// descriptor of the same file.
 int ControlLock(int file, int command, struct flock& lock) {
     lock.l_type = F_WRLCK;
     lock.l_whence = SEEK_SET; // with start and length 0: the whole file

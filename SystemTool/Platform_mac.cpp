@@ -37,7 +37,7 @@ std::string OSVersionString() {
 
 std::string ExecutablePath() {
     std::uint32_t size = 0;
-    ::_NSGetExecutablePath(nullptr, &size); // fails, and tells the size
+    ::_NSGetExecutablePath(nullptr, &size); // fails, and sets `size`
     std::string path(size, '\0');
     if (::_NSGetExecutablePath(path.data(), &size) != 0)
         return {};
@@ -76,8 +76,8 @@ bool AllocateFile(int file, std::int64_t bytes) {
     return ::fcntl(file, F_PREALLOCATE, &store) == 0 && ::ftruncate(file, bytes) == 0;
 }
 
-// The process's lock: this system has none of a single opening. Nothing else in the process opens and closes
-// the file.
+// The lock belongs to the process, because this system has no lock that belongs to one open file. Nothing
+// else in the process opens and closes the file.
 bool TryLockFile(int file) {
     struct flock lock {};
     lock.l_type = F_WRLCK;

@@ -9,11 +9,13 @@
 
 #include "SystemTool/PackageNote.h"
 
-// Reads the notes of an ELF file: records of an owner, a type and contents, in segments of their own.
+// Reads the notes of an ELF file. A note has an owner, a type and contents; notes are in segments of their
+// own.
 namespace SystemTool::Version {
 namespace {
 
-constexpr std::size_t MOST_NOTE_BYTES = 65536; // ours are a few hundred; a damaged file may claim anything
+// Ours have some hundred bytes, but a damaged file may claim any length.
+constexpr std::size_t MOST_NOTE_BYTES = 65536;
 constexpr std::size_t WORD = 4;
 constexpr std::size_t DOUBLE_WORD = 8;
 
@@ -64,7 +66,8 @@ void Take(Program& program, std::uint32_t type, std::string_view owner, std::str
         program.version = VersionIn(contents);
 }
 
-/// Takes the first note off; false when there is none, or it claims more than there is.
+/// Reads the first note and removes it from `notes`. False when there is none, or when the note claims to be
+/// longer than `notes` is.
 bool TakeOne(Program& program, std::string_view& notes, std::size_t alignment) {
     const auto padded = [alignment](std::size_t size) {
         return (size + alignment - 1) / alignment * alignment;

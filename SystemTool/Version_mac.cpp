@@ -29,7 +29,7 @@ std::string Hexadecimal(const std::uint8_t (&bytes)[N]) {
 
 } // namespace
 
-/// The version is not in the file here: the note that holds it is ELF's.
+/// The version stays empty: the note that holds it exists only in ELF files.
 Program Of(const std::string& file) {
     std::ifstream input(input, std::ios::binary);
     const auto header = At<mach_header_64>(input, 0);

@@ -6,9 +6,9 @@
 
 namespace SystemTool::Text {
 
-/// A line under construction. It lives on the stack of the thread that logs, and a usual record fits without
-/// an allocation; nothing of it outlives the call, so that nothing has to be destroyed when the process
-/// exits.
+/// A line that is being built. It lives on the stack of the thread that logs, and a usual record fits into it
+/// without an allocation. Nothing of it remains after the call, so nothing has to be destroyed when the
+/// process exits.
 using LineBuffer = boost::container::small_vector<char, 4096>;
 
 inline void Append(LineBuffer& line, std::string_view text) {

@@ -8,9 +8,9 @@ using Byte = std::uint8_t;
 constexpr std::string_view REPLACEMENT = "\xef\xbf\xbd"; // U+FFFD
 constexpr std::size_t LONGEST = 4;
 
-/// How long the character that begins with `lead` must be, and the range of its second byte. The range is
-/// narrower than that of other bytes where it keeps out longer forms, surrogates and values beyond Unicode.
-/// Length 0: no character begins with this byte.
+/// How long the character that begins with `lead` must be, and which values its second byte may have. After
+/// some lead bytes, fewer values are allowed than for other bytes: this excludes forms that are longer than
+/// needed, surrogates, and values beyond Unicode. Length 0: no character begins with this byte.
 struct Form {
     std::size_t length;
     Byte secondMin;

@@ -9,8 +9,8 @@
 /// UTF-8 in texts from outside. Pure functions, safe from any thread.
 namespace SystemTool::Text {
 
-/// Whether all bytes are ASCII, which is valid UTF-8. It looks at eight bytes at a time: almost every text is
-/// ASCII.
+/// Whether all bytes are ASCII, which is valid UTF-8. It tests eight bytes at a time, because almost every
+/// text is ASCII and must be tested to its end.
 inline bool IsAscii(std::string_view text) {
     constexpr std::uint64_t HIGH_BITS = 0x8080808080808080;
     std::uint64_t all = 0;
@@ -29,16 +29,16 @@ inline bool IsContinuation(char byte) {
     return (static_cast<unsigned char>(byte) & 0xc0) == 0x80;
 }
 
-/// The length of the character at the start of `text`, which is not empty: 1 to 4 bytes, or 0 when no valid
-/// character starts there. Longer forms than needed, halves of surrogate pairs and values beyond Unicode are
-/// not valid.
+/// The length of the character at the start of `text`, which must not be empty: 1 to 4 bytes, or 0 when no
+/// valid character starts there. Forms that are longer than needed, halves of surrogate pairs and values
+/// beyond Unicode are not valid.
 std::size_t CharacterLength(std::string_view text);
 
-/// The text with U+FFFD in place of each byte that is no part of a valid character.
+/// The text with U+FFFD in place of each byte that is not part of a valid character.
 std::string ValidUtf8(std::string_view text);
 
-/// The first `maxBytes` of the text at most, ending at a whole character. Where the limit falls among bytes
-/// that are no UTF-8, the text is cut at the limit.
+/// At most the first `maxBytes` of the text, cut at the end of a whole character. When the bytes at the limit
+/// are not UTF-8, the text is cut at the limit itself.
 std::string_view CutUtf8(std::string_view text, std::size_t maxBytes);
 
 } // namespace SystemTool::Text
