@@ -8,21 +8,22 @@
 
 namespace ReportLedger {
 
-/// The counters at a moment, as plain numbers in the places of Counter and Outcome.
+/// The values of all counters at one moment, as plain numbers. Counter and Outcome give their places.
 using Counts = std::array<std::uint64_t, COUNTERS>;
 
-/// Copies them one by one, the last first: how a datagram ended is copied before what was received, so that
-/// no copy has more ends than datagrams, also when the service counts meanwhile.
+/// Copies the counters one by one, from the last to the first. So the counters of how datagrams ended are
+/// copied before the counter of received datagrams. A copy therefore never has more ends than datagrams, also
+/// when the service counts meanwhile.
 Counts CopyOf(const Counters& counters);
 
-/// Datagrams that have ended while a process ran: what was ignored, stored, handed on, understood or refused.
+/// The number of datagrams that have ended while a process ran: the empty ones, and those of every Outcome.
 std::uint64_t EndedIn(const Counts& counts);
 
-/// Reports in the queue, the one that is being handled included.
+/// The number of reports in the queue, including the one that is being handled.
 std::uint64_t WaitingIn(const Counts& counts);
 
-/// What is received less what is known about it; 0 when the ledger balances, and also right after a datagram
-/// or an end was counted in part.
+/// The received datagrams minus those of which the ledger knows what became of them. 0 when the ledger
+/// balances. For a moment it is not 0, while a datagram or its end has been counted only in part.
 std::int64_t UnaccountedIn(const Counts& counts);
 
 } // namespace ReportLedger

@@ -21,7 +21,8 @@ FileState Judge(const File& content, std::size_t bytes) {
     const bool fits = bytes == FILE_BYTES && header.fileBytes == FILE_BYTES && header.counters == COUNTERS &&
                       header.marks == MARKS && header.markSeconds == MARK_SECONDS &&
                       header.recentMarks == RECENT_MARKS;
-    // A datagram is counted as received before it is counted as anything else, so less than that cannot be.
+    // A datagram is counted as received before it is counted as anything else. So a sound file cannot have
+    // fewer received datagrams than ended and lost ones.
     return fits && total[RECEIVED] >= EndedIn(total) + total[LOST_AT_ENDS] ? FileState::Sound
                                                                            : FileState::Damaged;
 }

@@ -7,18 +7,19 @@
 
 namespace ReportLedger {
 
-/// What can be told of a file's content before anything in it is believed.
+/// What a check of a file's content says. It is made before anything in the content is used.
 enum class FileState {
     Sound,
-    Unfinished,   ///< Nothing is lost with it: its making was cut short.
-    OtherVersion, ///< Of a layout that this program does not know.
-    Damaged,      ///< Cut, or overwritten, or its counters contradict each other.
+    Unfinished,   ///< Its making was interrupted, so it holds no counts yet.
+    OtherVersion, ///< Has a layout that this program does not know.
+    Damaged,      ///< Cut or overwritten, or its counters contradict each other.
 };
 
-/// Judges a file of `bytes` bytes, of which `content` holds as many as it can.
+/// Checks a file that is `bytes` bytes long. `content` holds the beginning of the file.
 FileState Judge(const File& content, std::size_t bytes);
 
-/// Of an open file; nothing when it cannot be read. One that is written meanwhile may seem damaged.
+/// The state of an open file; nothing when it cannot be read. A file that is written meanwhile may seem
+/// damaged.
 std::optional<FileState> StateOf(int file);
 
 } // namespace ReportLedger

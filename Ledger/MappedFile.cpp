@@ -25,7 +25,8 @@ constexpr mode_t FILE_MODE = 0600;
 constexpr int LOCK_ATTEMPTS = 20;
 constexpr auto BETWEEN_ATTEMPTS = std::chrono::milliseconds(5);
 
-/// A predecessor that is just being killed loses its instance lock a moment before this one.
+/// Tries for a short time: a previous process that is being killed loses its instance lock a moment before it
+/// loses this lock.
 bool LockSoon(int file) {
     for (int attempt = 1; !Platform::TryLockFile(file); ++attempt) {
         if (attempt == LOCK_ATTEMPTS)
@@ -35,8 +36,8 @@ bool LockSoon(int file) {
     return true;
 }
 
-/// Without waiting for a writer where the name is that of a pipe; no descriptor for anything but a file that
-/// can be locked.
+/// Opens and locks the file. Does not wait when the path is a pipe. Gives no descriptor for anything that is
+/// not a regular file, or that cannot be locked.
 Descriptor OpenAndLock(const std::string& path, int flags) {
     Descriptor file(::open(path.c_str(), O_RDWR | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC | flags, FILE_MODE));
     struct stat status {};
@@ -51,7 +52,7 @@ File* Map(int file) {
     return memory == MAP_FAILED ? nullptr : static_cast<File*>(memory);
 }
 
-/// The magic number comes last: a file that a kill left half made has none.
+/// Writes the magic number last, so that a file whose making was interrupted by a kill has none.
 void BeginCounting(File& content, Begun begun, std::int64_t nowMs) {
     Header& header = content.header;
     header.version = VERSION;
@@ -62,7 +63,8 @@ void BeginCounting(File& content, Begun begun, std::int64_t nowMs) {
     header.recentMarks = RECENT_MARKS;
     header.begunAtMs = nowMs;
     header.begun = begun;
-    std::atomic_signal_fence(std::memory_order_release); // a kill sees the order of the instructions
+    // The compiler must keep this order, because a kill may come between.
+    std::atomic_signal_fence(std::memory_order_release);
     header.magic = MAGIC;
 }
 
@@ -83,9 +85,8 @@ std::unique_ptr<MappedFile> MappedFile::Open(const std::string& directory, std::
             return nullptr;
         file = OpenAndLock(path, O_CREAT | O_EXCL);
         state = FileState::Unfinished;
-    } else if (*state == FileState::Unfinished &&
-               ::ftruncate(file.Number(), 0) != 0) { // what is left of it, as zeros
-        return nullptr;
+    } else if (*state == FileState::Unfinished && ::ftruncate(file.Number(), 0) != 0) {
+        return nullptr; // an interrupted process has left bytes here, and they must become zeros
     }
     if (!file.IsOpen() || ::fchmod(file.Number(), FILE_MODE) != 0)
         return nullptr;

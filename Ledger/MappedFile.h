@@ -12,30 +12,30 @@ namespace ReportLedger {
 
 /// The ledger's file, open for counting.
 ///
-/// Life: made or found → locked → judged, and set aside when it makes no sense → all its blocks allocated →
-/// mapped. What is written to the memory survives the process's end, however that comes, but not a power
-/// failure of the machine.
+/// Life: made or found → locked → checked, and set aside when it is damaged or of another layout → all its
+/// blocks allocated → mapped. What is written to the memory survives the end of the process, also a kill, but
+/// not a power failure of the machine.
 ///
-/// Failure: Open gives nothing, and leaves no file that it made itself. No signal is handled: the file must
-/// not be cut while it is mapped.
+/// Failure: Open returns null and removes the file that it made. While the file is mapped, it must not be
+/// cut: access to the missing part raises a signal, and no handler for that is installed.
 class MappedFile {
 public:
-    /// Makes what is missing: the directory and its parents with mode 0700, the file with 0600. When another
-    /// process has the file, it waits a tenth of a second for it, no longer.
+    /// Makes what is missing: the directory and its parents with mode 0700, the file with mode 0600. When
+    /// another process holds the lock of the file, this waits a tenth of a second at most.
     static std::unique_ptr<MappedFile> Open(const std::string& directory, std::int64_t nowMs);
 
     ~MappedFile();
     MappedFile(const MappedFile&) = delete;
     MappedFile& operator=(const MappedFile&) = delete;
 
-    /// Valid as long as this object.
+    /// Valid as long as this object exists.
     File& Content() const { return *m_content; }
 
 private:
     MappedFile(SystemTool::IO::Descriptor file, File* content)
         : m_file(std::move(file)), m_content(content) {}
 
-    SystemTool::IO::Descriptor m_file; ///< Stays open for its lock.
+    SystemTool::IO::Descriptor m_file; ///< Stays open, because closing it releases the lock.
     File* m_content;
 };
 

@@ -8,7 +8,8 @@
 namespace ReportLedger {
 namespace {
 
-/// Of the report under way. The thread's own, so that no class has to hand it through its prescribed results.
+/// The outcome of the report that this thread handles. It is thread-local so that no function has to return
+/// it beside its own result.
 thread_local std::optional<Outcome> t_outcome;
 
 } // namespace

@@ -35,7 +35,8 @@ Sight SightOf(FileState state) {
     return Sight::Damaged;
 }
 
-/// Up to its first zero byte, and only what can be printed: the file may be anything.
+/// The field's text up to its first zero byte. A character that cannot be printed becomes a question mark,
+/// because the file may hold anything.
 template <std::size_t SIZE>
 std::string TextOf(const std::array<char, SIZE>& field) {
     std::string text(field.begin(), std::ranges::find(field, '\0'));
@@ -44,7 +45,7 @@ std::string TextOf(const std::array<char, SIZE>& field) {
     return text;
 }
 
-/// Those that were not written meanwhile, and are not of the future.
+/// The marks that were not written during the copy and whose time is not in the future, the oldest first.
 std::vector<MarkAt> MarksOf(std::span<const Mark> marks, std::int64_t nowMs) {
     std::vector<MarkAt> found;
     for (const Mark& mark : marks) {
@@ -58,15 +59,15 @@ std::vector<MarkAt> MarksOf(std::span<const Mark> marks, std::int64_t nowMs) {
     return found;
 }
 
-/// What a process that is gone had received and not ended, as the next start will count it.
+/// Counts as lost what an ended process had received and not ended, in the same way as the next start will.
 void CountAsLost(Counts& total) {
     total[LOST_AT_ENDS] = total[RECEIVED] - EndedIn(total);
     total[HANDLED] = total[QUEUED];
     total[RECEIVING] = 0;
 }
 
-/// Repeated until it balances. One that never does may have been taken in the middle of much work: what moved
-/// between it and the one before is allowed for.
+/// Copies the counters until they balance. Under much work that may never happen: the last copy may be off by
+/// as much as was counted since the copy before it.
 void TakeBalancedLook(const File& content, Look& look) {
     Counts before = CopyOf(content.total);
     for (int i = 0; i < MOST_LOOKS; ++i) {
@@ -92,7 +93,7 @@ void TakeProcess(const File& content, Look& look) {
         look.atStart = CopyOf(content.atStart);
         if (before % 2 == 0 && header.starts.load(std::memory_order_acquire) == before)
             return;
-        if (!look.counting) // it was killed while it started: no process will finish what it wrote
+        if (!look.counting) // the process was killed during its start, so no process will finish this
             return;
         std::this_thread::sleep_for(BETWEEN_LOOKS);
     }
@@ -119,7 +120,7 @@ public:
     bool IsLocked() const { return SystemTool::Platform::IsFileLocked(m_file.Number()); }
 
 private:
-    /// A file of another size is not mapped: reading behind its end would end this program.
+    /// Does not map a file of another size: reading after the end of a shorter file would end this program.
     void Map() {
         struct stat status {};
         m_sight = Sight::Unreadable;
@@ -145,7 +146,8 @@ private:
 Look LookAt(const std::string& path) {
     const OpenFile file(path);
     if (file.GetSight() == Sight::Sound) {
-        // Asked before the counters are read: what a process counts until it ends is then not taken for lost.
+        // We test the lock before we read the counters. After the reading, a process that counts further and
+        // then ends would look dead, and its last reports would look lost.
         const bool counting = file.IsLocked();
         return LookAt(file.Content(), counting, SystemTool::Platform::CoarseTimeMs());
     }
@@ -177,7 +179,8 @@ Look LookAt(const File& content, bool counting, std::int64_t nowMs) {
 
 Counts SinceStart(const Look& look) {
     Counts counts{};
-    for (unsigned i = 0; i < COUNTERS; ++i) // a start that was cut short may have left part of an older one's
+    // An interrupted start may have left some values of an earlier start in `atStart`.
+    for (unsigned i = 0; i < COUNTERS; ++i)
         counts[i] = look.total[i] - std::min(look.atStart[i], look.total[i]);
     counts[MOST_WAITING] = look.total[MOST_WAITING_SINCE_START];
     counts[LOST_AT_ENDS] = 0;

@@ -9,14 +9,14 @@
 
 namespace ReportLedger {
 
-/// Why there is nothing to see.
+/// What was found at the ledger's path. Only with Sound there is something to read.
 enum class Sight {
     Sound,
     Missing,    ///< There is no file.
-    Unreadable, ///< There is something that this user cannot read, or that is no file.
-    Unfinished, ///< The file is being made, or its making was cut short.
+    Unreadable, ///< There is something that this user cannot read or that is no file.
+    Unfinished, ///< The file is being made, or its making was interrupted.
     Damaged,
-    OtherVersion, ///< Of a layout that this program does not know.
+    OtherVersion, ///< The file has a layout that this program does not know.
 };
 
 struct MarkAt {
@@ -24,14 +24,15 @@ struct MarkAt {
     Counts counts;
 };
 
-/// The ledger at a moment. Times are milliseconds since 1970, 0 for never.
+/// The ledger at one moment. Times are milliseconds since 1970, 0 for never.
 struct Look {
-    Sight sight = Sight::Missing; ///< The rest means something when this is Sound.
-    std::int64_t atMs = 0;        ///< When it was taken.
-    bool counting =
-        false; ///< The process that counts lives. Else what it had not ended is in LOST_AT_ENDS already.
-    bool balanced = false;    ///< Received is what ended, waits and was lost.
-    std::int64_t process = 0; ///< That counts, or counted last.
+    Sight sight = Sight::Missing; ///< The other members have a meaning only when this is Sound.
+    std::int64_t atMs = 0;        ///< When this look was taken.
+    /// Whether the process that counts is running. When it is not, LOST_AT_ENDS already includes what that
+    /// process had not ended.
+    bool counting = false;
+    bool balanced = false;    ///< Whether what was received is all ended, waiting or lost.
+    std::int64_t process = 0; ///< The id of the process that counts, or counted last.
     std::int64_t startedAtMs = 0;
     std::int64_t begunAtMs = 0; ///< When the file's counting began.
     Begun begun = Begun::NoFile;
@@ -44,16 +45,16 @@ struct Look {
     std::vector<MarkAt> recent; ///< One each second, the oldest first.
 };
 
-/// Looks at the file, without changing it or its times. Beside a process that counts it takes some
-/// milliseconds at the most: a look that does not balance is repeated, because a report may just be half
-/// counted.
+/// Reads the ledger's file; changes neither the file nor its times. While a process counts, the look is
+/// repeated until it balances, because a report may just be counted in part. This takes some tens of
+/// milliseconds at most.
 Look LookAt(const std::string& path);
 
-/// The same at counters in this process's memory.
+/// The same for counters in this process's memory.
 Look LookAt(const File& content, bool counting, std::int64_t nowMs);
 
-/// What the running process, or the last one, has counted itself: LOST_AT_ENDS is 0, and MOST_WAITING its
-/// own.
+/// What the running process, or the last one, has counted itself. LOST_AT_ENDS is then 0, and MOST_WAITING is
+/// that of this process alone.
 Counts SinceStart(const Look& look);
 
 } // namespace ReportLedger

@@ -10,8 +10,9 @@
 namespace ReportLedger {
 namespace {
 
-/// For the counter's own thread. The release orders it behind what that thread counted before: for a kill at
-/// any instruction and for readers. It costs nothing on the processors that order their stores by themselves.
+/// Only for the thread that owns the counter. Readers, and a kill at any instruction, find this store only
+/// after what the thread counted before: that is what the release is for. On processors that keep stores in
+/// order anyway, it costs nothing.
 void Add(Word& word, std::uint64_t count) noexcept {
     word.store(word.load(std::memory_order_relaxed) + count, std::memory_order_release);
 }
@@ -39,8 +40,8 @@ Mark& OldestOf(std::span<Mark> marks) noexcept {
         marks, {}, [](const Mark& mark) { return mark.atMs.load(std::memory_order_relaxed); });
 }
 
-/// Replaces the oldest mark. Its time is 0 meanwhile: a reader, and the next start after a kill, then leave
-/// it out.
+/// Overwrites the oldest mark. Its time is 0 during that, so that a reader ignores the mark; the next start
+/// after a kill ignores it, too.
 void Write(std::span<Mark> marks, const Counters& counters, std::int64_t nowMs) noexcept {
     Mark& mark = OldestOf(marks);
     Set(mark.atMs, 0);
@@ -50,7 +51,8 @@ void Write(std::span<Mark> marks, const Counters& counters, std::int64_t nowMs) 
     Set(mark.atMs, nowMs);
 }
 
-/// Once in each period. A clock that was set back begins anew: marks of the future say nothing about a rate.
+/// Writes a mark once in each period. When the clock was set back, it first discards all marks: a mark of the
+/// future is useless for a rate.
 void WriteWhenDue(std::span<Mark> marks, const Counters& counters, std::int64_t periodMs,
                   std::int64_t nowMs) noexcept {
     const std::int64_t newest = NewestOf(marks);
@@ -78,8 +80,8 @@ bool Writer::Open(const std::string& directory, const std::string& programVersio
 
 void Writer::BeginProcess(const std::string& programVersion, const std::string& buildId, std::int64_t nowMs) {
     Header& header = m_content->header;
-    const std::uint64_t odd =
-        header.starts.load(std::memory_order_relaxed) | 1U; // a kill may have left it odd
+    // `starts` is already odd when a kill interrupted the last start.
+    const std::uint64_t odd = header.starts.load(std::memory_order_relaxed) | 1U;
     header.starts.store(odd, std::memory_order_seq_cst);
     CountWhatWasLost(nowMs);
     const Counts total = CopyOf(m_content->total);
@@ -94,8 +96,9 @@ void Writer::BeginProcess(const std::string& programVersion, const std::string& 
     Tick(nowMs);
 }
 
-/// What came and did not end. Computed from the whole, and not added: a kill between any two of these stores
-/// leaves nothing to be counted twice.
+/// Counts the datagrams that were received and did not end. The number is computed from the totals and not
+/// added to the old number, so that a kill between any two of these stores makes the next start count nothing
+/// twice.
 void Writer::CountWhatWasLost(std::int64_t nowMs) {
     Counters& total = m_content->total;
     const Counts counts = CopyOf(total);
@@ -132,8 +135,8 @@ void Writer::Queued() noexcept {
     NoteMostWaiting(total[QUEUED].load(std::memory_order_relaxed));
 }
 
-/// What the consuming thread has handled is looked at only when the most may be passed: that cache line is
-/// the other thread's, and a look costs as much as everything else here.
+/// Reads HANDLED only when the number may be a new maximum: the cache line of HANDLED belongs to the
+/// consuming thread, and to read it takes as long as everything else here.
 void Writer::NoteMostWaiting(std::uint64_t queued) noexcept {
     Counters& total = m_content->total;
     if (queued - m_handledSeen <= total[MOST_WAITING_SINCE_START].load(std::memory_order_relaxed))
@@ -146,8 +149,8 @@ void Writer::NoteMostWaiting(std::uint64_t queued) noexcept {
 
 void Writer::CouldNotQueue(std::int64_t nowMs) noexcept {
     const auto exception = static_cast<unsigned>(Outcome::Exception);
-    m_content->total[exception].fetch_add(1,
-                                          std::memory_order_release); // the consuming thread counts them too
+    // Added atomically, because the consuming thread changes this counter, too.
+    m_content->total[exception].fetch_add(1, std::memory_order_release);
     Set(m_content->lastMs[exception], nowMs);
     m_content->total[RECEIVING].store(0, std::memory_order_release);
 }
