@@ -4,12 +4,12 @@
 
 #include "Modules/MetrikSdk/Sdk.h"
 
-// The two exports of the plug-in. The misspelling of the second one is the suite's.
+// The two functions that the plug-in exports. The misspelling of the second one is the suite's.
 
 extern "C" __attribute__((visibility("default"))) IMetrikSdk* CreateModule() {
-    // Before the process first uses SQLite; later it has no effect. The library's allocation statistics take
-    // a lock for each allocation, and are not used. The local store sets the same, but this plug-in is opened
-    // first.
+    // This must come before the process first uses SQLite; later it has no effect. SQLite's allocation
+    // statistics take a lock for each allocation, and are not used. The local store's plug-in makes the same
+    // call, but this plug-in is opened first.
     sqlite3_config(SQLITE_CONFIG_MEMSTATUS, 0);
     try {
         return new MetrikSdk::Sdk(MetrikSdk::process::OutboxRegistry::Instance());

@@ -9,10 +9,10 @@
 namespace MetrikSdk {
 namespace {
 
-/// A module's texts come from datagrams of 10 KiB, and every module's id stays in memory. Longer ones are
-/// cut; no honest module has one.
+/// The most bytes of a module's id. The texts come from datagrams of 10 KiB, and every module's id stays in
+/// memory. Longer texts are cut; a module that is no attacker has none.
 constexpr std::size_t MAX_ID_BYTES = 64;
-constexpr std::size_t MAX_TEXT_BYTES = 256; ///< Of a version or a name.
+constexpr std::size_t MAX_TEXT_BYTES = 256; ///< The same for a version or a name.
 
 std::string Cut(const std::string& text, std::size_t maxBytes) {
     return std::string(SystemTool::Text::CutUtf8(text, maxBytes));
@@ -28,7 +28,7 @@ void Call(IMetrikSdk::Callback callback, const std::string& what, const std::str
     try {
         if (callback != nullptr)
             callback(what, detail);
-    } catch (...) { // the listener's own problem
+    } catch (...) { // an exception of the callback is its own problem
     }
 }
 
@@ -74,7 +74,8 @@ void Sdk::Tell(report::Cause cause, const char* reason) noexcept {
     }
 }
 
-/// Gives the announcement up once it has served, or told that it cannot.
+/// Joins the module to its outbox. After that, or after a refusal was reported, the announcement is deleted.
+/// It stays when an exception is thrown, for the next event to try again.
 bool Sdk::Attach() {
     const auto& given = *m_announcement;
     m_id = StoredId(given.id);
@@ -95,7 +96,7 @@ bool Sdk::Attach() {
     return true;
 }
 
-/// What became of the directory that the module gave, when it is not used.
+/// Reports why the directory that the module gave is not used. Does nothing when it is used.
 void Sdk::TellDirectory(Callback onFailure, bool hasOutbox, const std::string& refusal) {
     if (hasOutbox && refusal.empty())
         return;
@@ -109,8 +110,8 @@ void Sdk::TellDirectory(Callback onFailure, bool hasOutbox, const std::string& r
         Call(onFailure, NameOf(report::Cause::Directory), *text);
 }
 
-/// Leaves an outbox whose directory turned unsafe after it was announced for the first outbox. Whether it
-/// did.
+/// When the directory of the module's outbox has turned unsafe, moves the module to the first outbox. Returns
+/// whether the module has moved and its new outbox is open.
 bool Sdk::MovesToTheFirst() {
     if (!m_membership || !Events().IsUnsafe())
         return false;
@@ -121,7 +122,7 @@ bool Sdk::MovesToTheFirst() {
     }
     auto module = *m_membership;
     module.engine = std::move(first);
-    // Before it leaves the old one, which it may have to keep.
+    // Joins the new outbox before it leaves the old one: when Join throws, the module keeps the old one.
     auto moved = m_registry.Members().Join(std::move(module));
     Detach();
     m_membership = std::move(moved);

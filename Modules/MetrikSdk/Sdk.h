@@ -10,15 +10,17 @@
 
 namespace MetrikSdk {
 
-/// One module's entry to the outbox of its database directory. Thousands of these cost a few strings each.
+/// One module's access to the outbox of its database directory. Each object takes only a few strings, because
+/// a process may have thousands of them.
 ///
-/// ReportEvent is true once the event survives kill -9 of the process, and false when it was not stored. The
-/// log directory is not used: what there is to say goes to the callbacks, whose texts the service logs. The
-/// failure callback gets what failed and why; the success callback "init" and the module's id, or "upload"
-/// and how many events.
+/// ReportEvent returns true once the event survives kill -9 of the process, and false when it was not stored.
+/// The log directory is not used: all messages go to the callbacks, and the service logs their texts. The
+/// failure callback gets what failed and why. The success callback gets "init" and the module's id, or
+/// "upload" and how many events.
 ///
-/// A second InitSdk begins anew with its arguments, and ends what the first began. One that returns false for
-/// a file that cannot be opened, or for want of memory, is not final: a later event tries again.
+/// A second InitSdk begins anew with its arguments, and ends what the first one began. InitSdk may return
+/// false because the file cannot be opened or because there is no memory. That is not final: a later event
+/// tries again.
 class Sdk final : public IMetrikSdk {
 public:
     explicit Sdk(process::OutboxRegistry& registry)
@@ -34,12 +36,12 @@ public:
     bool ReportEvent(std::string eventId, std::string eventJson) override;
 
 private:
-    /// What InitSdk was given, its texts uncut.
+    /// The arguments of InitSdk. The texts are not cut yet.
     struct Announcement {
         bool isGiven = false;
         std::string id;
         std::string dbDir;
-        process::Membership module; ///< Without its engine.
+        process::Membership module; ///< The engine is not set yet.
     };
 
     bool Attach();
@@ -51,11 +53,11 @@ private:
     void Tell(report::Cause cause, const char* reason) noexcept;
 
     process::OutboxRegistry& m_registry;
-    std::shared_ptr<const process::Membership>
-        m_membership; ///< Null before InitSdk, and without any directory.
+    /// Null before InitSdk, and when no directory can be used.
+    std::shared_ptr<const process::Membership> m_membership;
     std::string m_id;
-    /// Kept until the module has been attached, for the next event to try again. Made beforehand: to fill it
-    /// takes no memory.
+    /// Kept until the module has joined an outbox, so that the next event can try again. It is made in
+    /// advance, so that filling it needs no memory.
     std::unique_ptr<Announcement> m_announcement;
 };
 

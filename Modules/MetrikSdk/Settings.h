@@ -6,85 +6,88 @@
 
 #include "Modules/MetrikSdk/otlp/ResourceConfig.h"
 
-// What production runs with, and why. Tests hand in their own.
+// The settings of production, and the reasons for them. Tests use their own settings.
 namespace MetrikSdk {
 
 /// How much the outbox keeps while no collector takes it.
 struct CapSettings {
-    /// A million events of the common size. A desktop that is away from its collector for a month stays far
-    /// below; a runaway module cannot fill a small disk.
+    /// A million events of the common size. A desktop that does not reach its collector for a month stays far
+    /// below. And a module that reports without end cannot fill a small disk.
     std::size_t maxWaitingBytes = std::size_t{512} * 1024 * 1024;
-    /// Usage figures older than this change no decision any more, and a collector's store has closed the day.
+    /// Usage figures that are older than this change no decision any more, and a collector's store no longer
+    /// adds to such a day.
     std::chrono::milliseconds maxAge = std::chrono::days(30);
-    /// So long must the wall clock have run without a step before events are dropped by age. A machine that
-    /// starts without the right time has it from the network within minutes.
+    /// Events are dropped by age only after the wall clock has run for this long without a step. A machine
+    /// that starts with a wrong time gets the right time from the network within minutes.
     std::chrono::milliseconds clockAgreement = std::chrono::hours(1);
-    /// Looking for old events costs a read; they age by the day.
+    /// How often to look for old events. A look takes a read, and events become too old only after days.
     std::chrono::milliseconds ageCheckInterval = std::chrono::minutes(1);
-    /// Rows dropped in one transaction: a few milliseconds of one call.
+    /// How many rows one transaction drops at most. That takes a few milliseconds of one call.
     std::size_t maxDropsAtOnce = 1000;
-    /// Drops this far apart are two incidents, and each is told.
+    /// Drops that are further apart than this are two incidents, and each of them is reported.
     std::chrono::milliseconds dropRunEnds = std::chrono::minutes(10);
-    /// Refused events are kept for a person to look at. A person looks at no more than this, and a collector
-    /// that refuses everything must not move the whole outbox here unbounded.
+    /// Refused events are kept for a person to look at. A person looks at no more than this. A collector that
+    /// refuses everything must not move the whole outbox here.
     std::size_t maxDeadLetters = 10'000;
     std::size_t maxDeadLetterBytes = std::size_t{16} * 1024 * 1024;
-    /// One event. A datagram carries 10 KiB; a hundred times that is no event any more, and the batch bound
-    /// below must hold at least one.
+    /// The largest event. A datagram carries 10 KiB, and what is a hundred times larger is no event any more.
+    /// The limit of a batch below must hold at least one event.
     std::size_t maxEventBytes = std::size_t{1024} * 1024;
 };
 
-/// Which events travel together.
+/// Which events are sent together.
 struct BatchSettings {
-    /// The batch size that telemetry SDKs agree on by default; larger ones gain nothing on a local network.
+    /// The batch size that telemetry SDKs use by default. A larger one gains nothing on a local network.
     std::size_t maxEvents = 512;
-    /// Structured JSON is two to three times the stored size, about nine times where the payload is a list of
-    /// small integers. The common case fits the 4 MiB that collectors accept; one that does not is answered
-    /// with 413, and halved.
+    /// As structured JSON, an event is two to three times as long as in the outbox, and about nine times
+    /// where its payload is a list of small integers. A usual batch fits the 4 MiB that collectors accept.
+    /// The collector answers a longer one with 413, and then the batch is halved.
     std::size_t maxBytes = std::size_t{1024} * 1024;
-    /// An event waits this long for company before it is sent alone.
+    /// How long an event waits for further events before it is sent alone.
     std::chrono::milliseconds linger = std::chrono::seconds(1);
 };
 
-/// When to try again. The wait after n failures is uniform in [0, min(maxWait, firstWait * 2^(n-1))]: a fleet
-/// that lost its collector together must not come back together.
+/// When to try again. The wait after n failures is random, uniform in [0, min(maxWait, firstWait * 2^(n-1))]:
+/// the machines of a fleet that lost its collector must not all come back at the same moment.
 struct RetrySettings {
     std::chrono::milliseconds firstWait = std::chrono::seconds(1);
-    /// A collector that came back is noticed within this.
+    /// When a collector comes back, the uploader notices it within this time.
     std::chrono::milliseconds maxWait = std::chrono::minutes(5);
-    /// A Retry-After beyond this is a mistake, or malice.
+    /// A Retry-After beyond this is a mistake, or an attack.
     std::chrono::milliseconds maxRetryAfter = std::chrono::days(1);
-    /// So many events refused for good without one accepted between them are the address's fault, or the
-    /// credentials', and no longer the events': each further refusal is then waited for like a network fault.
+    /// After this many events that were refused for good, with no accepted one between them, the address or
+    /// the credentials are at fault and not the events. From then on, the uploader waits after each refusal
+    /// as after a network fault.
     int refusalsBeforeWaiting = 10;
 };
 
-/// What becomes of an event that a collector does not take alone, while it takes others.
+/// What happens to an event that a collector does not take alone, while it takes others.
 struct AsideSettings {
-    /// Before the second try; doubles with each further one.
+    /// The pause before the second try. It doubles with each further strike (see AsideList).
     std::chrono::milliseconds firstPause = std::chrono::minutes(1);
-    /// A collector that was mended has the event within this.
+    /// The longest pause. A collector that was repaired gets the event within this time.
     std::chrono::milliseconds maxPause = std::chrono::hours(1);
-    /// So many tries, between which others were taken: some four hours. What fails for so long fails for
-    /// ever.
+    /// How many strikes an event may have. A strike is a failed try, with other events taken since the try
+    /// before. Ten of them take some four hours. An event that fails for so long fails for ever.
     int strikes = 10;
-    /// One that comes on top is sent again and again until there is room. They cost memory and a look at each
-    /// batch.
+    /// How many events may be aside at once. Each of them takes memory, and a look at each batch. A further
+    /// event that would go aside is sent again and again until there is room.
     std::size_t maxEvents = 512;
 };
 
-/// How the outbox file is looked after.
+/// How the outbox file is opened, and how long to wait for it.
 struct FileSettings {
-    /// The user's data directory. Only below it is a directory made that is missing; see
-    /// Sqlite::SafeDirectory.
+    /// The user's data directory. Missing directories are made only below it; see Sqlite::SafeDirectory.
     std::string dataDirectory;
-    /// A file that cannot be opened is tried again this often; the first event after that interval pays.
+    /// How often to try again to open a file. The first event after this interval does it, and takes the time
+    /// for it.
     std::chrono::milliseconds reopenInterval = std::chrono::milliseconds(500);
-    /// Patience with another process that holds the write lock. Reports queue up behind this, which loses
-    /// nothing; giving up loses the event.
+    /// How long an event waits for another process that holds the write lock. Reports queue up meanwhile,
+    /// which loses nothing. To give up loses the event.
     std::chrono::milliseconds lockPatience = std::chrono::seconds(5);
-    /// Patience once that was used up, until an event gets through again: a lock that is held for good must
-    /// not cost five seconds an event. Also the uploader's, which can come back later.
+    /// How long an event waits after an earlier one has waited in vain, until an event is stored again: a
+    /// lock that is held for good must not take five seconds from each event. The uploader always waits this
+    /// long, because it can come back later.
     std::chrono::milliseconds shortLockPatience = std::chrono::milliseconds(50);
 };
 
@@ -94,10 +97,11 @@ struct OutboxSettings {
     RetrySettings retry;
     AsideSettings aside;
     FileSettings file;
-    otlp::ResourceConfig resource; ///< From the environment.
-    /// The failure callback ends in the service's log: the same cause is told this often at most.
+    otlp::ResourceConfig resource; ///< Read from the environment.
+    /// The texts of the failure callback end in the service's log. So the same cause is reported at most once
+    /// in this time.
     std::chrono::milliseconds tellInterval = std::chrono::minutes(1);
-    /// How long releasing an outbox waits for its uploader.
+    /// How long the release of an outbox waits for its uploader.
     std::chrono::milliseconds stopPatience = std::chrono::milliseconds(900);
 };
 

@@ -2,7 +2,7 @@
 
 namespace MetrikSdk {
 
-/// What GetSdkVersion tells, and what collectors see as the scope's version.
+/// What GetSdkVersion returns, and what collectors see as the version of the scope.
 constexpr const char* SDK_VERSION = "1.0.0";
 
 } // namespace MetrikSdk

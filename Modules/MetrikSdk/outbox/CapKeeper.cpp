@@ -19,7 +19,8 @@ void CapKeeper::EventStored(std::size_t bytes) {
 void CapKeeper::Recount(OutboxStore& store) {
     const auto status = store.Status();
     m_waitingEvents = status.waiting;
-    m_waitingBytes = status.waitingBytes + status.moduleBytes; // both are on the disk
+    // the events and the modules both take disk space
+    m_waitingBytes = status.waitingBytes + status.moduleBytes;
     m_waiting.Set(m_waitingEvents);
 }
 
@@ -31,7 +32,7 @@ void CapKeeper::KeepWithinCaps(OutboxStore& store, SteadyTime now, std::vector<r
     const auto maxRows = m_caps.maxDropsAtOnce;
     const auto dropped = store.DropOldest(m_underWayUpTo, OldestAllowed(now), excess, maxRows);
     Recount(store);
-    if (dropped.events < maxRows) // else more may be due: the next event goes on
+    if (dropped.events < maxRows) // otherwise more may be due, and the next event goes on
         m_nextAgeCheck = now + m_caps.ageCheckInterval;
     CountDrops(dropped, now, news);
 }

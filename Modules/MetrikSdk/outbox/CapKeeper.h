@@ -13,46 +13,46 @@
 
 namespace MetrikSdk::outbox {
 
-/// Keeps an outbox within its caps: knows how much waits, looks for what is too much or too old, and drops
-/// it. The rules are PruneRule's; here is when to look, and what was seen of the clocks since the file was
-/// opened.
+/// Keeps an outbox within its caps: counts what waits, looks for events that are too many or too old, and
+/// drops them. The rules are in PruneRule. This class decides when to look, and remembers what the clocks
+/// have shown since the file was opened.
 ///
 /// Threads: one at a time. Failure: throws StoreError.
 class CapKeeper {
 public:
-    /// `waiting` is told how many events wait. It outlives this object.
+    /// `waiting` gets the number of waiting events. It must outlive this object.
     CapKeeper(const CapSettings& caps, CountWaiter& waiting)
         : m_caps(caps), m_waiting(waiting), m_drops(caps.dropRunEnds) {}
 
-    /// Another file is open now: what was known of the one before is no longer true.
+    /// Call this when another file was opened: what is known about the old file is no longer true.
     void FileOpened(OutboxStore& store, SteadyTime now);
 
-    /// An event of so many bytes was stored.
+    /// An event that counts `bytes` was stored.
     void EventStored(std::size_t bytes);
 
-    /// Asks the file how much waits, after a change that the caller did not count.
+    /// Asks the file how much waits. Call this after a change that this object has not counted.
     void Recount(OutboxStore& store);
 
-    /// Drops the oldest events that are too much, and those that are too old, if it is time to look for
-    /// those. Appends what is to be told.
+    /// Drops the oldest events while there are too many bytes. Also drops events that are too old, when it is
+    /// time to look for them. Appends the messages to `news`.
     void KeepWithinCaps(OutboxStore& store, SteadyTime now, std::vector<report::News>& news);
 
-    /// Tells the totals of a run of drops that is over.
+    /// Appends the totals of a run of drops that is over.
     void TellIfOver(SteadyTime now, std::vector<report::News>& news) {
         TellEndOfRun(m_drops.TakeEnded(now), news);
     }
 
-    /// Tells the totals of a run of drops now, because nothing can be told later.
+    /// Appends the totals of the run of drops now, because nothing can be reported later.
     void EndRun(std::vector<report::News>& news);
 
-    /// Drops the oldest of the events that were refused for good.
+    /// Drops the oldest of the events that were refused for good, when there are too many.
     void KeepDeadLettersWithinCaps(OutboxStore& store, std::vector<report::News>& news) const;
 
-    /// Events up to this row are under way to the collector, and are not dropped; 0: none.
+    /// Events up to this row are being sent to the collector, and are not dropped. 0 means none.
     void SetUnderWay(std::int64_t lastRow) { m_underWayUpTo = lastRow; }
 
 private:
-    /// What was seen of both clocks since the file was opened.
+    /// What both clocks have shown since the file was opened.
     struct Clocks {
         SteadyTime openedSteady{};
         WallTime openedAt{};

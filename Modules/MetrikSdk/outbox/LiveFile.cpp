@@ -14,15 +14,17 @@ LiveFile::LiveFile(std::string directory, const FileSettings& settings)
 
 OutboxStore& LiveFile::Ready(SteadyTime now, std::chrono::milliseconds patience,
                              std::vector<report::News>& news) {
-    // Looked at for every event: one that went into a deleted file would be lost after we said yes to it.
+    // Checked for every event: an event that goes into a deleted file would be lost after Append returned
+    // true.
     if (m_store && Sqlite::IdentityOf(m_path) != m_identity) {
-        m_store.reset(); // SQLite leaves the files at the path alone once the path names another
+        m_store.reset(); // the path leads to another file, and SQLite leaves that file's log and index alone
         news.push_back({report::Cause::Vanished,
                         m_path + " was deleted or replaced, with all events that waited in it"});
     }
     if (m_store && !m_store->IsWhole())
         Rescue(news);
-    if (m_store && m_store->InTransaction()) // its end found no memory; closing is one, and undoes it
+    // There was no memory for the end of a transaction. Closing the file rolls it back.
+    if (m_store && m_store->InTransaction())
         m_store.reset();
     if (m_store) {
         m_store->SetLockPatience(patience);
@@ -41,7 +43,8 @@ OutboxStore& LiveFile::Ready(SteadyTime now, std::chrono::milliseconds patience,
     return *m_store;
 }
 
-/// A deleted log takes every event that follows, too: so a new one is begun.
+/// A deleted log would also take all later events with it. So the file is closed, and the next opening begins
+/// a new log.
 void LiveFile::Rescue(std::vector<report::News>& news) {
     if (!m_store->Rescue())
         news.push_back(
@@ -90,7 +93,7 @@ void LiveFile::CloseUntilLater(const StoreError& reason, SteadyTime now) {
     m_store.reset();
     m_failedAt = now;
     m_lastError = reason.what();
-    // What was wrong with the directory is for the caller to know each time: it may use another.
+    // A fault of the directory is reported at each call, because the caller may then use another directory.
     m_lastFault = reason.fault == StoreFault::Unsafe ? StoreFault::Unsafe : StoreFault::TryLater;
 }
 

@@ -19,21 +19,23 @@ namespace MetrikSdk::outbox {
 ///       ▲               ├─► vanished  deleted or replaced: a new file begun at once
 ///       └───────────────┴─► failing   closed, and opened again by a later call
 ///
-/// Threads: one at a time. News is appended for the caller to tell when it holds no lock.
+/// Threads: one at a time. Messages are appended to `news`; the caller reports them when it holds no lock.
 class LiveFile {
 public:
     LiveFile(std::string directory, const FileSettings& settings);
 
-    /// The open store, which waits for another process's lock as long as `patience`. Throws StoreError while
-    /// the file cannot be opened, which is tried once in FileSettings::reopenInterval, or whenever called if
-    /// only the lock or the disk's space was in the way.
+    /// The open store. Its operations wait up to `patience` for another process's lock. Throws StoreError
+    /// while the file cannot be opened. After a failure, this tries again once in
+    /// FileSettings::reopenInterval. When the lock or a full disk was the reason, it tries again at every
+    /// call.
     OutboxStore& Ready(SteadyTime now, std::chrono::milliseconds patience, std::vector<report::News>& news);
 
-    /// To be called when an operation of the store failed. Whether a first attempt is worth a second one at
-    /// once; a second failure closes the file for FileSettings::reopenInterval.
+    /// Call this when an operation of the store failed. Returns whether the operation is to be tried again at
+    /// once, which only a first attempt is. After a second failure, the file is closed for
+    /// FileSettings::reopenInterval.
     bool Failed(const StoreError& error, bool firstAttempt, SteadyTime now, std::vector<report::News>& news);
 
-    /// Changes with every file that is opened: what is known of the file before is no longer true.
+    /// Changes with every file that is opened. What is known about the file before is then no longer true.
     unsigned Generation() const { return m_generation; }
 
 private:
@@ -46,8 +48,8 @@ private:
     const std::string m_directory;
     const std::string m_path;
     const FileSettings m_settings;
-    std::optional<Sqlite::SafeDirectory>
-        m_place; ///< Checked anew with each opening. Outlives the store in it.
+    /// Checked again at each opening. It must outlive the store in it.
+    std::optional<Sqlite::SafeDirectory> m_place;
     std::unique_ptr<OutboxStore> m_store;
     Sqlite::Identity m_identity{};
     unsigned m_generation = 0;

@@ -12,8 +12,8 @@ Outbox::Outbox(const std::string& directory, const OutboxSettings& settings, rep
     : m_settings(settings), m_notifier(notifier), m_file(directory, settings.file),
       m_caps(settings.caps, m_waitingCount), m_deadLetters(settings.caps.dropRunEnds) {}
 
-/// Runs `operation` on the open store, a second time on a new or reopened file when the first one turns out
-/// to be unusable.
+/// Runs `operation` on the open store. When the file turns out to be unusable, runs it a second time on a new
+/// or reopened file.
 template <typename Operation>
 auto Outbox::AttemptTwice(Call& call, Operation operation) {
     for (bool first = true;; first = false) {
@@ -28,17 +28,17 @@ auto Outbox::AttemptTwice(Call& call, Operation operation) {
     }
 }
 
-/// Locks, runs `operation`, unlocks, and tells what there was to tell.
+/// Locks, runs `operation`, unlocks, and reports the messages of this call.
 template <typename Operation>
 auto Outbox::WithStore(Caller caller, Operation operation) {
-    // Filled by braces, which a deleted copy would forbid, and stays in this scope.
+    // It is initialised by braces, which a deleted copy constructor would forbid. It never leaves this scope.
     // NOLINTNEXTLINE(cppcoreguidelines-special-member-functions)
     struct TellAtEnd {
         report::Notifier& notifier;
         Call call;
         ~TellAtEnd() { notifier.TellFailures(call.news); }
     } tell{m_notifier, {}};
-    const std::lock_guard lock(m_mutex); // released before `tell` ends
+    const std::lock_guard lock(m_mutex); // released before `tell` is destroyed
     tell.call.now = std::chrono::steady_clock::now();
     tell.call.patience = caller == Caller::Module && !m_patienceUsedUp ? m_settings.file.lockPatience
                                                                        : m_settings.file.shortLockPatience;
@@ -50,7 +50,9 @@ bool Outbox::Open() {
         WithStore(Caller::Module, [](OutboxStore&, Call&) {});
         return true;
     } catch (const StoreError& error) {
-        m_patienceUsedUp = true; // thousands of modules may announce themselves while the lock is held
+        // While the lock is held, thousands of modules may call this. Only the first of them may wait for
+        // long.
+        m_patienceUsedUp = true;
         m_isUnsafe = error.fault == StoreFault::Unsafe;
         m_notifier.TellFailure(CauseOf(error), error.what());
         return false;
@@ -88,17 +90,17 @@ void Outbox::StoreEvent(OutboxStore& store, const ModuleIdentity& module, const 
     m_caps.EventStored(store.Store(module, event));
     try {
         FollowEvent(store, call);
-    } catch (const std::bad_alloc&) { // the event itself is safe, and the next one comes here, too
+    } catch (const std::bad_alloc&) { // the event itself is stored, and the next event tries this again
     }
 }
 
-/// What an event that was stored leads to.
+/// What is to be done after an event was stored.
 void Outbox::FollowEvent(OutboxStore& store, Call& call) {
     if (m_patienceUsedUp.exchange(false) || m_refused > 0)
         TellEndOfFailures(call);
     try {
         m_caps.KeepWithinCaps(store, call.now, call.news);
-    } catch (const StoreError& error) { // the event itself is safe
+    } catch (const StoreError& error) { // the event itself is stored
         call.news.push_back({report::Cause::File, error.what()});
     }
 }
@@ -108,7 +110,7 @@ void Outbox::TellEndOfFailures(Call& call) {
     call.news.push_back({report::Cause::File,
                          "Events are stored again; " + std::to_string(refused) + " were refused meanwhile",
                          report::News::Kind::End});
-    m_refused -= refused; // once it is sure to be told
+    m_refused -= refused; // only when it is sure to be reported
 }
 
 void Outbox::LearnAbout(OutboxStore& store, SteadyTime now) {
@@ -157,7 +159,7 @@ void Outbox::MoveToDeadLetters(const StoredEvent& event, const Refusal& refusal)
             m_deadLetters.Add(module, 1, call.now, WallNow());
         try {
             m_caps.KeepDeadLettersWithinCaps(store, call.news);
-        } catch (const StoreError& error) { // the event itself was moved, which is what is to be told next
+        } catch (const StoreError& error) { // the event itself was moved, and the caller reports that next
             call.news.push_back({report::Cause::File, error.what()});
         }
         m_caps.Recount(store);

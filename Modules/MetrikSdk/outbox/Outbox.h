@@ -14,56 +14,59 @@
 
 namespace MetrikSdk::outbox {
 
-/// The outbox of one directory, for all modules and the uploader of a process, kept within its caps.
+/// The outbox of one directory, kept within its caps. All modules of a process and the uploader use it.
 ///
-/// Threads: any. One lock over one connection, because every operation is short, and a connection that
-/// no other part of the process uses can be closed safely when its file is to be set aside.
-/// Failure: Append and Open return false, the others throw StoreError. Append and Open tell the notifier,
-/// and so does each operation that notices damage or drops; never while the lock is held.
+/// Threads: any. One lock guards the one connection, because every operation is short. No other part of the
+/// process uses the connection, so it can be closed safely when its file is to be set aside.
+/// Failure: Append and Open return false, the others throw StoreError. Append and Open report failures to the
+/// notifier. Each operation that notices damage or drops reports them, too. No report is made while the lock
+/// is held.
 class Outbox {
 public:
     Outbox(const std::string& directory, const OutboxSettings& settings, report::Notifier& notifier);
 
-    /// Opens the file, so that a problem is known early. False is not final: later calls try again.
+    /// Opens the file, so that a problem is known early. When this returns false, later calls try again.
     bool Open();
 
-    /// Stores the event. True once it survives kill -9 of this process.
+    /// Stores the event. Returns true once the event survives kill -9 of this process.
     bool Append(const ModuleIdentity& module, std::string eventId, std::string payload);
 
-    /// Whether the last event or opening failed because another user could change the directory. Its modules
-    /// are to use another outbox.
+    /// Whether the last event or opening that failed did so because another user could change the directory.
+    /// Then the modules must use another outbox.
     bool IsUnsafe() const { return m_isUnsafe; }
 
-    /// The oldest events but those of `without`. They are under way until Release, also when the file is
-    /// opened anew meanwhile: a cap drops others first.
+    /// The oldest events, without those of `without`. Until Release they count as being sent, also when the
+    /// file is opened anew meanwhile: a cap then drops other events.
     Batch Take(std::size_t maxEvents, const EventKeys& without = {});
 
-    /// The event, if it still waits. The same holds for it.
+    /// The event, if it still waits. It counts as being sent until Release, too.
     Batch TakeOne(const EventKey& key);
     void Release();
 
     void RemoveDelivered(const Batch& batch, std::size_t refused);
     void MoveToDeadLetters(const StoredEvent& event, const Refusal& refusal);
 
-    /// Tells the totals of what is being lost, because a listener is about to go. Not if another thread hangs
-    /// in the file system with the lock: going must not wait for it.
+    /// Reports the totals of what is being lost, because a callback is about to be removed. Does nothing when
+    /// another thread holds the lock: that thread may hang in the file system, and the removal must not wait
+    /// for it.
     void EndRuns();
 
     OutboxStatus Status();
 
-    /// How many events wait, as far as this process knows: it learns within a minute what another process
-    /// does to the same file.
+    /// The number of waiting events, as far as this process knows. It learns within a minute what another
+    /// process has done to the same file.
     CountWaiter& WaitingCount() { return m_waitingCount; }
 
 private:
-    /// Who waits for a lock: a module's event would be lost, the uploader comes back.
+    /// Who waits for another process's lock. A module's event would be lost after the wait; the uploader
+    /// comes back later.
     enum class Caller { Module, Uploader };
 
-    /// What belongs to one call and ends with it.
+    /// The data of one call.
     struct Call {
         SteadyTime now;
-        std::chrono::milliseconds patience; ///< with another process's lock
-        std::vector<report::News> news;     ///< told once the lock is released
+        std::chrono::milliseconds patience; ///< how long to wait for another process's lock
+        std::vector<report::News> news;     ///< reported once the lock is released
     };
 
     template <typename Operation>
@@ -82,14 +85,15 @@ private:
     report::Notifier& m_notifier;
     CountWaiter m_waitingCount;
 
-    /// The last event or opening failed, perhaps after all of the patience: the next one has less.
+    /// The last event or opening failed, perhaps after the full wait for a lock. So the next one waits less.
     std::atomic<bool> m_patienceUsedUp = false;
     std::atomic<bool> m_isUnsafe = false;
-    std::atomic<unsigned long> m_refused = 0; ///< Events since the last one that was stored.
+    /// Events that were refused since the last one that was stored.
+    std::atomic<unsigned long> m_refused = 0;
 
     std::mutex m_mutex; ///< Guards all below.
     LiveFile m_file;
-    unsigned m_knownGeneration = 0; ///< Of m_file, that m_caps knows.
+    unsigned m_knownGeneration = 0; ///< The generation of m_file that m_caps knows.
     CapKeeper m_caps;
     report::LossRun m_deadLetters;
 };

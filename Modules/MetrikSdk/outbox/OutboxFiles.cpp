@@ -28,7 +28,8 @@ bool Exists(const Sqlite::SafeDirectory& directory, const std::string& name) {
     return ::fstatat(directory.Number(), name.c_str(), &status, AT_SYMLINK_NOFOLLOW) == 0;
 }
 
-/// Such as 20261120T101530.123Z: sorts by time, and no character that a shell or a file system minds.
+/// Such as 20261120T101530.123Z. It sorts by time, and has no character that is special to a shell or a file
+/// system.
 std::string FileNameTime(WallTime now) {
     const auto milliseconds = now.time_since_epoch().count();
     const std::time_t seconds = static_cast<std::time_t>(milliseconds / 1000);
@@ -87,7 +88,8 @@ std::string SetAside(const Sqlite::SafeDirectory& directory, const std::string& 
     if (Sqlite::IdentityOf(directory.PathOf(name)) != identity)
         return {};
     const auto aside = UnusedName(directory, name + ".damaged-" + FileNameTime(now));
-    // The database goes last: a new one beside the side files of an old one would take them for its own.
+    // The database is renamed last. A new database that is made beside the side files of the old one would
+    // take them for its own.
     for (const std::string suffix : Sqlite::SIDE_FILE_SUFFIXES)
         Rename(directory, name + suffix, aside + suffix);
     Rename(directory, name, aside);

@@ -1,10 +1,10 @@
 #pragma once
 
-/// The outbox as a database. docs/Outbox.md shows people how to read it; a change of any name here is a
-/// change there, and a new SCHEMA_VERSION.
+/// The outbox as a database. docs/Outbox.md shows people how to read it. A change of a name here needs the
+/// same change there, and a new SCHEMA_VERSION.
 namespace MetrikSdk::outbox {
 
-/// "MOBX": lets file(1) and a person tell an outbox from another database.
+/// "MOBX": file(1) and people can tell an outbox from another database by it.
 constexpr int APPLICATION_ID = 0x4d4f4258;
 constexpr int SCHEMA_VERSION = 2;
 
@@ -60,8 +60,9 @@ CREATE TABLE totals(
     last_delivered_ms    INTEGER);
 )sql";
 
-/// From version 1, whose modules were kept for ever. Which of them have an event waiting is not known: until
-/// the last that waits now has left, all of them count as such.
+/// Changes version 1 into this version. Version 1 kept its modules for ever. It does not say which modules
+/// have an event waiting. So every module counts as having one, until the newest event that waits now has
+/// left.
 constexpr const char* MIGRATION = R"sql(
 ALTER TABLE module ADD COLUMN last_event INTEGER NOT NULL DEFAULT 0;
 UPDATE module SET last_event = (SELECT coalesce(max(id), 0) FROM event);
@@ -77,11 +78,11 @@ DROP TRIGGER event_stored;
 DROP VIEW outbox_status;
 )sql";
 
-/// The trigger keeps the sums right in the very statement that stores an event, so that storing is one
-/// statement, and nothing ever has to count the events.
+/// The triggers keep the sums right within the statement that changes an event. So storing is one statement,
+/// and the events never have to be counted.
 ///
-/// What a module's rows and their indexes cost is estimated from above: a text over some 200 bytes takes a
-/// page of its own in an index.
+/// The space that a module's rows and their indexes take is estimated from above: a text over some 200 bytes
+/// takes a page of its own in an index.
 constexpr const char* TRIGGER_AND_VIEW = R"sql(
 CREATE INDEX dead_letter_module ON dead_letter(module);
 CREATE TRIGGER event_stored AFTER INSERT ON event BEGIN

@@ -14,24 +14,26 @@
 namespace MetrikSdk::outbox {
 namespace {
 
-/// Row and b-tree overhead of an event, roughly, so that a million empty events do not count as nothing.
+/// What the row and the b-tree of an event take, roughly. Without it, a million empty events would count as
+/// nothing.
 constexpr std::size_t ROW_OVERHEAD_BYTES = 80;
 
-/// Modules whose keys are kept in memory. Any more are looked up for their next event.
+/// How many modules' keys are kept in memory. With more modules, the keys are forgotten and looked up again.
 constexpr std::size_t MAX_KNOWN_MODULES = 1000;
 
-/// Modules that are forgotten in one transaction: some milliseconds of one call.
+/// How many modules are forgotten in one transaction. That takes some milliseconds of one call.
 constexpr std::int64_t MAX_FORGOTTEN_AT_ONCE = 1000;
 
 constexpr const char* NEWEST_RELEASE = "SELECT coalesce(max(id), 0) FROM module_release";
 
-/// As the view estimates it; a module that the file knew by another version counts a little too much.
+/// What the rows of a module take, by the same estimate as in the view. For a module that the file knows by
+/// another version, it is a little too much.
 std::size_t BytesOf(const ModuleIdentity& module) {
     const auto cost = [](std::size_t octets) { return 150 + 3 * octets + (octets > 200 ? 1024U : 0U); };
     return cost(module.id.size()) + cost(module.version.size() + module.name.size());
 }
 
-/// The columns as AddTo reads them.
+/// The columns in the order in which AddTo reads them.
 constexpr const char* SELECT_EVENT =
     "SELECT id, uuid, release, sequence, event_id, payload, stored_ms, bytes FROM event ";
 
@@ -51,7 +53,7 @@ SQLite::Database OpenDatabase(const std::string& path) {
 OutboxStore::OutboxStore(const std::string& path, std::chrono::milliseconds lockPatience)
     : m_database(OpenDatabase(path)), m_sideFiles(path) {
     SetLockPatience(lockPatience);
-    KeepLogOnClose(true); // until the file is known to be in order
+    KeepLogOnClose(true); // until the file is known to be sound
     Guarded("Cannot open the outbox", [&] {
         Configure();
         CreateOrCheckSchema();
@@ -78,15 +80,15 @@ bool OutboxStore::Rescue() {
 }
 
 void OutboxStore::Configure() {
-    // Each event writes two pages into the log. Small ones take less of the disk: on a busy one an event
-    // costs 17 us with 1 KiB, and 50 us with the usual 4 KiB.
+    // Each event writes two pages into the log. Small pages take less of the disk's time: on a busy disk, an
+    // event takes 17 us with 1 KiB, and 50 us with the usual 4 KiB.
     m_database.exec("PRAGMA page_size = 1024");
     m_database.exec("PRAGMA journal_mode = WAL");
-    // FULL would sync at each commit: see the figures in docs/Outbox.md.
+    // FULL would sync the disk at each commit. The figures are in docs/Outbox.md.
     m_database.exec("PRAGMA synchronous = NORMAL");
-    m_database.exec("PRAGMA journal_size_limit = 16777216"); // a burst's log is given back to the disk
-    m_database.exec("PRAGMA temp_store = MEMORY");           // nothing beside the outbox itself is written
-    m_database.exec("PRAGMA trusted_schema = OFF");          // the file may have been replaced by another one
+    m_database.exec("PRAGMA journal_size_limit = 16777216"); // gives the disk space of a burst's log back
+    m_database.exec("PRAGMA temp_store = MEMORY");           // SQLite writes no files elsewhere
+    m_database.exec("PRAGMA trusted_schema = OFF");          // another file may have taken the place of ours
 }
 
 bool OutboxStore::IsOutbox() {
@@ -96,7 +98,7 @@ bool OutboxStore::IsOutbox() {
 }
 
 void OutboxStore::CreateOrCheckSchema() {
-    if (IsOutbox()) // known by reading: another process's write lock does not keep us from opening
+    if (IsOutbox()) // a read finds this out, so the opening need not wait for another process's write lock
         return;
     WriteTransaction transaction(m_database);
     const auto version = Number(m_database, "PRAGMA user_version");
@@ -142,7 +144,7 @@ std::size_t OutboxStore::Store(const ModuleIdentity& module, const NewEvent& eve
         insert->bindNoCopy(5, event.payload);
         insert->bind(6, static_cast<std::int64_t>(event.storedAt.time_since_epoch().count()));
         insert->bind(7, static_cast<std::int64_t>(bytes));
-        // No row means that the module was deleted under us; it is unknown what else is gone.
+        // No row was inserted: another program has deleted the module, and perhaps more.
         if (insert->exec() != 1)
             throw StoreError(StoreFault::Reopen, "The outbox has lost a module");
         return bytes + keys.newBytes;
@@ -219,7 +221,7 @@ Batch OutboxStore::One(const EventKey& key) {
     });
 }
 
-/// Returns the bytes that the event counts for.
+/// Returns how many bytes the event counts.
 std::size_t OutboxStore::AddTo(Batch& batch, const SQLite::Statement& row) {
     StoredEvent event{row.getColumn(0).getInt64(),
                       row.getColumn(1).getString(),
@@ -244,11 +246,12 @@ bool OutboxStore::Delete(const StoredEvent& event) {
     return statement->exec() == 1;
 }
 
-/// To be called in the transaction that removed events. Modules of few events go first: a flood of them does
-/// not push out one that reports every day. The newest is kept, so that no key is given out twice: another
-/// process may know it.
+/// Call this in the transaction that removed events. It forgets modules without waiting events when there are
+/// too many, those with the fewest events first: so a flood of modules does not push out a module that
+/// reports every day. The newest module is kept, so that its key is not given out twice: another process may
+/// know the key.
 void OutboxStore::ForgetIdleModules() {
-    if (Number(m_database, "SELECT EXISTS (SELECT 1 FROM event)") == 0) // the next ones get low rows again
+    if (Number(m_database, "SELECT EXISTS (SELECT 1 FROM event)") == 0) // the next events get low rows again
         m_database.exec("UPDATE module SET last_event = 0 WHERE last_event > 0");
     const auto excess = Number(m_database, "SELECT count(*) FROM module") - MAX_IDLE_MODULES;
     if (excess <= 0)
@@ -344,7 +347,7 @@ std::size_t OutboxStore::TrimDeadLetters(std::size_t maxRows, std::size_t maxByt
                                    "dead_letter_bytes - b.bytes FROM (SELECT bytes FROM dead_letter WHERE "
                                    "id = ?1) AS b");
             held.bind(1, oldest);
-            if (held.exec() == 0) // a person has emptied the table: believe the table
+            if (held.exec() == 0) // a person has emptied the table, so the sums are wrong
                 m_database.exec("UPDATE totals SET dead_letters = 0, dead_letter_bytes = 0");
             SQLite::Statement remove(m_database, "DELETE FROM dead_letter WHERE id = ?1");
             remove.bind(1, oldest);
@@ -355,8 +358,8 @@ std::size_t OutboxStore::TrimDeadLetters(std::size_t maxRows, std::size_t maxByt
     });
 }
 
-/// Deletes the oldest events behind `afterRow`, of one module or (0) of all, as long as `goesOn` says so for
-/// the next one.
+/// Deletes the oldest events after row `afterRow`: those of `module`, or of all modules when that is 0. Ends
+/// at the first event for which `goesOn` returns false.
 template <typename GoesOn>
 void OutboxStore::DropWhile(std::int64_t afterRow, std::int64_t module, std::size_t maxRows, Removed& removed,
                             Dropped& dropped, GoesOn goesOn) {
@@ -388,8 +391,8 @@ void OutboxStore::DropWhile(std::int64_t afterRow, std::int64_t module, std::siz
     removed.events += static_cast<std::int64_t>(doomed.size());
 }
 
-/// Of those that have at least so many bytes waiting; 0 when no module has, so that none of them fills the
-/// outbox.
+/// The module with the most waiting bytes, if it has at least `minBytes`; otherwise 0, because no single
+/// module fills the outbox.
 std::int64_t OutboxStore::LargestModule(std::int64_t minBytes) {
     SQLite::Statement query(m_database, "SELECT coalesce((SELECT id FROM module "
                                         "WHERE stored_bytes - removed_bytes >= ?1 "
@@ -415,7 +418,7 @@ OutboxStore::Dropped OutboxStore::DropOldest(std::int64_t afterRow, WallTime bef
             const auto droppedForAge = dropped.events;
             m_lastVictim = victim;
             DropWhile(from, victim, maxRows - dropped.events, removed, dropped, tooMuch);
-            if (dropped.events == droppedForAge) { // all of its events are under way
+            if (dropped.events == droppedForAge) { // all events of this module are being sent
                 m_lastVictim = 0;
                 DropWhile(afterRow, 0, maxRows - dropped.events, removed, dropped, tooMuch);
             }

@@ -13,20 +13,20 @@
 
 namespace MetrikSdk::outbox {
 
-/// How many events the outbox has seen, each in exactly one of the places below.
+/// How many events the outbox has seen.
 struct OutboxStatus {
     std::string outboxId;
-    std::int64_t stored = 0; ///< The sum of all that follow.
+    std::int64_t stored = 0; ///< The sum of delivered, refused, deadLettered, dropped and waiting.
     std::int64_t delivered = 0;
-    std::int64_t refused = 0;      ///< Taken in a partial success that counted them as rejected.
+    std::int64_t refused = 0;      ///< In a request that the collector took, but counted as rejected.
     std::int64_t deadLettered = 0; ///< Refused for good and moved to the dead-letter table.
-    std::int64_t dropped = 0;      ///< Given up for a cap.
+    std::int64_t dropped = 0;      ///< Dropped to keep within a cap.
     std::int64_t waiting = 0;
     std::int64_t waitingBytes = 0;
-    std::int64_t deadLetters = 0; ///< Rows that the dead-letter table holds now.
+    std::int64_t deadLetters = 0; ///< Rows in the dead-letter table now.
     std::int64_t deadLetterBytes = 0;
-    std::int64_t modules = 0;     ///< Known to the file.
-    std::int64_t moduleBytes = 0; ///< What they take there.
+    std::int64_t modules = 0;     ///< Modules that the file knows.
+    std::int64_t moduleBytes = 0; ///< How many bytes these modules take in the file.
 };
 
 /// Why a collector did not take an event.
@@ -35,7 +35,7 @@ struct Refusal {
     std::string reason;
 };
 
-/// One open outbox file, and all SQL of it.
+/// One open outbox file, and all SQL for it.
 ///
 /// The life of an event:
 ///
@@ -45,81 +45,85 @@ struct Refusal {
 ///                  │                └─► dead-lettered  row moved to the dead-letter table
 ///                  └─► dropped                         row deleted, for a cap
 ///
-/// "Sent" is known to the uploader alone and is not stored: a process that dies between sending and deleting
-/// sends again, with the same uuid.
+/// Only the uploader knows which events are "sent"; that is not stored. When a process dies between sending
+/// and deleting, the events are sent again, with the same uuids.
 ///
-/// Durability: after Store returns, the event survives kill -9 of the process. A power cut may cost the last
-/// seconds (the log is synced at checkpoints, not at each commit) and never damages the file.
-/// Cost: no operation depends on how many events wait.
-/// Threads: one at a time. Several processes may have the same file open; removal is by row and uuid, so that
-/// no process removes what another has put in the same place.
+/// Durability: after Store returned, the event survives kill -9 of the process. A power cut may lose the
+/// events of the last seconds, because the log is synced at checkpoints and not at each commit. It never
+/// damages the file.
+/// Time: no operation takes longer when more events wait.
+/// Threads: one at a time. Several processes may have the same file open. An event is removed by its row and
+/// uuid, so no process removes an event that another process has put in the same row.
 /// Failure: StoreError.
 class OutboxStore {
 public:
-    /// Opens the existing file, an empty one included, which becomes an outbox.
+    /// Opens the file, which must exist. An empty file becomes an outbox.
     OutboxStore(const std::string& path, std::chrono::milliseconds lockPatience);
 
-    /// How long the operations wait for another process that holds the lock.
+    /// How long the operations wait for another process's lock.
     void SetLockPatience(std::chrono::milliseconds patience);
 
-    /// Whether closing leaves the write-ahead log as it is: a damaged file is set aside together with it.
+    /// Whether a close leaves the write-ahead log as it is. A damaged file is set aside together with its
+    /// log.
     void KeepLogOnClose(bool keep);
 
-    /// Whether the files beside the database still have their names. Two system calls.
+    /// Whether the files beside the database still have their names. Takes two system calls.
     bool IsWhole() { return m_sideFiles.AreInPlace(); }
 
-    /// Whether a transaction of an operation that failed is still open. What is stored then, would be undone
-    /// with it.
+    /// Whether the transaction of a failed operation is still open. An event that is stored then would be
+    /// rolled back with it.
     bool InTransaction();
 
-    /// When it is not whole, before it is closed: whether all events are in the file all the same.
+    /// Call this when IsWhole returned false, before the store is closed. Returns whether all events are in
+    /// the database in spite of that.
     bool Rescue();
 
-    /// Stores the event as its module's next one. Returns the bytes that it counts for, with those of a
-    /// module that the file did not know.
+    /// Stores the event as the next one of its module. Returns how many bytes it counts, together with the
+    /// bytes of a module that is new to the file.
     std::size_t Store(const ModuleIdentity& module, const NewEvent& event);
 
-    /// The oldest events but those of `without`, at most `maxEvents`, ending with the one that reaches
-    /// `maxBytes`.
+    /// The oldest events, without those of `without`. Returns at most `maxEvents`, and ends with the event
+    /// that reaches `maxBytes`.
     Batch Oldest(std::size_t maxEvents, std::size_t maxBytes, const EventKeys& without = {});
 
     /// The event, if it still waits.
     Batch One(const EventKey& key);
 
-    /// Deletes what is still there of `batch`. `refused` of them count as refused, the others as delivered.
+    /// Deletes those events of `batch` that are still there. `refused` of them count as refused, the others
+    /// as delivered.
     void RemoveDelivered(const Batch& batch, std::size_t refused);
 
-    /// Moves the event, if it is still there, to the dead-letter table. Returns its module's id; empty if it
-    /// is not there.
+    /// Moves the event, if it is still there, to the dead-letter table. Returns the id of its module; empty
+    /// when the event is not there.
     std::string MoveToDeadLetters(const StoredEvent& event, const Refusal& refusal, WallTime now);
 
-    /// Deletes the oldest dead letters until both bounds hold. Returns how many.
+    /// Deletes the oldest dead letters until both limits hold. Returns how many it deleted.
     std::size_t TrimDeadLetters(std::size_t maxRows, std::size_t maxBytes);
 
-    /// What a cap cost, by module.
+    /// What was dropped for a cap.
     struct Dropped {
         std::size_t events = 0;
-        std::map<std::string, std::size_t> modules; ///< By id.
+        std::map<std::string, std::size_t> modules; ///< Events by module id.
     };
 
-    /// Deletes events behind row `afterRow`, at most `maxRows`: those that were stored before `before`, and
-    /// then, until `excessBytes` are gone, the oldest ones of the module with the most waiting bytes. So a
-    /// module that reports without end loses its own events and not the others'. When no module has so many,
-    /// the oldest of all go.
+    /// Deletes at most `maxRows` events after row `afterRow`. First it deletes those that were stored before
+    /// `before`. Then, until `excessBytes` are gone, it deletes the oldest events of the module with the most
+    /// waiting bytes. So a module that reports without end loses its own events and not those of others. When
+    /// no module has so many bytes, the oldest events of all modules go.
     Dropped DropOldest(std::int64_t afterRow, WallTime before, std::int64_t excessBytes, std::size_t maxRows);
 
-    /// So many modules are remembered when nothing of theirs waits. A suite has some tens, whose numbers so
-    /// go on.
+    /// How many modules are remembered although none of their events waits. A suite has some tens of modules,
+    /// so their sequence numbers go on.
     static constexpr std::int64_t MAX_IDLE_MODULES = 1000;
 
-    /// Reads the sums; grows with the number of modules, not of events.
+    /// Reads the sums. Takes longer with more modules, but not with more events.
     OutboxStatus Status();
 
 private:
     struct ReleaseKeys {
         std::int64_t module = 0;
         std::int64_t release = 0;
-        std::size_t newBytes = 0; ///< What its rows take, when they were just made.
+        std::size_t newBytes = 0; ///< What the new rows of a module take; 0 when no row was made.
     };
     struct Removed {
         std::int64_t events = 0;
@@ -142,14 +146,15 @@ private:
     void CountRemoved(const char* counter, const Removed& removed);
 
     SQLite::Database m_database;
-    Sqlite::SideFileWatch m_sideFiles; ///< Made anew once they are open.
+    Sqlite::SideFileWatch m_sideFiles; ///< Made again once the side files are open.
     std::unique_ptr<SQLite::Statement> m_insert;
     std::unique_ptr<SQLite::Statement> m_oldest;
     std::unique_ptr<SQLite::Statement> m_delete;
-    std::int64_t m_lastVictim = 0; ///< The module whose events were dropped last for the bytes,
-    std::int64_t m_lastVictimRow =
-        0; ///< up to this one: the next look need not begin at the first row again.
-    std::map<ModuleIdentity, ReleaseKeys> m_keys; ///< What the file already knows of the modules in use.
+    /// The module whose events were dropped last for their bytes, and the row of the last of these events.
+    /// The next search need not begin at the first row again.
+    std::int64_t m_lastVictim = 0;
+    std::int64_t m_lastVictimRow = 0;
+    std::map<ModuleIdentity, ReleaseKeys> m_keys; ///< The keys of modules in use, as the file knows them.
 };
 
 } // namespace MetrikSdk::outbox

@@ -20,7 +20,7 @@ ClockWatch BeginWatch(WallTime wall, SteadyTime steady) {
 
 ClockWatch LookAgain(const ClockWatch& watch, WallTime wall, SteadyTime steady) {
     constexpr std::chrono::milliseconds TOLERANCE = std::chrono::minutes(1);
-    constexpr int MAX_SLEW = 1000; // a time daemon corrects by half of a thousandth at most
+    constexpr int MAX_SLEW = 1000; // a time daemon changes the clock's speed by half of a thousandth at most
     const auto elapsed = std::chrono::floor<std::chrono::milliseconds>(steady - watch.lastSteady);
     const auto apart = std::chrono::abs((wall - watch.lastWall) - elapsed);
     const bool agree = apart <= TOLERANCE + elapsed / MAX_SLEW;

@@ -5,23 +5,25 @@
 #include "Modules/MetrikSdk/Settings.h"
 #include "Modules/MetrikSdk/Time.h"
 
-/// What is too much and what is too old. Pure; dropping, and when to look, are the outbox's.
+/// The rules for what is too much and what is too old. Pure. The outbox decides when to look, and drops the
+/// events.
 namespace MetrikSdk::outbox::PruneRule {
 
-/// Bytes that must go; 0 while the cap holds. A little more than the excess, so that the next event does not
-/// come into the same position.
+/// How many bytes must go; 0 while the cap holds. It is a little more than the excess, so that the next event
+/// does not exceed the cap again.
 std::int64_t ExcessBytes(std::int64_t waitingBytes, const CapSettings& caps);
 
 /// Events that were stored before this are too old.
 ///
-/// `now` is the wall clock. `openedAt` and `elapsed` are the wall clock when the outbox was opened and the
-/// steady time since: a clock that is set years ahead while the service runs must not make every waiting
-/// event too old, so the earlier reading counts. A machine that slept keeps its events longer, at worst.
+/// `now` is the wall clock. `openedAt` is the wall clock when the outbox was opened, and `elapsed` is the
+/// steady time since then. The earlier of `now` and `openedAt` + `elapsed` counts: a clock that is set years
+/// ahead while the service runs must not make every waiting event too old. At worst, a machine that slept
+/// keeps its events longer.
 WallTime OldestAllowed(WallTime now, WallTime openedAt, std::chrono::milliseconds elapsed,
                        const CapSettings& caps);
 
-/// Whether the wall clock runs with the steady one, and since when. A clock that is wrong when the outbox is
-/// opened shows in its correction, which is a jump.
+/// Whether the wall clock runs like the steady clock, and since when. A wall clock that is wrong when the
+/// outbox is opened jumps when it is corrected, and this sees the jump.
 struct ClockWatch {
     WallTime lastWall{};
     SteadyTime lastSteady{};
@@ -30,12 +32,13 @@ struct ClockWatch {
 
 ClockWatch BeginWatch(WallTime wall, SteadyTime steady);
 
-/// The watch after a further look. A step between the two looks begins the agreement anew; what a time daemon
-/// does by slewing is none.
+/// The watch after a further look. When the wall clock jumped between the two looks, the agreement begins
+/// anew. The slow corrections of a time daemon do not count as a jump.
 ClockWatch LookAgain(const ClockWatch& watch, WallTime wall, SteadyTime steady);
 
-/// Whether the clocks have agreed for long enough that events may be called old. Until then none is dropped
-/// by age: a board without a battery starts in a wrong year, and the network corrects its clock later.
+/// Whether the clocks have agreed for long enough that events may be called old. Until then, no event is
+/// dropped by age: a board without a battery starts in a wrong year, and the network corrects its clock
+/// later.
 bool MayDropByAge(const ClockWatch& watch, const CapSettings& caps);
 
 } // namespace MetrikSdk::outbox::PruneRule

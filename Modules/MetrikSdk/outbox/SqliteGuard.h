@@ -11,7 +11,7 @@
 // What every operation of the store does around its SQL.
 namespace MetrikSdk::outbox {
 
-/// What the holder of the store does about an error of SQLite's.
+/// What the holder of the store must do about an error of SQLite.
 inline StoreFault FaultOf(const SQLite::Exception& error) {
     switch (Sqlite::KindOf(error.getErrorCode())) {
     case Sqlite::ErrorKind::Wait:
@@ -19,13 +19,13 @@ inline StoreFault FaultOf(const SQLite::Exception& error) {
     case Sqlite::ErrorKind::Damage:
         return StoreFault::SetAside;
     case Sqlite::ErrorKind::Reopen:
-    case Sqlite::ErrorKind::Statement: // the statements are ours, so this one should have worked
+    case Sqlite::ErrorKind::Statement: // our own statement should have worked
         break;
     }
     return StoreFault::Reopen;
 }
 
-/// Runs one operation of the store, with SQLite's failures turned into ours.
+/// Runs one operation of the store. Turns exceptions of SQLite into StoreError.
 template <typename Operation>
 auto Guarded(const char* what, Operation operation) {
     try {
@@ -35,7 +35,7 @@ auto Guarded(const char* what, Operation operation) {
     }
 }
 
-/// Leaves a statement ready for its next use also when it fails: one that was left in the middle would hold
+/// Resets a statement after its use, also when it fails. A statement that is left in the middle would hold
 /// its read lock, and the log could never be checkpointed again.
 class Use {
 public:
@@ -49,10 +49,10 @@ private:
     SQLite::Statement& m_statement;
 };
 
-/// A transaction that has the write lock from its beginning: a deferred one could fail in its middle when
-/// another process writes between its read and its write. Undone unless it is committed, but for want of
-/// memory: then it stays open, and its connection is to be closed. (The library's own ends the process then:
-/// its destructor throws.)
+/// A transaction that has the write lock from its beginning. A deferred transaction could fail in the middle,
+/// when another process writes between its read and its write. The destructor rolls back unless Commit
+/// succeeded. Without memory that can fail: the transaction stays open, and its connection must be closed.
+/// (The library's own transaction would end the process then, because its destructor throws.)
 class WriteTransaction {
 public:
     explicit WriteTransaction(SQLite::Database& database) : m_database(database) {

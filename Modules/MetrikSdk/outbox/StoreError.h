@@ -7,11 +7,11 @@
 
 namespace MetrikSdk::outbox {
 
-/// What the holder of a store does after an operation failed.
+/// What the holder of a store must do after an operation failed.
 enum class StoreFault {
-    TryLater, ///< Nothing was changed and the store is in order: a full disk, another program's lock.
-    Reopen,   ///< The store cannot be used any more; open it again, later if that fails too.
-    SetAside, ///< The file is damaged or none of ours.
+    TryLater, ///< Nothing was changed and the store is sound: a full disk, or another program's lock.
+    Reopen,   ///< The store cannot be used any more. Open it again; later, if that fails, too.
+    SetAside, ///< The file is damaged, or it is no outbox of ours.
     Unsafe,   ///< Another user could change the directory; the outbox must not be there.
 };
 
@@ -22,7 +22,7 @@ public:
     const StoreFault fault;
 };
 
-/// How the failure is told.
+/// The cause under which the failure is reported.
 inline report::Cause CauseOf(const StoreError& error) {
     return error.fault == StoreFault::Unsafe ? report::Cause::Directory : report::Cause::File;
 }

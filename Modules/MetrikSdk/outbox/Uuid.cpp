@@ -7,7 +7,8 @@
 namespace MetrikSdk::outbox {
 namespace {
 
-/// The 12 bits behind the version; half of them are left for counting up within a millisecond.
+/// The 12 bits after the version. They start in the lower half of their range, so the upper half is left for
+/// counting up within a millisecond.
 constexpr unsigned COUNTER_BITS = 12;
 constexpr std::uint64_t COUNTER_START_MASK = 0x7ff;
 
@@ -26,7 +27,8 @@ public:
 
     Bits Next(std::uint64_t milliseconds) {
         const std::lock_guard lock(m_mutex);
-        // Time and counter are one number that only grows: a counter that overflows borrows a millisecond.
+        // Time and counter are one number that only grows. When the counter overflows, the time grows by a
+        // millisecond.
         const auto fresh = (milliseconds << COUNTER_BITS) | (m_random() & COUNTER_START_MASK);
         m_last = (fresh >> COUNTER_BITS) > (m_last >> COUNTER_BITS) ? fresh : m_last + 1;
         const auto time = m_last >> COUNTER_BITS;

@@ -40,7 +40,7 @@ std::shared_ptr<const Membership> Memberships::Join(Membership wanted) {
     listeners.Subscribe(membership->onFailure, membership->onSuccess);
     try {
         m_memberships.insert(membership);
-    } catch (...) { // a later module would find it, and another Unsubscribe
+    } catch (...) { // without the entry, no Leave would undo the Subscribe
         listeners.Unsubscribe(membership->onFailure, membership->onSuccess);
         throw;
     }

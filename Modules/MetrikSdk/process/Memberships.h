@@ -13,8 +13,8 @@ namespace MetrikSdk::process {
 
 class OutboxRegistry;
 
-/// What a module has in common with most others of its process. It is kept once for all of them: a module is
-/// cheap to announce, and any program of the machine may announce a hundred thousand.
+/// What a module has in common with most other modules of its process. It is kept once for all of them,
+/// because a module is cheap to announce: any program of the machine may announce a hundred thousand.
 struct Membership {
     std::shared_ptr<OutboxEngine> engine; ///< Not null.
     IMetrikSdk::Callback onFailure = nullptr;
@@ -26,17 +26,18 @@ struct Membership {
 /// The memberships of a process. Threads: any.
 class Memberships {
 public:
-    /// So many at once have a version and a name. The modules of a suite share a few; beyond, both texts are
-    /// left out, for they are a stranger's, and would stay in memory.
+    /// How many memberships may have a version and a name. The modules of a suite share a few memberships.
+    /// When there are more than this, both texts are left out, because they come from an unknown program and
+    /// would stay in memory.
     static constexpr std::size_t MAX_WITH_TEXTS = 1000;
 
     explicit Memberships(OutboxRegistry& registry) : m_registry(registry) {}
 
-    /// The membership like `wanted`. Its callbacks are told what the engine has to tell, until the last
-    /// module left it.
+    /// Returns the membership that equals `wanted`, and makes it when there is none. Its callbacks get the
+    /// engine's messages until the last module with this membership has called Leave.
     std::shared_ptr<const Membership> Join(Membership wanted);
 
-    /// Gives `membership` up. The last module's call gives the engine back to the registry.
+    /// Gives `membership` up. When no other module has it, the engine is given back to the registry.
     void Leave(std::shared_ptr<const Membership>& membership);
 
 private:

@@ -10,7 +10,7 @@
 
 namespace MetrikSdk::process {
 
-/// What an outbox's users and its uploader share. Lives as long as any of them.
+/// What the users of an outbox and its uploader share. It lives as long as any of them.
 struct OutboxCore {
     OutboxCore(const std::string& directory, const OutboxSettings& outboxSettings,
                std::shared_ptr<report::FailureReporter> reporter)

@@ -9,14 +9,15 @@
 namespace MetrikSdk::process {
 namespace {
 
-/// exit() may be called while the uploader is at work, by the service's crash handler on any thread. What it
-/// destroys afterwards must not be in use: the logger behind the callbacks, and the TLS library's own state.
+/// exit() may be called while the uploader is at work, also by the service's crash handler on any thread.
+/// After this function, exit() destroys the logger behind the callbacks and the TLS library's state. Neither
+/// may be in use then.
 void OnExit() {
     report::Notifier::Silence();
     otlp::HttpSender::AbandonAll(std::chrono::milliseconds(500));
 }
 
-/// Registered after the TLS library has registered its own, and therefore run before it.
+/// OnExit is registered after the TLS library has registered its own function, so OnExit runs before it.
 void RegisterOnExit() {
     [[maybe_unused]] static const int registered = std::atexit(&OnExit);
 }
@@ -44,14 +45,14 @@ OutboxEngine::OutboxEngine(const std::string& directory, const OutboxSettings& s
 void OutboxEngine::StartUploader(const otlp::EndpointConfig& endpoint) {
     try {
         m_uploader = std::make_unique<upload::Uploader>(m_core, std::make_shared<otlp::HttpSender>(endpoint));
-    } catch (const std::exception& error) { // the events are stored all the same
+    } catch (const std::exception& error) { // events are stored all the same
         m_complaints.push_back(std::string("The uploader cannot be started: ") + error.what());
     }
 }
 
 bool OutboxEngine::Open() {
     if (!m_complaints.empty() && !m_complained.exchange(true))
-        // One text: a second one would be kept back as a repetition of the first.
+        // All complaints are one text: a second text would be kept back as a repetition of the first.
         m_core->notifier.TellFailure({report::Cause::Configuration, Joined(m_complaints)});
     return m_core->outbox.Open();
 }

@@ -11,7 +11,7 @@
 namespace MetrikSdk::process {
 namespace {
 
-constexpr std::size_t MAX_TOLD_BYTES = 1024; ///< Of a path, in the log.
+constexpr std::size_t MAX_TOLD_BYTES = 1024; ///< The most bytes of a path, or of a reason, in a message.
 
 std::string Shown(const std::string& text) {
     return std::string(SystemTool::Text::CutUtf8(text, MAX_TOLD_BYTES));
@@ -59,13 +59,14 @@ std::shared_ptr<OutboxEngine> OutboxRegistry::Acquire(const std::string& directo
     return engine;
 }
 
-/// The directory's one name; empty, with the reason, for one that must not be used.
+/// The canonical path of the directory. Empty, with the reason in `refusal`, when the directory must not be
+/// used.
 std::string OutboxRegistry::Accepted(const std::string& directory, const std::string& dataDirectory,
                                      std::string& refusal) {
     try {
         if (!directory.empty())
             return Sqlite::SafeDirectory::Resolve(directory, dataDirectory);
-    } catch (const std::bad_alloc&) { // which says nothing of the directory
+    } catch (const std::bad_alloc&) { // a lack of memory says nothing about the directory
         throw;
     } catch (const std::exception& error) {
         refusal = "The directory " + Shown(directory) + " is not used: " + Shown(error.what());
@@ -79,7 +80,7 @@ std::string OutboxRegistry::Choose(const std::string& canonical) {
     if (m_firstDirectory.empty())
         m_firstDirectory = canonical;
     const bool isNew = !m_engines.contains(canonical);
-    // The first directory's place is kept for it.
+    // One place is always kept for the first directory.
     const auto taken = m_engines.size() + (m_engines.contains(m_firstDirectory) ? 0 : 1);
     return isNew && canonical != m_firstDirectory && taken >= MAX_OUTBOXES ? m_firstDirectory : canonical;
 }
@@ -96,12 +97,12 @@ void OutboxRegistry::Release(std::shared_ptr<OutboxEngine>& engine) {
         ForgetWhatWasTold();
 }
 
-/// What comes next is a new beginning, which tells anew. Part of the modules' destruction, so it does without
-/// memory.
+/// The next outbox is a new beginning, so every failure may be reported anew. This is part of the destruction
+/// of modules, so it must also work without memory.
 void OutboxRegistry::ForgetWhatWasTold() noexcept {
     try {
         m_reporter = std::make_shared<report::FailureReporter>(m_settings.tellInterval);
-    } catch (const std::bad_alloc&) { // then the limit on what is told goes on
+    } catch (const std::bad_alloc&) { // then the old reporter stays, with its limit on reports
     }
 }
 

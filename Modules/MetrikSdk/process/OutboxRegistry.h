@@ -14,41 +14,44 @@
 
 namespace MetrikSdk::process {
 
-/// The outboxes of this process: one for each database directory, however many modules announce themselves.
+/// The outboxes of this process: one for each database directory, however many modules use it.
 ///
-/// Directories come from outside, in datagrams. Empty ones mean the one that the process gave first. So do
-/// those that break the rule of Sqlite::SafeDirectory, and every new one once MAX_OUTBOXES are in use: an
-/// outbox costs a file and a thread.
+/// Directories come from outside, in datagrams. An empty directory means the first one that the process was
+/// given. So does a directory that breaks the rule of Sqlite::SafeDirectory, and each new directory when
+/// MAX_OUTBOXES are in use: an outbox takes a file and a thread.
 ///
 /// Threads: any.
 class OutboxRegistry {
 public:
-    /// The suite uses one directory, a test installation a second one; the rest is room for the unforeseen.
+    /// The suite uses one directory, and a test installation a second one. The others are room for uses that
+    /// we do not know.
     static constexpr std::size_t MAX_OUTBOXES = 8;
 
     using DataDirectory = std::function<std::string()>; ///< Returns the user's data directory.
 
     OutboxRegistry(const OutboxSettings& settings, otlp::LookUp lookUp, DataDirectory dataDirectory);
 
-    /// The process's own, with production's settings. Never destroyed: SDK objects may outlive static ones.
+    /// The registry of the process, with the settings of production. It is never destroyed, because SDK
+    /// objects may live longer than static objects.
     static OutboxRegistry& Instance();
 
-    /// The outbox for `directory`; null when there is no directory to use at all. To be given back by
-    /// Release.
+    /// The outbox that serves `directory`; it can be the first one (see the class). Null when `directory` is
+    /// empty or refused and no usable one was given before. Give it back with Release.
     std::shared_ptr<OutboxEngine> Acquire(const std::string& directory);
 
-    /// The same; `refusal` tells why it is not the outbox of `directory`, when that must not be used.
+    /// The same. When `directory` must not be used, `refusal` gets the reason.
     std::shared_ptr<OutboxEngine> Acquire(const std::string& directory, std::string& refusal);
 
-    /// The modules that use the outboxes.
+    /// The memberships of the modules that use the outboxes.
     Memberships& Members() { return m_members; }
 
-    /// Gives `engine` up. The last user's call stops its uploader before it returns; no other thread can open
-    /// the same file meanwhile.
+    /// Gives `engine` up. When no other module uses it, its uploader is stopped before this returns. No other
+    /// thread can open the same file meanwhile.
     void Release(std::shared_ptr<OutboxEngine>& engine);
 
-    /// What to tell a module that got no outbox, if it is time to tell: the limit on what is told holds for
-    /// the process. It begins anew when the last outbox in use was released, whose users have heard it all.
+    /// The text to report for a module that got no outbox; nothing when it was reported too recently. The
+    /// limit on reports holds for the whole process. It begins anew when the last outbox in use was released,
+    /// because the users of that outbox have heard of everything.
     std::optional<std::string> ReportNoDirectory();
     std::optional<std::string> RecordFailure(report::Cause cause, const std::string& text);
 
@@ -65,8 +68,8 @@ private:
     std::mutex m_mutex;                                  ///< Guards all below.
     std::shared_ptr<report::FailureReporter> m_reporter; ///< Shared by all outboxes.
     std::string m_firstDirectory;
-    std::map<std::string, std::weak_ptr<OutboxEngine>> m_engines; ///< By canonical directory.
-    Memberships m_members{*this};                                 ///< Guards itself, and is entered first.
+    std::map<std::string, std::weak_ptr<OutboxEngine>> m_engines; ///< By canonical path of the directory.
+    Memberships m_members{*this}; ///< Has its own mutex, which is locked before m_mutex.
 };
 
 } // namespace MetrikSdk::process

@@ -10,23 +10,25 @@
 
 namespace MetrikSdk::report {
 
-/// Events that were lost shortly after one another: a run. A person who reads that losses began wants to know
-/// in the end how many there were, when, and whose. Pure: the times are the caller's. Threads: one at a time.
+/// A run of losses: events that were lost shortly after one another. A person who reads that losses began
+/// wants to know in the end how many events were lost, when, and from which modules. Pure: the caller passes
+/// the times. Threads: one at a time.
 class LossRun {
 public:
-    /// Modules that a run counts one by one, and names. A hostile program has thousands.
+    /// How many modules a run counts one by one, and names. A hostile program may have thousands.
     static constexpr std::size_t MAX_MODULES = 20;
 
-    /// Losses this far apart are two runs.
+    /// Losses that are further apart than `ends` are two runs.
     explicit LossRun(std::chrono::milliseconds ends) : m_ends(ends) {}
 
-    /// `count` events of `module` were lost. Whether a run begins with them.
+    /// `count` events of `module` were lost. Returns whether a run begins with them.
     bool Add(const std::string& module, std::size_t count, SteadyTime now, WallTime wall);
 
-    /// The totals of the run that is over, once; nothing while it goes on, and when there was none.
+    /// The totals of a run that is over; each run is returned once. Nothing while the run goes on, or when
+    /// there was none.
     std::optional<std::string> TakeEnded(SteadyTime now);
 
-    /// The same for the run under way, because nothing will be told any more.
+    /// The totals of the run, also while it goes on. For a caller that cannot report anything later.
     std::optional<std::string> Take();
 
 private:

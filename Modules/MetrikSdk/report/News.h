@@ -4,26 +4,26 @@
 
 namespace MetrikSdk::report {
 
-/// What went wrong. Coarse on purpose: in the log, each of these is repeated once in an interval at most.
+/// What went wrong. The causes are coarse on purpose: the log gets each of them at most once in an interval.
 enum class Cause {
-    Configuration, ///< A variable of the environment that makes no sense.
-    Directory,     ///< No directory to keep the outbox in.
+    Configuration, ///< A variable of the environment makes no sense.
+    Directory,     ///< There is no directory in which the outbox can be.
     File,          ///< The outbox file cannot be used for now.
-    Damage,        ///< The outbox file was set aside.
+    Damage,        ///< The outbox file is damaged and was set aside.
     Vanished,      ///< The outbox file was deleted or replaced.
-    Event,         ///< An event that cannot be stored in any state of the file.
-    Drop,          ///< Events given up for a cap.
+    Event,         ///< The event itself cannot be stored, in any state of the file.
+    Drop,          ///< Events were dropped to keep within a cap.
     Upload,        ///< The collector cannot be reached or asks to wait.
     Refusal,       ///< Events that the collector will never take.
-    Warning,       ///< What a collector has to say about events that it took.
+    Warning,       ///< A collector's message about events that it took.
     Init,          ///< A module could not be initialised for an unexpected reason.
     Count          ///< How many causes there are.
 };
 
-/// The first text of the failure callback.
+/// The first text that the failure callback gets for this cause.
 const char* NameOf(Cause cause);
 
-/// A failure, or the end of failures, on its way to the callbacks.
+/// A failure, or the end of failures, that is to be reported to the callbacks.
 struct News {
     enum class Kind { Failure, End };
     Cause cause;

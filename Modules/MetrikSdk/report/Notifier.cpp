@@ -25,7 +25,7 @@ void Notifier::Subscribe(IMetrikSdk::Callback onFailure, IMetrikSdk::Callback on
     Add(m_onFailure, onFailure);
     try {
         Add(m_onSuccess, onSuccess);
-    } catch (...) { // both or neither
+    } catch (...) { // either both are added or none
         Take(m_onFailure, onFailure);
         throw;
     }
@@ -53,7 +53,7 @@ void Notifier::TellFailure(Cause cause, const char* text) noexcept {
     }
 }
 
-/// In which words it is told, if it is told now.
+/// The text to report; nothing when it is not to be reported now.
 std::optional<std::string> Notifier::Words(const News& news) {
     if (news.kind == News::Kind::Failure)
         return m_reporter->RecordFailure(news.cause, news.text, std::chrono::steady_clock::now());
@@ -80,7 +80,7 @@ void Notifier::Tell(const Subscribers& subscribers, const std::string& what, con
             return;
         try {
             callback(what, detail);
-        } catch (...) { // a stranger's exception must not end the uploader's thread
+        } catch (...) { // an exception of a callback must not end the uploader's thread
         }
     }
 }
