@@ -22,18 +22,18 @@ int Run(int argc, char** argv) {
 int main(int argc, char** argv) {
     SystemTool::IO::OpenClosedStandardDescriptors();
 
-    // The caller's mask does not count: a file or directory is its owner's alone from the moment it exists,
-    // and is opened to others afterwards where that is meant.
+    // We do not use the caller's umask: only its owner may use a file or directory from the moment it exists.
+    // Where others may use it, its mode is changed afterwards.
     ::umask(0077);
 
     try {
         return reportctl::terminal::FinishOutput(Run(argc, argv));
     } catch (const std::system_error& error) {
-        if (error.code() == std::errc::broken_pipe) // the reader of a long output has seen enough
+        if (error.code() == std::errc::broken_pipe) // the reader of a long output has read enough
             return 0;
         reportctl::terminal::TellLastError(error.what());
         return 1;
-    } catch (const std::exception& error) { // such as a disk that is full in the middle of a long output
+    } catch (const std::exception& error) { // for example, the disk became full during a long output
         reportctl::terminal::TellLastError(error.what());
         return 1;
     }

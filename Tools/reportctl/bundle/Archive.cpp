@@ -10,7 +10,8 @@
 namespace reportctl::bundle {
 namespace {
 
-/// The archive's bytes go into the file. No exception may pass through the library.
+/// Writes the archive's bytes into the file. It catches every exception: none may pass through the library,
+/// which is written in C.
 la_ssize_t Write(struct archive* archive, void* file, const void* bytes, std::size_t size) {
     try {
         static_cast<terminal::Result*>(file)->Write({static_cast<const char*>(bytes), size});
@@ -28,7 +29,7 @@ Archive::Archive(const std::string& path)
     Check(::archive_write_add_filter_gzip(m_archive.get()));
     Check(::archive_write_set_format_pax_restricted(m_archive.get()));
     Check(::archive_write_set_bytes_in_last_block(m_archive.get(),
-                                                  1)); // a file needs no padding to a tape's block
+                                                  1)); // no padding: only a tape needs whole blocks
     Check(::archive_write_open(m_archive.get(), &m_file, nullptr, &Write, nullptr));
 }
 

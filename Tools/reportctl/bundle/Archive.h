@@ -9,16 +9,17 @@ struct archive;
 
 namespace reportctl::bundle {
 
-/// A .tar.gz file that is made: it appears whole, mode 0600, or not at all (see terminal::Result).
+/// Makes a .tar.gz file with mode 0600. It appears whole or not at all (see terminal::Result).
 ///
 /// Failure: throws std::system_error for the file, std::runtime_error for the archive.
 class Archive {
 public:
     explicit Archive(const std::string& path);
 
-    /// Adds a text file; `name` may have a folder.
+    /// Adds a text file. `name` may begin with a folder.
     void Add(const std::string& name, const std::string& content);
 
+    /// Completes the file. Without this call, no file is left.
     void Finish();
 
 private:

@@ -33,8 +33,8 @@ namespace fs = std::filesystem;
 
 constexpr std::size_t LOG_LINES = 2000;
 
-/// What another command of this program prints. A process of its own, so that one that fails costs its part
-/// alone.
+/// Runs another command of this program and returns what it prints. The command has a process of its own, so
+/// that its failure affects only its own part of the bundle.
 std::string OutputOf(const std::string& command) {
     const auto program = SystemTool::IO::Directory::GetExcutableDirectory() + "reportctl";
     const auto line = fmt::format("{} {} 2>&1", terminal::ShellQuoted(program), command);
@@ -61,7 +61,7 @@ std::string SizeOf(const fs::path& path) {
     return error ? error.message() : fmt::format("{} bytes", size);
 }
 
-/// A directory's files with their modes and sizes.
+/// A list of a directory's files with their modes and sizes.
 std::string FilesIn(const std::string& directory) {
     std::string text = directory + ":\n";
     std::error_code error;
@@ -72,7 +72,7 @@ std::string FilesIn(const std::string& directory) {
     return error ? text + "  " + error.message() + "\n" : text;
 }
 
-/// Which settings of the collector there are. Their texts may hold keys.
+/// The names of the collector's settings, and their sizes. Their texts stay out, because they may hold keys.
 std::string Settings() {
     const auto environment = service::OfTheService();
     std::string text =
@@ -98,7 +98,7 @@ std::string System() {
                        FilesIn("/Library/Preferences/hublink"));
 }
 
-/// The rows of a query, columns joined by a bar.
+/// The rows of a query, one a line, with a bar between the columns.
 std::string Rows(SQLite::Database& database, const std::string& sql) {
     SQLite::Statement query(database, sql);
     std::string text;

@@ -12,10 +12,10 @@ namespace reportctl::bundle {
 struct Part {
     std::string name;
     std::string about;                    ///< for the list of contents
-    std::function<std::string()> content; ///< may throw: then the reason is the content
+    std::function<std::string()> content; ///< may throw; the bundle then has the reason as the content
 };
 
-/// What support needs, in the order of the list. Nothing in it changes anything.
+/// All files that support needs, in the order of the list of contents. Making them changes nothing.
 std::vector<Part> AllParts(const Redaction& redaction);
 
 } // namespace reportctl::bundle

@@ -19,7 +19,8 @@ std::string Sizes(std::string_view what, std::size_t bytes) {
     return fmt::format("[{}, {} bytes]", what, bytes);
 }
 
-/// What a database quotes in its error is a piece of the statement, and may be one of a value.
+/// Replaces each quoted piece of the text by "...". A database's error quotes a piece of the statement, which
+/// may be a piece of a report's value.
 std::string WithoutQuoted(const std::string& text) {
     std::string out;
     bool isInside = false;
@@ -36,7 +37,8 @@ std::string WithoutQuoted(const std::string& text) {
     return out;
 }
 
-/// The last error of the log may be quoted anywhere, with the statement of the report that the store refused.
+/// Takes the statements of reports out of a text. Any file of the bundle may quote the log's last error, and
+/// that error may hold the statement of a report that the store refused.
 std::string WithoutStatements(const std::string& text) {
     std::string out;
     for (std::size_t begin = 0; begin < text.size();) {
@@ -44,7 +46,7 @@ std::string WithoutStatements(const std::string& text) {
         const auto line = text.substr(begin, end - begin);
         const auto sql = line.find("insert into OperLog");
         const bool hasPiece =
-            line.find("near \"") != std::string::npos; // the rest of the line may have been cut off
+            line.find("near \"") != std::string::npos; // the line may have been cut before the statement
         if (sql != std::string::npos)
             out += WithoutQuoted(line.substr(0, sql)) + "[statement]\n";
         else
@@ -76,7 +78,7 @@ std::string RedactedReport(const message::Message& message) {
     return redacted.ToJson();
 }
 
-/// The message of a record, by where it comes from.
+/// A record's message without personal data. The place in the service that logged it tells what it may hold.
 std::string Redacted(const log::Line& line) {
     if (line.site == "App/ReportServer" && line.function == "Recv")
         return line.message.starts_with("[BoostLogError]") ? line.message : RedactedDatagram(line.message);

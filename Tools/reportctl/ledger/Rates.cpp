@@ -12,11 +12,12 @@ using ReportLedger::Look;
 using ReportLedger::MarkAt;
 using ReportLedger::Outcome;
 
-/// Marks are written up to one period and one poll apart, so the one that is meant may be a little older.
+/// Two marks may be one period and one poll apart, so the mark that is wanted may be a little older than a
+/// minute or a second.
 constexpr std::chrono::milliseconds MINUTE = 60s + 11s;
 constexpr std::chrono::milliseconds SECOND = 1s + 1300ms;
 
-/// The oldest mark that is not older than that; null when there is none.
+/// The oldest mark that is not older than `time`; null when there is none.
 const MarkAt* MarkWithin(const std::vector<MarkAt>& marks, std::int64_t nowMs,
                          std::chrono::milliseconds time) {
     const auto found = std::ranges::find_if(

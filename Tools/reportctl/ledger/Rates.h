@@ -6,25 +6,25 @@
 
 namespace reportctl::ledger {
 
-struct Rates { ///< A second.
+struct Rates { ///< In reports per second.
     double received = 0;
     double stored = 0;
     double refused = 0;
 };
 
-/// All that was refused, for whichever reason.
+/// The sum of the refused reports, for all reasons.
 std::uint64_t RefusedIn(const ReportLedger::Counts& counts);
 
-/// Between two looks.
+/// The rates between two readings of the counters that are `time` apart.
 Rates RatesBetween(const ReportLedger::Counts& before, const ReportLedger::Counts& after,
                    std::chrono::milliseconds time);
 
-/// Of about the last minute and the last second, by the marks that the ledger keeps. Zeros when nothing
-/// counts.
+/// The rates of about the last minute and of about the last second, from the marks that the ledger keeps.
+/// Zeros when no service is counting.
 Rates OfTheLastMinute(const ReportLedger::Look& look);
 Rates OfTheLastSecond(const ReportLedger::Look& look);
 
-/// What a counter grew by in about so long, or since the oldest mark.
+/// How much a counter grew in about the last `time`, or since the oldest mark when that is younger.
 std::uint64_t GrownIn(const ReportLedger::Look& look, unsigned place, std::chrono::milliseconds time);
 
 } // namespace reportctl::ledger

@@ -12,7 +12,7 @@ std::string ValueText(const JsonDocument& value) {
     return value.IsObject() ? value.ToJson() : value.ToString();
 }
 
-/// The service tells seconds from milliseconds by the length alone.
+/// The time in milliseconds. Like the service, it takes every time of ten characters for seconds.
 std::string TimeText(const JsonDocument& createTime) {
     auto text = createTime.ToString();
     return text.size() == Wire::SECONDS_LENGTH ? text + "000" : text;
@@ -46,7 +46,7 @@ Message Read(const std::string& text) {
     Message message;
     JsonDocument document;
     document.FromJson(text, message.fault);
-    // The service searches the raw text, before it parses anything.
+    // We search the raw text, because the service does so too, before it parses the text.
     if (text.find(Wire::REPORT_MARK) != std::string::npos) {
         ReadReport(message, document);
         return message;

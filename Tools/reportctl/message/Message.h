@@ -4,12 +4,12 @@
 
 namespace reportctl::message {
 
-/// Where a text is meant to end.
+/// What kind of message a text is.
 enum class Kind {
-    Report,  ///< the store
-    Event,   ///< analytics
+    Report,  ///< a report for the store
+    Event,   ///< a report for analytics
     Control, ///< a control message
-    Other,   ///< no text that was sent to the service
+    Other,   ///< not a message to the service
 };
 
 /// The word for people and for JSON: "report", "event", "control" or "other".
@@ -19,13 +19,13 @@ const char* WordFor(Kind kind);
 struct Message {
     Kind kind = Kind::Other;
     std::string eventID;
-    std::string value;      ///< JSON of an object, the text of anything else
-    std::string createTime; ///< in milliseconds, where it was given in seconds
+    std::string value;      ///< an object as JSON, any other value as a text
+    std::string createTime; ///< in milliseconds; seconds were converted
     std::string control;    ///< the kind of control message, such as "init"
-    std::string fault;      ///< the parser's words when it is no JSON
+    std::string fault;      ///< the parser's error when the text is not JSON, else empty
 
-    /// What stands before the first bar of the event id, or the module that a control message announces;
-    /// empty without one.
+    /// The part of the event id before its first bar, or the module that a control message announces. Empty
+    /// when there is none.
     std::string module;
 };
 

@@ -13,11 +13,11 @@
 namespace reportctl::page {
 namespace {
 
-/// How far back the page shows hours and days, and how many events and modules.
+/// The page shows the hours and days of this time, and this many of the most frequent events and modules.
 constexpr std::int64_t SHOWN_MS = 90LL * 24 * 3600 * 1000;
 constexpr std::size_t SHOWN_KEYS = 15;
 
-/// What each reason grew by from one mark of the ledger to the next.
+/// How many reports were refused for each reason between one mark of the ledger and the next.
 std::vector<RefusedAt> RefusedByMark(const ReportLedger::Look& look) {
     std::vector<RefusedAt> refused;
     for (std::size_t i = 1; i < look.marks.size(); ++i) {
@@ -30,13 +30,14 @@ std::vector<RefusedAt> RefusedByMark(const ReportLedger::Look& look) {
     return refused;
 }
 
-/// The tallies of a database that can be read; one that cannot be is told by the status.
+/// Runs `count` on the database. When the database cannot be read, nothing is counted, and the page's status
+/// gives the reason.
 template <typename Count>
 void CountIn(const std::string& path, const Count& count) {
     try {
         auto database = store::OpenUnchanged(path);
         count(database);
-    } catch (const std::exception&) { // the page shows what there is
+    } catch (const std::exception&) { // the page shows the other data
     }
 }
 

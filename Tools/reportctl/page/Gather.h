@@ -4,8 +4,8 @@
 
 namespace reportctl::page {
 
-/// Looks at the service, the store, the outbox and the ledger of this user, without changing any of them.
-/// What is missing or cannot be read is missing from the page, and its status tells so.
+/// Reads the state of this user's service, store, outbox and ledger, without changing any of them. A source
+/// that cannot be read is missing from the page, and the page's status says so.
 PageData Gather(int reloadSeconds);
 
 } // namespace reportctl::page

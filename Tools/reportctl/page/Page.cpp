@@ -21,7 +21,7 @@ namespace {
 
 using Writer = rapidjson::Writer<rapidjson::StringBuffer>;
 
-/// An event id may have ten thousand bytes; what a person reads of it has fewer.
+/// An event id may have ten thousand bytes, but a person reads only its beginning.
 constexpr std::size_t MAX_KEY_BYTES = 200;
 
 void WriteText(Writer& writer, std::string_view text) {
@@ -93,8 +93,8 @@ std::string JsonOf(const PageData& data) {
     return {text.GetString(), text.GetSize()};
 }
 
-/// JSON inside an HTML script element. A text of it must not end the element nor begin a comment; these
-/// characters stand only in texts, where JSON has another spelling for them.
+/// The JSON for an HTML script element. No text in it may end the element or begin a comment. The characters
+/// that could do so stand only in JSON strings, where they can be written as escapes.
 std::string ForScriptElement(const std::string& json) {
     std::string safe;
     safe.reserve(json.size());
@@ -122,7 +122,7 @@ std::string_view PartOf(std::string_view name, const std::string& data, std::str
 std::string ComposePage(const PageData& data, const std::string& nonce) {
     const auto json = ForScriptElement(JsonOf(data));
     std::string page;
-    // Each @NAME@ of the template once, from left to right: what is put in is not looked at again.
+    // Replaces each @NAME@ of the template, from left to right. The text that is put in is not searched.
     for (std::string_view rest = embedded::PageHtml(); !rest.empty();) {
         const auto begin = rest.find('@');
         page += rest.substr(0, begin);

@@ -34,7 +34,7 @@ function element(name, text, className) {
     return made;
 }
 
-/** A table with a caption. Columns of numbers are the ones whose cells are numbers. */
+/** Makes a table with a caption. A column is styled as numbers when all of its cells are numbers. */
 function table(caption, headings, rows) {
     const made = element("table");
     made.append(element("caption", caption));
@@ -57,7 +57,7 @@ function table(caption, headings, rows) {
     return made;
 }
 
-/** The numbers of a chart, for those who cannot see it or want them. */
+/** Adds the numbers of a chart as a table, for readers who cannot see the chart or want the exact numbers. */
 function numbers(section, caption, headings, rows) {
     const details = element("details");
     details.append(element("summary", "The numbers"));
@@ -71,7 +71,7 @@ const charts = [];
 const MOST_LETTERS = 24;
 const short = (text) => (text.length > MOST_LETTERS ? text.slice(0, MOST_LETTERS - 1) + "…" : text);
 
-/** Draws a chart into the section's canvas; without anything to draw, says so. */
+/** Draws a chart into the section's canvas. When there is nothing to draw, the section says so. */
 function chart(section, type, labels, datasets, options) {
     const holder = byId(section).querySelector(".chart");
     if (labels.length === 0) {
@@ -171,7 +171,7 @@ function showFlow() {
     numbers("flow", "The ledger since it was begun", ["what", "reports"], steps);
 }
 
-/** Adds the counts of quarter-hours up to whole hours or days of the viewer's zone. */
+/** Sums the counts of quarter-hours by whole hours or days of the viewer's time zone. */
 function collect(quarterHours, keyOf) {
     const sums = new Map();
     for (const [quarterHour, count] of quarterHours) {

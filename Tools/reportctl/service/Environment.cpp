@@ -25,7 +25,7 @@ std::map<std::string, std::string> Own() {
     return variables;
 }
 
-/// /proc shows the variables that a process was started with, each ended by a zero byte.
+/// The variables that a process was started with. In /proc, each of them ends with a zero byte.
 std::optional<std::map<std::string, std::string>> Of(const fs::path& process) {
     std::ifstream file(process / "environ", std::ios::binary);
     std::map<std::string, std::string> variables;
@@ -34,7 +34,8 @@ std::optional<std::map<std::string, std::string>> Of(const fs::path& process) {
     return variables.empty() ? std::nullopt : std::optional(std::move(variables));
 }
 
-/// Another data directory is that of another service, which this program knows nothing of.
+/// Whether both environments name the same data directory. When they differ, the process serves other files
+/// than those that this program looks at, so its settings are not ours.
 bool HasSameData(const std::map<std::string, std::string>& one,
                  const std::map<std::string, std::string>& other) {
     const auto dataOf = [](const auto& variables) {

@@ -23,7 +23,7 @@ namespace {
 
 namespace fs = std::filesystem;
 
-constexpr auto LOOPBACK = "0100007F"; // as the kernel's table writes addresses
+constexpr auto LOOPBACK = "0100007F"; // 127.0.0.1, as the kernel's table writes addresses
 constexpr auto ANY_ADDRESS = "00000000";
 
 std::string Folder(pid_t process) {
@@ -52,7 +52,7 @@ std::string NameOf(uid_t user) {
 }
 
 std::optional<std::string> ProgramNameOf(pid_t process) {
-    // What an upgrade has replaced is marked " (deleted)".
+    // When an upgrade has replaced the program's file, the system adds " (deleted)" to the path.
     if (const auto path = TargetOf(Folder(process) + "/exe"); !path.empty())
         return fs::path(path.substr(0, path.rfind(" (deleted)"))).filename().string();
     auto name = ContentOf(Folder(process) + "/comm");

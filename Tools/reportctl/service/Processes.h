@@ -7,15 +7,15 @@
 
 #include <sys/types.h>
 
-/// What the system tells of processes. It tells more of this user's own processes than of others'; root sees
-/// all of them. Nothing throws. Linux; elsewhere nothing is known.
+/// Looks up processes in the system's /proc. The system shows more of this user's own processes than of other
+/// users'; root sees all of them. Nothing throws. On a system other than Linux, nothing is found.
 namespace reportctl::service {
 
 /// The user's name, or its number where it has none.
 std::string NameOf(uid_t user);
 
-/// The name of a process's program, as the system shows it to everybody, but not cut to 15 characters where
-/// that can be seen.
+/// The file name of a process's program. When this user may not see the program's path, it is the name that
+/// the system shows to every user, cut to 15 characters. Nothing when there is no such process.
 std::optional<std::string> ProgramNameOf(pid_t process);
 
 std::optional<uid_t> OwnerOf(pid_t process);
@@ -23,13 +23,13 @@ std::optional<uid_t> OwnerOf(pid_t process);
 /// A variable of the environment that the process was started with.
 std::optional<std::string> EnvironmentOf(pid_t process, const std::string& name);
 
-/// Whether it has a library of this file name loaded; nothing when that cannot be seen.
+/// Whether the process has loaded a library with this file name; nothing when this user may not see it.
 std::optional<bool> HasLoaded(pid_t process, const std::string& library);
 
-/// Whether it has this socket open; nothing when that cannot be seen.
+/// Whether the process has this socket open; nothing when this user may not see it.
 std::optional<bool> HasSocket(pid_t process, std::uint64_t inode);
 
-/// The process that has it, if it can be seen.
+/// The process that has this socket open; nothing when this user may not see it.
 std::optional<pid_t> ProcessOfSocket(std::uint64_t inode);
 
 struct BoundSocket {
@@ -37,11 +37,12 @@ struct BoundSocket {
     std::uint64_t inode = 0;
 };
 
-/// The sockets that are bound to the service's address and port, or to the port at any address; the exact
-/// ones first.
+/// The sockets that are bound to the service's port. Those at the service's own address come first, then
+/// those at any address.
 std::vector<BoundSocket> SocketsAtTheServicesPort();
 
-/// The process that holds the machine's lock of the one service; nothing when none does.
+/// The process that holds the lock which allows only one service on the machine; nothing when the lock is
+/// free.
 std::optional<pid_t> LockHolder();
 
 } // namespace reportctl::service

@@ -5,12 +5,12 @@
 /// The service's program, as it is installed with this reportctl.
 namespace reportctl::service {
 
-/// Its path: where the installation puts it, or beside reportctl, as in a build. Empty when it is at neither
-/// place.
+/// The path of the service's program: where the installation puts it, or beside reportctl, as in a build.
+/// Empty when it is at neither place.
 std::string ProgramPath();
 
-/// For --version: a line for reportctl and one for the service, whose version is read from its file. Running
-/// it would start it: it takes no arguments.
+/// The text of --version: a line for reportctl and a line for the service. The service's version is read from
+/// its file. We cannot ask the program: it takes no arguments, so `--version` would start the service.
 std::string VersionText();
 
 } // namespace reportctl::service

@@ -13,8 +13,8 @@
 namespace reportctl::service {
 namespace {
 
-/// The lock is taken only to learn that it is free. It goes when the program is replaced, because that closes
-/// the file, and the service takes it anew. When another one is faster, the service refuses to start, and the
+/// Waits until the lock of the pid file is free, by taking it. execv closes the file and so releases the
+/// lock, and the service takes it again. When another service takes it first, ours refuses to start, and the
 /// caller tries again.
 void AwaitLock() {
     const int file = ::open((MAC_REG_PATH + "/Report.pid").c_str(), O_RDWR | O_CLOEXEC | O_NOFOLLOW);

@@ -23,25 +23,26 @@ constexpr mode_t PRIVATE_MODE = 0700;
 constexpr mode_t SHARED_MODE = 01777;
 constexpr mode_t READABLE_MODE = 0755;
 
-/// What a directory is to be like.
+/// The state that a directory shall have.
 struct Kind {
     mode_t mode;
     mode_t parentMode;
-    int openFlags; ///< decides about symbolic links
+    int openFlags; ///< with O_NOFOLLOW, a symbolic link is refused
 };
 
 constexpr Kind PRIVATE{PRIVATE_MODE, PRIVATE_MODE, O_DIRECTORY | O_RDONLY | O_CLOEXEC};
 constexpr Kind SHARED{SHARED_MODE, READABLE_MODE, O_DIRECTORY | O_RDONLY | O_CLOEXEC | O_NOFOLLOW};
 
-/// Through a descriptor, so that what is changed is the directory that was made or looked at.
+/// Changes the mode through a descriptor, so that only a directory is changed, and a symbolic link only where
+/// `openFlags` allow one.
 void SetMode(const std::string& path, mode_t mode, int openFlags) {
     const SystemTool::IO::Descriptor directory(::open(path.c_str(), openFlags));
     if (!directory.IsOpen() || ::fchmod(directory.Number(), mode) != 0)
         SystemTool::ThrowErrno(errno);
 }
 
-/// Private at first, then opened as wide as it is to be. One that appeared meanwhile is as good, but may have
-/// another mode.
+/// Makes the directory private at first, and then gives it its mode. Another program may have made it
+/// meanwhile: then it gets its mode, too, and AlreadyThere is thrown.
 void Make(const std::string& path, const Kind& kind) {
     const fs::path itself = (fs::path(path) / "").parent_path(); // without a slash at its end
     if (const auto parent = itself.parent_path(); !parent.empty())

@@ -6,15 +6,16 @@
 
 namespace reportctl::setup {
 
-/// Makes sure of a directory of the user's own, mode 0700, with its parents. One that is there with other
-/// rights is corrected. It may be a symbolic link to a directory: the user may keep the data elsewhere.
+/// Makes the user's own directory with mode 0700, and its parents. When the directory is there with another
+/// mode, the mode is corrected. It may be a symbolic link to a directory: the user may keep the data
+/// elsewhere.
 void EnsurePrivateDirectory(terminal::Worklog& log, const std::string& path);
 
-/// Makes sure of a directory in which every user of the machine may make files, and only the owner of a file
-/// may remove it: mode 1777. Every user may read its parents. A symbolic link is refused: the user who put it
-/// there would choose which directory every user may write to. When the right to make it is missing, the
-/// failure tells the command that makes it, with the pid file in it. True when it is there, or a dry run
-/// would make it.
+/// Makes a directory with mode 1777: every user of the machine may make files in it, and only the owner of a
+/// file may remove it. Every user may read its parents. When it is there with another mode, the mode is
+/// corrected. A symbolic link is refused: the user who made the link would choose a directory that every user
+/// may write to. When this user may not make the directory, the failure names the command that makes it and
+/// the pid file in it. Returns true when the directory is there, or when a dry run would make it.
 bool EnsureSharedDirectory(terminal::Worklog& log, const std::string& path);
 
 } // namespace reportctl::setup

@@ -19,7 +19,8 @@ std::filesystem::path NearestExisting(std::filesystem::path path) {
     return path;
 }
 
-/// How set-up is run as that user on the same directory. What `sudo -H` gives is the user's own home.
+/// The command that runs set-up as that user on the same directory. `sudo -H` sets HOME to the user's own
+/// home.
 std::string CommandFor(const passwd* user, uid_t number, const std::string& data) {
     const auto name = user != nullptr ? std::string(user->pw_name) : fmt::format("'#{}'", number);
     if (user != nullptr && data == std::string(user->pw_dir) + "/.local/share")

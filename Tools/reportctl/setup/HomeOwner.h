@@ -5,10 +5,12 @@
 
 namespace reportctl::setup {
 
-/// Why set-up must not make the user's data directory `data`, and the command to use; nothing when it may.
+/// The reason why set-up must not make the user's data directory `data`, with the command to use instead.
+/// Nothing when set-up may make it.
 ///
-/// Root's rights without root's home, as after `sudo`, would make files that their user's service cannot
-/// open: they would be root's. What tells is the owner of the nearest directory that exists.
+/// After `sudo`, set-up can run as root with another user's home. Its files would belong to root, and that
+/// user's service could not open them. The directory's owner shows this: the owner of `data`, or of its
+/// nearest parent that exists.
 std::optional<std::string> ReasonAgainstRoot(const std::string& data);
 
 } // namespace reportctl::setup

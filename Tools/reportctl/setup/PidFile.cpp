@@ -25,7 +25,8 @@ Descriptor Opened(int number) {
     return Descriptor(number);
 }
 
-/// With its whole mode from the start, under any umask; never replaces an existing file.
+/// Creates the file with its full mode from the start; the umask takes nothing from it. An existing file is
+/// never replaced.
 int CreateIn(int directory) {
     const mode_t mask = ::umask(0);
     const int file = ::openat(directory, NAME, O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC | O_NOFOLLOW, MODE);
@@ -40,7 +41,7 @@ void Make(const std::string& path) {
     struct stat status {};
     if (::fstat(directory.Number(), &status) != 0)
         SystemTool::ThrowErrno(errno);
-    // Checked before: a file of this user's own is what keeps the other users out.
+    // Checked before the file is made: a file that belongs to this user would keep the other users out.
     if (const uid_t self = ::geteuid(); self != 0 && self != status.st_uid)
         SystemTool::ThrowErrno(EPERM);
     const Descriptor file(CreateIn(directory.Number()));

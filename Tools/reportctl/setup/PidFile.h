@@ -6,16 +6,17 @@
 
 namespace reportctl::setup {
 
-/// Makes sure of the pid file in the directory that every user's service locks it in: empty, mode 0666, and
-/// the directory's owner's. That last one is why the service is not left to make it: a kernel with
-/// fs.protected_regular refuses a file in such a directory to everybody but its owner, unless it belongs to
-/// the directory's owner. The first user's service would keep out every other user's.
+/// Makes the pid file that the service of every user locks: empty, mode 0666, and owned by the directory's
+/// owner. The service must not make it itself, because then it would belong to the first user. A kernel with
+/// fs.protected_regular lets other users open a file in such a directory only when the file belongs to the
+/// directory's owner. So the first user's service would keep out the services of all other users.
 ///
-/// One that is there is looked at and never opened: a running service's id is in it. A symbolic link is
-/// refused. When the right to make it is missing, the failure tells the command that makes it.
+/// A pid file that is there already is checked but not opened, because it holds a running service's process
+/// id. A symbolic link is refused. When this user may not make the file, the failure names the command that
+/// makes it.
 void EnsurePidFile(terminal::Worklog& log, const std::string& directory);
 
-/// The command with which an administrator makes the pid file in this directory, where there is none.
+/// The command with which an administrator makes the pid file in this directory.
 std::string CommandForPidFile(const std::string& directory);
 
 } // namespace reportctl::setup

@@ -27,13 +27,13 @@ void SetUpBaseInfo(terminal::Worklog& log, const std::string& store, const Setup
         store::EnsureBaseInfo(log, store, store::SUITE_VERSION_KEY, options.suiteVersion);
 }
 
-/// One set-up at a time makes or changes the store: another one would take the files beside it for what a
-/// lost store left behind. Held for as long as the result lives. Nothing where there is no directory, as in a
-/// dry run.
+/// Waits for the lock that lets only one set-up at a time make or change the store. A second set-up would
+/// take the files beside the store for remains of a lost store. The lock is held as long as the result lives.
+/// When there is no directory, as in a dry run, there is no lock.
 SystemTool::IO::Descriptor WaitForTurn(const std::string& directory) {
     SystemTool::IO::Descriptor lock(::open(directory.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
     if (lock.IsOpen())
-        ::flock(lock.Number(), LOCK_EX); // on a file system without locks there is none
+        ::flock(lock.Number(), LOCK_EX); // fails on a file system without locks: set-up goes on without one
     return lock;
 }
 

@@ -8,7 +8,7 @@ namespace reportctl::terminal {
 
 std::string ShownJson(std::string_view json) {
     constexpr auto DELETE = '\x7f';
-    constexpr auto LEAD_OF_C1 = '\xc2'; // U+0080 to U+009F are this byte and one from 0x80 to 0x9f
+    constexpr auto LEAD_OF_C1 = '\xc2'; // U+0080 to U+009F are this byte and a byte from 0x80 to 0x9f
     std::string shown;
     shown.reserve(json.size());
     for (std::size_t at = 0; at < json.size(); ++at) {

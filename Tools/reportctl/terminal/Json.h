@@ -9,12 +9,12 @@
 
 namespace reportctl::terminal {
 
-/// JSON text that a terminal may show: the control characters that JSON lets stand as they are (U+007F to
-/// U+009F) are escaped.
+/// The JSON text as a terminal may show it. JSON allows the control characters U+007F to U+009F without an
+/// escape; here they are escaped.
 std::string ShownJson(std::string_view json);
 
-/// One JSON object on one line, its members in the order in which they are added. What is no UTF-8 becomes
-/// U+FFFD.
+/// Writes one JSON object on one line. Its members are in the order in which they are added. Bytes that are
+/// not UTF-8 become U+FFFD.
 class JsonObject {
 public:
     JsonObject() : m_writer(m_text) { m_writer.StartObject(); }
@@ -23,10 +23,10 @@ public:
     void Add(const char* key, std::int64_t number);
     void AddNull(const char* key);
 
-    /// Null for an empty text.
+    /// Adds the text, or null when the text is empty.
     void AddOrNull(const char* key, std::string_view text);
 
-    /// The object, without a line feed. The last call.
+    /// Ends the object and returns it, without a line feed. Call it last, and once.
     std::string Take();
 
 private:

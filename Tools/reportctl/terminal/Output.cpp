@@ -10,11 +10,11 @@ namespace reportctl::terminal {
 int FinishOutput(int exitCode) {
     const bool wasWritten = std::ferror(stdout) == 0;
     errno = 0;
-    // Of std::cout, too, which the help is printed with: it keeps nothing of its own.
+    // This also writes what was printed with std::cout (the help), which has no buffer of its own.
     if (std::fflush(stdout) == 0 && wasWritten)
         return exitCode;
     if (errno == EPIPE)
-        return exitCode; // its reader has seen enough
+        return exitCode; // the reader closed the pipe because it has read enough
     TellLastError("cannot write to standard output" +
                   (errno == 0 ? std::string() : ": " + SystemTool::ErrnoText(errno)));
     return exitCode == 0 ? 1 : exitCode;

@@ -4,14 +4,14 @@
 
 namespace reportctl::terminal {
 
-/// The last thing that a command does: writes out what standard output still keeps. Returns `exitCode`; or 1
-/// in place of 0, after a line on standard error, when some of the output could not be written. A script that
-/// reads a full disk's half output must not take it for the whole. A reader that closed its pipe has seen
-/// enough, and is no failure.
+/// Writes out what standard output still has in its buffer. Call it at the program's end. Returns `exitCode`.
+/// When some of the output could not be written, it prints a line on standard error and returns 1 in place of
+/// 0: with a full disk, a script must not take half of an output for the whole. When the reader closed the
+/// pipe, it has read enough; that is no failure.
 int FinishOutput(int exitCode);
 
-/// For what ends the program. Unlike fmt::print, it does not throw when standard error cannot be written to
-/// either.
+/// Prints the error that ends the program on standard error. Unlike fmt::print, it does not throw when
+/// standard error cannot be written to.
 void TellLastError(const std::string& text);
 
 } // namespace reportctl::terminal

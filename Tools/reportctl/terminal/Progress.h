@@ -6,8 +6,8 @@
 
 namespace reportctl::terminal {
 
-/// A line on standard error that tells how far a long command is. It is shown on a terminal only, and it is
-/// gone when this object is: what the command has to say at its end stands alone.
+/// A line on standard error that shows how far a long command is. It is shown on a terminal only. The
+/// destructor erases it, so that only the command's result stays on the screen.
 class Progress {
 public:
     /// `label` says what is being done, such as "exporting".
@@ -16,8 +16,8 @@ public:
     Progress(const Progress&) = delete;
     Progress& operator=(const Progress&) = delete;
 
-    /// `done` of `total` are done. Cheap enough to be called for each thousand rows; draws ten times a
-    /// second.
+    /// Shows that `done` of `total` are done. Draws at most ten times a second, so it may be called for each
+    /// thousand rows.
     void Show(std::int64_t done, std::int64_t total);
 
 private:

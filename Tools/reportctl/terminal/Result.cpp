@@ -28,19 +28,19 @@ std::string DirectoryOf(const std::string& path) {
     return slash == std::string::npos ? "." : path.substr(0, slash + 1);
 }
 
-/// The reader has seen enough: no failure, and nothing to tell. A library that this program links ignores the
-/// signal, which would have ended it.
+/// Ends the program as SIGPIPE does by default: the reader closed the pipe because it has read enough, which
+/// is no failure. We raise the signal here, because a library that this program links has it ignored.
 [[noreturn]] void EndByTheClosedPipe() {
     std::signal(SIGPIPE, SIG_DFL);
     std::raise(SIGPIPE);
-    std::_Exit(0); // the signal is blocked
+    std::_Exit(0); // reached when the signal is blocked
 }
 
-/// The new name of a file is safe only when its directory is.
+/// Puts a file's new name on the disk: after a crash, the name is there only when its directory was synced.
 void SyncDirectoryOf(const std::string& path) {
     const int directory = ::open(DirectoryOf(path).c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
     if (directory < 0)
-        return; // a directory that may not be read: the file itself is written
+        return; // this user may not read the directory; the file's contents are on the disk
     ::fsync(directory);
     ::close(directory);
 }

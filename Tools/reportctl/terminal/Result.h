@@ -7,16 +7,16 @@
 
 namespace reportctl::terminal {
 
-/// Where a command's result goes: standard output, or a file that appears whole or not at all.
+/// The output of a command: standard output, or a file that appears whole or not at all.
 ///
-/// A file is written under another name beside its own, mode 0600 unless another one is asked for, and gets
-/// its name in Finish, after its contents are on the disk; one that was there before stays as it is until
-/// then, and for good when anything fails. A path that names a device or a pipe is written to as it is.
+/// A file is first written under another name in the same directory. Finish gives it its own name, after its
+/// contents are on the disk. A file that has this name already stays unchanged until then, and it stays when
+/// anything fails. A path that names a device or a pipe is opened and written to directly.
 ///
-/// Failure: every operation throws std::system_error, a full disk and a full /dev/full included.
+/// Failure: every operation throws std::system_error, for example when the disk is full.
 class Result {
 public:
-    /// An empty path, or "-", is standard output.
+    /// An empty path, or "-", means standard output. `mode`: the mode of the finished file.
     explicit Result(const std::string& path, mode_t mode = 0600);
     ~Result();
     Result(const Result&) = delete;
@@ -24,10 +24,11 @@ public:
 
     void Write(std::string_view text);
 
-    /// Hands over what was written so far, for a result that grows while it is read.
+    /// Writes out what is in the buffer, for an output that is read while it grows.
     void Flush();
 
-    /// Everything is written when this returns. Without it, nothing of a file is left.
+    /// Completes the output: after it returns, everything is written, and a file has its name. Without this
+    /// call, the destructor removes the unfinished file.
     void Finish();
 
     bool IsStandardOutput() const { return m_path.empty(); }
@@ -37,7 +38,7 @@ private:
 
     std::string m_path;
     mode_t m_mode;
-    std::string m_draft; ///< empty: there is nothing to be renamed or removed
+    std::string m_draft; ///< the unfinished file; empty when there is none
     int m_descriptor = -1;
     std::string m_buffer;
 };

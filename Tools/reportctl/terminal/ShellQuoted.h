@@ -4,7 +4,7 @@
 
 namespace reportctl::terminal {
 
-/// The path as a shell takes it.
+/// The path as one word of a shell command, in single quotes when it needs them.
 inline std::string ShellQuoted(const std::string& path) {
     if (path.find_first_not_of("/._-0123456789ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz") ==
         std::string::npos)

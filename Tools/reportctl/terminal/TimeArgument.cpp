@@ -48,7 +48,7 @@ std::optional<TimePoint> ReadAge(const std::string& text, TimePoint now) {
     return now - Number(part[1]) * UnitOf(*part[2].first);
 }
 
-/// Fractions of a second have one to three digits; ".5" is half a second.
+/// A fraction of a second from its one to three digits: ".5" is half a second.
 milliseconds Fraction(const std::ssub_match& digits) {
     auto padded = digits.str();
     padded.resize(3, '0');
@@ -62,8 +62,8 @@ seconds OffsetOf(const std::string& zone) {
     return zone[0] == '-' ? -offset : offset;
 }
 
-/// The moment that the clock on the wall shows so. In the hour that a summer time repeats, the C library
-/// chooses.
+/// The moment at which a clock in this zone shows this time; an empty zone is local time. When summer time
+/// ends, an hour comes twice; the C library chooses which one is meant.
 TimePoint MomentOf(std::tm wall, const std::string& zone) {
     if (zone.empty()) {
         wall.tm_isdst = -1;
@@ -73,7 +73,7 @@ TimePoint MomentOf(std::tm wall, const std::string& zone) {
     return zone == "Z" ? utc : utc - OffsetOf(zone);
 }
 
-/// Whether the calendar has this day; mktime would make the 3rd of March of a 31st of February.
+/// Whether the calendar has this day. mktime alone would turn the 31st of February into a day of March.
 bool IsDay(const std::tm& wall) {
     using namespace std::chrono;
     return year_month_day(year(wall.tm_year + 1900), month(static_cast<unsigned>(wall.tm_mon + 1)),

@@ -8,7 +8,7 @@
 namespace reportctl::terminal {
 namespace {
 
-volatile std::sig_atomic_t g_isToEnd = 0; // what a signal handler may write to
+volatile std::sig_atomic_t g_isToEnd = 0; // a signal handler may write to this type
 
 extern "C" void EndTheWatch(int) {
     g_isToEnd = 1;
@@ -21,8 +21,8 @@ void Handle(void (*handler)(int)) {
         ::sigaction(signal, &action, nullptr);
 }
 
-/// A signal that comes between the look at g_isToEnd and the wait would be seen only after it. So it is let
-/// in by the wait.
+/// The signals that end the command. Wait blocks them before it reads g_isToEnd, and ppoll unblocks them
+/// while it waits. Otherwise a signal that comes between the two would be noticed only after the wait.
 sigset_t TheSignals() {
     sigset_t signals;
     ::sigemptyset(&signals);

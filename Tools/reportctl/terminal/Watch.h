@@ -4,10 +4,10 @@
 
 namespace reportctl::terminal {
 
-/// For a command that goes on until it is told to end. While it lives, Ctrl-C and SIGTERM end the command in
-/// an orderly way and not the program.
+/// For a command that runs until it is told to end. While this object lives, Ctrl-C and SIGTERM do not kill
+/// the program: Wait returns false, and the command can end in an orderly way.
 ///
-/// One at a time, on the main thread.
+/// Only one object at a time, on the main thread.
 class Watch {
 public:
     Watch();
@@ -15,8 +15,8 @@ public:
     Watch(const Watch&) = delete;
     Watch& operator=(const Watch&) = delete;
 
-    /// Waits so long. False when the command is to end: by one of the signals, or because the reader of
-    /// standard output has closed its end.
+    /// Waits for this time. Returns false, also earlier, when the command shall end: after one of the
+    /// signals, or when the reader of standard output has closed the pipe.
     bool Wait(std::chrono::milliseconds time);
 };
 

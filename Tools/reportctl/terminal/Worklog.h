@@ -5,7 +5,7 @@
 
 namespace reportctl::terminal {
 
-/// What is done to a thing: the word for having done it, and for what a dry run would do.
+/// An action's name in the output: the word for the action done, and the words that a dry run prints.
 struct Verb {
     const char* done;
     const char* planned;
@@ -17,35 +17,36 @@ inline constexpr Verb SET{"set", "would set"};
 inline constexpr Verb MIGRATE{"migrated", "would migrate"};
 inline constexpr Verb RENAME{"renamed", "would rename"};
 
-/// What an action throws when another program has done the same meanwhile, such as a set-up that was started
-/// with this one.
+/// An action throws this when another program has already done the same, for example a second set-up that
+/// runs at the same time.
 struct AlreadyThere {};
 
-/// Does things and tells the person, one line each: results on standard output, failures and warnings on
-/// standard error. In a dry run nothing is done, only told. A quiet one tells failures and warnings only.
+/// Runs actions and prints one line for each: results on standard output, failures and warnings on standard
+/// error. A dry run only prints what it would do. A quiet worklog prints failures and warnings only.
 ///
 /// One thread.
 class Worklog {
 public:
     explicit Worklog(bool isDryRun, bool isQuiet = false) : m_isDryRun(isDryRun), m_isQuiet(isQuiet) {}
 
-    /// `thing` needs nothing.
+    /// Prints that `thing` is there already.
     void AlreadyDone(const std::string& thing);
 
-    /// Does `action` to `thing` unless this is a dry run. AlreadyThere means AlreadyDone. Any other exception
-    /// from it is told as a failure, followed by `advice`. Returns false after a failure.
+    /// Runs `action`, which acts on `thing`, unless this is a dry run. When it throws AlreadyThere, the
+    /// result is that of AlreadyDone. Any other std::exception from it is printed as a failure, followed by
+    /// `advice`. Returns false after a failure.
     bool Run(const Verb& verb, const std::string& thing, const std::function<void()>& action,
              const std::string& advice = {});
 
-    /// Something could not be done; `text` says what, and what to do about it.
+    /// Prints a failure. `text` says what could not be done, and what the person can do about it.
     void Fail(const std::string& text);
 
-    /// Something was done as asked, but will not do what the person wants.
+    /// Prints a warning: the state is accepted, but will not have the effect that the person wants.
     void Warn(const std::string& text) const;
 
     bool IsDryRun() const { return m_isDryRun; }
 
-    /// Says the last word. True when nothing failed.
+    /// Prints the last line, which sums up. Returns true when nothing failed.
     bool Summarise() const;
 
 private:
