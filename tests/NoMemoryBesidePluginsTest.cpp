@@ -22,12 +22,13 @@
 
 using namespace SyncServiceReport;
 
-// The service where each allocation fails once, and then each with all that follow it, beside the plug-ins
-// that ship, whose allocations, and those of the libraries that they use, count too.
+// The service with real plug-ins while memory fails. In each test, one allocation fails, or one and all that
+// follow it; then the same for the next allocation. The allocations of the plug-ins, and of the libraries
+// that they use, count, too.
 
 namespace {
 
-/// The service without its port and its threads, with a store and a log of its own.
+/// The service without its port and its threads, with its own store and log.
 class Service final : public ReportServer {
 public:
     Service() {
@@ -51,7 +52,7 @@ public:
         return work != nullptr ? work->m_data : "";
     }
 
-    /// As the process is told it: asked through the plug-in, which commits first.
+    /// The number of rows. The plug-in is asked, because it commits before it answers.
     static int Rows() {
         int rows = -1;
         DBHelper::instance().GetTotalCount("select count(*) from OperLog", rows);
@@ -70,7 +71,7 @@ private:
     TemporaryDirectory m_data;
 };
 
-/// The log of the process, which is configured once.
+/// The log of the process. It is configured once.
 class Log {
 public:
     static Log& Instance() {
@@ -107,7 +108,7 @@ std::string ArrayOfTwoThousand() {
     return array + "]";
 }
 
-/// A kind of text. `n` makes each one of its own.
+/// A kind of text. `n` makes each text a different one.
 struct Kind {
     std::string name;
     std::function<std::string(int n)> text;
@@ -146,7 +147,7 @@ std::vector<Kind> Kinds() {
 
 class NoMemoryBesidePlugins : public ::testing::TestWithParam<Kind> {
 protected:
-    /// Consumes a text with memory that fails; whether any did.
+    /// Consumes a text while memory fails. True when an allocation failed.
     bool Consume(int first, int count) {
         const std::string text = GetParam().text(first);
         Log::Instance().News();
@@ -188,7 +189,7 @@ TEST_P(NoMemoryBesidePlugins, AtOneAllocationLetsTheReportArriveOrTellsOfIt) {
         before = Arrived();
     }
     EXPECT_GT(first, 5) << "allocations were made to fail";
-    EXPECT_TRUE(untold == 0 || told > 0) << untold; // the SDK tells the same cause once a minute
+    EXPECT_TRUE(untold == 0 || told > 0) << untold; // the SDK reports the same cause once a minute only
 }
 
 TEST_P(NoMemoryBesidePlugins, FromOneAllocationOnCostsThatReportOnly) {
@@ -213,7 +214,7 @@ TEST(NoMemoryBesideTheLogger, ReceivingATextThrowsOrQueuesIt) {
                     const FailingMemory memory(first, count);
                     try {
                         service.Recv(text);
-                    } catch (const std::bad_alloc&) { // which the receiver prints
+                    } catch (const std::bad_alloc&) { // the receiver prints this one
                         isQueued = false;
                     }
                     failed = FailingMemory::Failed();

@@ -23,8 +23,9 @@
 using namespace SyncServiceReport;
 using ::testing::ElementsAre;
 
-// Each allocation on a report's way fails once, and then each with all that follow it: that costs the report,
-// and never the ones after it. Beside fake plug-ins, whose allocations count, too.
+// The service with fake plug-ins while memory fails. In each test, one allocation fails, or one and all that
+// follow it; then the same for the next allocation. This may lose the report but never a later one. The
+// allocations of the fake plug-ins count, too.
 
 namespace {
 
@@ -32,8 +33,8 @@ namespace {
 class Server final : public ReportServer {
 public:
     Server() {
-        m_socket.bind(
-            Poco::Net::SocketAddress("127.0.0.1", 0)); // so that Start gets no port and starts no receiver
+        // A port of its own, so that Start cannot bind and starts no receiver.
+        m_socket.bind(Poco::Net::SocketAddress("127.0.0.1", 0));
         const CapturedOutput complaint;
         Start();
         StopThread();
@@ -57,7 +58,7 @@ std::size_t SdkCalls(int slot) {
     return static_cast<std::size_t>(std::ranges::count(FakeSdk().calls, slot, &FakeSdkState::Call::slot));
 }
 
-/// Whether a line tells of a failure.
+/// Whether a record says that something failed.
 bool IsTold() {
     const auto records = FakeLogger().Records();
     return std::ranges::any_of(records, [](const LogRecord& record) { return record.level >= 3; });
@@ -70,12 +71,12 @@ std::string ArrayOfTwoThousand() {
     return array + "]";
 }
 
-/// A kind of text, and what tells that it was handled. `n` makes each text one of its own.
+/// A kind of text, and how a test sees that it was handled. `n` makes each text a different one.
 struct Kind {
     std::string name;
     std::function<std::string(int n)> text;
-    std::function<std::size_t(const ReportServer&)>
-        effect; ///< Grows, or is another one, with each that is handled.
+    /// Changes with each text that is handled.
+    std::function<std::size_t(const ReportServer&)> effect;
 
     friend std::ostream& operator<<(std::ostream& out, const Kind& kind) { return out << kind.name; }
 };
@@ -122,7 +123,7 @@ std::vector<Kind> Kinds() {
 
 class NoMemory : public ::testing::TestWithParam<Kind> {
 protected:
-    /// Consumes a text with memory that fails; whether any did.
+    /// Consumes a text while memory fails. True when an allocation failed.
     bool Consume(int first, int count) {
         const std::string text = GetParam().text(first);
         FakeLogger().Clear();
@@ -137,7 +138,7 @@ protected:
         ASSERT_EQ(Rows(), before + 1);
     }
 
-    FakeSqliteState& m_db = FakeSqlite(); ///< Loaded before the server, they outlive it.
+    FakeSqliteState& m_db = FakeSqlite(); ///< Loaded before the server, so that the fakes outlive it.
     FakeSdkState& m_sdk = FakeSdk();
     Server m_server;
     bool m_result = false;
@@ -210,7 +211,7 @@ TEST_F(NoMemoryFor, ReceivingATextThrowsOrQueuesIt) {
                     const FailingMemory memory(first, count);
                     try {
                         m_server.Recv(text);
-                    } catch (const std::bad_alloc&) { // which the receiver prints
+                    } catch (const std::bad_alloc&) { // the receiver prints this one
                         isQueued = false;
                     }
                     failed = FailingMemory::Failed();
@@ -241,7 +242,7 @@ TEST_F(NoMemoryFor, TheTextOfACaughtExceptionEndsNothing) {
 
 namespace {
 
-/// A queue whose consumer has no memory behind a value: for waiting for the next one, among others.
+/// A queue whose consumer has no memory after it handled a value: for example, none to wait for the next one.
 class Tasker final : public PocoTasker<int> {
 public:
     ~Tasker() override { StopThread(); }
@@ -258,11 +259,11 @@ public:
     int Consumed() const { return m_consumed; }
 
 private:
-    std::optional<FailingMemory> m_memory; ///< Of the consuming thread.
+    std::optional<FailingMemory> m_memory; ///< Used on the consuming thread.
     std::atomic<int> m_consumed = 0;
 };
 
-/// A receiver without memory for what it is to print.
+/// A receiver that has no memory for the text that it has to print.
 class Receiver final : public UDPServer {
 public:
     ~Receiver() override { Stop(); }
@@ -274,14 +275,16 @@ public:
             StopSelf();
         if (msg != "throw")
             return true;
-        m_memory.emplace(m_received, 3); // the exception's own text still has some, as early ones of the loop
+        // Three allocations fail, each time beginning with a later one: in the exception's text, in the
+        // printing, in the loop.
+        m_memory.emplace(m_received, 3);
         throw Poco::IOException("a reason of more than sixteen bytes");
     }
 
     int Received() const { return m_received; }
 
 private:
-    std::optional<FailingMemory> m_memory; ///< Of the receiving thread.
+    std::optional<FailingMemory> m_memory; ///< Used on the receiving thread.
     std::atomic<int> m_received = 0;
 };
 
@@ -305,8 +308,7 @@ TEST(NoMemoryForPrinting, DoesNotEndTheReceiver) {
         sender.sendTo(text.data(), static_cast<int>(text.size()),
                       Poco::Net::SocketAddress("127.0.0.1", 9997));
     };
-    // The memory that is missing may cost a datagram behind the one that threw, too; another one then comes
-    // through.
+    // The missing memory may also lose a datagram after the one that threw. A further datagram then arrives.
     const auto comesThrough = [&](const std::string& text) {
         const int before = receiver.Received();
         send(text);

@@ -25,7 +25,7 @@ ST_OptLog Log(const std::string& eventID) {
     return log;
 }
 
-/// Runs `body` with standard output where a death test looks.
+/// Runs `body` with standard output sent to standard error, which a death test examines.
 template <typename Body>
 void Quietly(Body body) {
     ::dup2(STDERR_FILENO, STDOUT_FILENO);
@@ -81,6 +81,6 @@ TEST(WithoutPluginsDeathTest, ACrashEndsTheProcessWithZeroAndNoOutput) {
 }
 
 TEST(WithoutPluginsDeathTest, AMissingPreferencesDirectoryEndsTheProcessWithOneAndNoOutput) {
-    std::filesystem::remove_all("/Library/Preferences/hublink"); // the sandbox's
+    std::filesystem::remove_all("/Library/Preferences/hublink"); // a directory of the sandbox
     EXPECT_EXIT(Quietly([] { MiniDump::IsAlreadyRun(); }), ExitedWithCode(1), "^$");
 }

@@ -14,7 +14,7 @@
 using namespace SyncServiceReport;
 using ReportLedger::Outcome;
 
-// What the ledger counts, by the datagram that causes it.
+// What the ledger counts for each kind of datagram.
 
 namespace {
 
@@ -39,7 +39,7 @@ protected:
         DBHelper::instance().Init(nullptr);
     }
 
-    /// Sends it, and waits until it has been handled.
+    /// Sends the datagram, and waits until the service has handled it.
     void Send(const std::string& datagram) {
         const auto before = Counts()[ReportLedger::RECEIVED];
         m_sender.sendTo(datagram.data(), static_cast<int>(datagram.size()),
@@ -55,7 +55,7 @@ protected:
         return LookAt(m_server.Ledger().Content(), true, SystemTool::Platform::CoarseTimeMs()).total;
     }
 
-    /// That sending it makes one more of these, and none more of any other end.
+    /// Sends the datagram. Expects that the counter of this outcome grows by one, and no other outcome's.
     void ExpectToEndAs(Outcome outcome, const std::string& datagram) {
         auto expected = Counts();
         Send(datagram);

@@ -18,7 +18,7 @@ LogRecord ParseError(const std::string& message) {
     return {4, "App/ReportServer", "JsonToStruct", 123, message};
 }
 
-/// On a server that was never started.
+/// Tests run on a server that was never started.
 class TheJsonToStruct : public ::testing::Test {
 protected:
     ST_OptLog Converted(const std::string& json) {

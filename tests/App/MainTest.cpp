@@ -18,7 +18,7 @@ using ::testing::HasSubstr;
 using ::testing::MatchesRegex;
 using ::testing::StartsWith;
 
-// The program's main, linked as it is, beside a fake logger that echoes what it is told.
+// The real main of the program, with a fake logger that copies each record to standard error.
 
 namespace {
 
@@ -27,7 +27,7 @@ public:
     explicit Program(const char* environment, rlim_t stackBytes = RLIM_INFINITY) {
         if (::pipe(m_output) != 0)
             throw std::runtime_error("no pipe");
-        ::setenv("XDG_DATA_HOME", m_data.Path().c_str(), 1); // where it keeps its ledger
+        ::setenv("XDG_DATA_HOME", m_data.Path().c_str(), 1); // where the program keeps its ledger
         m_process = ::fork();
         if (m_process == 0) {
             ::dup2(m_output[1], STDOUT_FILENO);
@@ -54,7 +54,7 @@ public:
     Program(const Program&) = delete;
     Program& operator=(const Program&) = delete;
 
-    /// What it has written when it has written `text`.
+    /// Waits until the program has written `text`. Returns all that it has written.
     std::string OutputUpTo(const std::string& text) {
         EXPECT_TRUE(WaitUntil([&] {
             char bytes[4096];
@@ -72,7 +72,7 @@ public:
                state.si_pid == 0;
     }
 
-    /// The signal that ends it.
+    /// Waits for the program's end. Returns the signal that ended it.
     int AwaitSignal() {
         int status = 0;
         ::waitpid(m_process, &status, 0);
@@ -112,8 +112,8 @@ TEST(Main, StaysWhenTheServerCannotStart) {
 #if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
     GTEST_SKIP() << "the sanitizers' runtimes need threads themselves";
 #endif
-    constexpr rlim_t MORE_THAN_THERE_IS = rlim_t{1}
-                                          << 46; // for the stack of each thread, so that none can start
+    // The stack of each thread is to have this size, so that no thread can start.
+    constexpr rlim_t MORE_THAN_THERE_IS = rlim_t{1} << 46;
     Program program("FAKE_LOGGER_ECHOES", MORE_THAN_THERE_IS);
     const std::string output = program.OutputUpTo("[App/ReportServer:35 Start]");
     EXPECT_THAT(output, HasSubstr("Poco exception: ")) << "the receiving thread's, printed";

@@ -28,13 +28,13 @@ using ::testing::KilledBySignal;
 
 namespace {
 
-/// What the next lock fails with; 0 for a lock that is really tried.
+/// The error of the next lock; 0 lets the lock really be tried.
 int g_lockError = 0;
 
 } // namespace
 
-// The linker sends the program's calls of fcntl here, so that a lock can fail in a way that no file system
-// here does. Both names, because the headers choose between them.
+// The linker redirects the program's calls of fcntl here, so that a lock can fail in a way that no file
+// system of this machine does. Both names are replaced, because the headers choose one of them.
 extern "C" int __real_fcntl64(int file, int command, ...);
 extern "C" int __wrap_fcntl64(int file, int command, ...) {
     if (g_lockError != 0) {
@@ -50,7 +50,7 @@ extern "C" int __wrap_fcntl64(int file, int command, ...) {
 
 namespace {
 
-const std::filesystem::path DIRECTORY = "/Library/Preferences/hublink"; // the sandbox's
+const std::filesystem::path DIRECTORY = "/Library/Preferences/hublink"; // a directory of the sandbox
 const std::filesystem::path PID_FILE = DIRECTORY / "Report.pid";
 
 constexpr int RUNS_ALREADY = 101;
@@ -60,7 +60,7 @@ LogRecord Record(int level, int line, const std::string& message) {
     return {level, "App/MiniDump", "IsAlreadyRun", line, message};
 }
 
-/// How a child process ends that runs `body` and exits with its result.
+/// Runs `body` in a child process and returns the child's exit code, which is the result of `body`.
 template <typename Body>
 int ExitCodeOfChild(Body body) {
     const pid_t child = ::fork();
@@ -92,7 +92,7 @@ protected:
     }
 };
 
-/// A process of its own that holds the lock until this object goes.
+/// A separate process that holds the lock until the destructor ends it.
 class Holder {
 public:
     Holder() {
@@ -144,7 +144,8 @@ sighandler_t HandlerOf(int signal) {
     return action.sa_handler;
 }
 
-/// Goes `depth` calls deeper and crashes there. The result is used after the call, so that it stays one.
+/// Makes `depth` nested calls and crashes in the innermost. The result is used after the call, so that the
+/// compiler keeps the calls.
 [[gnu::noinline]] int CrashAt(int depth) {
     volatile int result = depth == 0 ? ::raise(SIGSEGV) : CrashAt(depth - 1);
     return result + 1;

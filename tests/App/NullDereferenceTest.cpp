@@ -13,8 +13,8 @@
 using namespace SyncServiceReport;
 using ::testing::ExitedWithCode;
 
-// A mistake in the program, on each of its threads. Unlike a signal that was sent, its fault comes again if
-// the handler returns.
+// A programming mistake on each of the program's threads. Unlike a signal that was sent, such a fault comes
+// again when the handler returns.
 
 namespace {
 
@@ -23,8 +23,8 @@ namespace {
     *nowhere = 1; // NOLINT(clang-analyzer-core.NullDereference): what is asked for
 }
 
-/// Has the thread that logs a record of `function` make the mistake then. A record of the trace that comes
-/// from the same thread is followed by a line that says so.
+/// Makes the thread crash that logs a record of `function`. When the same thread also logs the trace, each
+/// record of the trace is followed by the line "by the one".
 void MakeTheMistakeIn(const std::string& function) {
     FakeLogger().echoes = true;
     FakeLogger().onWrite = [function](const LogRecord& record) {
@@ -43,9 +43,10 @@ void SendDatagram(const std::string& text) {
     sender.sendTo(text.data(), static_cast<int>(text.size()), Poco::Net::SocketAddress("127.0.0.1", 9997));
 }
 
-/// The service, which makes the mistake where `function` logs, at the latest when a message has arrived.
+/// Runs the service, which crashes where `function` logs, at the latest when a message has arrived.
 void RunWithTheMistakeIn(const std::string& function) {
-    const rlimit seconds{.rlim_cur = 20, .rlim_max = 20}; // a handler that returned would go on for ever
+    // If the handler returned, this would repeat for ever.
+    const rlimit seconds{.rlim_cur = 20, .rlim_max = 20};
     ::setrlimit(RLIMIT_CPU, &seconds);
     MiniDump::EnableAutoStack("/logs", "Report");
     MakeTheMistakeIn(function);

@@ -47,8 +47,8 @@ public:
         return Consumed();
     }
 
-    Poco::Event m_entered; ///< Set when Consume holds the text "block"
-    Poco::Event m_release; ///< and waits for this.
+    Poco::Event m_entered; ///< Consume sets it when it has the text "block".
+    Poco::Event m_release; ///< Consume then waits for it.
 
 private:
     std::atomic<bool> m_inside = false;
@@ -74,7 +74,7 @@ public:
 
 class OtherNotification : public Poco::Notification {};
 
-/// Tells when it is deleted.
+/// Sets `deleted` when it is deleted.
 class Witness : public Poco::Notification {
 public:
     explicit Witness(std::atomic<bool>& deleted) : m_deleted(deleted) {}

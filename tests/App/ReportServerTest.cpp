@@ -52,7 +52,8 @@ protected:
                       Poco::Net::SocketAddress("127.0.0.1", 9997));
     }
 
-    /// A message whose effect tells that everything sent before it has been handled.
+    /// The last message of a test. When its effect is seen, everything that was sent before it has been
+    /// handled.
     static constexpr auto THE_END = R"({"msgType":"updateOpenID","exdata":{"openID":"the end"}})";
 
     void AwaitTheEnd() {
@@ -60,15 +61,16 @@ protected:
         m_server.Stop();
     }
 
-    std::size_t EventCount() const { return m_sdk.calls.size() - 1; } // beside the initialisation
-    std::size_t RowCount() const { return m_db.calls.size() - 2; }    // beside opening and reading BaseInfo
+    std::size_t EventCount() const { return m_sdk.calls.size() - 1; } // the first call is the initialisation
+    // The first two calls open the file and read BaseInfo.
+    std::size_t RowCount() const { return m_db.calls.size() - 2; }
 
     FakeSqliteState& m_db = FakeSqlite();
     FakeSdkState& m_sdk = FakeSdk();
     ReportServer m_server;
 };
 
-/// A server whose consumer stays with its first text until it is released.
+/// A server whose consumer keeps its first text until the test releases it.
 class BlockedServer final : public ReportServer {
 public:
     ~BlockedServer() override { m_release.set(), Stop(); }
@@ -83,7 +85,8 @@ public:
     Poco::Event m_release{Poco::Event::EVENT_MANUALRESET};
 };
 
-/// The threads of this process, a sanitizer's included: it starts its own with the program's first.
+/// The number of threads of this process. A sanitizer starts a thread of its own with the program's first
+/// thread, so this starts one before it counts.
 std::ptrdiff_t ThreadCount() {
     std::thread([] {}).join();
     return std::distance(std::filesystem::directory_iterator("/proc/self/task"), {});
@@ -126,7 +129,7 @@ TEST_F(TheReportServer, StartIsTrueWhenNothingWorks) {
 
 TEST_F(TheReportServer, AnExceptionInStartIsLogged) {
     Start();
-    CapturedOutput output; // the socket's complaint about a second bind
+    CapturedOutput output; // captures the socket's error about a second bind
     EXPECT_FALSE(m_server.Start()) << "a thread that runs cannot be started";
     const auto records = FakeLogger().RecordsOf("Start");
     ASSERT_EQ(records.size(), 1U);
@@ -162,10 +165,10 @@ TEST_F(TheReportServer, StopEndsTheInputBeforeTheQueue) {
     const auto before = ThreadCount();
     ASSERT_TRUE(server.Start());
     server.Recv("any");
-    server.m_entered.wait(); // the consumer is at work, and stays so
+    server.m_entered.wait(); // now the consumer handles the text, until it is released
     Poco::Thread stopper;
     stopper.startFunc([&server] { server.Stop(); });
-    // Consumer and stopper are left when the receiver is gone.
+    // When the receiver's thread has ended, two more than before are left: the consumer's and the stopper's.
     EXPECT_TRUE(WaitUntil([&] { return ThreadCount() == before + 2; }, std::chrono::seconds(5)));
     server.m_release.set();
     stopper.join();
@@ -185,7 +188,8 @@ TEST_F(TheReportServer, DestructionKeepsTheDestinationsUntilTheReportUnderWayIsS
     server->Recv(R"({"eventID":"B1"})");
     entered.wait();
     OtherThread destroyer([&] { server.reset(); });
-    // Consumer and destroyer are left when the receiver is gone.
+    // When the receiver's thread has ended, two more than before are left: the consumer's and the
+    // destroyer's.
     EXPECT_TRUE(WaitUntil([&] { return ThreadCount() == before + 2; }, std::chrono::seconds(5)));
     EXPECT_TRUE(destroyer.Waits());
     EXPECT_EQ(m_db.destroyed, 0);

@@ -17,8 +17,8 @@
 #include "tests/support/CapturedOutput.h"
 #include "tests/support/WaitUntil.h"
 
-// Who else may bind the report port. A socket's options say, its own and those of the sockets that it would
-// share with.
+// Which other programs may bind the report port. The options of a socket decide that, together with those of
+// the sockets that share the port.
 
 namespace {
 
@@ -35,7 +35,7 @@ public:
     bool Recv(const std::string& msg) override {
         ++m_received;
         if (msg == LAST_REPORT)
-            StopSelf(); // saves Stop the wait for the poll's end
+            StopSelf(); // so that Stop need not wait for the end of the poll
         return true;
     }
 
@@ -45,12 +45,13 @@ private:
     std::atomic<int> m_received = 0;
 };
 
-/// How a program may ask for a port that is taken.
+/// How a program may try to bind a port that is already bound.
 struct Attempt {
     const char* what;
-    std::vector<int> options; ///< Of SOL_SOCKET, each set to 1.
-    const char* address;      ///< One of IPv6 also takes what comes by IPv4.
-    const char* device = ""; ///< The socket is bound to it first; the kernel prefers such a socket to others.
+    std::vector<int> options; ///< Options of level SOL_SOCKET, each set to 1.
+    const char* address;      ///< A socket with an IPv6 address also receives datagrams of IPv4.
+    /// Bound to this device first: the kernel prefers such a socket to others.
+    const char* device = "";
 };
 
 const std::vector<Attempt> ATTEMPTS = {
@@ -65,7 +66,8 @@ const std::vector<Attempt> ATTEMPTS = {
     {"both, of every address by IPv6", {SO_REUSEADDR, SO_REUSEPORT}, "::"},
 };
 
-/// The error of the bind, 0 when it succeeded, -1 when it did not come to that; the socket stays open.
+/// Tries to bind. The error of the bind; 0 when it succeeded; -1 when an earlier step failed. The socket
+/// stays open.
 int Try(const Attempt& attempt) {
     const Poco::Net::SocketAddress address(attempt.address, PORT);
     const int socket = ::socket(address.af(), SOCK_DGRAM | SOCK_CLOEXEC, 0);
@@ -84,7 +86,7 @@ int Try(const Attempt& attempt) {
     return ::bind(socket, address.addr(), address.length()) == 0 ? 0 : errno;
 }
 
-/// A process of another user, which tries and keeps what it got until it is destroyed.
+/// A process of another user that tries to bind, and keeps its socket until the destructor ends it.
 class AnotherUser {
 public:
     explicit AnotherUser(const Attempt& attempt) {
@@ -108,7 +110,7 @@ public:
     AnotherUser(const AnotherUser&) = delete;
     AnotherUser& operator=(const AnotherUser&) = delete;
 
-    /// Of its bind; 0 when it succeeded.
+    /// The error of its bind; 0 when it succeeded.
     int Error() const { return m_error; }
 
 private:

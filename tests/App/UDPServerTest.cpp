@@ -55,7 +55,7 @@ public:
             m_socket.close();
         if (msg == "fail the next receive")
             SendToNobody();
-        return false; // of no consequence
+        return false; // the server ignores it
     }
 
     std::vector<std::string> Received() {
@@ -67,18 +67,18 @@ public:
 
     bool IsRunning() const { return m_thread.isRunning(); }
 
-    /// Whether the receiving thread, which must have received something, waits for more.
+    /// Whether the receiving thread sleeps. The thread must have received something before.
     bool WaitsForMore() {
         return FallsAsleep(m_threadId, [] { return false; });
     }
 
-    /// For a loop that the test runs itself.
+    /// For a test that runs the loop on its own thread.
     void Bind() { m_socket.bind(SocketAddress(LOOPBACK, PORT)); }
 
     void Join() { m_thread.join(); }
 
-    /// From here on, the socket's descriptor is another file, as after a wrong second close by other code. By
-    /// bare system calls: a sanitizer takes it for the mistake that it is.
+    /// Makes the socket's descriptor refer to another file, as a wrong second close by other code would. It
+    /// uses bare system calls, because a sanitizer reports this as the mistake that it is.
     void LoseTheSocket() {
         const int other = ::open("/dev/null", O_RDWR | O_CLOEXEC);
         ::syscall(SYS_dup3, other, m_socket.impl()->sockfd(), O_CLOEXEC);
@@ -88,7 +88,7 @@ public:
     int ReceiveBufferBytes() { return m_socket.getReceiveBufferSize(); }
 
 private:
-    /// Sends to a port where no program listens, which the kernel answers with an error for the next receive.
+    /// Sends to a port where no program listens. The kernel answers with an error for the next receive.
     void SendToNobody() {
         Poco::Net::DatagramSocket nobody(SocketAddress(LOOPBACK, 0));
         const SocketAddress address = nobody.address();
@@ -104,7 +104,7 @@ private:
     std::vector<std::string> m_received;
 };
 
-/// Leaves the stop to the base class.
+/// A receiver that does not call Stop itself, so that the base class does.
 class ReceiverWithoutAStop final : public UDPServer {
 public:
     explicit ReceiverWithoutAStop(std::atomic<pid_t>& thread) : m_threadId(thread) {}
@@ -118,7 +118,7 @@ private:
     std::atomic<pid_t>& m_threadId;
 };
 
-/// What a receiver tells its watch, in words.
+/// Records the calls that the receiver makes, as words.
 class Watch final : public DatagramWatch {
 public:
     void Received(std::size_t bytes) override { Tell(std::to_string(bytes)); }
@@ -148,7 +148,7 @@ protected:
         m_sender.sendTo(datagram.data(), static_cast<int>(datagram.size()), SocketAddress(LOOPBACK, PORT));
     }
 
-    /// What arrived when `count` texts had.
+    /// Waits until `count` texts have arrived, and returns all that have.
     std::vector<std::string> Await(std::size_t count) {
         EXPECT_TRUE(WaitUntil([&] { return m_receiver.Received().size() >= count; }));
         return m_receiver.Received();
@@ -342,7 +342,7 @@ TEST_F(TheUDPServer, AStopBeforeTheLoopBeganLetsItReturnAtOnce) {
     m_receiver.Bind();
     Send("waiting");
     m_receiver.StopSelf();
-    m_receiver.run(); // on this thread
+    m_receiver.run(); // runs on the test's thread
     EXPECT_THAT(m_receiver.Received(), ElementsAre()) << "not even for what waits";
 }
 

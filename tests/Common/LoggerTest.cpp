@@ -19,7 +19,7 @@ namespace {
 
 constexpr LogSite SITE{LogLevel::Info, "Function", 7};
 
-/// The one record that logging `format` at SITE gives.
+/// Logs `format` at SITE, which must give one record, and returns that.
 template <typename... Arguments>
 LogRecord Logged(const std::string& format, const Arguments&... arguments) {
     FakeLogger().Clear();
@@ -41,7 +41,7 @@ bool IsBoostLogError(const LogRecord& record) {
     return record == BoostLogError(record.message.substr(std::min<std::size_t>(record.message.size(), 15)));
 }
 
-/// The text, or why it could not be built.
+/// The text, or the reason why it could not be built.
 template <typename MakeText>
 std::string TextOrReason(MakeText makeText) {
     try {

@@ -32,7 +32,7 @@ protected:
                      Field(&LogRecord::function, function), Field(&LogRecord::message, message));
     }
 
-    /// Initialises with the rows that BaseInfo has.
+    /// Initialises the worker with these rows in BaseInfo.
     void InitWith(std::vector<std::vector<std::string>> rows) {
         m_db.rows = std::move(rows);
         EXPECT_TRUE(m_worker.Init());

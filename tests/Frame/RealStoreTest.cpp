@@ -54,8 +54,8 @@ protected:
 
     std::vector<Row> Query(const std::string& sql) const {
         SQLite::Database database(File(), SQLite::OPEN_READWRITE, 5000);
-        database.exec(
-            "begin immediate"); // which a burst's rows, committed together, let through once they are there
+        // The rows of a burst are committed together. This lock is granted only after that commit.
+        database.exec("begin immediate");
         SQLite::Statement query(database, sql);
         std::vector<Row> rows;
         while (query.executeStep()) {
@@ -192,7 +192,8 @@ TEST_F(RealStore, WhatAReportSmugglesInHasNoEffectButOneRowOrOneError) {
             log.eventID = place == 0 ? text : "B1";
             log.value = place == 1 ? text : "v";
             log.createTime = place == 2 ? text : "1";
-            ST_BaseInfo info; // the places of suiteVersion and openID; pType is a number and takes no text
+            // The texts of suiteVersion and openID come from here. pType is a number and takes no text.
+            ST_BaseInfo info;
             info.suiteVersion = place == 3 || place == 5 ? text : "3";
             info.openID = place == 4 || place == 5 ? text : "visitor";
             m_server.SetBaseInfo(info);

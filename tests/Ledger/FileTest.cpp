@@ -16,13 +16,13 @@
 
 using namespace ReportLedger;
 
-// The ledger's file on its way through what can happen to a file.
+// What the ledger does when something happens to its file.
 
-/// Whether mapping memory fails, as when there is none left.
+/// When true, mapping memory fails, as it does when no memory is left.
 static bool g_noMemoryToMap = false;
 
 extern "C" {
-// What the linker's --wrap asks for; see CMakeLists.txt.
+// The linker's option --wrap asks for these names; see CMakeLists.txt.
 void* __real_mmap(void* address, std::size_t bytes, int protection, int flags, int file, off_t offset);
 void* __wrap_mmap(void* address, std::size_t bytes, int protection, int flags, int file, off_t offset) {
     if (g_noMemoryToMap) {
@@ -37,7 +37,7 @@ namespace {
 
 class LedgerFile : public LedgerFixture {
 protected:
-    /// A file in which so many reports have been stored.
+    /// Makes a file that counts this many stored reports.
     void MakeFile(int reports) const {
         Writer writer;
         ASSERT_TRUE(Open(writer, NOW_MS - 1000));
@@ -57,7 +57,7 @@ protected:
         return bytes;
     }
 
-    /// That a start began anew for this reason and kept the old file beside.
+    /// Expects that a start made a new file for this reason, and kept the old one beside it.
     void ExpectBegunAnew(Begun begun) const {
         Writer writer;
         ASSERT_TRUE(Open(writer));
@@ -70,7 +70,7 @@ protected:
         EXPECT_EQ(std::filesystem::exists(SetAside()), begun != Begun::NoFile);
     }
 
-    /// That a start counts in memory, and leaves what is there as it is.
+    /// Expects that a start counts in memory, and does not change what is at the file's place.
     void ExpectCountingInMemory() const {
         Writer writer;
         EXPECT_FALSE(Open(writer));
@@ -154,7 +154,7 @@ TEST_F(LedgerFile, ThatIsNoLedgerIsSetAside) {
 
 TEST_F(LedgerFile, WhoseCountersContradictEachOtherIsSetAside) {
     MakeFile(3);
-    Overwrite(256, WordOf(2)); // received, fewer than were stored
+    Overwrite(256, WordOf(2)); // the received reports: now fewer than the stored ones
     EXPECT_EQ(Look().sight, Sight::Damaged);
     ExpectBegunAnew(Begun::Damaged);
 }
@@ -190,7 +190,7 @@ TEST_F(LedgerFile, ThatIsSetAsideReplacesTheOneBeforeIt) {
 
 TEST_F(LedgerFile, WhoseMakingWasCutShortIsMadeAgain) {
     MakeFile(3);
-    Overwrite(0, std::string(8, '\0')); // the magic number comes last
+    Overwrite(0, std::string(8, '\0')); // no magic number, which is written last
     EXPECT_EQ(Look().sight, Sight::Unfinished);
     ExpectBegunAnew(Begun::NoFile);
     ASSERT_EQ(::truncate(Path().c_str(), 0), 0);
@@ -280,7 +280,7 @@ TEST_F(LedgerFile, OnAFileSystemThatHasBecomeFullIsCountedInAsBefore) {
     const Disk disk(Directory(), 1'000'000);
     MakeFile(3);
     disk.Fill();
-    MakeFile(3); // also when it is opened then
+    MakeFile(3); // also when it is opened on the full disk
     EXPECT_EQ(Look().total[RECEIVED], 6U);
 }
 

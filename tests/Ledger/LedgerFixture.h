@@ -9,7 +9,7 @@
 #include "Ledger/Writer.h"
 #include "tests/support/TemporaryDirectory.h"
 
-/// A ledger's file in a directory of the test's own.
+/// A ledger's file in a directory of the test.
 class LedgerFixture : public ::testing::Test {
 protected:
     using Outcome = ReportLedger::Outcome;
@@ -17,12 +17,12 @@ protected:
 
     static constexpr std::int64_t NOW_MS = 1'760'000'000'000;
 
-    /// As the service does at its start.
+    /// Opens the ledger as the service does at its start.
     bool Open(Writer& writer, std::int64_t nowMs = NOW_MS) const {
         return writer.Open(Directory(), "1.2.3", "c0ffee", nowMs);
     }
 
-    /// What a report of 100 bytes makes the two threads count.
+    /// Counts what both threads count for a report of 100 bytes that is received and queued.
     static void Take(Writer& writer, std::int64_t nowMs = NOW_MS) {
         writer.Received(100, false, nowMs);
         writer.Queued();

@@ -37,7 +37,7 @@ TEST_F(LedgerOutcome, TheFirstWordCounts) {
 }
 
 TEST_F(LedgerOutcome, OneReportsWordIsNotTheNextOnes) {
-    Ended(Outcome::NoStore); // of nothing that is under way
+    Ended(Outcome::NoStore); // while no report is handled
     for (int i = 0; i < 2; ++i) {
         const Handling handling(m_writer);
         Ended(i == 0 ? Outcome::Stored : Outcome::Store);

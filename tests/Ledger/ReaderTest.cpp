@@ -16,13 +16,13 @@
 
 using namespace ReportLedger;
 
-// What a look from outside sees, also of a process that counts meanwhile, and of one that was killed.
+// What a reader sees, also while a process counts, and after a process was killed.
 
 namespace {
 
 class LedgerReader : public LedgerFixture {};
 
-/// What both threads of a service count, as fast as they can.
+/// Counts what both threads of a service count, as fast as possible.
 class BusyService {
 public:
     explicit BusyService(Writer& writer) : m_writer(writer) {
@@ -44,7 +44,8 @@ private:
             m_writer.Received(empty ? 0 : 100, false, 1);
             if (empty)
                 continue;
-            m_queued.fetch_add(1, std::memory_order_release); // the queue's own hand-over
+            // Stands for the synchronisation of the real queue.
+            m_queued.fetch_add(1, std::memory_order_release);
             m_writer.Queued();
         }
     }
@@ -106,7 +107,7 @@ TEST_F(LedgerReader, SeesThatAReportIsMissingWhenNothingIsUnderWay) {
     Take(writer);
     EXPECT_TRUE(Look().balanced);
     writer.Received(100, false, NOW_MS);
-    writer.Received(100, false, NOW_MS); // the one before has gone nowhere
+    writer.Received(100, false, NOW_MS); // so the ledger misses the first one
     EXPECT_FALSE(Look().balanced);
 }
 
@@ -117,7 +118,7 @@ TEST_F(LedgerReader, LeavesOutMarksOfTheFutureAndHalfWrittenOnes) {
     writer.Tick(NOW_MS + 20'000);
     EXPECT_EQ(LookAt(writer.Content(), true, NOW_MS + 15'000).marks.size(), 2U);
     const auto file = std::make_unique<File>();
-    file->marks[0].atMs = 0; // as while it is written
+    file->marks[0].atMs = 0; // as during a write of the mark
     file->marks[0].counters[RECEIVED] = 5;
     EXPECT_TRUE(LookAt(*file, false, NOW_MS).marks.empty());
 }

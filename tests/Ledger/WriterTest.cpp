@@ -7,7 +7,7 @@
 
 using namespace ReportLedger;
 
-// What is counted, and what a restart makes of it.
+// What is counted, and what the next start does with the counts.
 
 namespace {
 
@@ -151,7 +151,7 @@ TEST_F(LedgerWriter, WhatAProcessDidNotEndIsLostWhenItIsGoneAndCountedByTheNextO
         TakeAndEnd(writer, Outcome::Stored);
         for (int i = 0; i < 3; ++i)
             Take(writer);
-        writer.Received(100, false, NOW_MS); // and one that is not in the queue yet
+        writer.Received(100, false, NOW_MS); // a fourth report, which is not in the queue yet
         EXPECT_TRUE(Look().balanced);
         EXPECT_EQ(WaitingIn(Look().total), 3U);
     }

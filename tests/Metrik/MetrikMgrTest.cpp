@@ -22,7 +22,7 @@ LogRecord Record(int level, const std::string& function, int line, const std::st
 
 class TheMetrikMgr : public ::testing::Test {
 protected:
-    /// Registers the default module and forgets that it was logged.
+    /// Registers the default module, and drops the record of that.
     void Init() {
         EXPECT_TRUE(m_mgr.Init());
         FakeLogger().Clear();
@@ -34,7 +34,7 @@ protected:
         return m_mgr.Send(log);
     }
 
-    /// The module ids that the SDK was started for, in order.
+    /// The ids of the modules that the SDK was started for, in order.
     std::vector<std::string> Started() const {
         std::vector<std::string> modules;
         for (const Call& call : m_sdk.calls)

@@ -99,7 +99,7 @@ TEST_F(TheMetrikWorker, AnSdkThatMakesNoObjectIsLogged) {
     m_sdk.createsNothing = true;
     EXPECT_FALSE(m_worker.InitDefalut());
     EXPECT_FALSE(m_worker.Init(MESSAGE));
-    // The loader has no error of its own for a plug-in that opened and returned nothing.
+    // The loader has no error text for a plug-in that was opened but made no object.
     EXPECT_THAT(FakeLogger().Records(),
                 ElementsAre(Record(4, "InitDefalut", 38, "Failed to load metrik sdk interface:"),
                             Record(4, "Init", 73, "Failed to load metrik sdk interface:")));

@@ -13,7 +13,7 @@
 #include "tests/fakes/FakeLogger.h"
 #include "tests/support/TemporaryDirectory.h"
 
-// Of the program's heap, where there is one.
+// A function of the program's heap, jemalloc; null in a build with another heap.
 extern "C" int mallctl(const char* name, void* old, std::size_t* oldSize, void* fresh, std::size_t freshSize)
     __attribute__((weak));
 
@@ -101,16 +101,16 @@ TEST_F(RealSdk, ManyModulesCostNeitherFilesNorThreads) {
 
 namespace {
 
-/// Each with an id, a version and a name of its own, and longer than any honest one.
+/// Many modules. Each has its own id, version and name, longer than any real one.
 class ModulesOfLongTexts : public RealSdk {
 protected:
     static constexpr std::size_t ID_BYTES = 1000;
 
-    /// Of the program's heap; none in a build that has another heap.
+    /// How many bytes the program's heap has given out; nothing in a build with another heap.
     static std::optional<std::size_t> AllocatedBytes() {
         if (::mallctl == nullptr)
             return std::nullopt;
-        std::uint64_t epoch = 1; // figures are those of the last epoch
+        std::uint64_t epoch = 1; // to write it refreshes the figures
         std::size_t bytes = 0;
         std::size_t size = sizeof bytes;
         ::mallctl("epoch", nullptr, nullptr, &epoch, sizeof epoch);
@@ -139,7 +139,8 @@ protected:
 
 TEST_F(ModulesOfLongTexts, CostLittleMoreThanTheirIds) {
     constexpr std::size_t FOR_A_HUNDRED_THOUSAND = std::size_t{64} << 20;
-    constexpr std::size_t HOWEVER_MANY = std::size_t{1} << 20; // the first thousand versions and names
+    // Enough for the versions and names of the first thousand modules.
+    constexpr std::size_t HOWEVER_MANY = std::size_t{1} << 20;
     const auto before = AllocatedBytes();
     if (!before)
         GTEST_SKIP() << "the figures are those of the program's own heap";

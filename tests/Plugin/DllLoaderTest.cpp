@@ -11,7 +11,7 @@
 using SystemTool::DllLoader;
 using ::testing::HasSubstr;
 
-// Here and not beside its class, because here is a library to load.
+// This test is here and not in tests/SystemTool, because here is a library that it can load.
 
 namespace {
 

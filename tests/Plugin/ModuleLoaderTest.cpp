@@ -221,8 +221,8 @@ TEST(ModuleLoader, TheDestructorGivesTheObjectBackOnce) {
 }
 
 TEST(ModuleLoader, UnloadWithoutDestoryModuleThrows) {
-    static auto* const loader =
-        new Loader(PathOf(WITHOUT_DESTORY_MODULE)); // never destroyed: see the death test
+    // Never destroyed, because its destructor would end the process: see the death test.
+    static auto* const loader = new Loader(PathOf(WITHOUT_DESTORY_MODULE));
     EXPECT_THROW(loader->Unload(), boost::system::system_error);
     EXPECT_TRUE(loader->Load()) << "the mutex was released on the way out, and the library is still open";
 }

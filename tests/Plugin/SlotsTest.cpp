@@ -7,13 +7,12 @@
 #include "Plugin/IMetrikSdk.h"
 #include "Plugin/ISqliteDatabase.h"
 
-// The order of the operations is the plug-ins' binary interface: a plug-in that was built yesterday has them
-// so.
+// The order of the operations is the plug-ins' binary interface: plug-ins that were built earlier rely on it.
 
 namespace {
 
-/// The place of a virtual operation in its class's table. A pointer to one holds one more than its offset in
-/// bytes.
+/// The place of a virtual operation in its class's table. A pointer to such an operation holds its offset in
+/// bytes plus one.
 template <typename Operation>
 std::size_t SlotOf(Operation operation) {
     std::uintptr_t offset = 0;

@@ -13,7 +13,7 @@ using SystemTool::CommonTool::GetUserDataDir;
 
 namespace {
 
-/// What os-release calls the system, as a shell reads it.
+/// The system's name in os-release, as a shell reads it.
 std::string PrettyName() {
     FILE* const shell = ::popen(". /etc/os-release && printf %s \"$PRETTY_NAME\"", "r");
     std::string name(200, '\0');

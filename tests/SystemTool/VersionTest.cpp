@@ -16,7 +16,7 @@ namespace {
 
 const std::string THIS_PROGRAM = std::filesystem::read_symlink("/proc/self/exe").string();
 
-/// What binutils read out of this program.
+/// The build id that readelf finds in this program.
 std::string BuildIdByReadelf() {
     FILE* const tool = ::popen(("readelf -n " + THIS_PROGRAM + " | sed -n 's/ *Build ID: //p'").c_str(), "r");
     std::string id(200, '\0');

@@ -2,16 +2,16 @@
 
 #include "tests/fakes/FakePlugin.h"
 
-/// What a fake plug-in's two exports were asked for, and what they are told to do.
+/// How often the two exports of a fake plug-in were called, and what a test tells them to do.
 struct FakeFactory {
     int created = 0;
     int destroyed = 0;
     bool createsNothing = false;
     Throws createThrows = Throws::Nothing;
-    int* sequence = nullptr; ///< A counter that several plug-ins' fakes may share,
-    int destroyedAt = 0;     ///< and what it said when an object was destroyed last.
+    int* sequence = nullptr; ///< A counter that the fakes of several plug-ins may share.
+    int destroyedAt = 0;     ///< The counter's value when an object was last destroyed.
 
-    /// For "CreateModule": whether there is to be an object.
+    /// For "CreateModule": true when it is to make an object.
     bool Create() {
         ++created;
         ThrowIf(createThrows);

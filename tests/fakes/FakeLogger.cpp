@@ -9,7 +9,8 @@ namespace {
 
 FakeLoggerState& State() {
     static auto* state = [] {
-        auto* made = new FakeLoggerState; // outlives the statics of the program, which log while they go
+        // Never destroyed, because the program's statics log while they are destroyed.
+        auto* made = new FakeLoggerState;
         made->echoes = std::getenv("FAKE_LOGGER_ECHOES") != nullptr;
         return made;
     }();

@@ -30,7 +30,7 @@ struct LogRecord {
     }
 };
 
-/// What the fake logger recorded, over all of its instances, and what it is told to do.
+/// What all instances of the fake logger recorded, and what a test tells them to do.
 struct FakeLoggerState {
     void Write(LogRecord record, const void* instance) {
         ThrowIf(throws);
@@ -48,7 +48,7 @@ struct FakeLoggerState {
         const std::lock_guard lock(mutex);
         return records;
     }
-    /// The records of one function, for a test that has no eye for what else was logged.
+    /// The records of one function, for a test that does not look at other records.
     std::vector<LogRecord> RecordsOf(const std::string& function) {
         auto all = Records();
         std::erase_if(all, [&function](const LogRecord& record) { return record.function != function; });
@@ -67,8 +67,8 @@ struct FakeLoggerState {
     std::function<void(const LogRecord&)> onWrite; ///< Called with each record before it is kept.
     int created = 0;                               ///< Instances that "CreateModule" made.
     Throws throws = Throws::Nothing;
-    bool echoes =
-        false; ///< Copies each record to standard error, for tests that see no more of a child than that.
+    /// Copies each record to standard error. Some tests see nothing else of a child process.
+    bool echoes = false;
     bool hangs = false; ///< Never returns from a write.
 
 private:

@@ -5,7 +5,7 @@ namespace {
 FakeModuleState g_state;
 
 #ifdef CREATE_THROWS
-/// Of a class that only this library has.
+/// A class that only this library has.
 class OwnError : public std::exception {
 public:
     const char* what() const noexcept override { return "the plug-in's own error"; }

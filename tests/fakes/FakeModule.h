@@ -20,7 +20,7 @@ struct FakeModuleState {
     int destroyed = 0;
     IFakeModule* lastDestroyed = nullptr;
 
-    std::function<void()> onCreate;  ///< Called by the next "CreateModule", and no other.
+    std::function<void()> onCreate;  ///< Called by the next "CreateModule" only.
     std::function<void()> onDestroy; ///< The same for "DestoryModule".
 
     static void CallOnce(std::function<void()>& hook) {

@@ -26,8 +26,8 @@ inline void ThrowIf(Throws what) {
     }
 }
 
-/// The state that the fake plug-in beside this executable exports as "FakeState". The library is kept open,
-/// so that the state outlives every loader.
+/// The state of the fake plug-in that lies beside this executable. The plug-in exports it as "FakeState". The
+/// library stays open, so that the state outlives every loader.
 template <typename State>
 State& FakeState(const std::string& library) {
     void* handle = ::dlopen((SystemTool::IO::Directory::GetExcutableDirectory() + library).c_str(), RTLD_NOW);

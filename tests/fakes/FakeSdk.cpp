@@ -8,7 +8,7 @@ FakeSdkState& State() {
 }
 
 #ifdef INIT_THROWS_OWN_CLASS
-/// Of a class that only this library has, whose code goes with the library.
+/// A class that only this library has. Its code is gone when the library is closed.
 class OwnError : public std::exception {
 public:
     const char* what() const noexcept override { return "the SDK's own error"; }

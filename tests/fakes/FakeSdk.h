@@ -6,10 +6,10 @@
 #include "Plugin/IMetrikSdk.h"
 #include "tests/fakes/FakeFactory.h"
 
-/// What the fake SDK was asked, over all of its objects and in order, and what it answers.
+/// The calls that all objects of the fake SDK received, in order, and what they answer.
 struct FakeSdkState : FakeFactory {
-    /// One call, by the slot that was called (0 is the interface's first) and the object's number (1 is the
-    /// first made).
+    /// One call: `slot` is the operation's place in the interface (the first is 0), `object` is the number of
+    /// the object (the first that was made is 1).
     struct Call {
         int slot;
         int object;
@@ -19,7 +19,7 @@ struct FakeSdkState : FakeFactory {
     };
 
     std::vector<Call> calls;
-    IMetrikSdk::Callback onFailure = nullptr; ///< As the last InitSdk gave them.
+    IMetrikSdk::Callback onFailure = nullptr; ///< The callback that the last InitSdk got.
     IMetrikSdk::Callback onSuccess = nullptr;
     bool initAnswer = true;
     bool reportAnswer = true;

@@ -7,16 +7,17 @@
 
 #include "tests/fakes/FakeFactory.h"
 
-/// What the fake database was asked, and what it answers.
+/// The calls that the fake database received, and what it answers.
 struct FakeSqliteState : FakeFactory {
     struct Call {
         std::string operation;
-        std::string argument; ///< The path or statement; a batch's statements joined by blanks.
+        /// The path or statement. For a batch, the statements with blanks between them.
+        std::string argument;
 
         bool operator==(const Call&) const = default;
     };
 
-    /// The next answer, the default one when the script is used up.
+    /// The next answer of the script; after its end, the default answer.
     bool Answer() {
         if (throwsIn.empty() || throwsIn == calls.back().operation)
             ThrowIf(throws);
@@ -32,10 +33,10 @@ struct FakeSqliteState : FakeFactory {
     std::deque<bool> answers;
     bool answer = true;
     Throws throws = Throws::Nothing;
-    std::string throwsIn; ///< The one operation that throws; empty for all.
+    std::string throwsIn; ///< The only operation that throws; when empty, all do.
     std::string errorText = "scripted error";
     std::vector<std::vector<std::string>> rows; ///< What a query appends.
-    int count = 0; ///< What a counting statement stores; nothing is stored for a negative.
+    int count = 0; ///< What a counting statement stores; a negative number means that it stores nothing.
 };
 
 inline FakeSqliteState& FakeSqlite() {

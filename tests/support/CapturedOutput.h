@@ -5,7 +5,7 @@
 #include <streambuf>
 #include <string>
 
-/// Standard output while this object lives; may be written and read by different threads.
+/// Captures standard output while this object exists. Different threads may write and read it.
 class CapturedOutput : private std::streambuf {
 public:
     CapturedOutput() : m_original(std::cout.rdbuf(this)) {}
@@ -18,7 +18,7 @@ public:
         return m_text;
     }
 
-    /// How often it was flushed.
+    /// How often the output was flushed.
     int Flushes() const {
         const std::lock_guard lock(m_mutex);
         return m_flushes;
@@ -41,7 +41,7 @@ private:
         return character;
     }
 
-    mutable std::mutex m_mutex; ///< Guards text and count.
+    mutable std::mutex m_mutex; ///< Guards the text and the number of flushes.
     std::string m_text;
     int m_flushes = 0;
     std::streambuf* m_original;

@@ -8,9 +8,9 @@
 
 #include "tests/fakes/FakeLogger.h"
 
-/// Runs `operation`, which must answer false, once for each kind of exception that `script` can be told to
-/// throw, and expects one warning for each in the agreed words. A `line` of 0 stands for any: the site has
-/// none of its own.
+/// Runs `operation` once for each kind of exception that `script` can throw. Expects false each time, and one
+/// warning with the text that people search for. A `line` of 0 means any line, for a place that has no fixed
+/// one.
 template <typename Operation>
 void ExpectEachKindOfExceptionToBeLogged(Throws& script, const std::string& file, const std::string& function,
                                          int line, Operation operation) {

@@ -16,16 +16,16 @@
 
 #include "tests/support/WaitUntil.h"
 
-/// A second process, which runs a function of the test. Killed with this object.
+/// A second process, which runs a function of the test. The destructor kills it.
 ///
-/// Start it before this process opens a database or starts a thread: neither survives a fork. The child ends
-/// without exit handlers, unless the function calls exit itself.
+/// Start it before this process opens a database or starts a thread, because neither works after a fork. The
+/// child ends without its exit handlers, unless the function itself calls exit.
 class ChildProcess {
 public:
-    /// For a function that can tell the parent, once, that it is where the parent waits for it.
+    /// The child calls it, once, to say that it has reached the point that the parent waits for.
     using Tell = std::function<void()>;
 
-    /// `body` returns the exit code, or as a bool whether all went as it should. It may take a Tell.
+    /// `body` returns the exit code, or a bool that is true for success. It may take a Tell.
     template <typename Body>
     explicit ChildProcess(Body body) {
         std::array<int, 2> ends{-1, -1};
@@ -49,7 +49,7 @@ public:
 
     pid_t Pid() const { return m_pid; }
 
-    /// Blocks until the child told; false when it ended before.
+    /// Blocks until the child has called Tell; false when the child ended before.
     bool WaitUntilItTold() {
         char mark = 0;
         return ::read(m_told, &mark, 1) == 1;
@@ -61,19 +61,20 @@ public:
         return Wait();
     }
 
-    /// The exit code; 128 and the signal's number for a child that a signal ended.
+    /// Waits for the child's end. Returns the exit code, or 128 plus the signal's number when a signal ended
+    /// it.
     int Wait() {
         int status = 0;
         ::waitpid(m_pid, &status, 0);
         return Ended(status);
     }
 
-    /// The same, if the child ends before the deadline.
+    /// The same as Wait, but nothing when the child does not end before the deadline.
     std::optional<int> WaitFor(std::chrono::milliseconds deadline) {
         return WaitUntil([this] { return HasEnded(); }, deadline) ? std::optional(m_code) : std::nullopt;
     }
 
-    /// Whether the child has ended; what Wait would return is in Status then.
+    /// Whether the child has ended. If so, Status returns what Wait would return.
     bool HasEnded() {
         int status = 0;
         if (m_pid > 0 && ::waitpid(m_pid, &status, WNOHANG) == m_pid)

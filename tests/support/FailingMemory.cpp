@@ -6,8 +6,8 @@
 
 namespace {
 
-// Plain numbers, so that a look at them never allocates.
-thread_local int g_before = -1; // allocations that succeed before the first that fails; negative: none fails
+// Plain numbers, because reading them never allocates.
+thread_local int g_before = -1; // allocations that succeed before the first one fails; negative: none fails
 thread_local int g_failing = 0;
 thread_local int g_failed = 0;
 
@@ -52,7 +52,7 @@ int FailingMemory::Failed() {
 
 const bool FailingMemory::FAILS_IN_C = false;
 
-// What takes memory from operator new gives it back by operator delete, which these replace, too.
+// These replace operator delete, too, which frees what these operators new return.
 void* operator new(std::size_t bytes) {
     void* const memory = Fails() ? nullptr : std::malloc(bytes);
     if (memory == nullptr)
@@ -72,8 +72,8 @@ void operator delete(void* memory, std::size_t) noexcept {
 
 const bool FailingMemory::FAILS_IN_C = true;
 
-// The program's own come before the C library's, for the libraries that it loads, too. What they return is
-// the C library's memory, which its free takes back.
+// The program's functions come before those of the C library, also for the libraries that the program loads.
+// They return memory of the C library, which its free can release.
 extern "C" {
 
 void* __libc_malloc(std::size_t bytes);

@@ -3,8 +3,8 @@
 #include <algorithm>
 #include <chrono>
 
-/// The shortest time that `action` took in a few tries. A busy machine can only lengthen a try, so this is
-/// how a test asks whether something is quick.
+/// The shortest time that `action` took in a few tries. A busy machine can only make a try longer, so the
+/// shortest one shows whether something is quick.
 template <typename Action>
 std::chrono::milliseconds Fastest(Action action, int tries = 5) {
     auto fastest = std::chrono::milliseconds::max();
@@ -17,8 +17,8 @@ std::chrono::milliseconds Fastest(Action action, int tries = 5) {
     return fastest;
 }
 
-/// Like Fastest, where the action has to prepare what is timed: each try prepares, and then times the action.
-/// The first try under the limit is the last one, and makes the result true.
+/// Like Fastest, for an action that needs preparation: each try prepares without timing, and then times the
+/// action. True as soon as one try stays under the limit.
 template <typename Prepare, typename Action>
 bool CanEndWithin(std::chrono::milliseconds limit, Prepare prepare, Action action) {
     for (int i = 0; i < 5; ++i) {

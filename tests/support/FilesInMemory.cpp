@@ -1,9 +1,9 @@
 #include <cstdlib>
 #include <filesystem>
 
-// A program that links this has its temporary directories in memory, where the system has a place for that.
-// Its tests open and close databases some hundred times, and on a disk that other tests keep busy each of the
-// syncs may take a tenth of a second.
+// A program that links this file has its temporary directories in memory, when the system offers that. Its
+// tests open and close databases some hundred times. On a disk that other tests use, each sync may take a
+// tenth of a second.
 
 namespace {
 

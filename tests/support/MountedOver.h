@@ -6,8 +6,8 @@
 
 #include <sys/mount.h>
 
-/// One file in the place of another one while this object lives; the other one is made where there is none.
-/// Needs the sandbox, whose mounts are its own.
+/// Puts one file in the place of another while this object exists. Makes the other file when there is none.
+/// Needs the sandbox, which has mounts of its own.
 class MountedOver {
 public:
     MountedOver(const std::string& file, std::string place) : m_place(std::move(place)) {

@@ -6,9 +6,9 @@
 
 #include <unistd.h>
 
-/// Rights do not bind root: a test about rights gives its own up, and `directory` with the `files` in it to
-/// the user that it becomes. Only in a child process, since there is no way back. True when the process is an
-/// ordinary user's.
+/// Makes this process an ordinary user's, and gives that user `directory` and the `files` in it. A test about
+/// rights needs it, because root may do everything. Only in a child process, because a process cannot become
+/// root again. True when the process belongs to an ordinary user.
 inline bool BecomeOrdinaryUser(const std::string& directory, std::vector<std::string> files = {}) {
     constexpr uid_t NOBODY = 65534;
     if (::geteuid() != 0)

@@ -9,17 +9,16 @@
 
 #include "tests/support/WaitUntil.h"
 
-/// Whether the kernel has put the thread to sleep, as it does while the thread waits for a lock, another
-/// thread or time.
+/// Whether the thread sleeps. It does while it waits for a lock, for another thread or for time.
 inline bool IsAsleep(pid_t thread) {
     std::ifstream file("/proc/self/task/" + std::to_string(thread) + "/stat");
     std::string fields;
     std::getline(file, fields);
-    const auto endOfName = fields.rfind(')'); // a name may hold anything
+    const auto endOfName = fields.rfind(')'); // a name may contain any character
     return endOfName != std::string::npos && fields.compare(endOfName, 3, ") S") == 0;
 }
 
-/// Whether the thread falls asleep and stays so, rather than for a moment. False when `hasEnded` comes first.
+/// Whether the thread falls asleep and stays asleep for some time. False when `hasEnded` becomes true first.
 template <typename HasEnded>
 bool FallsAsleep(const std::atomic<pid_t>& thread, HasEnded hasEnded) {
     constexpr int LOOKS = 20; // a millisecond apart
@@ -31,7 +30,7 @@ bool FallsAsleep(const std::atomic<pid_t>& thread, HasEnded hasEnded) {
            !hasEnded();
 }
 
-/// A call on a thread of its own; the destructor waits for its end.
+/// Runs a call on a thread of its own. The destructor waits for the call's end.
 class OtherThread {
 public:
     template <typename Call>
@@ -45,7 +44,7 @@ public:
     OtherThread(const OtherThread&) = delete;
     OtherThread& operator=(const OtherThread&) = delete;
 
-    /// False when the call ended; true when it waits, for the caller of this for one.
+    /// True when the call waits, for example for the thread that asks this. False when the call has ended.
     bool Waits() {
         return FallsAsleep(m_id, [this] { return m_ended.load(); });
     }
@@ -53,5 +52,5 @@ public:
 private:
     std::atomic<pid_t> m_id = 0;
     std::atomic<bool> m_ended = false;
-    std::thread m_thread; ///< The last member: it uses the others.
+    std::thread m_thread; ///< The last member, because the thread uses the others.
 };

@@ -6,7 +6,7 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
-/// A second user of the machine, for attacks. Only root can play one.
+/// A second user of the machine, for tests of attacks. Only root can act as this user.
 namespace OtherUser {
 
 inline constexpr uid_t ID = 65534;
@@ -15,13 +15,13 @@ inline bool CanBeMade() {
     return ::geteuid() == 0;
 }
 
-/// Makes the file, or the link itself, the other user's.
+/// Makes the other user the owner of the file; of a link itself, not of its target.
 inline void Give(const std::string& path) {
     if (::lchown(path.c_str(), ID, ID) != 0)
         throw std::runtime_error("cannot give away " + path);
 }
 
-/// Runs the function in a process of that user's. Whether it returned true.
+/// Runs the function in a process of that user. True when the function returned true.
 template <typename Function>
 bool Does(Function function) {
     const pid_t child = ::fork();

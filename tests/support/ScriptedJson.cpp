@@ -6,8 +6,9 @@ using SystemTool::IO::JsonDocument;
 
 ScriptedJson g_scriptedJson;
 
-// The linker sends the core's calls of JsonDocument::FromJson here. A member function takes its object as the
-// first argument.
+// The linker redirects the core's calls of JsonDocument::FromJson to ScriptedFromJson below (its option
+// --wrap). A member function gets its object as the first argument, so these functions have the document
+// there.
 #define FROM_JSON                                                                                            \
     "_ZN10SystemTool2IO12JsonDocument8FromJsonERKNSt7__cxx1112basic_stringIcSt11char_traitsIcESaIcEEERS7_"
 

@@ -10,7 +10,7 @@ std::vector<long> g_pauses;
 
 } // namespace
 
-// The linker sends the core's calls of Poco::Thread::sleep here.
+// The linker redirects the core's calls of Poco::Thread::sleep to this function.
 [[gnu::visibility("default")]] void
 PauseInstead(long milliseconds) asm("__wrap__ZN4Poco10ThreadImpl9sleepImplEl");
 void PauseInstead(long milliseconds) {

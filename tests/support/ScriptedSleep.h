@@ -2,6 +2,6 @@
 
 #include <vector>
 
-/// The pauses of Poco::Thread::sleep in the core's code that is linked into the test, in milliseconds. None
-/// of them really sleeps. Safe from any thread.
+/// The pauses, in milliseconds, that the core's code in this test asked of Poco::Thread::sleep. No pause
+/// really sleeps. Safe from any thread.
 std::vector<long> Pauses();

@@ -5,7 +5,7 @@
 #include <stdexcept>
 #include <string>
 
-/// A fresh directory that is removed with this object, with all its content.
+/// A new directory. The destructor removes it with its content.
 class TemporaryDirectory {
 public:
     TemporaryDirectory() : m_path((std::filesystem::temp_directory_path() / "ssr-test-XXXXXX").string()) {

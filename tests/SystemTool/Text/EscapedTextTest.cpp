@@ -81,8 +81,8 @@ TEST(EscapedText, EscapesBytesThatAreNoUtf8) {
     EXPECT_EQ(Escaped("\x80"), "\\x80");                            // a continuation alone
     EXPECT_EQ(Escaped("\xc3"), "\\xc3");                            // cut off
     EXPECT_EQ(Escaped("\xe6\x8a."), "\\xe6\\x8a.");                 // cut off within the text
-    EXPECT_EQ(Escaped("\xc0\x8a"), "\\xc0\\x8a");                   // a newline in a longer form
-    EXPECT_EQ(Escaped("\xe0\x80\x8a"), "\\xe0\\x80\\x8a");          // and in a longer one
+    EXPECT_EQ(Escaped("\xc0\x8a"), "\\xc0\\x8a");                   // a newline in two bytes
+    EXPECT_EQ(Escaped("\xe0\x80\x8a"), "\\xe0\\x80\\x8a");          // a newline in three bytes
     EXPECT_EQ(Escaped("\xed\xa0\x80"), "\\xed\\xa0\\x80");          // a surrogate
     EXPECT_EQ(Escaped("\xf4\x90\x80\x80"), "\\xf4\\x90\\x80\\x80"); // beyond Unicode
     EXPECT_EQ(Escaped("\xf0\x8f\xbf\xbf\xff"), "\\xf0\\x8f\\xbf\\xbf\\xff");
@@ -100,12 +100,12 @@ TEST(EscapedText, CanBeTurnedBackIntoTheSameBytesAndEscapingItAgainChangesOnlyBa
     std::mt19937 random(20261120);
     for (int round = 0; round < 3000; ++round) {
         std::string bytes(random() % 120, '\0');
-        // Of all bytes, but often such as begin or go on with a character.
+        // Any byte, but mostly bytes that begin or continue a character.
         for (char& byte : bytes)
             byte = static_cast<char>(random() % 3 == 0 ? random() % 256 : 0x80 + random() % 128);
         const std::string escaped = Escaped(bytes);
         EXPECT_EQ(Unescaped(escaped), bytes);
-        std::string again = Escaped(escaped); // text that is not valid, harmless UTF-8 would be escaped now
+        std::string again = Escaped(escaped); // this would escape any text that is not valid, harmless UTF-8
         for (auto at = again.find("\\\\"); at != std::string::npos; at = again.find("\\\\", at + 1))
             again.erase(at, 1);
         EXPECT_EQ(again, escaped);
