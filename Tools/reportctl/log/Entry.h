@@ -8,31 +8,31 @@
 
 namespace reportctl::log {
 
-/// Where a datagram ended.
+/// What the service did with a datagram.
 enum class Outcome {
-    Unknown,     ///< not told yet, or no source can tell
+    Unknown,     ///< not known yet, or never known
     Stored,      ///< its row is in the store
-    ToAnalytics, ///< the outbox has its event, or has counted it
+    ToAnalytics, ///< its event is in the outbox, or was stored there and has left it
     Control,     ///< a control message that the service could read
-    Refused,     ///< the service said so
+    Refused,     ///< a line of the service's log says so
 };
 
-/// The word of JSON: "unknown", "stored", "toAnalytics", "control" or "refused".
+/// The word for people and for JSON: "unknown", "stored", "toAnalytics", "control" or "refused".
 const char* WordFor(Outcome outcome);
 
-/// A line of the log as a person wants it: a datagram with what became of it, or another line.
+/// One entry of the log as a person reads it: a datagram with its outcome, or another line.
 ///
 ///     arrived (Unknown) ──┬─► Refused       by a line of the log: Pairing
 ///                         ├─► Control       it is one, and no line says otherwise: Pairing
 ///                         └─► Stored, ToAnalytics   by what the databases hold: Outcomes
 struct Entry {
-    Line line; ///< of its arrival; line.message is the datagram's text
+    Line line; ///< for a datagram the line of its arrival: line.message is the datagram's text
     message::Message message;
     bool isDatagram = false;
     bool isReadable = true; ///< false: a datagram whose text the log could not write
     Outcome outcome = Outcome::Unknown;
-    std::string reason;   ///< why it was refused, or what is odd about it; may be empty
-    int refusedLevel = 0; ///< of the line that tells the refusal
+    std::string reason;   ///< why it was refused, or what is unusual about it; may be empty
+    int refusedLevel = 0; ///< the level of the line that reports the refusal
 
     std::chrono::steady_clock::time_point readAt = std::chrono::steady_clock::now();
 

@@ -31,7 +31,8 @@ std::optional<std::uint64_t> NumberOf(const std::string& name) {
     return read.ec == std::errc() && read.ptr == end && begin != end ? std::optional(number) : std::nullopt;
 }
 
-/// A file that is gone meanwhile was written before every time.
+/// When the file was last written, rounded up to a second. A file that was deleted meanwhile counts as older
+/// than every time.
 terminal::TimePoint LastWritten(const std::string& path) {
     struct stat status {};
     if (::stat(path.c_str(), &status) != 0)

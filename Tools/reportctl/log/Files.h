@@ -9,19 +9,19 @@
 
 namespace reportctl::log {
 
-/// The directory of the log of this user's service.
+/// The directory that this user's service writes its log into.
 std::string LogDirectory();
 
-/// The file that is being written, "Report.log", whether it is there or not.
+/// The path of the file that the service writes now, "Report.log". The file need not exist.
 std::string LiveFile(const std::string& directory);
 
-/// Why the file cannot be read now, in the system's words; empty when it can.
+/// The system's message why the file cannot be read now; empty when it can be read.
 std::string ReasonAgainst(const std::string& path);
 
-/// The rotated files, oldest first. Their numbers tell their age; their times do not.
+/// The rotated files, oldest first. Their numbers give the order; the times of the files do not.
 std::vector<std::string> RotatedFiles(const std::string& directory);
 
-/// Those of RotatedFiles that may hold a line of `since` or later.
+/// The files of RotatedFiles that may hold a line from `since` on.
 std::vector<std::string> RotatedFilesSince(const std::string& directory, terminal::TimePoint since);
 
 /// The last `count` of RotatedFiles.

@@ -35,7 +35,7 @@ bool Follower::TakeLine(std::string& line) {
     return true;
 }
 
-/// Reads some more of the open file; false at its end.
+/// Reads the next bytes of the open file. Returns false at its end.
 bool Follower::Fill() {
     if (!m_file.IsOpen())
         return false;
@@ -47,25 +47,25 @@ bool Follower::Fill() {
     return true;
 }
 
-/// At the end of the open file: true when there is more to read elsewhere.
+/// Call it at the end of the open file. Returns true when there is more to read, in this file or in another.
 bool Follower::MoveOn() {
     if (!m_isLive)
         return OpenNext();
     struct stat now {};
     if (::stat(m_live.c_str(), &now) != 0)
-        return false; // deleted, or between two files: the service makes it with its next record
+        return false; // the file was deleted or rotated: the service makes it again with its next record
     if (now.st_dev == m_device && now.st_ino == m_inode) {
         if (now.st_size >= ::lseek(m_file.Number(), 0, SEEK_CUR))
             return false;
-        m_unread.clear(); // cut: what is in it now is new
+        m_unread.clear(); // the file was cut, so everything in it now is new
         return ::lseek(m_file.Number(), 0, SEEK_SET) == 0;
     }
-    if (Fill()) // what came between its end and its rotation
+    if (Fill()) // lines that were written after we reached the end and before the rotation
         return true;
     return OpenNext();
 }
 
-/// The files that have a number above that of the open one, which has been read to its end.
+/// Queues the rotated files that come after the open file, which has been read to its end.
 void Follower::QueueSuccessors() {
     const auto files = RotatedFiles(m_directory);
     auto next = files.end();
@@ -84,7 +84,7 @@ bool Follower::OpenNext() {
     while (!m_files.empty()) {
         const auto path = m_files.front();
         m_files.pop_front();
-        if (Open(path)) // else it was deleted for the log's bound meanwhile
+        if (Open(path)) // this fails when the file was deleted meanwhile, because the log was too large
             return true;
     }
     m_isLive = Open(m_live);
@@ -99,7 +99,7 @@ bool Follower::Open(const std::string& path) {
     m_file = std::move(file);
     m_device = status.st_dev;
     m_inode = status.st_ino;
-    m_unread.clear(); // a half line, which nothing will end
+    m_unread.clear(); // half a line of the file before, whose rest does not come
     m_taken = 0;
     return true;
 }

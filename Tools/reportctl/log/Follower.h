@@ -11,21 +11,21 @@
 
 namespace reportctl::log {
 
-/// Reads the lines of the log in their order: those of the files that it is given, those of the live file,
-/// and then, call after call, those that come. It reads a file that is rotated away to its end and goes on
-/// with the ones after it; it goes on where a file was cut, with one that was deleted and made again, and
-/// with one that is not there yet.
+/// Reads the lines of the log in their order: first those of the given rotated files, then those of the live
+/// file, and in later calls the lines that were added since. When the live file is rotated, it is read to its
+/// end before the files after it. Reading also goes on when the live file was cut, was deleted and made
+/// again, or does not exist yet.
 ///
-/// It only reads, and the service notices nothing of it. One thread.
+/// It only reads and does not affect the service. One thread.
 class Follower {
 public:
-    /// `rotated` are the files to begin with, oldest first.
+    /// `rotated`: the files to read first, oldest first.
     Follower(std::string directory, const std::vector<std::string>& rotated);
 
-    /// The next whole line, without its line feed. False when there is none now.
+    /// Reads the next whole line, without its line feed. Returns false when there is none now.
     bool Next(std::string& line);
 
-    /// Whether the live file could be opened, so far.
+    /// Whether the live file could be opened until now.
     bool HasLiveFile() const { return m_isLive; }
 
 private:
@@ -42,9 +42,9 @@ private:
     SystemTool::IO::Descriptor m_file;
     dev_t m_device = 0;
     ino_t m_inode = 0;
-    bool m_isLive = false; ///< m_file is the live file, as far as is known
+    bool m_isLive = false; ///< m_file was the live file when it was opened
     std::string m_unread;
-    std::size_t m_taken = 0; ///< of m_unread
+    std::size_t m_taken = 0; ///< how many bytes of m_unread were handed out
 };
 
 } // namespace reportctl::log

@@ -28,8 +28,8 @@ int NumberAt(std::string_view text, std::size_t at, std::size_t size) {
     return number;
 }
 
-/// The seconds since 1970 of a local time. A busy log has thousands of lines with one second, and the
-/// conversion costs more than all else.
+/// The seconds since 1970 of a local time. It keeps the last result: a busy log has thousands of lines of the
+/// same second, and the conversion takes longer than all other work on a line.
 std::time_t SecondsOf(std::string_view stamp) {
     thread_local std::string lastText;
     thread_local std::time_t lastSeconds = 0;
@@ -54,7 +54,9 @@ terminal::TimePoint TimeOf(std::string_view stamp) {
                                std::chrono::milliseconds(NumberAt(stamp, SECONDS_SIZE + 1, 3)));
 }
 
-/// Takes the text up to `end` off `rest`; nothing when it does not come.
+/// Removes the text up to and with `end` from `rest`, and returns it without `end`. Nothing when `rest` has
+/// no
+/// `end`.
 std::optional<std::string_view> TakeUntil(std::string_view& rest, std::string_view end) {
     const auto at = rest.find(end);
     if (at == std::string_view::npos)
@@ -70,7 +72,8 @@ int HexDigit(char c) {
     return found == std::string_view::npos ? -1 : static_cast<int>(found);
 }
 
-/// Appends what the escape at the start of `text` stands for, and returns its size.
+/// Appends the character that the escape at the start of `text` stands for. Returns the escape's size. A
+/// backslash that begins no escape is appended itself.
 std::size_t AppendOriginal(std::string& out, std::string_view text) {
     constexpr std::string_view LETTERS = "\\nrt";
     constexpr std::string_view ORIGINALS = "\\\n\r\t";

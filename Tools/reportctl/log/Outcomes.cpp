@@ -11,7 +11,8 @@ namespace {
 
 using message::Kind;
 
-/// What arrives between reading the log and reading the databases.
+/// So many more rows and events are read than the log has datagrams, because some arrive after the log was
+/// read and before the databases are.
 constexpr std::int64_t SLACK = 1000;
 
 bool IsOpenEvent(const Entry& entry) {
@@ -70,9 +71,9 @@ void Outcomes::Resolve(Pairing& pairing) {
         CountSince(pairing);
 }
 
-/// Of the events that came before the first reading, nobody knows how many the module had stored before each.
-/// When it has stored as many as the log has of it, and no line tells of one that could not be kept, these
-/// are among them.
+/// Decides about the events that arrived before the first reading. For them it is not known which number of
+/// stored events belongs to which datagram. When a module has stored at least as many events as the log has
+/// datagrams of it, and no line of the log says that an event could not be kept, all of them were stored.
 void Outcomes::CountBefore(Pairing& pairing) {
     if (pairing.AnalyticsFailures() > 0)
         return;

@@ -11,34 +11,38 @@
 
 namespace reportctl::log {
 
-/// How many datagrams a command is about at its start, at the most: so many rows and events are read.
+/// How many reports and events the log has at the command's start. So many rows and events of the databases
+/// are read.
 struct Backlog {
     std::int64_t reports = 0;
     std::int64_t events = 0;
 };
 
-/// Tells of datagrams whether the store or the outbox has them.
+/// Finds out which datagrams the store or the outbox has.
 ///
 /// An event that was delivered has left the outbox. It counts as toAnalytics when its module has stored as
-/// many events as the log has datagrams of the module, so that none can be missing; otherwise it stays
-/// unknown.
+/// many events as the log has datagrams of the module, so that none can be missing. Otherwise its outcome
+/// stays unknown.
 ///
-/// Call Read, then read the log, then Resolve: an event that was read and has no line yet would be counted
-/// for another.
+/// Call Read, then read the log, then call Resolve. In another order, an event could be read that has no line
+/// yet, and it would be counted for another datagram. Only the first time, the log is read before Read, which
+/// needs to know the backlog.
 ///
-/// One thread. Failure: nothing throws for a database that is missing or cannot be read; Complaints tells it.
+/// One thread. Failure: nothing throws when a database is missing or cannot be read; TakeComplaints returns
+/// the reason.
 class Outcomes {
 public:
     Outcomes(const std::string& storePath, const std::string& outboxPath)
         : m_storePath(storePath), m_outboxPath(outboxPath), m_rows(storePath), m_events(outboxPath) {}
 
-    /// Reads what came since; the first time, what the backlog needs.
+    /// Reads the rows and events that were added since the last call. The first call reads as many as
+    /// `backlog` needs.
     void Read(const Backlog& backlog);
 
-    /// Gives every open entry its outcome that can have one now.
+    /// Gives an outcome to every open entry whose outcome is known now.
     void Resolve(Pairing& pairing);
 
-    /// Why something cannot be told, each reason once.
+    /// The reasons why some outcomes cannot be known. Each reason is returned once.
     std::vector<std::string> TakeComplaints();
 
 private:

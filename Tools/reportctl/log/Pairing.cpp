@@ -26,7 +26,7 @@ bool IsArrival(const Line& line) {
     return IsFrom(line, "App/ReportServer", "Recv");
 }
 
-/// The value for analytics must be JSON; the service's own words say what is wrong with it.
+/// Whether the service refuses the event's value: a value for analytics must be JSON.
 bool HasBadValue(const Entry& entry) {
     if (entry.message.kind != Kind::Event || entry.message.value.empty())
         return false;
@@ -53,7 +53,7 @@ std::optional<std::string> After(const std::string& text, std::string_view begin
     return text.substr(beginning.size());
 }
 
-/// A line after which events may have been refused without a line of their own.
+/// Whether events may have been refused after this line without a line of their own.
 bool IsAnalyticsFailure(const Line& line) {
     if (line.site == "Metrik/MetrikWorker" && line.message.starts_with("Failed to load metrik sdk"))
         return true;
@@ -65,13 +65,15 @@ bool IsAnalyticsFailure(const Line& line) {
                        [&](const char* cause) { return line.message.starts_with(cause); });
 }
 
-/// The one of them that is about an event, and not about reading the outbox, say.
+/// Whether the line says that an event could not be stored. Other lines of FailCallBackFun are about the
+/// outbox, for example about reading it.
 bool IsEventNotKept(const Line& line) {
     return IsFrom(line, "Metrik/MetrikWorker", "FailCallBackFun") &&
            line.message.starts_with("outbox file-Cannot store an event");
 }
 
-/// A control message that the parser could read has an effect, or the service passes over it without a word.
+/// Decides about a control message that is JSON. The service acts on it when it knows its kind, and ignores
+/// it otherwise, without a line in the log.
 void JudgeControl(Entry& entry) {
     if (entry.message.kind != Kind::Control || !entry.message.fault.empty())
         return;
@@ -108,7 +110,7 @@ void Pairing::Take(Line line) {
 }
 
 void Pairing::AddDatagram(Line line) {
-    if (line.process != m_process) { // a service that was started anew handles nothing of the one before
+    if (line.process != m_process) { // a restarted service handles no datagram of the process before it
         m_handled = m_entries.size();
         m_process = line.process;
     }
@@ -144,7 +146,8 @@ bool Pairing::RefuseFirst(const Line& line, const std::string& reason, const Fit
     return RefuseUnreadable(line, reason);
 }
 
-/// Whether one entry alone can be meant: one whose text the log could not write can always be.
+/// Marks the one entry that the line can be about. Returns false when no entry or more than one can be meant.
+/// An entry whose text the log could not write can always be meant.
 bool Pairing::RefuseOnly(const Line& line, const std::string& reason, const Fits& fits) {
     std::optional<std::size_t> found;
     for (auto index = m_handled; index < m_entries.size(); ++index) {

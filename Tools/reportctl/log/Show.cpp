@@ -12,7 +12,8 @@
 namespace reportctl::log {
 namespace {
 
-/// So much of a value says what it is about, and leaves room on the line for where it ended.
+/// The beginning of a value that is shown: enough to recognise it, and short enough that the outcome fits on
+/// the line.
 constexpr std::size_t VALUE_BYTES = 48;
 
 std::string Short(const std::string& text) {

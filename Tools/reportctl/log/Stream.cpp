@@ -10,7 +10,8 @@ namespace {
 
 bool IsFinished(const Entry& entry) {
     return !entry.IsOpen() || std::chrono::steady_clock::now() - entry.readAt >= Stream::PATIENCE ||
-           // The log's local times may be an hour off where clocks are set back; the other test sees to that.
+           // The log's local times can be an hour wrong after clocks are set back; the test above then
+           // decides.
            std::chrono::system_clock::now() - entry.line.time >= Stream::PATIENCE;
 }
 

@@ -11,27 +11,28 @@
 
 namespace reportctl::log {
 
-/// The log as a stream of entries, each with its outcome: reads the lines, pairs the refusals, asks the
-/// databases.
+/// The log as a stream of entries with their outcomes. It reads the lines, pairs refusals with datagrams, and
+/// looks into the databases.
 ///
 /// One thread.
 class Stream {
 public:
-    /// So long a datagram waits for its outcome. Handling one takes well under a millisecond, and the store
-    /// commits at least ten times a second; a service that is further behind has many waiting, and no one
-    /// wants to wait for them all.
+    /// How long a datagram waits for its outcome. The service handles a datagram in well under a millisecond,
+    /// and the store commits at least ten times a second. A service that is further behind has many datagrams
+    /// waiting, and this command does not wait for all of them.
     static constexpr std::chrono::milliseconds PATIENCE{1000};
 
     Stream(const std::string& directory, const std::vector<std::string>& rotated);
 
-    /// Leaves out the lines before this time.
+    /// Makes later calls of Read skip the lines before this time.
     void SetSince(terminal::TimePoint since) { m_since = since; }
 
-    /// Reads what the log has now, and asks the databases. Returns how many entries there are in all.
+    /// Reads the log's new lines and looks into the databases. Returns how many entries wait to be taken.
     std::size_t Read();
 
-    /// Hands over the entries whose outcome is known, or will not be, in the order of the log; the first that
-    /// waits stops it.
+    /// Calls `visit` with the finished entries in the order of the log, and removes them. An entry is
+    /// finished when its outcome is known, or when it has waited for PATIENCE. Stops at the first entry that
+    /// still waits.
     void TakeFinished(const std::function<void(Entry&)>& visit);
 
     bool HasLog() const { return m_follower.HasLiveFile(); }
