@@ -18,8 +18,8 @@ std::string Cut(const std::string& text, std::size_t maxBytes) {
     return std::string(SystemTool::Text::CutUtf8(text, maxBytes));
 }
 
-/// The id as a collector reads it, which gets valid UTF-8 only. So two modules that a collector could not
-/// tell apart are one module of the outbox, and no sequence number comes twice.
+/// The id as a collector sees it, which gets only valid UTF-8. So two ids that a collector could not tell
+/// apart are one module of the outbox, and no sequence number is used twice.
 std::string StoredId(const std::string& id) {
     return Cut(SystemTool::Text::ValidUtf8(Cut(id, MAX_ID_BYTES)), MAX_ID_BYTES);
 }
@@ -41,7 +41,7 @@ std::string Sdk::GetSdkVersion() {
 std::int64_t Sdk::GetPendingCount() {
     try {
         return m_membership ? Events().Status().waiting : -1;
-    } catch (const std::exception&) { // told already
+    } catch (const std::exception&) { // not reported here: Open and Append report what is wrong
         return -1;
     }
 }

@@ -35,7 +35,7 @@ void WriteElements(JsonWriter& writer, const JsonValue& array) {
         WriteAnyValue(writer, element);
 }
 
-/// Both lists of the protocol look alike: {"<type>": {"values": [...]}}.
+/// Both kinds of lists of the protocol have the same form: {"<type>": {"values": [...]}}.
 void WriteList(JsonWriter& writer, const JsonValue& value) {
     writer.Key(value.IsObject() ? "kvlistValue" : "arrayValue");
     writer.StartObject();
@@ -59,13 +59,13 @@ void WriteScalar(JsonWriter& writer, const JsonValue& value) {
     } else if (value.IsInt64()) {
         writer.Key("intValue");
         WriteText(writer, std::to_string(value.GetInt64()));
-    } else if (value.IsUint64()) { // a double would lose its last digits
+    } else if (value.IsUint64()) { // as a double it would lose its last digits
         writer.Key("stringValue");
         WriteText(writer, std::to_string(value.GetUint64()));
     } else if (value.IsNumber()) {
         writer.Key("doubleValue");
         writer.Double(value.GetDouble());
-    } // null: the AnyValue without a value
+    } // null becomes an AnyValue without a value
 }
 
 } // namespace

@@ -17,7 +17,8 @@ constexpr const char* SIGNAL_PREFIX = "OTEL_EXPORTER_OTLP_LOGS_";
 constexpr const char* COMMON_PREFIX = "OTEL_EXPORTER_OTLP_";
 constexpr const char* LOGS_PATH = "v1/logs";
 
-/// Of the same family: what our own rules decide, which docs/Outbox.md describes.
+/// Variables of the same family that have no effect. Our own rules decide instead; docs/Outbox.md describes
+/// them.
 constexpr std::array NOT_HONOURED{"OTEL_BLRP_SCHEDULE_DELAY",
                                   "OTEL_BLRP_EXPORT_TIMEOUT",
                                   "OTEL_BLRP_MAX_QUEUE_SIZE",
@@ -52,12 +53,12 @@ bool IsToken(const std::string& name) {
                                                    "ABCDEFGHIJKLMNOPQRSTUVWXYZ") == std::string::npos;
 }
 
-/// A line feed in a value would smuggle in a header of its own.
+/// A line feed in a value would add another header to the request.
 bool IsHeaderValue(const std::string& value) {
     return std::none_of(value.begin(), value.end(), [](unsigned char c) { return c < 0x20 && c != '\t'; });
 }
 
-/// What describes the body is ours to say.
+/// Whether the header describes the body. Only we set those headers.
 bool IsReserved(const std::string& name) {
     const auto lower = LowerCase(name);
     return lower == "content-type" || lower == "content-encoding" || lower == "content-length" ||
@@ -102,7 +103,7 @@ private:
         return value == nullptr ? std::string() : Trimmed(value);
     }
 
-    /// Of each pair of variables the signal's own wins.
+    /// Of each pair of variables, the one for this signal wins.
     Variable Pair(const std::string& name) const {
         Variable variable{SIGNAL_PREFIX + name, Value(SIGNAL_PREFIX + name)};
         if (variable.value.empty())
@@ -110,7 +111,8 @@ private:
         return variable;
     }
 
-    /// Offers the signal's own variable and then the common one, where they are set, until `accept` says yes.
+    /// Calls `accept` with the signal's own variable and then with the common one, as far as they are set,
+    /// until it returns true.
     template <typename Accept>
     void OfferPair(const std::string& name, Accept accept) {
         for (const char* prefix : {SIGNAL_PREFIX, COMMON_PREFIX}) {
@@ -120,7 +122,7 @@ private:
         }
     }
 
-    /// A list of exporters; ours is the only one that we have.
+    /// The variable is a list of exporters. The only exporter that we have is otlp.
     bool IsExporterNone() {
         const auto exporters = LowerCase(Value("OTEL_LOGS_EXPORTER"));
         if (!exporters.empty() && exporters != "none" && exporters != "otlp")
@@ -128,7 +130,7 @@ private:
         return exporters == "none";
     }
 
-    /// A person who set one of these expects something to happen.
+    /// Complains about variables without effect, because a person who set one of them expects an effect.
     void ReadWhatIsNotHonoured() {
         if (const auto protocol = Pair("PROTOCOL"); !protocol.value.empty() && protocol.value != "http/json")
             m_complaints.push_back(protocol.name + ": only http/json is spoken, and is spoken all the same");
@@ -150,7 +152,7 @@ private:
         return result;
     }
 
-    /// Empty when it makes no sense.
+    /// The URL for logs; empty when the variable is no http or https URL.
     static std::string UrlOf(const Variable& endpoint) {
         const auto url = ParseUrl(endpoint.value);
         if (!url)
@@ -176,7 +178,8 @@ private:
         }
     }
 
-    /// Returns what is wrong with it. What is no name may be a secret, and is not repeated.
+    /// Returns what is wrong with the header; empty when it is right. A text without a name may be a secret,
+    /// so it is not repeated.
     static std::string ReadHeader(const std::string& text, int number, EndpointConfig& config) {
         if (text.empty())
             return {};

@@ -7,7 +7,8 @@
 namespace MetrikSdk::otlp {
 namespace {
 
-constexpr int GZIP_WINDOW_BITS = 15 + 16; // the largest window; 16 more asks for gzip's header and not zlib's
+// 15 is the largest window; 16 asks for a gzip header, not a zlib header
+constexpr int GZIP_WINDOW_BITS = 15 + 16;
 constexpr int DEFAULT_MEMORY_LEVEL = 8;
 
 class Deflater {
@@ -15,7 +16,7 @@ public:
     Deflater() {
         if (::deflateInit2(&m_stream, Z_DEFAULT_COMPRESSION, Z_DEFLATED, GZIP_WINDOW_BITS,
                            DEFAULT_MEMORY_LEVEL, Z_DEFAULT_STRATEGY) != Z_OK)
-            throw std::bad_alloc(); // the only failure that the constants above leave
+            throw std::bad_alloc(); // with the constants above, only a lack of memory can fail
     }
     ~Deflater() { ::deflateEnd(&m_stream); }
     Deflater(const Deflater&) = delete;
@@ -27,7 +28,7 @@ public:
         m_stream.avail_in = static_cast<uInt>(text.size());
         m_stream.next_out = reinterpret_cast<Bytef*>(result.data());
         m_stream.avail_out = static_cast<uInt>(result.size());
-        ::deflate(&m_stream, Z_FINISH); // ends in one call, because the bound holds
+        ::deflate(&m_stream, Z_FINISH); // one call is enough, because the result has the size of the bound
         result.resize(m_stream.total_out);
         return result;
     }

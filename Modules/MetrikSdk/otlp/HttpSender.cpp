@@ -15,10 +15,10 @@
 namespace MetrikSdk::otlp {
 namespace {
 
-/// A collector's answer is a short JSON object; more than this is no answer of one.
+/// A collector's answer is a short JSON object. A longer answer than this comes from something else.
 constexpr std::size_t MAX_ANSWER_BYTES = std::size_t{64} * 1024;
 
-/// How soon a request notices that it is to end.
+/// How soon a request notices that it has to end.
 constexpr int POLL_MS = 50;
 
 std::atomic<bool> g_abandonAll = false;
@@ -32,15 +32,15 @@ public:
     RequestUnderWay& operator=(const RequestUnderWay&) = delete;
 };
 
-/// Once in a process, by whichever thread comes first; never undone, because other parts of the process may
-/// use the library too.
+/// Runs once in a process, on the thread that comes first. It is never undone, because other parts of the
+/// process may use the library, too.
 void InitialiseLibrary() {
     [[maybe_unused]] static const CURLcode done = ::curl_global_init(CURL_GLOBAL_DEFAULT);
 }
 
-/// Every option is one that this library's minimum version knows. One that is refused all the same, by a TLS
-/// backend that cannot do it say, must not be passed over: the next request would be less safe than was asked
-/// for.
+/// The library's minimum version knows every option that we use. It may refuse one all the same, for example
+/// when its TLS backend does not support it. We must not ignore that: the next request would be less safe
+/// than the configuration asks for.
 template <typename Value>
 void Set(CURL* easy, CURLoption option, Value value) {
     if (const auto code = ::curl_easy_setopt(easy, option, value); code != CURLE_OK)
@@ -71,8 +71,8 @@ void HttpSender::Configure() {
     Set(easy, CURLOPT_HTTPHEADER, m_headers.get());
     Set(easy, CURLOPT_FOLLOWLOCATION, 0L); // a redirect could carry the credentials to another host
     Set(easy, CURLOPT_TIMEOUT_MS, static_cast<long>(m_config.timeout.count()));
-    Set(easy, CURLOPT_NOSIGNAL, 1L);   // signals are the service's
-    Set(easy, CURLOPT_QUICK_EXIT, 1L); // ending must not wait for a name server
+    Set(easy, CURLOPT_NOSIGNAL, 1L);   // signals are for the service
+    Set(easy, CURLOPT_QUICK_EXIT, 1L); // the end of the process must not wait for a name server
     Set(easy, CURLOPT_ERRORBUFFER, m_error);
     Set(easy, CURLOPT_WRITEFUNCTION, &HttpSender::OnBody);
     Set(easy, CURLOPT_HEADERFUNCTION, &HttpSender::OnHeader);
@@ -85,7 +85,8 @@ void HttpSender::ConfigureTls() {
     Set(easy, CURLOPT_SSLVERSION, static_cast<long>(CURL_SSLVERSION_TLSv1_2));
     if (!m_config.certificate.empty()) {
         Set(easy, CURLOPT_CAINFO, m_config.certificate.c_str());
-        // Whom the file does not name is not trusted; the library would look into the system's directory too.
+        // Only the certificates of that file are trusted. By default, the library would also use the system's
+        // directory.
         Set(easy, CURLOPT_CAPATH, static_cast<const char*>(nullptr));
     }
     if (!m_config.clientKey.empty())
@@ -98,14 +99,14 @@ void HttpSender::ConfigureHeaders() {
     AddHeader("Content-Type: application/json");
     if (m_config.gzip)
         AddHeader("Content-Encoding: gzip");
-    AddHeader("Expect:"); // no waiting for a "100 Continue" that many servers never send
+    AddHeader("Expect:"); // do not wait for a "100 Continue" that many servers never send
     if (std::none_of(m_config.headers.begin(), m_config.headers.end(), [](const auto& header) {
             return ::strcasecmp(header.first.c_str(), "User-Agent") == 0;
         }))
         AddHeader(std::string("User-Agent: MetrikSdk/") + SDK_VERSION);
     for (const auto& [name, value] : m_config.headers) {
         std::string line = name;
-        line += value.empty() ? ";" : ": " + value; // how the library writes an empty one
+        line += value.empty() ? ";" : ": " + value; // the library takes a header without a value in this form
         AddHeader(line);
     }
 }
@@ -119,7 +120,8 @@ void HttpSender::AddHeader(const std::string& line) {
 }
 
 HttpResult HttpSender::Post(const std::string& body) {
-    const RequestUnderWay underWay; // before MustEnd: AbandonAll sets its flag and then looks for us
+    // Made before MustEnd is called: AbandonAll sets its flag first, and then looks for requests.
+    const RequestUnderWay underWay;
     Answer answer;
     const auto sent = m_config.gzip ? Gzip(body) : std::string();
     const auto& bytes = m_config.gzip ? sent : body;
@@ -173,7 +175,7 @@ HttpResult HttpSender::Finish(CURLcode code, Answer& answer) {
     curl_off_t sent = 0;
     ::curl_easy_getinfo(m_easy.get(), CURLINFO_SIZE_UPLOAD_T, &sent);
     result.began = sent > 0;
-    if (code == CURLE_OK) // the library is content with a status line
+    if (code == CURLE_OK) // the library accepts an answer that ends after its status line
         result.fault = "the answer ended inside its headers";
     else
         result.fault = m_error[0] != '\0' ? m_error : ::curl_easy_strerror(code);
@@ -186,7 +188,7 @@ std::size_t HttpSender::OnBody(char* bytes, std::size_t size, std::size_t count,
     const auto room = MAX_ANSWER_BYTES - answer.result.body.size();
     answer.result.body.append(bytes, std::min(length, room));
     answer.cut = length > room;
-    return answer.cut ? 0 : length; // 0 ends the transfer; what matters has been read
+    return answer.cut ? 0 : length; // 0 ends the transfer, because enough has been read
 }
 
 std::size_t HttpSender::OnHeader(char* bytes, std::size_t size, std::size_t count, void* data) {
@@ -194,7 +196,7 @@ std::size_t HttpSender::OnHeader(char* bytes, std::size_t size, std::size_t coun
     auto& answer = *static_cast<Answer*>(data);
     auto& result = answer.result;
     const std::string_view line(bytes, size * count);
-    if (line.starts_with("HTTP/")) { // a new answer begins: the one before was interim
+    if (line.starts_with("HTTP/")) { // a new answer begins: the one before was an interim answer
         result.retryAfter.clear();
         answer.headersEnded = false;
     }
@@ -212,7 +214,7 @@ std::size_t HttpSender::OnHeader(char* bytes, std::size_t size, std::size_t coun
 void HttpSender::AbandonAll(std::chrono::milliseconds patience) {
     g_abandonAll = true;
     const auto deadline = std::chrono::steady_clock::now() + patience;
-    // No condition variable: the thread that called exit() may have been interrupted anywhere.
+    // We use no condition variable: the thread that called exit() may have been interrupted anywhere.
     while (g_requestsUnderWay > 0 && std::chrono::steady_clock::now() < deadline)
         std::this_thread::sleep_for(std::chrono::milliseconds(1));
 }

@@ -12,11 +12,11 @@
 
 namespace MetrikSdk::otlp {
 
-/// Posts over HTTP. The connection is kept between requests. TLS is verified; redirects are not followed;
-/// only http and https are spoken; the proxies of the standard variables are used. Of an answer's body no
-/// more than 64 KiB is read.
+/// Posts over HTTP. The connection is kept between requests. TLS certificates are verified. Redirects are not
+/// followed. Only http and https are used. The proxies of the standard variables are used. At most 64 KiB of
+/// an answer's body are read.
 ///
-/// Threads: Abandon by any; all else by one at a time.
+/// Threads: any may call Abandon. All other functions: one thread at a time.
 class HttpSender : public Sender {
 public:
     explicit HttpSender(EndpointConfig config);
@@ -26,16 +26,16 @@ public:
     std::string Destination() const override { return WithoutSecrets(m_config.url); }
     std::vector<std::string> HeaderNames() const override;
 
-    /// Ends every request of the process, waits until none is under way, at most `patience`, and lets no new
-    /// one begin. For exit(): the TLS library is about to clean itself up, and must not be in use then.
-    /// (Called by a thread that crashed within a request, it waits in vain.)
+    /// For exit(): the TLS library is about to destroy its state, which must not be in use then. Ends every
+    /// request of the process, and lets no new one begin. Waits until no request is running, but at most
+    /// `patience`. (When the caller is a thread that crashed within a request, it waits in vain.)
     static void AbandonAll(std::chrono::milliseconds patience);
 
 private:
     struct Answer {
         HttpResult result;
         bool headersEnded = false;
-        bool cut = false; ///< The body was longer than what is read of it.
+        bool cut = false; ///< The body was longer than the part that is read.
     };
 
     void Configure();
@@ -52,7 +52,7 @@ private:
     const EndpointConfig m_config;
     std::atomic<bool> m_abandoned = false;
     std::unique_ptr<curl_slist, decltype(&::curl_slist_free_all)> m_headers;
-    std::unique_ptr<CURLM, decltype(&::curl_multi_cleanup)> m_multi; ///< Holds the connection.
+    std::unique_ptr<CURLM, decltype(&::curl_multi_cleanup)> m_multi; ///< Keeps the connection.
     std::unique_ptr<CURL, decltype(&::curl_easy_cleanup)> m_easy;
     char m_error[CURL_ERROR_SIZE] = "";
 };

@@ -9,7 +9,7 @@
 namespace MetrikSdk::otlp {
 namespace {
 
-/// A person may have edited the file: an id that is no UUID is a name like any other.
+/// A person may have edited the file. So an id that is no UUID is allowed, and is used as a name.
 boost::uuids::uuid Namespace(const std::string& outboxId) {
     try {
         return boost::uuids::string_generator()(outboxId);

@@ -4,8 +4,8 @@
 
 namespace MetrikSdk::otlp {
 
-/// A UUID of version 5 that is the same for a module of an outbox for ever, and another one for each other
-/// module and each other outbox of a fleet. `outboxId` is the outbox's own UUID. Pure.
+/// A UUID of version 5. For a module of an outbox it is always the same. Every other module, and every other
+/// outbox of a fleet, has another one. `outboxId` is the UUID of the outbox. Pure.
 std::string InstanceId(const std::string& outboxId, const std::string& moduleId);
 
 } // namespace MetrikSdk::otlp

@@ -17,10 +17,10 @@
 namespace MetrikSdk::otlp {
 namespace {
 
-/// Whose names the attributes below are, as far as they are common ones.
+/// The schema that defines the names of the attributes below, as far as they are common names.
 constexpr const char* SCHEMA_URL = "https://opentelemetry.io/schemas/1.30.0";
 
-/// An event is neither a warning nor an error.
+/// The severity of all events: an event is neither a warning nor an error.
 constexpr int SEVERITY_INFO = 9;
 
 class Encoder {
@@ -80,7 +80,7 @@ private:
         m_writer.EndObject();
     }
 
-    /// All names of OwnResource.
+    /// All names that OwnResource writes.
     static constexpr std::array<std::string_view, 7> OWN_NAMES{
         "service.name", "service.namespace", "service.version", "service.instance.id",
         "os.type",      "os.description",    "metrik.outbox.id"};
@@ -137,7 +137,7 @@ private:
             TextAttribute(key, *text);
     }
 
-    /// The first of several members with one name, as in the body.
+    /// When several members have one name, the first one is written, as in the body.
     void DataAttributes(const JsonValue& data) {
         std::set<std::string_view> written;
         for (const auto& member : data.GetObject()) {
@@ -160,7 +160,7 @@ private:
         m_writer.EndObject();
     }
 
-    /// The protocol's JSON writes 64-bit integers as texts, because many readers' numbers are doubles.
+    /// The protocol's JSON writes 64-bit integers as texts, because many readers keep numbers as doubles.
     static std::string Nanoseconds(WallTime time) {
         const std::chrono::nanoseconds nanoseconds = Computable(time).time_since_epoch();
         return std::to_string(nanoseconds.count());

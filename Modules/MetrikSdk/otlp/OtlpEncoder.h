@@ -7,17 +7,19 @@
 
 namespace MetrikSdk::otlp {
 
-/// The batch as the body of an OTLP/HTTP JSON logs request. Pure. docs/Events.md shows one, and says what
-/// each part means.
+/// The batch as the body of an OTLP/HTTP JSON logs request. Pure. docs/Events.md shows an example, and says
+/// what each part means.
 ///
-/// One resource for each module release, and one log record for each event. The payload is a structured body,
-/// and what is worth a column of a table is an attribute, too: its first MAX_DATA_ATTRIBUTES scalar members
-/// of eventData among it. timeUnixNano is the payload's extend.createTime; where that makes no sense, it is
-/// the time at which the event was stored, which is also observedTimeUnixNano. A payload that is no JSON
-/// object, or is too deep, becomes a text body. What is not UTF-8 is replaced by U+FFFD.
+/// There is one resource for each module release, and one log record for each event. The payload becomes a
+/// structured body. What deserves a column of a table becomes an attribute, too. The first
+/// MAX_DATA_ATTRIBUTES scalar members of eventData are among these attributes. timeUnixNano is the payload's
+/// extend.createTime. When that makes no sense, timeUnixNano is the time at which the event was stored, like
+/// observedTimeUnixNano. A payload that is no JSON object, or is too deep, becomes a text body. Bytes that
+/// are not UTF-8 are replaced by U+FFFD.
 std::string EncodeOtlp(const Batch& batch, const ResourceConfig& config = {});
 
-/// Collectors bound the attributes of a record at 128 by default, and columns are named after them.
+/// By default, collectors allow 128 attributes for a record. Columns are named after the attributes, so the
+/// names are bounded, too.
 constexpr int MAX_DATA_ATTRIBUTES = 64;
 constexpr std::size_t MAX_DATA_NAME_BYTES = 128;
 

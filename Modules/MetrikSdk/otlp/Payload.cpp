@@ -9,15 +9,17 @@
 namespace MetrikSdk::otlp {
 namespace {
 
-/// The last millisecond whose nanoseconds fit 64 bits with a sign, which is what stores keep: the year 2262.
+/// The last millisecond, in the year 2262, whose nanoseconds fit into 64 bits with a sign. Stores keep times
+/// in that form.
 constexpr std::int64_t MAX_CREATE_TIME_MS = 9'223'372'036'854;
 
 } // namespace
 
-/// Read by the service's own rules, and iteratively: what follows may use the call stack freely, since the
-/// depth is known.
+/// Reads the text by the service's own rules, and without recursion. Later functions may use the call stack
+/// freely, because the depth is known then.
 ///
-/// What the service takes as a report's value is one level deeper in its payload.
+/// A value of a report that the service accepts is one level deeper in the payload, so the second attempt
+/// allows one level more.
 Payload::Payload(const std::string& text)
     : m_document(Parsed(text, MAX_DEPTH)), m_isShallow(m_document != nullptr) {
     if (!m_isShallow)

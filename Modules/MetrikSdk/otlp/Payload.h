@@ -9,27 +9,27 @@
 
 namespace MetrikSdk::otlp {
 
-/// An event's payload, read once for everything that an upload needs of it.
+/// The payload of an event. It is read once for everything that an upload needs from it.
 class Payload {
 public:
-    /// Objects and arrays within each other. A level of JSON is three levels of the protocol's messages, and
-    /// readers of those give up at a hundred.
+    /// How deep objects and arrays may be nested. One level of JSON takes three levels of the protocol's
+    /// messages, and readers of these messages give up at a hundred levels.
     static constexpr int MAX_DEPTH = 24;
 
     explicit Payload(const std::string& text);
 
-    /// The payload as a JSON object; null when it is none, or one that is not sent as one: deeper than
-    /// MAX_DEPTH, or not UTF-8.
+    /// The payload as a JSON object. Null when it is no object, when it is deeper than MAX_DEPTH, or when it
+    /// is not UTF-8. Such a payload is not sent as an object.
     const SystemTool::IO::JsonValue* Object() const { return m_isShallow ? m_document.get() : nullptr; }
 
-    /// When the event happened, by the module's word: extend.createTime, decimal milliseconds as a text.
-    /// Nothing when there is none or it makes no sense. Deep payloads have one, too.
+    /// When the event happened, as the module says: extend.createTime, decimal milliseconds as a text.
+    /// Nothing when it is missing or makes no sense. Also works for a payload that is too deep.
     std::optional<WallTime> CreateTime() const;
 
-    /// The object eventData; null when there is none. Deep payloads have one, too.
+    /// The object eventData; null when there is none. Also works for a payload that is too deep.
     const SystemTool::IO::JsonValue* EventData() const { return ObjectIn("eventData"); }
 
-    /// A text of the object `outer`; nothing when there is none.
+    /// The text `name` in the object `outer`; nothing when there is none.
     std::optional<std::string> TextIn(const char* outer, const char* name) const;
 
 private:

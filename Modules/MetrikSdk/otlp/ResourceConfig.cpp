@@ -13,7 +13,7 @@ namespace {
 
 using Attributes = std::vector<std::pair<std::string, std::string>>;
 
-/// Nothing when the list is ill-formed.
+/// Nothing when the list has a wrong form.
 std::optional<Attributes> Parsed(const std::string& list) {
     Attributes attributes;
     for (std::size_t start = 0; start < list.size();) {
@@ -34,7 +34,7 @@ std::optional<Attributes> Parsed(const std::string& list) {
     return attributes;
 }
 
-/// Takes service.name out of the list, where it is only a default.
+/// Removes service.name from the list and returns its value, which is only a default there.
 std::string TakeServiceName(Attributes& attributes) {
     const auto found = std::find_if(attributes.begin(), attributes.end(),
                                     [](const auto& attribute) { return attribute.first == "service.name"; });

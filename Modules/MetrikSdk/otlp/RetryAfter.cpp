@@ -10,7 +10,7 @@
 namespace MetrikSdk::otlp {
 
 std::optional<std::chrono::milliseconds> ParseRetryAfter(const std::string& header, WallTime now) {
-    constexpr std::int64_t FAR = 1'000'000'000; // seconds; keeps the sums of a hostile number in range
+    constexpr std::int64_t FAR = 1'000'000'000; // in seconds; keeps sums with a hostile number in range
     std::int64_t seconds = 0;
     const auto end = header.data() + header.size();
     const auto parsed = std::from_chars(header.data(), end, seconds);
@@ -22,7 +22,7 @@ std::optional<std::chrono::milliseconds> ParseRetryAfter(const std::string& head
     if (date < 0)
         return std::nullopt;
     const auto today = std::chrono::floor<std::chrono::seconds>(now).time_since_epoch().count();
-    if (date > today + FAR) // the date's year may have ten digits
+    if (date > today + FAR) // the year of the date may have ten digits
         return std::chrono::seconds(FAR);
     const WallTime until{std::chrono::seconds(date)};
     return std::max(until - now, std::chrono::milliseconds(0));

@@ -8,7 +8,7 @@
 
 namespace MetrikSdk::otlp {
 
-/// A Retry-After header: seconds, or a date. Nothing when it is neither.
+/// The wait that a Retry-After header asks for, in seconds or until a date. Nothing when it is neither.
 std::optional<std::chrono::milliseconds> ParseRetryAfter(const std::string& header, WallTime now);
 
 } // namespace MetrikSdk::otlp

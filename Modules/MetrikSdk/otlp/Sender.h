@@ -7,7 +7,8 @@
 
 namespace MetrikSdk::otlp {
 
-/// Takes a request's body to the collector. Post by one thread; Abandon by any, also before Post.
+/// Sends the body of a request to the collector. Threads: one calls Post. Any may call Abandon, also before
+/// Post.
 class Sender {
 public:
     virtual ~Sender() = default;
@@ -15,13 +16,13 @@ public:
     /// Blocks until there is an answer or a reason why there is none.
     virtual HttpResult Post(const std::string& body) = 0;
 
-    /// Ends the request under way, and every later one at once.
+    /// Ends the request that is running, and every later one at once.
     virtual void Abandon() = 0;
 
-    /// Where to, for people.
+    /// The address of the collector, for people.
     virtual std::string Destination() const = 0;
 
-    /// The names of the headers that were configured, for people.
+    /// The names of the configured headers, for people.
     virtual std::vector<std::string> HeaderNames() const = 0;
 };
 

@@ -22,7 +22,8 @@ void AsideList::OtherWasTaken() {
     }
 }
 
-/// A clock that was set back must not hold an event for longer than the longest pause.
+/// Whether the event may be tried. A clock that was set back must not hold it for longer than the longest
+/// pause.
 bool AsideList::IsDue(const Entry& entry, WallTime now) const {
     return entry.notBefore <= now || entry.notBefore - now > m_settings.maxPause;
 }

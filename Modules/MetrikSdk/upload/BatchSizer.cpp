@@ -5,7 +5,8 @@
 namespace MetrikSdk::upload {
 namespace {
 
-/// A larger request is an experiment that may cost a whole time-out, so it is made rarely.
+/// How many full requests must be taken before a larger one is tried. A larger one may fail only after a
+/// whole time-out, so it is tried rarely.
 constexpr int REQUESTS_BEFORE_GROWTH = 8;
 constexpr std::size_t GROWTH_DIVISOR = 8;
 
@@ -41,7 +42,8 @@ void BatchSizer::Shrink(std::size_t sent, Blame blame) {
     m_suspects = sent;
     m_suspectIsAside = false;
     m_now.events = half;
-    if (!m_failing) // a collector that is away fails every size: only the first one says something
+    // A collector that is away fails every size, so only the first failure says something about the size.
+    if (!m_failing)
         m_now.doubles = half;
     m_failing = true;
     m_fullRequests = 0;

@@ -6,7 +6,7 @@
 
 namespace MetrikSdk::upload {
 
-/// A request as far as its size goes.
+/// The size of a request.
 struct RequestSize {
     std::size_t events = 0;
     std::size_t bodyBytes = 0; ///< Before compression.
@@ -16,52 +16,55 @@ struct RequestSize {
 enum class Blame {
     Event,    ///< At least one event of it will never be taken.
     TooLarge, ///< The body is longer than the collector reads.
-    NoAnswer, ///< It timed out, or the connection broke: perhaps it is too much for the line.
-    Later     ///< "Not now", which a collector also says for ever to an event that it cannot digest.
+    NoAnswer, ///< The request timed out, or the connection broke: perhaps it is too long for the line.
+    Later     ///< "Not now". A collector may also say this for ever to an event that it cannot process.
 };
 
-/// How many events go into the next request. Batches are always the oldest events, so numbers are all that
-/// has to be remembered. Pure.
+/// Decides how many events go into the next request. Batches always hold the oldest events, so this class
+/// only has to remember numbers. Pure.
 ///
-/// A request that fails is followed by its halves in turn, a failing half by its own, until one event is
-/// left. What comes of such a search:
+/// After a request that fails, its halves are sent one after the other. A half that fails is halved again,
+/// until one event is left. The results of such a search:
 ///
-///     one event was to blame      batches are as large again as before the search
-///     all were taken in parts     refused before: the refusal was a passing one, and batches are as before
-///                                 no answer, or "later": the size was to blame. The size that worked is remembered; it
-///                                 doubles up to half of what failed, and grows by an eighth after eight full requests
+/// - One event was to blame: batches are as large again as before the search.
+/// - All events were taken in parts, after a refusal: the refusal was temporary, and batches are as large as
+///   before.
+/// - All events were taken in parts, after no answer or "later": the size was to blame. The size that worked
+///   is remembered. It doubles up to half of the size that failed, and then grows by an eighth after eight
+///   full requests.
 ///
-/// The first "later" halves nothing: it is about the collector, usually. The longest body that a collector
-/// reads is known once it has refused one: later bodies stay below, starting with half of it.
+/// The first "later" halves nothing, because it is usually about the collector. After a collector has refused
+/// a body as too long, later bodies stay shorter, starting with half of its length.
 class BatchSizer {
 public:
     static constexpr std::size_t UNKNOWN = std::numeric_limits<std::size_t>::max();
 
     explicit BatchSizer(std::size_t maxEvents) : m_max(maxEvents), m_now{maxEvents, maxEvents} {}
 
-    /// At least 1.
+    /// How many events the next request may have; at least 1.
     std::size_t MaxEvents() const;
 
-    /// Of a request of more than one event; UNKNOWN as long as no body was too long.
+    /// The limit for a request of more than one event; UNKNOWN as long as no body was too long.
     std::size_t MaxBodyBytes() const { return m_maxBody; }
 
-    /// The request failed. Whether it was one event alone, so that the caller must decide about that.
+    /// The request failed. Returns true when it had only one event, so that the caller must decide about that
+    /// event.
     bool Failed(const RequestSize& sent, Blame blame);
 
-    /// The request's events were taken.
+    /// The events of the request were taken.
     void Taken(const RequestSize& sent);
 
-    /// The event that was sent alone is to blame, and has left the head of the outbox.
+    /// The event that was sent alone is to blame, and has left the front of the outbox.
     void Found();
 
-    /// The event that was sent alone has left the head of the outbox for now. It is to blame if the next
+    /// The event that was sent alone has left the front of the outbox for now. It is to blame if the next
     /// request is taken.
     void SteppedAside() { m_suspectIsAside = true; }
 
 private:
     struct Limits {
-        std::size_t events;  ///< Of one request.
-        std::size_t doubles; ///< Up to here the former doubles with each request that is taken.
+        std::size_t events;  ///< How many events one request may have.
+        std::size_t doubles; ///< `events` doubles up to this number, with each request that is taken.
     };
 
     void Shrink(std::size_t sent, Blame blame);
@@ -72,9 +75,10 @@ private:
 
     std::size_t m_max;
     Limits m_now;
-    std::optional<Limits> m_before; ///< Of the search that is under way.
-    std::size_t m_span = 0;     ///< Events of the request that began it, as far as they are not taken yet.
-    std::size_t m_suspects = 0; ///< The same of the last request that failed.
+    std::optional<Limits> m_before; ///< The limits before the search that is going on.
+    /// Events of the request that began the search, without those that were taken since.
+    std::size_t m_span = 0;
+    std::size_t m_suspects = 0; ///< The same for the last request that failed.
     bool m_sizeIsSuspected = false;
     bool m_suspectIsAside = false;
     bool m_failing = false; ///< The last request failed.

@@ -15,17 +15,18 @@
 namespace MetrikSdk::upload::RetryPolicy {
 namespace {
 
-/// How much of an answer's text a person wants to read.
+/// How much of an answer's text goes into a message for people.
 constexpr std::size_t MAX_QUOTED_BYTES = 300;
 
 bool IsSuccess(long status) {
     return status >= 200 && status < 300;
 }
 
-/// A hotel's log-in page answers every plain request with 200 and a page. Collectors answer that with JSON,
-/// with nothing, or with a word; a page of theirs comes with errors only, from the proxy before them.
+/// Whether the answer is a web page. The log-in page of a hotel's network answers every plain request with
+/// 200 and a page. A collector answers with JSON, with nothing, or with a word. Pages from a collector's
+/// address come only with errors, from the proxy in front of it.
 bool IsWebPage(const otlp::HttpResult& result) {
-    static constexpr std::string_view PAGE = "text/html"; // media types have no letter case
+    static constexpr std::string_view PAGE = "text/html"; // media types may be in upper or lower case
     return ::strncasecmp(result.contentType.c_str(), PAGE.data(), PAGE.size()) == 0;
 }
 
@@ -33,8 +34,9 @@ bool AsksToWait(long status) {
     return status == 429 || status == 502 || status == 503 || status == 504;
 }
 
-/// Who sends them, and where to, is wrong, and not what they are. (A firewall that dislikes one event answers
-/// so, too; so one that is never taken while others are steps aside as with any other "later".)
+/// Whether the sender or the address is wrong, and not the events. (A firewall that dislikes one event
+/// answers like this, too. So an event that is never taken while others are goes aside, as with any other
+/// "later".)
 bool IsConfigurationsFault(long status) {
     static constexpr std::array STATUSES{401L, 403L, 404L, 405L, 407L, 415L, 511L};
     return std::find(STATUSES.begin(), STATUSES.end(), status) != STATUSES.end();
@@ -70,7 +72,7 @@ Verdict Judge(const otlp::HttpResult& result) {
         return result.began ? Verdict::WaitAndHalve : Verdict::Wait;
     if (IsSuccess(result.status))
         return IsWebPage(result) ? Verdict::Wait : Verdict::Delete;
-    // A redirect is the address's fault and not the events'. It is not followed: it could carry the
+    // A redirect is the fault of the address and not of the events. We do not follow it: it could carry the
     // credentials to another host.
     if (result.status < 400)
         return Verdict::Wait;
@@ -81,13 +83,13 @@ Verdict Judge(const otlp::HttpResult& result) {
 
 PartialSuccess ReadPartialSuccess(const otlp::HttpResult& result, std::size_t sent) {
     const auto partial = ParseAnswer(result.body).GetKeyValue("partialSuccess");
-    // A 64-bit integer, so a text by the protocol's rules; some collectors write a number.
+    // By the protocol's rules, a 64-bit integer is a text. Some collectors write a number.
     const auto text = partial.GetKeyValue("rejectedLogRecords").ToString();
     std::uint64_t rejected = 0;
     const auto end = text.data() + text.size();
     const auto parsed = std::from_chars(text.data(), end, rejected);
     const bool isNumber = parsed.ec == std::errc() && parsed.ptr == end;
-    if (parsed.ec != std::errc()) // a negative one, a word
+    if (parsed.ec != std::errc()) // a negative number, or a word
         rejected = 0;
     return {static_cast<std::size_t>(std::min<std::uint64_t>(rejected, sent)),
             OneLine(partial.GetKeyValue("errorMessage").ToString()),

@@ -10,15 +10,15 @@
 namespace MetrikSdk::upload {
 namespace {
 
-/// An idle uploader looks again this often: events may come from another process, or the file may be back.
+/// How often an idle uploader looks again. Another process may have stored events, or the file may be back.
 constexpr std::chrono::milliseconds IDLE = std::chrono::seconds(30);
 
 constexpr Pause AT_ONCE{};
 
 } // namespace
 
-/// Keeps the batch from being dropped for a cap while it is under way. What was delivered and is not deleted
-/// yet stays so until Settle: dropped, it would be counted as lost.
+/// While this object lives, no cap drops the batch that is being sent. A batch that was delivered but not
+/// deleted yet stays protected until Settle: a cap that dropped it would count it as lost.
 class UploadCycle::UnderWay {
 public:
     explicit UnderWay(UploadCycle& cycle) : m_cycle(cycle) {}
@@ -66,7 +66,7 @@ Pause UploadCycle::TakeAndSend(WallTime now) {
     return Send(std::move(batch), false, now);
 }
 
-/// Tries the event that is aside and due, if there is one.
+/// Tries an event that is aside and due, if there is one.
 std::optional<Pause> UploadCycle::TryAside(WallTime now) {
     while (const auto due = m_aside.Due(now)) {
         auto batch = m_outbox.TakeOne(*due);
@@ -92,7 +92,7 @@ Pause UploadCycle::Send(Batch batch, bool isAside, WallTime now) {
     return wished > pause.duration ? Pause{wished} : pause;
 }
 
-/// Leaves out the events for which the body would be too long.
+/// Encodes the batch. Leaves out its last events when the body would be too long.
 std::string UploadCycle::EncodeWithinBound(Batch& batch) const {
     auto body = otlp::EncodeOtlp(batch, m_settings.resource);
     while (body.size() > m_sizer.MaxBodyBytes() && batch.events.size() > 1) {
@@ -138,7 +138,7 @@ std::string UploadCycle::Describe(const otlp::HttpResult& result) const {
     return RetryPolicy::Describe(result) + (lookAt.empty() ? "" : "; " + lookAt);
 }
 
-/// Lets the others go past an event that failed alone, if there are others.
+/// Sets an event aside that failed alone, so that others can be sent. Does nothing when there are no others.
 void UploadCycle::StepAside(const StoredEvent& event, WallTime now) {
     auto without = m_aside.Keys();
     without[event.row] = event.uuid;

@@ -20,15 +20,15 @@ struct Pause {
     std::int64_t untilWaiting = outbox::CountWaiter::NEVER; ///< Or until so many events wait.
 };
 
-/// One upload after another: takes a batch, sends it, and does with it what the answer says. No thread of its
-/// own, and no clock: the caller passes the time and sleeps.
+/// Does one upload after the other: takes a batch, sends it, and treats its events as the answer says. It has
+/// no thread and no clock: the caller passes the time and sleeps.
 ///
-/// An event leaves the outbox only through here (or for a cap): after its delivery is known, or with its
-/// verdict into the dead letters. What was delivered and could not be deleted, for a full disk say, is kept
-/// in mind and deleted before anything else is sent. Which events go is decided by BatchPlan and BatchSizer,
-/// and by AsideList for those that the collector does not take.
+/// An event leaves the outbox only through this class (or for a cap): after it was delivered, or to the dead
+/// letters after a verdict. Delivered events that could not be deleted, for example because the disk is full,
+/// are remembered and deleted before anything else is sent. BatchPlan and BatchSizer decide which events are
+/// sent. AsideList does so for events that the collector does not take.
 ///
-/// Threads: one. Failure: told to the notifier, and waited for.
+/// Threads: one. Failure: reported to the notifier; the next pass comes after a wait.
 class UploadCycle {
 public:
     UploadCycle(outbox::Outbox& outbox, otlp::Sender& sender, report::Notifier& notifier,
@@ -42,10 +42,10 @@ private:
         Batch batch;
         std::size_t refused = 0;
     };
-    /// A request and what came back.
+    /// A request and its answer.
     struct Exchange {
         Batch batch;
-        bool isAside = false; ///< The batch is one event that had stepped aside.
+        bool isAside = false; ///< The batch is one event that had been set aside.
         std::size_t bodyBytes = 0;
         otlp::HttpResult result;
 
@@ -78,10 +78,10 @@ private:
     std::function<double()> m_random; ///< Uniform in [0, 1).
     BatchSizer m_sizer;
     AsideList m_aside;
-    bool m_isAsidesTurn = false;      ///< A batch was taken since one that is aside was tried.
-    std::optional<Removal> m_removal; ///< Delivered, and not deleted yet.
+    bool m_isAsidesTurn = false;      ///< A batch was taken since the last try of an event that is aside.
+    std::optional<Removal> m_removal; ///< Events that were delivered, but are not deleted yet.
     int m_failures = 0;               ///< Requests in a row that must be repeated.
-    int m_refusalsInARow = 0;         ///< Events refused for good since one was last accepted.
+    int m_refusalsInARow = 0;         ///< Events that were refused for good since the last accepted one.
 };
 
 } // namespace MetrikSdk::upload

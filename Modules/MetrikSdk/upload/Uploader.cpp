@@ -13,8 +13,9 @@
 namespace MetrikSdk::upload {
 namespace {
 
-/// The signals that a thread must not get: all but those of its own faults, which the service's crash handler
-/// wants. Among the blocked is SIGPIPE, which a TLS connection that the collector closed would raise.
+/// The signals that the thread must not get: all but those of its own faults, which the service's crash
+/// handler needs. One of the blocked signals is SIGPIPE: a write to a TLS connection that the collector has
+/// closed would raise it.
 sigset_t SignalsToBlock() {
     sigset_t signals;
     ::sigfillset(&signals);
@@ -23,7 +24,8 @@ sigset_t SignalsToBlock() {
     return signals;
 }
 
-/// A new thread begins with its maker's mask, so that there is no moment in which it could be hit.
+/// Blocks signals on this thread while it lives. A new thread begins with the mask of the thread that makes
+/// it, so there is no moment in which it could get a signal.
 class BlockedSignals {
 public:
     BlockedSignals() {
@@ -57,7 +59,7 @@ void TellFailure(process::OutboxCore& core, const char* reason) noexcept {
     }
 }
 
-/// An unexpected exception, such as a lack of memory, must not end the service.
+/// An unexpected exception, such as a lack of memory, must not end the service. So the uploads begin again.
 void RunUntilStopped(process::OutboxCore& core, otlp::Sender& sender) noexcept {
     constexpr std::chrono::seconds RECOVERY(10);
     auto& waiting = core.outbox.WaitingCount();

@@ -12,13 +12,13 @@ struct OutboxCore;
 
 namespace MetrikSdk::upload {
 
-/// The thread that empties an outbox: runs from construction to destruction.
+/// The thread that sends the events of an outbox. It runs from construction to destruction.
 ///
-/// Destruction ends the request under way and waits for the thread, OutboxSettings::stopPatience at most: one
-/// that hangs in the file system is left to itself, with its share of what it uses. What was not sent stays
-/// in the outbox.
-/// Threads: constructed and destroyed by any; destroyed by its own thread (a crash handler there may call
-/// exit()) it waits for nothing.
+/// Destruction ends the running request and waits for the thread, for OutboxSettings::stopPatience at most. A
+/// thread that hangs in the file system is detached, and keeps alive what it uses. Events that were not sent
+/// stay in the outbox.
+/// Threads: any may construct and destroy it. When its own thread destroys it, because a crash handler on
+/// that thread called exit(), it waits for nothing.
 /// Failure: construction throws what creating a thread throws.
 class Uploader {
 public:
