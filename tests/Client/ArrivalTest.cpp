@@ -17,7 +17,7 @@
 using hublink::Result;
 using SystemTool::IO::JsonDocument;
 
-// What is reported as sent arrives, through the real service, as it was given.
+// Every event that the library reports as sent arrives unchanged, through the real service.
 
 namespace {
 
@@ -40,7 +40,7 @@ std::string Compact(const std::string& json) {
     return compact;
 }
 
-/// As the service reads and prints it; empty for what it cannot read.
+/// The JSON as the service reads and prints it; empty when the service cannot read it.
 std::string Printed(const std::string& json) {
     std::string error;
     const JsonDocument document = JsonDocument().FromJson(json, error);
@@ -59,7 +59,7 @@ protected:
         m_service.Start();
     }
 
-    /// Sends so many events at the service's pace, and notes what should arrive of them.
+    /// Sends EVENTS random events at a rate that the service can take, and notes those that should arrive.
     void SendRandomEvents(std::uint64_t seed, bool mayHaveZeros,
                           const std::function<Result(const RandomEvent&)>& send) {
         RandomEvents events(seed);
@@ -100,8 +100,8 @@ private:
         (event.id.starts_with("A") ? m_forAnalytics : m_forStore).push_back(event);
     }
 
-    /// JSON that another parser takes is not refused for its grammar. (Half of a surrogate pair, that parser
-    /// lets pass.)
+    /// Expects that JSON which another parser accepts is not refused for its grammar. That parser accepts
+    /// half of a surrogate pair, so texts with such escapes are left out.
     static void ExpectThatItIsRefusedRightly(const RandomEvent& event, Result result) {
         if (result != Result::InvalidJson || event.kind != RandomEvent::Kind::Json ||
             event.id.starts_with("A") || event.value.find("\\u") != std::string::npos)
@@ -111,10 +111,11 @@ private:
         EXPECT_TRUE(document.HasParseError()) << event.value;
     }
 
-    /// The service's socket holds 4 MiB where the machine allows it, and 208 KiB where it does not.
+    /// Waits when the socket's buffer may be filling. The buffer holds 4 MiB where the machine allows it,
+    /// otherwise 208 KiB.
     void Pace(const RandomEvent& event) {
         constexpr std::size_t BYTES = 50'000;
-        m_unread += event.id.size() + event.value.size() + 1000; // with what the kernel adds
+        m_unread += event.id.size() + event.value.size() + 1000; // plus what the kernel adds to a datagram
         if (m_unread < BYTES)
             return;
         ASSERT_TRUE(WaitUntil(&Service::TookAllDatagrams));
@@ -132,7 +133,7 @@ private:
         const auto eventData = JsonDocument().FromJson(payload, error).GetKeyValue("eventData");
         JsonDocument expected;
         expected.FromJson(given.kind == RandomEvent::Kind::Nothing ? "{}" : given.value, error);
-        for (const auto* name : {"openid", "sys_version"}) // which the service sets
+        for (const auto* name : {"openid", "sys_version"}) // the service sets these members
             expected.SetKeyValue(name, eventData.GetKeyValue(name));
         return error.empty() && eventData.ToJson() == expected.ToJson();
     }

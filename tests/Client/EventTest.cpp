@@ -17,14 +17,14 @@ constexpr auto INIT =
     R"({"msgType":"init","exdata":{"moduleID":"A100","moduleVersion":"2.1","moduleName":"Painter",)"
     R"("logPath":"","dbPath":"","openID":"","hublinkVersion":""}})";
 
-/// What an event becomes on the wire.
+/// The datagram that the library makes of an event.
 class ClientEvent : public ::testing::Test {
 protected:
     const hublink::Reporter::Time m_time{std::chrono::milliseconds(1700000000123)};
     ServicePort m_port;
     hublink::Reporter m_reporter{hublink::Module{"A100", "2.1", "Painter"}};
 
-    /// The datagram of an event at that time, between id and time.
+    /// Sends an event at m_time, and returns its datagram.
     std::string ValueOnTheWire(const std::string& id, hublink::Value value) {
         EXPECT_EQ(m_reporter.Event(id, value, m_time), Result::Sent) << id << " " << value.Text();
         return m_port.TakeOne();

@@ -28,7 +28,7 @@ EventsInCProcess::EventsInCProcess() {
 }
 
 EventsInCProcess::~EventsInCProcess() {
-    ::close(m_to); // the end of its input ends it
+    ::close(m_to); // the process ends at the end of its input
     ::close(m_from);
     ::waitpid(m_process, nullptr, 0);
 }

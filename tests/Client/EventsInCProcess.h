@@ -6,7 +6,8 @@
 
 #include "tests/Client/RandomEvents.h"
 
-/// The program events_in_c, which sends what it is told through the C interface. Ended by the destructor.
+/// The program events_in_c, which sends events through the C interface as it is told to. The destructor ends
+/// it.
 class EventsInCProcess {
 public:
     EventsInCProcess();
@@ -14,7 +15,7 @@ public:
     EventsInCProcess(const EventsInCProcess&) = delete;
     EventsInCProcess& operator=(const EventsInCProcess&) = delete;
 
-    /// The event's texts have no zero byte: in C, they would end there.
+    /// The event's texts must have no zero byte: in C, a text would end there.
     hublink::Result Send(const RandomEvent& event) const;
 
 private:

@@ -22,14 +22,14 @@ using ::testing::ElementsAre;
 using ::testing::SizeIs;
 using ::testing::StartsWith;
 
-// What a program may do around a reporter: many threads, forks, closing what it does not know, running out of
-// memory.
+// What a program may do while it has a reporter: use many threads, fork, close descriptors that it does not
+// own, run out of memory.
 
 namespace {
 
 class ClientInItsProcess : public ::testing::Test {
 protected:
-    /// What a child of a fork returns, which must end by itself.
+    /// The result that `child` returns in a forked process. The process must end by itself.
     template <typename Child>
     static Result ResultInChild(Child child) {
         const pid_t process = ::fork();
@@ -128,7 +128,7 @@ TEST_F(ClientInItsProcess, AForkMayFallIntoTheEventsOfOtherThreads) {
             while (!stop)
                 m_reporter.Event("B1");
         });
-    threads.emplace_back([&] { // and into the beginning and the end of a reporter
+    threads.emplace_back([&] { // and during the construction and destruction of a reporter
         while (!stop)
             hublink::Reporter().Event("B1");
     });
@@ -159,8 +159,8 @@ TEST_F(ClientInItsProcess, ADescriptorThatTheProgramUsesForAFileIsLeftAlone) {
 
 TEST_F(ClientInItsProcess, EightThreadsShareAReporter) {
 #ifdef __SANITIZE_THREAD__
-    constexpr std::uint64_t LEAST_EVENTS =
-        5'000; // each takes ten times as long; SSR_CLIENT_EVENTS asks for more
+    // Each takes ten times as long here. SSR_CLIENT_EVENTS asks for more.
+    constexpr std::uint64_t LEAST_EVENTS = 5'000;
 #else
     constexpr std::uint64_t LEAST_EVENTS = 100'000;
 #endif

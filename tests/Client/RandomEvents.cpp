@@ -14,7 +14,8 @@ constexpr std::array PIECES = {
     ";--"sv, "');"sv,    "|"sv,    "\u00e4"sv,      "\u20ac"sv, "\ufffd"sv, "\U0001F600"sv, "\U0010ffff"sv,
     " "sv,   "openid"sv, "a"sv,    "some words "sv, "\ufeff"sv, "\u2028"sv, "\\ud83d"sv,    "\u0000x"sv};
 
-// What makes a text one that cannot be sent; less often, else no event would be.
+// Pieces that make a text one that cannot be sent. They are used less often than the others; otherwise no
+// event could be sent.
 constexpr std::array BAD_PIECES = {"\0"sv,  "\x80"sv, "\xc0\xaf"sv, "\xed\xa0\x80"sv, "\xf4\x90\x80\x80"sv,
                                    "\xff"sv};
 
@@ -60,7 +61,7 @@ RandomEvent RandomEvents::Next() {
     default:
         event.kind = RandomEvent::Kind::Json;
         event.value = OneIn(4) ? Json(4) : JsonObject(4);
-        if (OneIn(20)) // and broken
+        if (OneIn(20)) // breaks the JSON
             event.value.erase(Below(event.value.size()), 1);
         return event;
     }
@@ -90,7 +91,7 @@ std::string RandomEvents::Text(std::size_t pieces) {
     return text;
 }
 
-/// About as long as a datagram, on both sides of the limit.
+/// A text about as long as a datagram: some are over the limit, some under it.
 std::string RandomEvents::LongText() {
     const std::string_view piece = PIECES[Below(PIECES.size())];
     std::string text = Text(10);

@@ -13,8 +13,8 @@ struct RandomEvent {
     std::string value;
 };
 
-/// Makes events out of what a report's way to the table could change: quotes, percent signs, control
-/// characters, bytes that are no UTF-8, zero bytes, "eventID", escapes, numbers of many digits, white space,
+/// Makes events of texts that could change on their way to the table: quotes, percent signs, control
+/// characters, bytes that are not UTF-8, zero bytes, "eventID", escapes, numbers of many digits, white space,
 /// and texts of 10 KB. The same seed makes the same events.
 class RandomEvents {
 public:

@@ -14,7 +14,7 @@ using ::testing::AllOf;
 using ::testing::Contains;
 using ::testing::ElementsAre;
 
-// The library beside the service as it runs on a user's machine.
+// The library with the real service, as on a user's machine.
 
 namespace {
 

@@ -21,7 +21,7 @@ void SwallowRefusals() {
     g_swallowsRefusals = true;
 }
 
-// The linker's names (--wrap).
+// The names that the linker's option --wrap asks for.
 extern "C" ssize_t __real_send(int socket, const void* data, std::size_t bytes,
                                int flags); // NOLINT(bugprone-*,cert-*)
 

@@ -27,14 +27,14 @@ auto EventWithId(const std::string& id) {
     return StartsWith("{\"eventID\":\"" + id + "\"");
 }
 
-/// Who listens on the service's port, as it changes.
+/// Changes the program that listens on the service's port.
 class ServiceComesAndGoes : public ::testing::Test {
 protected:
     std::optional<ServicePort> m_port;
     hublink::Reporter m_reporter{hublink::Module{"A100", "2.1", "Painter"}};
 };
 
-/// The port in the hands of another user, while this lives; with root's rights only.
+/// Binds the port as another user while this object exists. Works with root's rights only.
 class OtherUser {
 public:
     OtherUser() : m_isOther(::seteuid(12'345) == 0) {
@@ -139,7 +139,8 @@ TEST_F(ServiceComesAndGoes, ARefusalThatComesLateCostsNoEventAndTellsEverythingA
     EXPECT_EQ(m_reporter.SetUser("u1"), Result::Sent);
     EXPECT_EQ(m_reporter.Event("A100|1"), Result::Sent);
     m_port->Take();
-    FailNextSend(ECONNREFUSED); // as the system does when it learned of it after the send before
+    // The system does this when it learns of a refusal only after the earlier send.
+    FailNextSend(ECONNREFUSED);
     EXPECT_EQ(m_reporter.Event("A100|2"), Result::Sent);
     EXPECT_THAT(m_port->Take(), ElementsAre(USER, INIT, EventWithId("A100|2")));
 }
@@ -182,9 +183,10 @@ TEST_F(ServiceComesAndGoes, AnEventWhoseModuleCouldNotBeAnnouncedIsNotSent) {
     EXPECT_THAT(m_port->Take(), ElementsAre(INIT, EventWithId("A100|2")));
 }
 
-/// A loopback that passes a thousand bytes a second, while this lives: what waits for its turn fills the
-/// sender's buffer. Of the test's own network; but what was left in it would be answered later, and take the
-/// room for such answers from all networks of the machine.
+/// Makes the loopback device pass only a thousand bytes a second while this object exists, so that waiting
+/// datagrams fill the sender's buffer. It is the loopback of the test's own network. The kernel answers
+/// datagrams that are left in it later, and its room for such answers is shared by all networks of the
+/// machine.
 class SlowNetwork {
 public:
     SlowNetwork()

@@ -6,15 +6,16 @@
 #include <Poco/Net/DatagramSocket.h>
 #include <Poco/Net/SocketAddress.h>
 
-/// Listens where the service would, and reads nothing into what arrives. In the sandbox only, which has the
-/// port to itself.
+/// Listens on the service's port and does not interpret what arrives. Only in the sandbox, where no other
+/// program has the port.
 class ServicePort {
 public:
     ServicePort() : m_socket(Poco::Net::SocketAddress("127.0.0.1", 9997)) {
         m_socket.setReceiveBufferSize(8 * 1024 * 1024);
     }
 
-    /// What has arrived since the last call. A datagram over loopback has arrived when its sender goes on.
+    /// The datagrams that have arrived since the last call. Over loopback, a datagram has arrived when its
+    /// send() returns.
     std::vector<std::string> Take() {
         std::vector<std::string> texts;
         while (m_socket.poll(Poco::Timespan(0), Poco::Net::Socket::SELECT_READ)) {
@@ -26,7 +27,7 @@ public:
         return texts;
     }
 
-    /// The one datagram that has arrived; a text that no datagram has when there is none, or more.
+    /// The one datagram that has arrived. When there is none or more than one, a text that no datagram has.
     std::string TakeOne() {
         const auto texts = Take();
         return texts.size() == 1 ? texts.front() : std::to_string(texts.size()) + " datagrams";

@@ -8,7 +8,7 @@
 #include "tests/Modules/MetrikSdk/support/SmallDisk.h"
 #include "tests/Tools/reportctl/support/ServiceFilesFixture.h"
 
-// What holds for every command that looks at the service's files or changes them.
+// Tests for every command that reads or changes the service's files.
 
 namespace {
 
@@ -16,13 +16,13 @@ using ::testing::AnyOf;
 using ::testing::HasSubstr;
 using ::testing::Not;
 
-/// What a command cannot do without.
+/// The file that a command needs.
 enum class Needs { Store, Outbox, Log, Ledger, Nothing };
 
 struct Command {
     std::string arguments;
     Needs needs = Needs::Nothing;
-    int exitCode = 0; ///< when nothing is wrong but that no service runs
+    int exitCode = 0; ///< when everything is right except that no service runs
 };
 
 const std::vector<Command> LOOK{
@@ -52,7 +52,7 @@ const std::vector<Command> CHANGE{
     {"outbox purge --dead", Needs::Outbox},
 };
 
-/// What these write, they write into a file or directory whose name comes last.
+/// Commands that write into a file or directory. Its name is the last argument.
 const std::vector<Command> WRITE{
     {"export --output ", Needs::Store},
     {"backup ", Needs::Store},
@@ -75,7 +75,8 @@ bool IsJson(const std::string& text) {
     return !rapidjson::Document().Parse<rapidjson::kParseValidateEncodingFlag>(text.c_str()).HasParseError();
 }
 
-/// Without the line feeds: a byte, or the UTF-8 of a character, that a terminal may take for an order.
+/// Whether the text has a character, line feeds excepted, that a terminal may take for an order: a control
+/// byte, or a control character in UTF-8.
 bool HasControlCharacter(const std::string& text) {
     for (std::size_t i = 0; i < text.size(); ++i) {
         const auto byte = static_cast<unsigned char>(text[i]);
@@ -90,13 +91,13 @@ class EveryCommand : public ServiceFilesFixture {
 protected:
     std::string File() const { return Data() + "/written"; }
 
-    /// Empty for a command that does its work whatever is there.
+    /// The path of what the command needs; empty for a command that needs nothing.
     std::string PathOf(Needs needs) const {
         return needs == Needs::Nothing ? "" : Files()[static_cast<std::size_t>(needs)];
     }
 
-    /// A command that needs something fails and names it, followed by one of these words; the others do their
-    /// work.
+    /// Expects that a command which needs a file fails and names the file, followed by one of these words.
+    /// Expects that the other commands succeed.
     void ExpectWords(const Command& command, const Outcome& outcome,
                      const std::vector<std::string>& words) const {
         const auto path = PathOf(command.needs);
@@ -107,7 +108,7 @@ protected:
         std::filesystem::remove_all(File());
     }
 
-    /// For the shell: descriptor 4 is a pipe whose reader has gone.
+    /// A shell text that makes descriptor 4 a pipe without a reader.
     std::string ClosedPipe() const {
         const auto pipe = "'" + Data() + "/pipe'";
         return "{ mkfifo " + pipe + "; exec 3<>" + pipe + " 4>" + pipe + " 3<&-; rm " + pipe + ";";
@@ -166,7 +167,7 @@ TEST_F(EveryCommand, ReadsTheDatabasesOnAFullDiskAndDoesThemNoHarm) {
     std::filesystem::create_directory(directory);
     const auto result = RunOnSmallDisk(directory, 2 << 20, [&] {
         std::filesystem::copy(directory + "-before", directory, std::filesystem::copy_options::recursive);
-        RemoveSideFiles(); // which cannot be made now
+        RemoveSideFiles(); // they cannot be made on the full disk
         std::ofstream(directory + "/filler") << std::string(4 << 20, 'x');
         for (const auto& command : LOOK)
             EXPECT_EQ(Reportctl(command.arguments).exitCode, command.exitCode) << command.arguments;
@@ -190,8 +191,9 @@ TEST_F(EveryCommand, SaysWhatIsMissing) {
         std::filesystem::remove(file);
     RemoveSideFiles();
     for (const auto& command : All(File())) {
+        // When there is no outbox, no event was ever stored, so this is no error.
         if (command.needs == Needs::Outbox && command.arguments == "find B100")
-            continue; // nothing was ever stored in an outbox that is not there
+            continue;
         ExpectWords(command, Reportctl(command.arguments),
                     {" is missing", ": No such file or directory", " cannot be read"});
     }
@@ -230,8 +232,8 @@ TEST_F(EveryCommand, SaysWhatItMayNotRead) {
         GTEST_SKIP() << "only root can become another user";
     const auto shared = std::filesystem::path(Data()).parent_path();
     const auto program = shared / "reportctl";
-    std::filesystem::copy_file(REPORTCTL,
-                               program); // the tree may be below a directory that is its owner's alone
+    // The build tree may be in a directory that only its owner can enter.
+    std::filesystem::copy_file(REPORTCTL, program);
     for (const auto& directory : {shared, std::filesystem::path(Data())})
         std::filesystem::permissions(directory, std::filesystem::perms(0777));
     for (const auto& command : All(File()))
@@ -243,7 +245,7 @@ TEST_F(EveryCommand, SaysWhatItMayNotRead) {
 
 TEST_F(EveryCommand, ShowsNoTextOfOthersToTheTerminalAsItIs) {
     for (const auto& command : LOOK) {
-        if (command.arguments.starts_with("export")) // which copies, byte for byte
+        if (command.arguments.starts_with("export")) // it copies texts, byte for byte
             continue;
         SCOPED_TRACE(command.arguments);
         const auto text = OutputOf(command.arguments);

@@ -85,7 +85,7 @@ TEST_F(OutboxCommand, DeletesDeadLettersWhenItIsAskedTo) {
 }
 
 TEST_F(OutboxCommand, ChangesNothingWhileItLooks) {
-    Reportctl("outbox list"); // whatever opening it for the first time brings
+    Reportctl("outbox list"); // opening it for the first time may change files
     const auto before = Everything();
     Reportctl("outbox list --json");
     EXPECT_TRUE(Everything() == before);

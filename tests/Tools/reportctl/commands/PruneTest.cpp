@@ -8,7 +8,7 @@ protected:
     std::uintmax_t Bytes() const { return std::filesystem::file_size(Store()); }
 };
 
-constexpr auto NEWEST_FOUR = "prune --older-than 2023-11-14T22:13:26Z"; // of ten
+constexpr auto NEWEST_FOUR = "prune --older-than 2023-11-14T22:13:26Z"; // keeps the newest four of ten rows
 
 TEST_F(Prune, DeletesNothingWithoutYes) {
     InsertMany(10);
@@ -66,7 +66,7 @@ TEST_F(Prune, SaysHowAStoreOfAnOlderSetUpCanShrink) {
     const auto outcome = Reportctl("prune --keep-rows 10 --yes");
     EXPECT_TRUE(outcome.Says("stop the service and run `reportctl setup --compact` once")) << outcome.output;
     EXPECT_EQ(Bytes(), before);
-    ASSERT_EQ(RunSetup().exitCode, 0); // a small one is rewritten without being asked
+    ASSERT_EQ(RunSetup().exitCode, 0); // set-up rewrites a small store without being asked
     EXPECT_LT(Bytes(), before / 10);
     EXPECT_EQ(Ask("pragma auto_vacuum"), "2");
     EXPECT_EQ(Rows(), "10");

@@ -14,7 +14,7 @@ namespace {
 
 constexpr auto PID_FILE = "/Library/Preferences/hublink/Report.pid";
 
-/// The pid file's lock, as another user's service holds it.
+/// Holds the pid file's lock, as the service of another user does.
 class Lock {
 public:
     Lock() : m_file(::open(PID_FILE, O_RDWR | O_CREAT | O_CLOEXEC, 0666)) {
@@ -33,7 +33,7 @@ public:
         m_file = -1;
     }
 
-    /// Whether a process waits for it, by what the kernel says.
+    /// Whether the kernel says that this process waits for the lock.
     static bool IsWaitedForBy(pid_t process) {
         std::ifstream locks("/proc/locks");
         for (std::string line; std::getline(locks, line);)
@@ -66,7 +66,7 @@ protected:
         }
     }
 
-    /// By its program: reportctl has become it.
+    /// Whether the process now runs the service's program, which reportctl starts in its own process.
     bool IsService() const {
         std::error_code error;
         const auto program =

@@ -8,7 +8,7 @@ namespace {
 
 class Send : public SendFixture {
 protected:
-    /// What arrives when this is sent, after looking at what the person is told.
+    /// Sends with these arguments, expects `told` as the output, and returns the text that arrives.
     std::string Arrival(const std::string& arguments, const std::string& told) const {
         Listener listener;
         const auto outcome = SendFixture::Send(arguments);
@@ -19,7 +19,7 @@ protected:
         return text;
     }
 
-    /// What would be sent.
+    /// The text that would be sent.
     std::string Text(const std::string& arguments) const {
         const auto output = SendFixture::Send("--dry-run " + arguments).output;
         return output.substr(0, output.find('\n'));

@@ -216,8 +216,8 @@ TEST_F(Setup, SaysSoWhenItsWordsCannotBeWritten) {
     EXPECT_EQ(Reportctl("--help >/dev/full").exitCode, 1) << "standard error is as full there";
 }
 
-/// A directory for pid files that is another's, and a user who runs set-up: where the test runs as root, that
-/// must be made.
+/// The directory for pid files belongs to another user than the one who runs set-up. A test that runs as root
+/// must make these users.
 class SetupInAnothersDirectory : public Setup {
 protected:
     static constexpr uid_t NOBODY = 65534;
@@ -229,7 +229,8 @@ protected:
         fs::remove(PidFile());
     }
 
-    /// The program where the other user can reach it, run on data of that user's own.
+    /// Runs a copy of the program as the other user, who can reach the copy and has a data directory of its
+    /// own.
     Outcome RunSetupAsNobody() const {
         const auto root = fs::path(Data()).parent_path();
         fs::permissions(root, fs::perms{0755});
@@ -340,7 +341,7 @@ TEST_F(Setup, RenamesNothingInADryRun) {
 }
 
 TEST_F(Setup, MakesNoStoreBesideALeftOverLogThatItCannotRename) {
-    // What something is mounted on cannot be renamed, not even by root.
+    // A directory on which something is mounted cannot be renamed, not even by root.
     const std::string withMounts = "unshare --user --map-root-user --mount ";
     if (Run(withMounts + "true").exitCode != 0)
         GTEST_SKIP() << "this machine does not allow user namespaces";

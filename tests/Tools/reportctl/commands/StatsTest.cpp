@@ -43,7 +43,7 @@ TEST_F(Stats, CountByHourOfLocalTimeOrOfUtc) {
 }
 
 TEST_F(Stats, CountByDay) {
-    InsertMany(7200); // until 00:13:19 of the next day, UTC
+    InsertMany(7200); // one each second, until 00:13:19 UTC of the next day
     Insert("'e'", "''", "'-1'");
     Insert("'e'", "''", "'never'");
     EXPECT_EQ(Json("--by day --utc"), R"([{"key":"1969-12-31","count":1},{"key":"2023-11-14","count":6400},)"

@@ -10,7 +10,7 @@ using reportctl::log::Line;
 using reportctl::log::Outcome;
 using ::testing::ElementsAre;
 
-/// The lines of a service, given one by one.
+/// Gives the lines of a service's log to the class, one by one.
 class LogPairing : public ::testing::Test {
 protected:
     void Take(const std::string& site, const std::string& function, int level, const std::string& message,
@@ -32,7 +32,7 @@ protected:
         Arrive(fmt::format(R"({{"eventID":"{}","value":"{}","createTime":1700000000}})", eventID, value));
     }
 
-    /// How each line ended, with the reason.
+    /// How the report of each line ended, with the reason.
     std::vector<std::string> Ends() {
         std::vector<std::string> ends;
         for (const auto& entry : m_pairing.Entries())

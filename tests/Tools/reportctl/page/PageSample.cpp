@@ -1,5 +1,5 @@
-// page_sample FILE [RELOAD-SECONDS]: writes a page with known numbers and hostile texts, for the browser that
-// looks at it.
+// page_sample FILE [RELOAD-SECONDS]: writes a page with known numbers and hostile texts. A test opens the
+// page in a browser.
 
 #include <cstdlib>
 #include <fstream>
@@ -32,7 +32,7 @@ constexpr auto STATUS =
 
 PageData Sample(int reloadSeconds) {
     PageData data;
-    data.generatedAtMs = 1'795'270'000'000; // a multiple of no hour
+    data.generatedAtMs = 1'795'270'000'000; // not a full hour
     data.reloadSeconds = reloadSeconds;
     data.statusJson = STATUS;
     const auto now = data.generatedAtMs / 900'000;

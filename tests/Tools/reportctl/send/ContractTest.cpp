@@ -8,8 +8,8 @@
 
 namespace {
 
-/// The service in this process, with the real store: what `send` lets pass arrives, and what it refuses does
-/// not.
+/// The service runs in this process, with the real store. Texts that `send` accepts arrive; texts that it
+/// refuses do not.
 class SendContract : public SendFixture {
 protected:
     void SetUp() override {
@@ -22,7 +22,7 @@ protected:
 
     void TearDown() override { m_service.Stop(); }
 
-    /// Sends these lines with all their errors, and waits until the service has handled them.
+    /// Sends these lines in spite of their errors, and waits until the service has handled them.
     void SendAnyway(const std::string& lines) {
         const auto outcome = Send(FileOf(lines + AN_END) + "--anyway");
         ASSERT_EQ(outcome.exitCode, 0) << outcome.output;
@@ -38,8 +38,9 @@ private:
         return std::stoi(Ask("select count(*) from OperLog where " + condition));
     }
 
-    /// A report whose row tells that everything before it has been handled: the store commits the rows of a
-    /// burst together and in order. The user of before it may be one with whom nothing is stored.
+    /// The last lines that a test sends. The row of the report shows that everything before it has been
+    /// handled, because the store commits the rows of a burst together and in order. A sign-in comes first:
+    /// the user before it may have a text with which no row can be stored.
     static constexpr auto AN_END = R"({"msgType":"updateOpenID","exdata":{"openID":"u","hublinkVersion":"1"}}
 {"eventID":"the end","createTime":1700000000})";
 

@@ -12,7 +12,8 @@ protected:
         return "{\"eventID\":\"B" + std::to_string(number) + "\",\"createTime\":1700000000}";
     }
 
-    /// Starts `reportctl send -` with a pipe that the test writes line by line; what it says goes to a file.
+    /// Starts `reportctl send -` with a pipe to which the test writes line by line. The program's output goes
+    /// to a file.
     FILE* StartOnAPipe() const {
         const auto command = "'" REPORTCTL "' send - >'" + Data() + "/said' 2>&1";
         return ::popen(command.c_str(), "w");
@@ -115,7 +116,8 @@ TEST_F(SendLines, StopsAtTheFirstLineWhenNobodyListens) {
 }
 
 TEST_F(SendLines, SendsALineAsSoonAsItIsWrittenAndStopsWhenTheListenerGoes) {
-    FILE* const pipe = StartOnAPipe(); // before there is a socket that it would inherit and keep open
+    // Before the listener's socket, because the program would inherit it and keep it open.
+    FILE* const pipe = StartOnAPipe();
     ASSERT_NE(pipe, nullptr);
     {
         Listener listener;
@@ -136,7 +138,7 @@ TEST_F(SendLines, KeepsThePace) {
         lines += Line(number) + "\n";
     const auto start = std::chrono::steady_clock::now();
     EXPECT_EQ(Send(FileOf(lines) + "--rate 100").exitCode, 0);
-    // 20 intervals of 10 ms, less the lateness that is made up for.
+    // 20 intervals of 10 ms, minus 5 ms because a late line is followed by shorter intervals.
     EXPECT_GE(std::chrono::steady_clock::now() - start, std::chrono::milliseconds(195));
 }
 

@@ -7,7 +7,7 @@ const std::string NOT_SENT = "dry run: would send 0 messages (0 bytes); left out
 
 class SendJudgement : public SendFixture {
 protected:
-    /// What is said about a text, line by line, and nothing else: "" when it is good.
+    /// What the program says about a text, without its other output; empty when the text is good.
     std::string Said(const std::string& text) const {
         const auto outcome = Send(FileOf(text) + "--dry-run");
         const bool isSent = outcome.exitCode == 0;

@@ -13,7 +13,7 @@ using ::testing::ElementsAre;
 
 namespace {
 
-/// A pipe that the test writes and the reader reads.
+/// The test writes to a pipe, and the reader reads from it.
 class TheLineReader : public ::testing::Test {
 protected:
     TheLineReader() {

@@ -111,7 +111,7 @@ TEST_F(StatusVerdict, IsDegradedByTooLittleRoom) {
     ExpectDegraded("Only 499 MB are free");
     m_status.disk = {500'000'000, 200'000'000'000};
     ExpectHealthy();
-    m_status.disk = {50'000'000, 1'000'000'000}; // a small one: five of a hundred
+    m_status.disk = {50'000'000, 1'000'000'000}; // a small disk: five per cent are free
     ExpectHealthy();
     m_status.disk = {49'999'999, 1'000'000'000};
     ExpectDegraded("Only 49 MB are free");

@@ -7,12 +7,12 @@
 
 namespace {
 
-/// The view as an analyst's program sees it, over rows that another program may have written, too.
+/// The view as an analyst's program sees it. Another program may have written rows, too.
 class ReportsView : public ReportctlFixture {
 protected:
     void SetUp() override {
         ASSERT_EQ(RunSetup().exitCode, 0);
-        ::setenv("TZ", "UTC-1", 1); // one hour east, in the words of POSIX
+        ::setenv("TZ", "UTC-1", 1); // one hour east of UTC: POSIX reverses the sign
         ::tzset();
     }
     void TearDown() override {

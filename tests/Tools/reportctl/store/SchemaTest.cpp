@@ -13,7 +13,7 @@ protected:
         EXPECT_EQ(Ask("pragma integrity_check"), "ok");
     }
 
-    /// Set-up fails, says this, and has not touched a byte of the store.
+    /// Expects that set-up fails, prints this reason, and does not change a byte of the store.
     void ExpectLeftAlone(const std::string& reason) const {
         const auto before = ContentOf(Store());
         const auto outcome = RunSetup("--open-id u1");
@@ -22,8 +22,8 @@ protected:
         EXPECT_EQ(ContentOf(Store()), before);
     }
 
-    /// What kill -9 leaves of a store when the service had run these statements: what they wrote is in the
-    /// log alone.
+    /// Leaves the files that remain when a service runs these statements and is then killed: the changes are
+    /// in the write-ahead log only.
     void RunInAServiceThatIsKilled(const std::string& sql) const {
         namespace fs = std::filesystem;
         const auto aside = Data() + "/aside";
@@ -39,7 +39,7 @@ protected:
         ASSERT_GT(fs::file_size(Log()), 0u);
     }
 
-    /// Set-up ends like this, says this, and changes neither the store nor its log.
+    /// Expects this exit code and text of set-up, and that neither the store nor its log changes.
     void ExpectUntouched(const std::string& arguments, int exitCode, const std::string& text) const {
         const auto store = ContentOf(Store());
         const auto log = ContentOf(Log());

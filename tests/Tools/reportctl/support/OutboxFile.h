@@ -6,7 +6,7 @@
 
 #include "Modules/MetrikSdk/outbox/OutboxSchema.h"
 
-/// Makes an outbox as the service leaves it: one event waits, two were refused.
+/// Makes an outbox as the service leaves it: one event is waiting, two were refused.
 inline void MakeOutbox(const std::string& path) {
     SQLite::Database outbox(path, SQLite::OPEN_READWRITE | SQLite::OPEN_CREATE);
     outbox.exec("pragma journal_mode = wal");

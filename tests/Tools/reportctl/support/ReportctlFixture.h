@@ -15,7 +15,7 @@
 #include "tests/support/ModeOf.h"
 #include "tests/support/TemporaryDirectory.h"
 
-/// Runs reportctl with a home and a preferences directory of the test's own.
+/// Runs reportctl with a data directory and a preferences directory of the test.
 class ReportctlFixture : public testing::Test {
 protected:
     struct Outcome {
@@ -25,8 +25,8 @@ protected:
         bool Says(const std::string& text) const { return output.find(text) != std::string::npos; }
     };
 
-    /// Runs `reportctl setup` with these arguments; `shell` is what the shell does before, such as
-    /// "umask 0 &&".
+    /// Runs `reportctl setup` with these arguments. `shell` is shell text that comes before the command, such
+    /// as "umask 0 &&".
     Outcome RunSetup(const std::string& arguments = {}, const std::string& shell = {}) const {
         return Reportctl("setup --preferences-dir '" + Preferences() + "' " + arguments, shell);
     }
@@ -52,7 +52,7 @@ protected:
     std::string Database() const { return Data() + "/hublink/database"; }
     std::string Store() const { return Database() + "/Report.db"; }
 
-    /// Everything below the test's directory: each path with its mode, each file with its content.
+    /// All that is below the test's directory: each path with its mode, and each file with its content.
     std::map<std::string, std::string> Everything() const {
         std::map<std::string, std::string> all;
         for (const auto& entry : std::filesystem::recursive_directory_iterator(m_directory.Path()))
@@ -61,7 +61,7 @@ protected:
         return all;
     }
 
-    /// A database that a user made by hand, where set-up looks for one.
+    /// Makes a database by hand, as a user may have done, at the place where set-up looks for one.
     void MakeStore(const std::string& sql) const {
         std::filesystem::create_directories(Database());
         SQLite::Database(Store(), SQLite::OPEN_READWRITE | SQLite::OPEN_CREATE).exec(sql);

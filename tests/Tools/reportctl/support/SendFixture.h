@@ -5,10 +5,10 @@
 
 #include "tests/Tools/reportctl/support/ReportctlFixture.h"
 
-/// Listens where the service would, and runs `reportctl send`.
+/// Listens on the service's port, and runs `reportctl send`.
 class SendFixture : public ReportctlFixture {
 protected:
-    /// Stands in for the service: takes what arrives and reads nothing into it.
+    /// Listens in place of the service, and does not interpret what arrives.
     class Listener {
     public:
         Listener() : m_socket(Poco::Net::SocketAddress("127.0.0.1", 9997)) {
@@ -22,8 +22,7 @@ protected:
             return text;
         }
 
-        /// Whether everything that was sent has been received. A datagram over loopback has arrived when its
-        /// sender goes on.
+        /// Whether nothing is left to receive. Over loopback, a datagram has arrived when its send() returns.
         bool IsEmpty() { return !m_socket.poll(Poco::Timespan(0), Poco::Net::Socket::SELECT_READ); }
 
     private:
@@ -36,7 +35,7 @@ protected:
         return Reportctl("send " + arguments, shell);
     }
 
-    /// A file with this content, as an argument.
+    /// Makes a file with this content. Returns the argument that names it.
     std::string FileOf(const std::string& content) const {
         const auto path = Data() + "/lines";
         std::ofstream(path, std::ios::binary) << content;

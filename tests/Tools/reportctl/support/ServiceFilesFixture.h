@@ -9,8 +9,8 @@
 #include "tests/Tools/reportctl/support/OutboxFile.h"
 #include "tests/Tools/reportctl/support/RowsFixture.h"
 
-/// All that a service leaves behind: store, outbox, log and ledger, with texts in them that would drive a
-/// terminal, leave their field, or are no UTF-8.
+/// All files of a service: store, outbox, log and ledger. They hold texts that would control a terminal, that
+/// would break out of their field, or that are not UTF-8.
 class ServiceFilesFixture : public RowsFixture {
 protected:
     void SetUp() override {
@@ -30,7 +30,8 @@ protected:
     std::string Ledger() const { return Data() + "/hublink/run/Report.ledger"; }
     std::array<std::string, 4> Files() const { return {Store(), Outbox(), Log(), Ledger()}; }
 
-    /// What SQLite keeps beside the databases would mend what a test does to them.
+    /// Removes the files that SQLite keeps beside the databases: they would repair the damage that a test
+    /// does.
     void RemoveSideFiles() const {
         for (const auto& database : {Store(), Outbox()})
             for (const auto* suffix : {"-wal", "-shm"})

@@ -15,7 +15,7 @@ using std::chrono::milliseconds;
 
 const TimePoint NOW(milliseconds(1700000000123));
 
-/// The time zone of the process, for as long as this lives.
+/// Sets the time zone of the process while this object exists.
 class TimeZone {
 public:
     explicit TimeZone(const char* zone) {
@@ -52,7 +52,7 @@ TEST(TimeArgument, CountsAnAgeBackFromNow) {
 }
 
 TEST(TimeArgument, TakesADateForItsFirstMomentInLocalTime) {
-    const TimeZone zone("UTC-1"); // one hour east, in the words of POSIX
+    const TimeZone zone("UTC-1"); // one hour east of UTC: POSIX reverses the sign
     EXPECT_EQ(Read("1970-01-02"), 86'400'000 - 3'600'000);
     EXPECT_EQ(Read("1970-01-02T01:00"), 86'400'000);
     EXPECT_EQ(Read("1970-01-02 01:00:01.5"), 86'400'000 + 1'500);
