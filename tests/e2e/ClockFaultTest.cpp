@@ -11,7 +11,7 @@
 
 using ::testing::ElementsAre;
 
-// A wall clock that steps changes the times that are written down, and nothing else.
+// When the wall clock jumps, only the times change that are written down.
 
 namespace {
 
@@ -25,7 +25,7 @@ protected:
         m_service.Start();
     }
 
-    /// Reports are stored and events delivered, all of them, and as soon as ever.
+    /// Expects that all reports are stored and all events delivered, and as quickly as usual.
     void ExpectEverythingToGoOn() {
         for (int i = 0; i < 20; ++i) {
             Service::Send(R"({"eventID":"B1"})");
@@ -39,13 +39,13 @@ protected:
         EXPECT_THAT(Outbox(), ElementsAre(all + "|" + all + "|0")) << "stored, delivered, dropped";
     }
 
-    /// The last line of the log has the time that the service's clock shows.
+    /// Expects that the last line of the log has the time of the service's clock, which is `ahead`.
     void ExpectTheLogToBeAhead(std::chrono::seconds ahead) const {
         const std::string log = m_service.Log();
         std::istringstream line(log.substr(log.rfind('\n', log.size() - 2) + 1));
         std::tm local{};
         line >> std::get_time(&local, "%Y-%m-%d %H:%M:%S");
-        local.tm_isdst = -1; // is to be found out
+        local.tm_isdst = -1; // mktime decides whether it is summer time
         const auto written = std::chrono::system_clock::from_time_t(std::mktime(&local));
         EXPECT_LT(std::chrono::abs(written - (std::chrono::system_clock::now() + ahead)), 1min) << line.str();
     }
@@ -86,7 +86,7 @@ TEST_F(ClockFault, AnHourBackwardsChangesNothingButTheTimes) {
 
 TEST_F(ClockFault, EventsThatWaitWhileItStepsAreDeliveredAtOnce) {
     ExpectEverythingToGoOn();
-    // Each wait for company lasts a second, so that most of these steps meet events that wait.
+    // The uploader waits a second for more events. So most of these jumps happen while events wait.
     for (const auto ahead : {24h * 365, -1h, 0h}) {
         Service::Send(R"({"eventID":"A759|1"})");
         Service::Send(R"({"eventID":"B1"})");

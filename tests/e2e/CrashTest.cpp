@@ -18,11 +18,11 @@ namespace {
 
 using namespace std::chrono_literals;
 
-/// From the fault to the end of the process: the second that is promised, and room for a busy test machine.
-/// Less than the five seconds after which the handler's own deadline would end it.
+/// How long the process may take from the fault to its end: the promised second, and more for a busy test
+/// machine. It is less than the five seconds after which the handler's alarm would end the process.
 constexpr auto DEADLINE = 4s;
 
-/// What puts the service under load.
+/// Puts the service under load.
 void SendReports(int count) {
     for (int i = 0; i < count; ++i)
         Service::Send(R"({"eventID":"B1","value":{"a":1}})");
@@ -42,14 +42,15 @@ protected:
         return m_service.LogLines("App/ReportServer:111 SetBaseInfo").back().thread;
     }
 
-    /// The process ended with 0, and the crashed thread left its trace, and no other thread did.
+    /// Expects that the process ended with 0, and that the crashed thread left its trace and no other thread
+    /// did.
     void ExpectATraceOf(pid_t thread) {
         ExpectATrace();
         for (const auto& signal : m_service.LogLines("App/MiniDump:240 OnStackCallBack"))
             EXPECT_EQ(signal.thread, thread);
     }
 
-    /// The process ended with 0, and one of its threads left its trace.
+    /// Expects that the process ended with 0, and that exactly one of its threads left a trace.
     void ExpectATrace() {
         EXPECT_EQ(m_service.AwaitEnd(DEADLINE), 0);
         const auto signals = m_service.LogLines("App/MiniDump:240 OnStackCallBack");
@@ -57,7 +58,7 @@ protected:
         EXPECT_EQ(signals[0].level, "ERROR");
         EXPECT_EQ(signals[0].message, "Signal[11]");
         auto frames = m_service.LogLines("App/MiniDump:252 OnStackCallBack");
-        // A sanitizer's backtrace stands before the C library's, and so does its frame.
+        // A sanitizer replaces the C library's backtrace, and its own frame is in the trace.
         std::erase_if(frames,
                       [](const auto& frame) { return frame.message.find("san.so") != std::string::npos; });
         EXPECT_GE(frames.size(), 3U);
@@ -94,12 +95,12 @@ TEST_F(Crash, OfTheConsumingThreadIsTraced) {
 TEST_F(Crash, UnderLoadIsTraced) {
     SendReports(2000);
     m_service.Signal(SIGSEGV);
-    ExpectATrace(); // of the main thread, which the kernel prefers, or of one that was just then started
+    ExpectATrace(); // of the main thread, which the kernel prefers, or of a thread that was just started
 }
 
 TEST_F(Crash, OfAThreadAtWorkEndsTheProcess) {
-    // The fault may hit a thread while it holds the allocator's lock; then the trace is lost, but not the
-    // end.
+    // The fault may come while the thread holds the allocator's lock. Then the trace is lost, but the process
+    // still ends.
     int traced = 0;
     constexpr int CRASHES = 6;
     for (int i = 0; i < CRASHES; ++i) {

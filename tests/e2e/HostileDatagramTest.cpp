@@ -8,16 +8,16 @@
 #include "tests/e2e/support/HostileDatagrams.h"
 #include "tests/e2e/support/HostileFixture.h"
 
-// What any user of the machine may send: the service goes on, writes only its own files and takes the next
-// report.
+// Datagrams that any user of the machine may send. The service must go on, write only its own files and take
+// the next report.
 
 namespace {
 
 struct Barrage {
     const char* name;
     Hostile::Datagrams (*datagrams)();
-    int rows;   ///< That it adds to the store; ALL when each datagram adds one.
-    int events; ///< That it adds to the outbox.
+    int rows;   ///< The rows that it adds to the store; ALL when each datagram adds one.
+    int events; ///< The events that it adds to the outbox.
 };
 constexpr int ALL = -1;
 
@@ -25,13 +25,15 @@ void PrintTo(const Barrage& barrage, std::ostream* out) {
     *out << barrage.name;
 }
 
-// Where a text is put in every field, the products are texts times reports that are sound beside it.
+// A product is the number of texts times the number of valid reports that each text gives, because each text
+// is put into every field.
 const Barrage BARRAGES[] = {
     {"OpeningBrackets", Hostile::Brackets, 0, 0},
     {"DeepNesting", Hostile::DeepNesting, 0, 0},
     {"NestingAtTheLimit", Hostile::NestingAtTheLimit, 1, 1},
     {"InvalidUtf8", Hostile::InvalidUtf8, 0, 0},
-    {"ZeroCharacters", Hostile::ZeroCharacters, 3 * 3, 3 * 9}, // which end a statement, but not JSON in one
+    // A zero character ends a statement, but not the JSON within one.
+    {"ZeroCharacters", Hostile::ZeroCharacters, 3 * 3, 3 * 9},
     {"HugeNumbers", Hostile::HugeNumbers, 0, 0},
     {"NumbersThatVanish", Hostile::NumbersThatVanish, 4 * 4, 4 * 3},
     {"DuplicateAndEmptyKeys", Hostile::DuplicateAndEmptyKeys, 5, 0},
@@ -41,11 +43,11 @@ const Barrage BARRAGES[] = {
     {"ForgedRecords", Hostile::ForgedRecords, 0, 0},
     {"EscapedForgedRecords", Hostile::EscapedForgedRecords, 4 * 6, 4 * 9},
     {"TerminalEscapes", Hostile::TerminalEscapes, 8 * 6, 8 * 9},
-    {"Sql", Hostile::Sql, 25 * 2, 25 * 9}, // no statement holds the day mark, or a member that is not read
+    {"Sql", Hostile::Sql, 25 * 2, 25 * 9}, // the day mark, and a member that is not read, are in no statement
     {"SqlThatFits", Hostile::SqlThatFits, ALL, 0},
 };
 
-/// The beginnings of database directories, all of them where every user of the machine may write.
+/// Paths of database directories, all of them where every user of the machine may write.
 std::vector<std::string> HostilePaths(const std::string& elsewhere) {
     return {elsewhere + "/honest",
             elsewhere + "/a/../b/./c//",
@@ -73,14 +75,14 @@ std::string Announcement(const std::string& module, const std::string& dbPath, c
 
 class HostileModule : public HostileFixture {
 protected:
-    /// Nothing was made there, and nothing at the top of the file system.
+    /// Expects that nothing was made in this directory or in the root directory.
     void ExpectNothingIn(const std::string& elsewhere) {
         EXPECT_TRUE(std::filesystem::is_empty(elsewhere));
         EXPECT_EQ(EntriesOfTheRoot(), m_root);
     }
 
 private:
-    /// Where a relative path of enough upward steps leads.
+    /// A relative path with enough ".." leads to the root directory.
     static std::set<std::string> EntriesOfTheRoot() {
         std::set<std::string> names;
         for (const auto& entry : std::filesystem::directory_iterator("/"))

@@ -5,7 +5,7 @@
 #include "tests/e2e/support/Ledger.h"
 #include "tests/support/WaitUntil.h"
 
-// What comes while the service cannot receive waits in the kernel, as much as has room there.
+// Datagrams that arrive while the service cannot receive wait in the kernel, as long as there is room.
 
 TEST(IntakeFault, AStoppedServiceLosesWhatDoesNotFitTheSocketAndStoresTheRest) {
     Service service;

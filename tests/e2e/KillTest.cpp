@@ -16,11 +16,12 @@
 
 using ::testing::ElementsAre;
 
-// kill -9 at random moments under load, each time followed by a restart. Ten times, or as often as you say:
+// kill -9 at random moments under load, each time followed by a restart. It is done ten times, or as often as
+// SSR_KILLS says:
 //
 //     SSR_KILLS=100 tests/in-sandbox build/release/tests/e2e_tests/e2e_tests --gtest_filter='Kill.*'
 //
-// SSR_SEED=<the number that a run printed> chooses the same moments again.
+// A run prints its seed. SSR_SEED=<that number> chooses the same moments again.
 
 namespace {
 
@@ -35,11 +36,11 @@ constexpr auto READY_WITHIN = 30s;
 #else
 constexpr int RATE = 20'000;
 constexpr unsigned KILLS = 10;
-constexpr auto READY_WITHIN = 1s; // a report that is sent to the restarted service is in the store
+constexpr auto READY_WITHIN = 1s; // from the start until a report that was sent after it is in the store
 #endif
 
-constexpr std::int64_t EVERY_NTH_EVENT = 20; // goes to analytics
-constexpr unsigned EVERY_NTH_AT_START = 4;   // of the kills hits a service that is starting
+constexpr std::int64_t EVERY_NTH_EVENT = 20; // every 20th report goes to analytics
+constexpr unsigned EVERY_NTH_AT_START = 4;   // every 4th kill hits a service that is starting
 constexpr int LONGEST_LIFE_MS = 400;
 constexpr int LONGEST_START_MS = 60;
 
@@ -61,7 +62,7 @@ public:
         m_thread.join();
     }
 
-    /// No report with a higher number has been sent.
+    /// The number of the last report that was sent.
     std::int64_t Sent() const { return m_sent; }
 
 private:
@@ -75,7 +76,7 @@ private:
                 Service::Send(R"({"eventID":")" + std::string(event ? "A759|" : "B1|") +
                               std::to_string(number) + R"(","value":)" + ValueOf(number) + "}");
             }
-            std::this_thread::sleep_for(1ms); // the pace
+            std::this_thread::sleep_for(1ms); // keeps the rate
         }
     }
 
@@ -84,8 +85,8 @@ private:
     std::thread m_thread;
 };
 
-/// What a reader with a connection of its own has seen in the store: the number of each row's report, by the
-/// row's id.
+/// The rows that a reader with its own connection has seen in the store: the number of each row's report, by
+/// the row's id.
 class Reader {
 public:
     explicit Reader(std::string file) : m_file(std::move(file)) {}
@@ -93,13 +94,14 @@ public:
     void Open() { m_database.emplace(m_file, SQLite::OPEN_READWRITE, 10'000); }
     void Close() { m_database.reset(); }
 
-    /// Notes the rows that have been committed since; the newest one's number.
+    /// Reads the rows that were committed since the last call. Returns the number of the newest one.
     std::int64_t Continue() {
         ForEachRow(m_numbers.size(), [this](std::int64_t number) { m_numbers.push_back(number); });
         return m_numbers.empty() ? 0 : m_numbers.back();
     }
 
-    /// That all rows which were seen are there, as they were. Those before the last call were looked at then.
+    /// Expects that all rows that were seen are still there, unchanged. Each call checks the rows since the
+    /// call before.
     void ExpectWhatWasSeen() {
         auto at = m_verified;
         ForEachRow(m_verified, [&](std::int64_t number) {
@@ -116,7 +118,8 @@ public:
     const std::vector<std::int64_t>& Numbers() const { return m_numbers; }
 
 private:
-    /// Hands on the numbers of the rows behind that one, and looks at their ids and values.
+    /// Calls `action` with the number of each row after the one with id `behind`, and checks the rows' ids
+    /// and values.
     template <typename Action>
     void ForEachRow(std::size_t behind, Action action) {
         SQLite::Statement query(*m_database, "select id, substr(eventID, 4), value, pType from OperLog "
@@ -148,13 +151,13 @@ protected:
         m_service.Install();
     }
 
-    /// Starts the service, and waits until a report that was sent after that is in the store.
+    /// Starts the service, and waits until a report that was sent after the start is in the store.
     void StartAndTakeReports(const Load& load) {
         const auto begin = Clock::now();
         const auto sent = load.Sent();
         m_service.Launch();
-        ASSERT_TRUE(
-            WaitUntil([] { return Service::Bound(); }, 10s)); // before, the reader would do its repairs
+        // Earlier, the reader instead of the service would recover the store.
+        ASSERT_TRUE(WaitUntil([] { return Service::Bound(); }, 10s));
         m_reader.Open();
         ASSERT_TRUE(WaitUntil([&] { return m_reader.Continue() > sent; }, READY_WITHIN + 10s));
         const Milliseconds took = Clock::now() - begin;
@@ -164,7 +167,7 @@ protected:
         m_longestStart = std::max(m_longestStart, took);
     }
 
-    /// Lets it live for a random time, up to which the reader looks, and ends it.
+    /// Lets the service run for a random time, in which the reader reads, and then kills it.
     void KillUnderLoad(const Load& load, bool readerStays) {
         const auto moment = Clock::now() + Random(LONGEST_LIFE_MS);
         WaitUntil([&] {
@@ -172,7 +175,8 @@ protected:
             return Clock::now() >= moment;
         });
         m_events = EventCount();
-        if (!readerStays) // then the next start finds a log that no process has open, and recovers it
+        // Then the next start finds a write-ahead log that no process has open, and recovers it.
+        if (!readerStays)
             m_reader.Close();
         End(load);
     }
@@ -191,10 +195,11 @@ protected:
         ExpectTrueLedger();
     }
 
-    /// What was received has ended or is lost, and nothing that was counted before is gone.
+    /// Expects that every received report has ended or is lost, and that no counter became smaller.
     void ExpectTrueLedger() {
         const auto books = m_service.Books();
-        if (books.sight == ReportLedger::Sight::Missing) // the first one was killed before it made one
+        // The first process was killed before it made the file.
+        if (books.sight == ReportLedger::Sight::Missing)
             return;
         ASSERT_EQ(books.sight, ReportLedger::Sight::Sound);
         EXPECT_FALSE(books.counting);
@@ -216,7 +221,7 @@ protected:
                     ElementsAre("1|1"));
     }
 
-    /// Rows are in the order in which their reports were sent, and what is missing between two of them was
+    /// Expects that rows are in the order in which their reports were sent, and that each missing number was
     /// lost by a kill or dropped by the kernel.
     void ExpectOrderWithoutGaps() {
         const auto& numbers = m_reader.Numbers();
@@ -243,12 +248,13 @@ protected:
     Reader m_reader{m_service.DatabaseFile()};
     const unsigned m_seed;
     std::mt19937 m_random;
-    std::vector<std::int64_t> m_killedAt; ///< What had been sent when the process was gone.
-    std::int64_t m_dropped = 0;           ///< By the kernel, while the service listened.
-    std::int64_t m_events = 0;            ///< In the outbox before the last kill.
-    std::int64_t m_mostLost = 0;          ///< Reports that were sent, and not in the store when a kill came.
+    /// The last number that was sent when the process was gone, for each kill.
+    std::vector<std::int64_t> m_killedAt;
+    std::int64_t m_dropped = 0;  ///< Dropped by the kernel while the service listened.
+    std::int64_t m_events = 0;   ///< The events in the outbox before the last kill.
+    std::int64_t m_mostLost = 0; ///< The most reports that were sent but not stored when a kill came.
     Milliseconds m_longestStart{0};
-    ReportLedger::Counts m_counted{}; ///< By the ledger, at the last kill.
+    ReportLedger::Counts m_counted{}; ///< The ledger's counters at the last kill.
 };
 
 } // namespace

@@ -9,7 +9,7 @@
 #include "tests/support/ModeOf.h"
 #include "tests/support/WaitUntil.h"
 
-// What the real service counts in its file, and that the file never costs it anything.
+// What the real service counts in its file. Nothing that happens to the file may lose a report.
 
 namespace {
 
@@ -20,14 +20,14 @@ class ServicesLedger : public ::testing::Test {
 protected:
     ServicesLedger() { m_service.Install(); }
 
-    /// That the service works, and where it counts.
+    /// Expects that the service stores a report, wherever it counts.
     void ExpectReportsToBeStored() {
         Service::Send(R"({"eventID":"B1"})");
         m_service.AwaitQuiet();
         EXPECT_EQ(m_service.RowCount(), 1);
     }
 
-    /// Waits until all of it has ended.
+    /// Waits until this many datagrams have been received and have ended. Returns the counts.
     ReportLedger::Counts AwaitEndOf(std::uint64_t datagrams) {
         EXPECT_TRUE(WaitUntil([&] {
             const auto counts = m_service.Books().total;
@@ -114,7 +114,7 @@ TEST_F(ServicesLedger, CountsWhatWaitedWhenTheServiceWasKilledAsLost) {
     m_service.Start();
     m_service.AwaitQuiet();
     SQLite::Database other(m_service.DatabaseFile(), SQLite::OPEN_READWRITE, 10'000);
-    other.exec("begin immediate"); // the store waits for this one
+    other.exec("begin immediate"); // the store waits for this transaction
     for (int i = 0; i < 10; ++i)
         Service::Send(R"({"eventID":"B1"})");
     EXPECT_TRUE(WaitUntil([&] { return m_service.Counted(ReportLedger::QUEUED) == 11; }));

@@ -12,14 +12,14 @@
 #include "tests/e2e/support/Service.h"
 #include "tests/support/WaitUntil.h"
 
-// A long run of reports at a fixed rate: every one of them ends somewhere, in order, and the ledger adds up.
+// A long run of reports at a fixed rate: each one ends somewhere, in order, and the ledger's counts add up.
 
 namespace {
 
 using namespace std::chrono_literals;
 
 #if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
-constexpr int REPORTS = 10'000; // a sanitized program is many times slower, and a loss there tells nothing
+constexpr int REPORTS = 10'000; // a program with a sanitizer is much slower, so a loss there shows nothing
 constexpr int RATE = 1'000;     // reports a second
 #else
 constexpr int REPORTS = 100'000;
@@ -32,9 +32,9 @@ int ReportCount() {
     return asked != nullptr ? std::atoi(asked) : REPORTS;
 }
 
-constexpr int STRETCH = 200'000;     // of reports, whose lines the log keeps
-constexpr int EVERY_NTH_EVENT = 10;  // goes to analytics
-constexpr int EVERY_NTH_BROKEN = 97; // is no JSON
+constexpr int STRETCH = 200'000;     // so many reports that the log still keeps all their lines
+constexpr int EVERY_NTH_EVENT = 10;  // every 10th report goes to analytics
+constexpr int EVERY_NTH_BROKEN = 97; // every 97th report is no JSON
 
 bool IsBroken(int i) {
     return i % EVERY_NTH_BROKEN == 0;
@@ -51,21 +51,21 @@ std::string Report(int i) {
            R"(","value":{"button":"save","page":"editor","count":3,"text":"as people write it"},"createTime":1700000000})";
 }
 
-/// Looks now and then.
+/// Sends the reports at RATE, and calls `look` after every thousand.
 template <typename Action>
 void SendAtRate(int first, int end, Action look) {
     const auto begin = std::chrono::steady_clock::now();
     for (int i = first; i < end; ++i) {
         const auto due = begin + std::chrono::microseconds(1'000'000LL * (i - first) / RATE);
         if (std::chrono::steady_clock::now() < due)
-            std::this_thread::sleep_until(due); // the pace, not a wait for anything
+            std::this_thread::sleep_until(due); // keeps the rate; no condition is waited for
         Service::Send(Report(i));
         if (i % 1000 == 0)
             look();
     }
 }
 
-/// Counts the log's lines, each once, as long as it is asked before the logger deletes its oldest file.
+/// Counts each line of the log once, if it is called often enough: before the logger deletes its oldest file.
 class LogCount {
 public:
     explicit LogCount(std::string directory) : m_directory(std::move(directory)) {}
@@ -75,7 +75,7 @@ public:
             std::ifstream log(entry.path());
             std::string first;
             std::getline(log, first);
-            std::streamoff& read = m_read[first]; // which a file keeps when it is rotated
+            std::streamoff& read = m_read[first]; // the first line stays the same when a file is rotated
             log.seekg(read);
             for (std::string line; std::getline(log, line);) {
                 read += static_cast<std::streamoff>(line.size()) + 1;
@@ -89,7 +89,8 @@ public:
 
 private:
     std::string m_directory;
-    std::map<std::string, std::streamoff> m_read; ///< How much of each file, by its first line.
+    /// How many bytes of each file have been read. The key is the file's first line.
+    std::map<std::string, std::streamoff> m_read;
     int m_refused = 0;
     int m_received = 0;
 };

@@ -14,7 +14,7 @@
 using ::testing::IsEmpty;
 using ::testing::MatchesRegex;
 
-// A log that cannot be written costs lines of the log and nothing else, and goes on by itself.
+// A log that cannot be written loses lines of the log and nothing else, and recovers by itself.
 
 namespace {
 
@@ -27,13 +27,14 @@ protected:
         m_service.Start();
     }
 
-    /// So many reports, all of them stored.
+    /// Sends this many reports, and expects that all are stored.
     void Store(int count) {
         m_ledger.Report(count);
         EXPECT_TRUE(WaitUntil([&] { return m_ledger.Stored() == Ledger::Range(0, m_ledger.Next()); }, 60s));
     }
 
-    /// A report that comes now is a line of the log, within what the log allows itself.
+    /// Expects that a new report gets its line in the log. The logger needs a moment to try again, so several
+    /// reports are sent.
     void ExpectToGoOn() {
         EXPECT_TRUE(WaitUntil([&] {
             Store(1);
@@ -45,7 +46,7 @@ protected:
         return std::to_string(m_ledger.Next() - 1) + R"(","value":{"text":"as people write it"}})";
     }
 
-    /// How many reports have a line.
+    /// How many reports have a line in the log.
     int Received() const { return Matches(R"(App/ReportServer:42 Recv\] .*as people write it"\}\}$)"); }
 
     int Matches(const std::string& form) const {
@@ -58,7 +59,8 @@ protected:
         return matches;
     }
 
-    /// The log says once how many records it lacks, and it lacks no more.
+    /// Expects that the log says once how many records are missing, that this number is right, and that no
+    /// more are missing.
     void ExpectOneGap(const std::string& reason) {
         const Poco::RegularExpression form(
             R"(WARN  \[\d+:\d+\] \[Modules/BoostLogger:\d+ ReportLoss\] (\d+) records could not be written: (.*))");
@@ -118,7 +120,7 @@ TEST_F(LogFault, WhatAFullDiskKeepsOutOfTheLogIsNotKeptInMemory) {
     };
     send(10);
     const auto before = m_service.ResidentKilobytes();
-    send(50); // 10 MB of lines
+    send(50); // these are 10 MB of lines
     EXPECT_LT(m_service.ResidentKilobytes() - before, 5'000);
 }
 
@@ -142,7 +144,8 @@ TEST_F(LogFault, ADirectoryThatMayOnlyBeReadForATimeCostsLinesWhoseNumberIsLogge
     InstallAndStart();
     Store(20);
     {
-        const Disk other(Directory(), 1'000'000); // is in the log's place, until this block ends
+        // Mounted over the log's directory until the end of this block.
+        const Disk other(Directory(), 1'000'000);
         other.ForbidWriting();
         EXPECT_TRUE(WaitUntil([&] {
             Store(1);
@@ -174,7 +177,7 @@ TEST_F(LogFault, AFileSizeLimitDoesNotEndTheService) {
     constexpr rlim_t LIMIT = 1'000'000;
     m_service.Install();
     {
-        const FileSizeLimit limit(LIMIT); // which the service inherits
+        const FileSizeLimit limit(LIMIT); // the service inherits it
         m_service.Start();
     }
     for (int i = 0; i < 300; ++i)
@@ -203,7 +206,7 @@ TEST_F(LogFault, ADiskThatIsFullForLogAndStoreCostsReportsWithoutATrace) {
     EXPECT_TRUE(std::ranges::includes(stored, Ledger::Range(first, m_ledger.Next())));
     EXPECT_LT(stored.size() + m_ledger.Lost().size(), 1000U);
     const auto isTold = [this] {
-        m_ledger.Report(); // the log is tried again four times a second, with what comes then
+        m_ledger.Report(); // each new line lets the logger try again, four times a second at most
         return Matches("records could not") >= 1;
     };
     EXPECT_TRUE(WaitUntil(isTold));

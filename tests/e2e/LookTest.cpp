@@ -12,7 +12,7 @@
 using ::testing::HasSubstr;
 using ::testing::Not;
 
-// What reportctl shows of a service that runs.
+// What reportctl shows of a running service.
 
 namespace {
 
@@ -25,7 +25,7 @@ protected:
         m_service.Start();
     }
 
-    /// What this command adds to the output.
+    /// Runs reportctl, and returns what it printed.
     std::string Reportctl(const std::vector<std::string>& arguments, int exitCode = 0) const {
         const auto before = m_service.Output().size();
         EXPECT_EQ(m_service.Reportctl(arguments), exitCode);
@@ -94,7 +94,8 @@ TEST_F(Look, ARetriedDeadLetterIsDeliveredByTheServiceThatRuns) {
     status = 200;
     EXPECT_THAT(Reportctl({"outbox", "test"}), HasSubstr("of the running service, process "));
     EXPECT_THAT(Reportctl({"outbox", "retry", "--all"}), HasSubstr("1 put back\n"));
-    Service::Send(R"({"eventID":"A759|2","value":{"a":1}})"); // else the uploader looks after half a minute
+    // Otherwise the uploader looks only after half a minute.
+    Service::Send(R"({"eventID":"A759|2","value":{"a":1}})");
     EXPECT_TRUE(WaitUntil([&] { return InOutbox("delivered from outbox_status") == 2; }, 60s));
     EXPECT_EQ(InOutbox("stored from outbox_status"), 3);
     EXPECT_EQ(InOutbox("waiting from outbox_status"), 0);

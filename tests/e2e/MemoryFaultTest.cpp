@@ -9,7 +9,7 @@
 #include "tests/e2e/support/Service.h"
 #include "tests/support/WaitUntil.h"
 
-// The service at a limit of its memory: of its addresses (ulimit -v) or of its data (ulimit -d).
+// The service when it reaches a limit on its memory: on its addresses (ulimit -v) or its data (ulimit -d).
 
 namespace {
 
@@ -27,7 +27,7 @@ long Kilobytes(const Service& service, const std::string& name) {
 struct Limit {
     const char* name;
     decltype(RLIMIT_AS) resource;
-    const char* usage; ///< In the process's status.
+    const char* usage; ///< Its name in the process's status.
 };
 
 class MemoryFault : public ::testing::TestWithParam<Limit> {
@@ -39,7 +39,7 @@ protected:
         for (int i = 1; i < 2000; ++i)
             m_arrayOfTwoThousand += ",1";
         m_arrayOfTwoThousand += "]";
-        SendAndAwaitARow(); // everything that is loaded late is there
+        SendAndAwaitARow(); // now everything is loaded
     }
 
     void SetLimit() {
@@ -64,12 +64,12 @@ protected:
         return m_service.Log().find(":164 JsonToStruct] Std exception :std::bad_alloc") != std::string::npos;
     }
 
-    /// Reports come until there is no memory to take another one.
+    /// Sends reports until there is no memory to take another one.
     void FillTheMemory() {
         EXPECT_TRUE(WaitUntil([&] { return SendLargeReports(50), HasRefusedAtTheReceiver(); }));
     }
 
-    /// A report that is sent while memory is short may be lost, so it is sent until it is stored.
+    /// Sends a report until it is stored, because a report that is sent while memory is short may be lost.
     void SendAndAwaitARow() {
         const std::string eventID = "marker" + std::to_string(++m_markers);
         EXPECT_TRUE(WaitUntil([&] {
@@ -99,7 +99,7 @@ TEST_P(MemoryFault, ABacklogThatFillsTheMemoryCostsReportsAndNotTheService) {
     SetLimit();
     {
         SQLite::Database other(m_service.DatabaseFile(), SQLite::OPEN_READWRITE);
-        other.exec("begin immediate"); // the store waits for it, and the queue grows
+        other.exec("begin immediate"); // the store waits for this transaction, and the queue grows
         FillTheMemory();
         other.exec("commit");
     }
@@ -109,7 +109,7 @@ TEST_P(MemoryFault, ABacklogThatFillsTheMemoryCostsReportsAndNotTheService) {
     EXPECT_EQ(m_service.Process(), process);
     EXPECT_EQ(m_service.Log().find("OnStackCallBack"), std::string::npos);
 
-    constexpr long FREED_KILOBYTES = 1024; // the least: what stays in use lies scattered
+    constexpr long FREED_KILOBYTES = 1024; // at least this much: the memory that stays in use is scattered
     EXPECT_TRUE(WaitUntil([&] {
         return Kilobytes(m_service, GetParam().usage) < m_limitKilobytes - FREED_KILOBYTES;
     })) << Kilobytes(m_service, GetParam().usage)
@@ -117,7 +117,7 @@ TEST_P(MemoryFault, ABacklogThatFillsTheMemoryCostsReportsAndNotTheService) {
     for (const char* suffix : {"", "-wal", "-shm"})
         std::filesystem::remove(m_service.DatabaseFile() + suffix);
     m_service.Install();
-    SendAndAwaitARow(); // for which SQLite maps the new file's memory
+    SendAndAwaitARow(); // SQLite must map memory for the new file
 }
 
 INSTANTIATE_TEST_SUITE_P(AtALimitOf, MemoryFault,

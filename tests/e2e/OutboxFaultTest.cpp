@@ -15,7 +15,7 @@
 using ::testing::ElementsAre;
 using ::testing::MatchesRegex;
 
-// What the user loses when events for analytics cannot be kept or sent, and that it goes on by itself.
+// What is lost when events for analytics cannot be kept or sent, and that the service recovers by itself.
 
 namespace {
 
@@ -23,7 +23,8 @@ using namespace std::chrono_literals;
 
 class OutboxFault : public ::testing::Test {
 protected:
-    static constexpr auto COLLECTOR = "127.0.0.1:4318"; ///< The sandbox's; a test starts the listener.
+    /// An address of the sandbox; each test starts a listener there itself.
+    static constexpr auto COLLECTOR = "127.0.0.1:4318";
 
     void InstallAndStart() {
         m_service.Install();
@@ -34,14 +35,14 @@ protected:
         Service::Send(R"({"eventID":"A759|)" + std::to_string(m_sent++) + R"(","value":{"a":1}})");
     }
 
-    /// So many events, all of them handled. The store must be in order.
+    /// Sends this many events and waits until they are handled. The store must work.
     void SendEvents(int count) {
         for (int i = 0; i < count; ++i)
             SendEvent();
         m_service.AwaitQuiet();
     }
 
-    /// What the SDK told.
+    /// The messages that the SDK gave to its failure callback.
     std::vector<std::string> Told() const {
         std::vector<std::string> messages;
         for (const auto& line : m_service.LogLines("Metrik/MetrikWorker:21 FailCallBackFun"))
@@ -53,7 +54,8 @@ protected:
         return WaitUntil([&] { return Told().size() >= count; }, 30s);
     }
 
-    /// Sends an event at a time until one is kept; what was sent is kept or counted by the second message.
+    /// Sends one event at a time until one is kept. Expects that each event that was sent is kept, or counted
+    /// in the second message.
     void ExpectToGoOnAndToHaveCounted(const std::string& beginning) {
         EXPECT_TRUE(WaitUntil([&] {
             SendEvent();
@@ -107,7 +109,7 @@ TEST_F(OutboxFault, ALockHeldForMoreThanFiveSecondsCostsTheEventsThatComeAfterTh
         SendEvent();
     ASSERT_TRUE(AwaitTold(1));
     EXPECT_GE(std::chrono::steady_clock::now() - begin, 4900ms);
-    m_service.AwaitQuiet(); // the others are refused at once
+    m_service.AwaitQuiet(); // the other events are refused at once
     EXPECT_LT(std::chrono::steady_clock::now() - begin, 10s);
     other.exec("commit");
     ExpectToGoOnAndToHaveCounted("outbox file-Cannot store an event: database is locked");

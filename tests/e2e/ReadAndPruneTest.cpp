@@ -9,8 +9,8 @@
 #include "tests/e2e/support/Service.h"
 #include "tests/support/WaitUntil.h"
 
-// What people do with the store while the service writes to it: nothing that it is sent may be lost or
-// refused.
+// What people do with the store while the service writes to it. No report that is sent meanwhile may be lost
+// or refused.
 
 namespace {
 
@@ -18,12 +18,12 @@ using namespace std::chrono_literals;
 
 constexpr int OLD_ROWS = 150'000;
 #if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
-constexpr int RATE = 200; // reports a second; a sanitized program is many times slower
+constexpr int RATE = 200; // reports a second; a program with a sanitizer is much slower
 #else
 constexpr int RATE = 2'000;
 #endif
 
-/// Sends reports at a fixed rate on a thread of its own, as long as it lives.
+/// Sends reports at a fixed rate on a thread of its own, until Stop.
 class Stream {
 public:
     Stream() : m_thread([this] { Run(); }) {}
@@ -31,7 +31,7 @@ public:
     Stream(const Stream&) = delete;
     Stream& operator=(const Stream&) = delete;
 
-    /// How many it has sent.
+    /// Stops sending. Returns how many reports were sent.
     int Stop() {
         m_stop = true;
         if (m_thread.joinable())
@@ -65,7 +65,8 @@ protected:
         m_service.Start();
     }
 
-    /// All that was sent is stored, nothing was dropped or refused, and the ledger agrees.
+    /// Expects that every report that was sent is stored, that nothing was dropped or refused, and that the
+    /// ledger says the same.
     void ExpectAllStored(int sent) {
         m_service.AwaitQuiet();
         EXPECT_EQ(
@@ -86,8 +87,8 @@ TEST_F(StoreInUse, IsPrunedWithoutAReportLost) {
     Stream reports;
     ASSERT_EQ(m_service.Reportctl({"prune", "--older-than", "2025-01-01", "--yes"}), 0) << m_service.Output();
     const auto walBytes = WalBytes();
-    // The file is cut by the merge of a log that no writer is behind; the service's own may come a little
-    // later.
+    // The file becomes shorter when the write-ahead log has been merged and no writer has newer pages in it.
+    // The service's own merge may come a little later.
     EXPECT_TRUE(WaitUntil([&] { return std::filesystem::file_size(m_service.DatabaseFile()) < before / 2; }))
         << "the space was not given back";
     ExpectAllStored(reports.Stop());
@@ -111,7 +112,7 @@ TEST_F(StoreInUse, IsExportedCountedAndCopiedWithoutAReportLost) {
 TEST_F(StoreInUse, IsCountedByOutcome) {
     Service::Send(R"({"eventID":"new|1","value":"x","createTime":1900000000})");
     Service::Send("no JSON");
-    m_service.AwaitQuiet(); // sends a report itself
+    m_service.AwaitQuiet(); // this also sends a report
     ASSERT_EQ(m_service.Reportctl({"stats", "--by", "outcome", "--json"}), 0);
     EXPECT_NE(m_service.Output().find(R"([{"key":"stored","count":2},{"key":"refused.notJson","count":1}])"),
               std::string::npos)

@@ -9,7 +9,7 @@ using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 using ::testing::StartsWith;
 
-// The road of each kind of message to its end, with nothing but the real program in between.
+// How each kind of message reaches its end, through the real program alone.
 
 namespace {
 
@@ -30,7 +30,7 @@ protected:
                                "join module on module.id = event.module order by event.id");
     }
 
-    /// The messages of one site's log lines.
+    /// The level and message of one site's log lines.
     std::vector<std::string> Messages(const std::string& site) const {
         std::vector<std::string> messages;
         for (const auto& line : m_service.LogLines(site))
@@ -94,7 +94,7 @@ TEST_F(ReportPath, EveryDatagramIsLoggedByTheReceivingThreadAndHandledByAnother)
     Service::Send(R"({"msgType":"updateOpenID","exdata":{"openID":"u1"}})");
     m_service.AwaitQuiet();
     const auto received = m_service.LogLines("App/ReportServer:42 Recv");
-    ASSERT_EQ(received.size(), 3U); // with the marker
+    ASSERT_EQ(received.size(), 3U); // two of these, and the marker
     EXPECT_EQ(received[0].message, R"({"eventID":"B1"})");
     EXPECT_EQ(received[0].level, "INFO");
     EXPECT_EQ(received[0].process, m_service.Process());

@@ -17,13 +17,14 @@
 using ::testing::ElementsAre;
 using ::testing::IsSupersetOf;
 
-// Who may read what the program makes, and who can reach it.
+// Who may read the files that the program makes, and who can send to it.
 
 namespace {
 
 constexpr int PORT = 9997;
 
-/// Local addresses of the UDP sockets with the report port, of both families, as the kernel writes them.
+/// The local addresses of the UDP sockets that have the report port, IPv4 and IPv6, as the kernel writes
+/// them.
 std::vector<std::string> AddressesWithThePort() {
     std::vector<std::string> addresses;
     for (const char* family : {"/proc/net/udp", "/proc/net/udp6"}) {
@@ -50,7 +51,7 @@ protected:
         m_service.Start();
     }
 
-    /// So much that the log begins a second file.
+    /// Sends so much that the log begins a second file.
     void FillALogFile() {
         const std::string report = R"({"eventID":"B1","value":")" + std::string(10'000, 'x') + "\"}";
         for (int i = 0; i < 1100; ++i) {
@@ -92,14 +93,14 @@ TEST_F(Rights, TheOneSocketIsBoundToLoopback) {
 }
 
 TEST_F(Rights, ADatagramToAnotherAddressOfTheMachineIsNotReceived) {
-    ASSERT_EQ(std::system("ip address add 10.1.2.3/32 dev lo"), 0); // the sandbox's
+    ASSERT_EQ(std::system("ip address add 10.1.2.3/32 dev lo"), 0); // the sandbox's device
     for (const std::string host : {"10.1.2.3", "127.0.0.2"})
         SendTo(host, R"({"eventID":"B1"})");
     m_service.AwaitQuiet();
     EXPECT_EQ(m_service.RowCount(), 0);
     EXPECT_EQ(m_service.LogLines("App/ReportServer:42 Recv").size(), 1U) << "that of the marker";
 
-    for (const std::string host : {"10.1.2.3", "127.0.0.2"}) { // where it would have been received
+    for (const std::string host : {"10.1.2.3", "127.0.0.2"}) { // a socket at that address does receive it
         Poco::Net::DatagramSocket there(Poco::Net::SocketAddress(host, PORT));
         SendTo(host, "x");
         EXPECT_TRUE(there.poll(Poco::Timespan(10, 0), Poco::Net::Socket::SELECT_READ)) << host;

@@ -18,7 +18,7 @@ using ::testing::ElementsAre;
 using ::testing::HasSubstr;
 using ::testing::IsEmpty;
 
-// How the program starts, with everything in its place and with each thing missing in turn.
+// How the program starts, with everything in its place and without each thing in turn.
 
 namespace {
 
@@ -36,7 +36,7 @@ std::string ContentOfPidFile() {
     return ContentOf(Service::PID_FILE);
 }
 
-/// One bit for each signal that the process has a handler for, the lowest for signal 1.
+/// One bit for each signal that the process handles; the lowest bit is for signal 1.
 std::uint64_t CaughtSignals(pid_t process) {
     std::ifstream status("/proc/" + std::to_string(process) + "/status");
     for (std::string line; std::getline(status, line);)
@@ -47,7 +47,7 @@ std::uint64_t CaughtSignals(pid_t process) {
 
 class StartUp : public ::testing::Test {
 protected:
-    /// A report is received and logged by the program.
+    /// Expects that the program receives and logs a report.
     void ExpectAReportIsTaken() {
         const auto before = m_service.LogLines("App/ReportServer:42 Recv").size();
         Service::Send(REPORT);
@@ -85,8 +85,9 @@ TEST_F(StartUp, HandlesASegmentationFaultAndNoOtherSignal) {
     m_service.Install();
     m_service.Start();
     Service::Send(EVENT);
-    m_service.AwaitQuiet(); // after which every plug-in has done something
-    constexpr std::uint64_t C_LIBRARY = std::uint64_t{3} << 31U; // the two that it keeps for its threads
+    m_service.AwaitQuiet(); // now every plug-in has done something
+    // The C library handles two signals itself, for its threads.
+    constexpr std::uint64_t C_LIBRARY = std::uint64_t{3} << 31U;
     EXPECT_EQ(CaughtSignals(m_service.Process()) & ~C_LIBRARY, std::uint64_t{1} << (SIGSEGV - 1U));
 }
 
@@ -108,7 +109,7 @@ TEST_F(StartUp, ASecondInstanceIsRefusedAndTheFirstGoesOn) {
     Service::Send(EVENT);
     Service::Send("no JSON");
     Service::Send(R"({"eventID":"B1","value":"it's"})");
-    m_service.AwaitQuiet(); // after all of which nothing has dropped the lock
+    m_service.AwaitQuiet(); // none of these may have released the lock
     EXPECT_EQ(m_service.RunAnother(), 1);
     const auto locked = m_service.LogLines("App/MiniDump:318 IsAlreadyRun");
     EXPECT_THAT(MessagesOf(locked),
@@ -153,7 +154,7 @@ TEST_F(StartUp, RestartsWhileTheOldOneIsBeingKilled) {
     for (int i = 0; i < 10; ++i) {
         ::kill(old, SIGKILL);
         pid_t next = 0;
-        do { // until the old one's lock is gone, the new one is refused
+        do { // the new process is refused until the old one's lock is released
             next = m_service.LaunchAnother();
             ASSERT_TRUE(WaitUntil([&] { return runs(next) || hasEnded(next); }));
         } while (!runs(next));
@@ -236,7 +237,7 @@ TEST_F(StartUp, AMissingLogDirectoryIsMade) {
 
 TEST_F(StartUp, WithoutThePreferencesDirectoryItEndsWithOne) {
     m_service.Install();
-    std::filesystem::remove_all("/Library/Preferences/hublink"); // the sandbox's
+    std::filesystem::remove_all("/Library/Preferences/hublink"); // a directory of the sandbox
     m_service.Launch();
     EXPECT_EQ(m_service.AwaitEnd(), 1);
     EXPECT_THAT(MessagesOf(m_service.LogLines("App/MiniDump:304 IsAlreadyRun")),

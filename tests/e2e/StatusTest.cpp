@@ -20,7 +20,7 @@ using ::testing::ContainsRegex;
 using ::testing::HasSubstr;
 using ::testing::Not;
 
-// `reportctl status` and `reportctl metrics` beside the real service: each verdict by its cause.
+// `reportctl status` and `reportctl metrics` with the real service: each verdict and its cause.
 
 namespace {
 
@@ -35,7 +35,7 @@ class Status : public ::testing::Test {
 protected:
     Status() { m_service.Install(); }
 
-    /// What it writes, and its exit code.
+    /// Runs reportctl. Returns what it printed, and sets `code` to its exit code.
     std::string Run(const std::vector<std::string>& arguments, int& code) const {
         const auto before = m_service.Output().size();
         code = m_service.Reportctl(arguments);
@@ -63,7 +63,7 @@ protected:
         return json.GetKeyValue(path).ToJson();
     }
 
-    /// That it is judged so, for a reason with these words.
+    /// Expects this exit code, and a reason with these words.
     void Expect(int code, const std::string& words) const {
         Json(code);
         EXPECT_THAT(m_text, HasSubstr(words));
@@ -80,7 +80,7 @@ protected:
     }
 
     Service m_service;
-    mutable std::string m_text; ///< Of the last look.
+    mutable std::string m_text; ///< The output of the last call.
 };
 
 } // namespace
@@ -89,7 +89,7 @@ TEST_F(Status, OfAServiceThatWorksIsHealthyAndHasItsFigures) {
     m_service.Start();
     Service::Send(R"({"eventID":"B1","value":"v","createTime":1700000000})");
     Service::Send(R"({"eventID":"A759|1"})");
-    Service::Send(R"({"eventID":"A999|1"})"); // a sender's mistake
+    Service::Send(R"({"eventID":"A999|1"})"); // a mistake of the sender: no such module
     ASSERT_TRUE(WaitUntil([&] { return ReportLedger::EndedIn(m_service.Books().total) == 3; }));
     ASSERT_TRUE(WaitUntil([&] { return m_service.RowCount() == 1; }));
     const auto json = Json(0);
@@ -175,7 +175,7 @@ TEST_F(Status, IsDegradedByAnUploadThatKeepsFailing) {
 }
 
 TEST_F(Status, IsDegradedWhenTheLedgerIsNotInItsFile) {
-    std::filesystem::create_directories(m_service.LedgerFile()); // a directory in its place
+    std::filesystem::create_directories(m_service.LedgerFile()); // a directory in the file's place
     m_service.Start();
     const auto json = Json(1);
     EXPECT_EQ(At(json, "service.running"), "true");
@@ -187,7 +187,8 @@ TEST_F(Status, IsDegradedWhenTheLedgerIsNotInItsFile) {
 TEST_F(Status, IsDownWhenAnotherProgramHasThePort) {
     Poco::Net::DatagramSocket other;
     other.bind(Poco::Net::SocketAddress("127.0.0.1", 9997), false, false);
-    ::fcntl(other.impl()->sockfd(), F_SETFD, FD_CLOEXEC); // the service is a child
+    // The service is a child process and must not inherit the socket.
+    ::fcntl(other.impl()->sockfd(), F_SETFD, FD_CLOEXEC);
     m_service.Launch();
     ASSERT_TRUE(WaitUntil([&] { return m_service.Output().find("in use") != std::string::npos; }));
     ASSERT_TRUE(WaitUntil([&] { return m_service.Books().counting; }));

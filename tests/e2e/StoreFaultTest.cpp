@@ -17,7 +17,8 @@ using ::testing::Field;
 using ::testing::IsEmpty;
 using ::testing::IsSupersetOf;
 
-// What the user loses when Report.db cannot be used, and that the service goes on by itself when it can.
+// What is lost when Report.db cannot be used, and that the service recovers by itself when it can be used
+// again.
 
 namespace {
 
@@ -31,7 +32,7 @@ protected:
         m_service.Start();
     }
 
-    /// So many reports, all of them rows before the fault comes.
+    /// Sends this many reports, and waits until all are rows, before the fault comes.
     void StoreSome(int count = 20) {
         const int first = m_ledger.Next();
         m_ledger.Report(count);
@@ -42,13 +43,14 @@ protected:
         return std::ranges::includes(m_ledger.Stored(), Ledger::Range(first, m_ledger.Next()));
     }
 
-    /// Reports are stored again, every one, without a restart.
+    /// Expects that reports are stored again, without a restart, and that no further one is lost.
     void ExpectToGoOn() {
         EXPECT_TRUE(m_ledger.ReportUntilOneIsStored());
         StoreSome();
     }
 
-    /// Nothing is missing from `first` on, and what is no row has its statement in the log, with this error.
+    /// Expects that each report from `first` on is a row, or that its statement is in the log with this
+    /// error.
     void ExpectEachStoredOrLogged(const std::string& error, int first = 0) {
         EXPECT_TRUE(m_ledger.AwaitEachStoredOrLogged(first));
         EXPECT_THAT(m_ledger.Lost(), Each(Field(&Ledger::LostOne::error, error)));
@@ -56,7 +58,7 @@ protected:
             EXPECT_FALSE(m_ledger.Stored().contains(number));
     }
 
-    /// The store with the files that belong to it.
+    /// The store and the files that belong to it.
     std::vector<std::string> Files() const {
         const auto store = m_service.DatabaseFile();
         return {store, store + "-wal", store + "-shm"};
@@ -97,7 +99,7 @@ TEST_F(StoreFault, ALockHeldForTenSecondsCostsNothing) {
         m_ledger.Report(10);
         EXPECT_TRUE(
             WaitUntil([&] { return m_service.LogLines("App/ReportServer:42 Recv").size() == before + 10; }));
-        WaitUntil([&] { return std::chrono::steady_clock::now() > end; }, 200ms); // the pace
+        WaitUntil([&] { return std::chrono::steady_clock::now() > end; }, 200ms); // keeps the pace
     }
     EXPECT_EQ(m_ledger.Stored(), Ledger::Range(0, 20));
     other.exec("commit");
@@ -162,7 +164,7 @@ TEST_F(StoreFault, ADeletedStoreCostsWhatWasInItAndWhatComesUntilSetUpMakesAnoth
 TEST_F(StoreFault, AFileSizeLimitEndsTheServiceWhenTheStoreReachesIt) {
     m_service.Install();
     {
-        const FileSizeLimit limit(1'000'000); // which the service inherits
+        const FileSizeLimit limit(1'000'000); // the service inherits it
         m_service.Start();
     }
     for (int i = 0; i < 300; ++i)
@@ -230,11 +232,11 @@ TEST_F(StoreFault, AStoreThatMayOnlyBeReadCostsTheReportsThatComeUntilItMayBeWri
 
 namespace {
 
-/// A way in which the bytes of the file go bad.
+/// One kind of damage to the file.
 struct Damage {
     const char* name;
-    bool truncated;           ///< Rather than overwritten.
-    std::uintmax_t keptBytes; ///< Of its beginning; a page has 4096.
+    bool truncated;           ///< The file is cut; otherwise it is overwritten.
+    std::uintmax_t keptBytes; ///< How many bytes at the beginning stay as they are. A page has 4096 bytes.
     const char* error;
 };
 
@@ -259,7 +261,7 @@ protected:
 TEST_P(DamagedStore, CostsWhatWasInItAndWhatComesUntilAnotherIsInItsPlace) {
     InstallAndStart();
     StoreSome(200);
-    // What is still in the write-ahead log would make up for the damage.
+    // The content of the write-ahead log would otherwise replace the damaged pages.
     m_service.Query(m_service.DatabaseFile(), "pragma wal_checkpoint(truncate)");
     DamageTheFile();
     const int first = m_ledger.Next();

@@ -3,8 +3,8 @@
 #include <cstdint>
 #include <string>
 
-/// A small file system of the test's own, mounted at a directory; it hides what was there and goes with this
-/// object. Only in the sandbox. Failure: throws std::system_error.
+/// A small file system of the test, mounted at a directory. It hides what was there. The destructor unmounts
+/// it. Only in the sandbox. Failure: throws std::system_error.
 class Disk {
 public:
     Disk(std::string directory, std::uintmax_t bytes);
@@ -12,11 +12,11 @@ public:
     Disk(const Disk&) = delete;
     Disk& operator=(const Disk&) = delete;
 
-    /// Takes all the room that is left.
+    /// Uses all the room that is left.
     void Fill() const;
     void MakeRoom() const;
 
-    /// No process may write any more. Refused by the kernel while a file is open for writing.
+    /// Makes the file system read-only. The kernel refuses this while a file is open for writing.
     void ForbidWriting() const;
     void AllowWriting() const;
 

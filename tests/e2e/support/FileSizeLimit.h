@@ -2,8 +2,8 @@
 
 #include <sys/resource.h>
 
-/// While this lives, no file that this process, or a child that it starts, writes may become larger: the
-/// system ends the process by SIGXFSZ. A child keeps the limit.
+/// While this object exists, a file of this process, or of a child that it starts, cannot become larger than
+/// the limit: the system ends the process that tries by SIGXFSZ. A child keeps the limit for its life.
 class FileSizeLimit {
 public:
     explicit FileSizeLimit(rlim_t bytes) {

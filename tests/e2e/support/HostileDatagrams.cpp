@@ -5,7 +5,7 @@
 namespace Hostile {
 namespace {
 
-constexpr std::size_t LONGEST_BYTES = 65507; // of a datagram, by the protocol
+constexpr std::size_t LONGEST_BYTES = 65507; // the largest datagram of the protocol
 
 std::string Repeated(const std::string& text, std::size_t count) {
     std::string repeated;
@@ -30,17 +30,17 @@ std::string Member(const std::string& key, const std::string& text) {
     return "\"" + key + R"(":")" + text + "\"";
 }
 
-/// A new module with that text in one of its fields, and an event of it.
+/// Announces a new module with that text in one of its fields, and sends an event of the module.
 Datagrams ModuleWith(const std::string& key, const std::string& text) {
     static int s_modules = 0;
     const std::string module = "AM" + std::to_string(++s_modules);
     return {Control("init", Member("moduleID", module) + "," + Member(key, text)), Report(module + "|1")};
 }
 
-/// As many columns as nine digits can ask for, more than that, and more than any integer holds.
+/// Numbers of columns: the largest with nine digits, a larger one, and one that no integer holds.
 const std::vector<std::string> COUNTS = {"999999999", "2000000000", "99999999999999999999"};
 
-/// What may stand between the percent sign and the letter.
+/// Texts that may stand between the percent sign and the letter.
 std::vector<std::string> DirectivePrefixes() {
     std::vector<std::string> prefixes = {"",   "1$", "9$", "0$",  "999999999$", "-",  "+",   " ",     "#",
                                          "0",  "_",  "=",  "-+#", "*",          ".*", "*.*", "1$*2$", "hh",
@@ -80,7 +80,7 @@ Datagrams InEveryNumber(const std::vector<std::string>& numbers) {
     return all;
 }
 
-/// A record as the log would show it, of a site that the program has not.
+/// A record in the log's form, of a place that the program does not have.
 const std::string FORGED = "2026-11-20 10:15:30.123 ERROR [1:1] [App/Forged:1 Forged] forged";
 
 } // namespace
@@ -124,7 +124,8 @@ Datagrams Brackets() {
         for (const std::string head :
              {"", R"({"eventID":)", R"({"eventID":"B1","value":)", R"({"eventID":"A759|1","value":)"})
             all.push_back((head + many).substr(0, Wire::MAX_BYTES));
-        all.push_back(Report("A759|1", R"(,"value":")" + Repeated("[", 5000) + "\"")); // parsed a second time
+        // The value is parsed a second time.
+        all.push_back(Report("A759|1", R"(,"value":")" + Repeated("[", 5000) + "\""));
     }
     return all;
 }
@@ -149,10 +150,10 @@ Datagrams NestingAtTheLimit() {
 }
 
 Datagrams InvalidUtf8() {
-    return InEveryField({"\xc0\xaf", "\xe0\x80\xaf", "\xf0\x80\x80\xaf", // longer than need be
-                         "\x80", "\xbf", "a\xc3", "a\xe2\x82",           // on their own, and cut off
+    return InEveryField({"\xc0\xaf", "\xe0\x80\xaf", "\xf0\x80\x80\xaf", // longer forms than needed
+                         "\x80", "\xbf", "a\xc3", "a\xe2\x82",           // parts of characters
                          "\xed\xa0\x80", "\xed\xbf\xbf",                 // halves of surrogate pairs
-                         "\\ud800", "\\udc00x",                          // the same, escaped
+                         "\\ud800", "\\udc00x",                          // halves of surrogate pairs, escaped
                          "\xf4\x90\x80\x80", "\xf8\x88\x80\x80\x80", "\xfe", "\xff", "\xff\xfe"});
 }
 
@@ -192,7 +193,7 @@ Datagrams LongestDatagrams() {
 
 Datagrams Directives() {
     Datagrams all = DirectiveTexts();
-    for (const char letter : std::string_view("dsTt%")) // the flag that is an SQL quote too
+    for (const char letter : std::string_view("dsTt%")) // a quote is a flag here, and a quote in SQL, too
         all.push_back(std::string("%'") + letter);
     return all;
 }
@@ -254,7 +255,7 @@ Datagrams Sql() {
 
 Datagrams SqlThatFits() {
     return {
-        Report("B1','v','1',0,'x','y')--"), // the row that it says itself
+        Report("B1','v','1',0,'x','y')--"), // the text itself gives the row's values
         Report("B1','v','1',0,'x','y');--"),
         Report("B1", R"(,"value":"'/*","createTime":"*/||'','1")"), // a comment from one field into the next
         Report("B1", R"(,"value":"''; drop table OperLog; --")"),

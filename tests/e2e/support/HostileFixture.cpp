@@ -18,7 +18,7 @@ using namespace std::chrono_literals;
 
 #if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
 constexpr auto STORED_WITHIN = 60s;
-constexpr bool HAS_ITS_OWN_MEMORY = false; // most of it is the sanitizer's
+constexpr bool HAS_ITS_OWN_MEMORY = false; // most of the memory belongs to the sanitizer
 #else
 constexpr auto STORED_WITHIN = 1s;
 constexpr bool HAS_ITS_OWN_MEMORY = true;
@@ -26,19 +26,21 @@ constexpr bool HAS_ITS_OWN_MEMORY = true;
 
 constexpr std::size_t MEMORY_BYTES = 100'000'000;
 
-/// In the socket at once: a quarter of the smallest buffer that a kernel grants by default.
+/// How many bytes may be in the socket at once: a quarter of the smallest buffer that a kernel grants by
+/// default.
 constexpr std::size_t UNREAD_BYTES = 50'000;
-constexpr std::size_t BYTES_AROUND_A_DATAGRAM = 1000; // which the kernel counts too
+constexpr std::size_t BYTES_AROUND_A_DATAGRAM = 1000; // the kernel counts them, too
 
 const std::string SCHEMA = "select type, name, tbl_name, sql from sqlite_master order by name";
 
-/// The sites that a datagram may make write a line.
+/// The places in the code that a datagram may cause to write a line.
 const Poco::RegularExpression
     SITE("^(App/ReportServer:(42 Recv|111 SetBaseInfo|123 JsonToStruct)|Frame/DBHelper:\\d+ ExecSql|"
          "Frame/FrameWorker:\\d+ Init|Metrik/MetrikMgr:(41 AddWorker|53 Update|(107|115) Send)|"
          "Metrik/MetrikWorker:((107|121) Send|21 FailCallBackFun))$");
 
-/// What would end a line or drive a terminal. In this mode, a text that is no UTF-8 is an error of its own.
+/// Characters that would end a line or control a terminal. In this mode, a text that is not UTF-8 is also an
+/// error.
 const Poco::RegularExpression
     DANGEROUS("[\\x{0}-\\x{9}\\x{b}-\\x{1f}\\x{7f}-\\x{9f}\\x{2028}-\\x{202e}\\x{2066}-\\x{2069}]",
               Poco::RegularExpression::RE_UTF8);
@@ -61,7 +63,7 @@ std::vector<std::string> FilesBelow(const std::string& directory) {
 } // namespace
 
 HostileFixture::HostileFixture() : m_returnTo(std::filesystem::current_path()) {
-    std::filesystem::current_path(m_workingDirectory.Path()); // the service's, too
+    std::filesystem::current_path(m_workingDirectory.Path()); // the service inherits it
     m_service.Install();
     m_output = m_service.Output();
     m_service.Start();
@@ -73,13 +75,13 @@ HostileFixture::~HostileFixture() {
     std::filesystem::current_path(m_returnTo);
 }
 
-/// After which each thread that the service will ever have is there.
+/// Stores a burst of reports. After it, the service has started all the threads that it ever has.
 void HostileFixture::HaveABurstStored() {
     constexpr int BURST = 20;
     for (int i = 0; i < BURST; ++i)
         Send(R"({"eventID":"Burst"})");
     m_service.AwaitQuiet();
-    ++m_sent; // the marker of that
+    ++m_sent; // AwaitQuiet has sent a marker
     m_rowsBefore = m_service.RowCount();
     EXPECT_EQ(m_rowsBefore, BURST);
 }
@@ -154,7 +156,7 @@ void HostileFixture::ExpectOneLineForEachRecord() {
     EXPECT_EQ(Service::DroppedByKernel(), 0);
     std::size_t received = 0;
     const auto threads = WhatIsThere().threads;
-    for (const auto& line : m_service.LogLines()) { // throws for a line that is no record
+    for (const auto& line : m_service.LogLines()) { // LogLines throws for a line that is no record
         ASSERT_TRUE(SITE.match(line.site)) << line.site;
         ASSERT_EQ(line.process, m_service.Process());
         ASSERT_TRUE(std::find(threads.begin(), threads.end(), line.thread) != threads.end()) << line.thread;

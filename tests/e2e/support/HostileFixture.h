@@ -9,18 +9,18 @@
 
 #include "tests/e2e/support/Service.h"
 
-/// The real service in an empty working directory, and what must still be true after the hostile datagrams.
+/// The real service in an empty working directory, and the checks after the hostile datagrams.
 class HostileFixture : public ::testing::Test {
 protected:
     HostileFixture();
     ~HostileFixture() override;
 
-    /// Sends without overrunning the socket, so that each one is received.
+    /// Sends no faster than the socket can take, so that each datagram is received.
     void Send(const std::string& datagram);
 
-    /// The next report is stored in time, the store and the outbox have got so many rows and events and are
-    /// sound, the log is one line for each record, the ledger has them all, and neither memory nor
-    /// descriptors nor threads nor files have grown.
+    /// Expects that the next report is stored in time; that the store has got this many rows and the outbox
+    /// this many events, and both are sound; that the log has one line for each record; that the ledger
+    /// counts all; and that memory, descriptors, threads and files have not grown.
     void ExpectSoundness(std::int64_t rows, std::int64_t events);
 
     /// An empty directory that the service was started in.
@@ -29,11 +29,11 @@ protected:
     Service m_service;
 
 private:
-    /// What is counted before and after.
+    /// What is compared before and after.
     struct Possessions {
-        std::vector<std::string> schema;   ///< Of both databases.
+        std::vector<std::string> schema;   ///< The schemas of both databases.
         std::vector<std::string> baseInfo; ///< The rows of the store's second table.
-        std::vector<std::string> files;    ///< In the data directory.
+        std::vector<std::string> files;    ///< The files in the data directory.
         std::size_t descriptors = 0;
         std::vector<pid_t> threads;
     };
@@ -48,7 +48,7 @@ private:
 
     TemporaryDirectory m_workingDirectory;
     std::filesystem::path m_returnTo;
-    std::string m_output; ///< Of the set-up.
+    std::string m_output; ///< The output of the set-up.
     Possessions m_before;
     std::int64_t m_rowsBefore = 0;
     std::size_t m_sent = 0;

@@ -10,7 +10,7 @@
 
 namespace {
 
-/// Fewer than what the smallest usual socket buffer holds.
+/// Fewer datagrams than the smallest usual socket buffer holds.
 constexpr int PORTION = 50;
 
 int NumberOf(const std::string& eventId) {

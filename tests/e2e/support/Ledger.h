@@ -7,21 +7,21 @@
 
 #include "tests/e2e/support/Service.h"
 
-/// Numbered reports for the store, and what became of each: a row, or a line of the log with its statement.
-/// Made for faults, in which no marker can be stored to wait for.
+/// Sends numbered reports for the store, and finds out how each ended: as a row, or as a line of the log with
+/// its statement. It is for faults: during a fault, no marker can be stored that a test could wait for.
 class Ledger {
 public:
     using Numbers = std::set<int>;
 
     explicit Ledger(Service& service) : m_service(service) {}
 
-    /// Sends so many, no faster than the service takes them from its socket.
+    /// Sends this many reports, no faster than the service takes them from its socket.
     void Report(int count = 1);
 
-    /// Sends one at a time until one becomes a row; whether that was before the deadline.
+    /// Sends one report at a time until one becomes a row. True when that was before the deadline.
     bool ReportUntilOneIsStored(std::chrono::milliseconds deadline = std::chrono::seconds(20));
 
-    /// Sends one at a time until one is logged as lost.
+    /// Sends one report at a time until one is logged as lost. True when that was before the deadline.
     bool ReportUntilOneIsLost(std::chrono::milliseconds deadline = std::chrono::seconds(20));
 
     /// Waits until each number from `first` on has become a row or a line of the log.
@@ -30,10 +30,11 @@ public:
     /// The number of the next report.
     int Next() const { return m_next; }
 
-    /// Those in the store, which are there once and in their order; none, and a failure, when they are not.
+    /// The numbers in the store. When one is there twice or out of order, the test fails and the result is
+    /// empty.
     Numbers Stored() const;
 
-    /// Those whose statement failed, with the error text before the statement.
+    /// A report whose statement failed. `error` is the text before the statement.
     struct LostOne {
         int number;
         std::string error;

@@ -35,7 +35,7 @@ std::vector<char*> Pointers(std::vector<std::string>& texts) {
     return pointers;
 }
 
-/// The exit code, or minus the signal.
+/// The exit code, or minus the signal's number.
 int CodeOf(int status) {
     return WIFEXITED(status) ? WEXITSTATUS(status) : -WTERMSIG(status);
 }
@@ -54,14 +54,16 @@ std::vector<std::string> KernelsLineOfThePort() {
 } // namespace
 
 Service::Service() {
-    // The program looks for its plug-ins beside itself, so a copy of it may have others than the original.
+    // The program looks for its plug-ins in its own directory. A copy of the program may have other plug-ins
+    // than the original.
     std::filesystem::copy_file(std::filesystem::path(SSR_BIN_DIR) / PROGRAM,
                                m_program.Path() + "/" + PROGRAM);
     for (const auto& plugin : PLUGINS)
         std::filesystem::create_symlink(std::filesystem::path(SSR_BIN_DIR) / plugin,
                                         m_program.Path() + "/" + plugin);
-    // A sanitizer looks for leaks at exit, which takes longer than the crash handler's deadline on a busy
-    // machine; and it wants to be the first library otherwise, where a test loads one before the program.
+    // A sanitizer looks for leaks at exit. On a busy machine, this takes longer than the crash handler's
+    // deadline. A sanitizer also demands to be the first library, but some tests load another library before
+    // the program.
     m_environment = {"XDG_DATA_HOME=" + DataDirectory(), "HOME=" + DataDirectory(), "PATH=/usr/bin:/bin",
                      "ASAN_OPTIONS=detect_leaks=0:verify_asan_link_order=0"};
 }
@@ -69,13 +71,13 @@ Service::Service() {
 Service::~Service() {
     ExpectBalance();
     Kill();
-    // A program with a data race goes on after the report.
+    // A program with a data race does not end after the sanitizer's report.
     if (const auto output = Output(); output.find("Sanitizer: ") != std::string::npos)
         ADD_FAILURE() << output;
 }
 
-/// After any fault, each received report has ended, waits, or was lost. There is no ledger where the disk
-/// took none.
+/// Expects that each received report has ended, waits, or was lost, after any fault. There may be no ledger
+/// when the disk took none.
 void Service::ExpectBalance() {
     const auto isBalanced = [this] {
         const auto books = Books();
@@ -204,7 +206,8 @@ std::vector<Service::Line> Service::LogLines() const {
         R"(^\d{4}-\d\d-\d\d \d\d:\d\d:\d\d\.\d{3} (\w+) +\[(\d+):(\d+)\] \[([^\]]+)\] (.*)$)");
     std::vector<Line> lines;
     const std::string content = Log();
-    // The size of a file grows page by page, so a line that is being written may be there in part.
+    // The log may end in a part of a line, because the size of a file grows page by page while a line is
+    // written.
     std::istringstream log(content.substr(0, content.rfind('\n') + 1));
     for (std::string text; std::getline(log, text);) {
         std::vector<std::string> parts;
@@ -232,7 +235,7 @@ std::vector<std::string> Service::Query(const std::string& file, const std::stri
                 row += (column > 0 ? "|" : "") + query.getColumn(column).getString();
             rows.push_back(row);
         }
-    } catch (const SQLite::Exception&) { // not there yet
+    } catch (const SQLite::Exception&) { // the file or table does not exist yet
     }
     return rows;
 }
@@ -261,6 +264,6 @@ std::int64_t Service::DroppedByKernel() {
 
 bool Service::TookAllDatagrams() {
     const auto fields = KernelsLineOfThePort();
-    return !fields.empty() &&
-           fields[4].ends_with(":00000000"); // bytes waiting to be sent, and to be received
+    // This field has the bytes that wait to be sent, and the bytes that wait to be received.
+    return !fields.empty() && fields[4].ends_with(":00000000");
 }

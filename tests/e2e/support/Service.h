@@ -11,9 +11,9 @@
 #include "Ledger/Reader.h"
 #include "tests/support/TemporaryDirectory.h"
 
-/// The real program with the real plug-ins, in a user data directory of its own. The sandbox of the test
-/// gives it port 9997 and the pid file's directory. Killed by the destructor, which fails the test when a
-/// sanitizer found something in it, or when its ledger does not balance.
+/// The real program with the real plug-ins and a user data directory of its own. The sandbox gives the test
+/// port 9997 and the pid file's directory. The destructor kills the program, and fails the test when a
+/// sanitizer found an error or when the ledger does not balance.
 class Service {
 public:
     /// A line of the log, taken apart.
@@ -30,32 +30,33 @@ public:
     Service(const Service&) = delete;
     Service& operator=(const Service&) = delete;
 
-    /// Leaves a plug-in out, from the next start on.
+    /// Removes a plug-in, from the next start on.
     void Remove(const std::string& plugin);
 
-    /// Adds to the environment, from the next start on.
+    /// Adds a variable to the environment, from the next start on.
     void SetEnvironment(const std::string& nameAndValue) { m_environment.push_back(nameAndValue); }
 
     /// Starts the program with descriptors 0 to 2 closed, from the next start on.
     void CloseStandardDescriptors() { m_closesStandardDescriptors = true; }
 
-    /// Runs `reportctl` with these arguments in the service's data directory; its exit code. Output goes to
-    /// Output().
+    /// Runs `reportctl` with these arguments in the service's data directory. Returns its exit code; its
+    /// output goes to Output().
     int Reportctl(const std::vector<std::string>& arguments) const;
 
-    /// What an installation does: `reportctl setup`.
+    /// Does what an installation does: runs `reportctl setup`.
     void Install() const;
 
-    /// Starts the program and waits until it takes datagrams (see Bound), or has ended.
+    /// Starts the program, and waits until it takes datagrams (see Bound) or has ended.
     void Start();
 
     /// Starts the program and waits for nothing.
     void Launch();
 
-    /// Starts a second program beside the first, and gives its exit code; -1 when it was killed by a signal.
+    /// Starts a second process beside the first, and waits for its end. Returns its exit code; -1 when a
+    /// signal killed it.
     int RunAnother() const;
 
-    /// Starts a second program beside the first and waits for nothing; the caller ends it.
+    /// Starts a second process beside the first, and waits for nothing. The caller must end it.
     pid_t LaunchAnother() const;
 
     bool IsRunning();
@@ -64,18 +65,20 @@ public:
     void Signal(int signal) const;
     void Signal(int signal, pid_t thread) const;
 
-    /// Waits for the end; the exit code, or minus the signal, or nothing when it did not end in time.
+    /// Waits for the program's end. Returns the exit code or minus the signal's number; nothing when the
+    /// program did not end in time.
     std::optional<int> AwaitEnd(std::chrono::milliseconds deadline = std::chrono::seconds(10));
 
-    /// SIGKILL, and wait.
+    /// Sends SIGKILL, and waits for the end.
     void Kill();
 
     pid_t Process() const { return m_process; }
 
-    /// Sends one datagram, a test's own process being as good as any of the suite's.
+    /// Sends one datagram from the test's process. For the service, this is the same as any program of the
+    /// suite.
     static void Send(const std::string& text);
 
-    /// Waits until a report that is sent now has been stored, and so all sent before it handled.
+    /// Sends a report and waits until it is stored. Everything that was sent before has then been handled.
     void AwaitQuiet();
 
     const std::string& DataDirectory() const { return m_data.Path(); }
@@ -104,25 +107,25 @@ public:
     std::int64_t Count(const std::string& file, const std::string& sql) const;
     std::int64_t RowCount() const { return Count(DatabaseFile(), "select count(*) from OperLog"); }
 
-    /// What its ledger says.
+    /// The service's ledger.
     ReportLedger::Look Books() const { return ReportLedger::LookAt(LedgerFile()); }
 
-    /// One number of it, since the service was installed.
+    /// One counter of the ledger, since the service was installed.
     std::uint64_t Counted(ReportLedger::Counter counter) const { return Books().total[counter]; }
     std::uint64_t Counted(ReportLedger::Outcome outcome) const {
         return Books().total[static_cast<unsigned>(outcome)];
     }
 
-    /// Of its memory, what the machine has in use for it.
+    /// How much real memory the program uses.
     long ResidentKilobytes() const;
 
     /// Whether the report port is bound in this network.
     static bool Bound();
 
-    /// Datagrams that the kernel dropped at the report port, by the socket's own counter.
+    /// How many datagrams the kernel dropped at the report port, by the counter of the socket.
     static std::int64_t DroppedByKernel();
 
-    /// Whether the program has taken every datagram off its socket.
+    /// Whether the program has taken all datagrams from its socket.
     static bool TookAllDatagrams();
 
 private:

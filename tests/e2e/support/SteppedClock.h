@@ -7,8 +7,8 @@
 #include "tests/e2e/support/Service.h"
 #include "tests/support/TemporaryDirectory.h"
 
-/// The wall clock of a service that is started after this object was made: it runs as the machine's, so much
-/// ahead of it.
+/// The wall clock of a service that is started after this object was made. It runs like the machine's clock,
+/// but is ahead of it by a time that the test sets.
 class SteppedClock {
 public:
     explicit SteppedClock(Service& service) {
@@ -17,11 +17,11 @@ public:
         service.SetEnvironment("SSR_STEPPED_CLOCK_FILE=" + File());
     }
 
-    /// From now on.
+    /// Sets how far the clock is ahead, from now on.
     void StepTo(std::chrono::seconds ahead) const {
         const std::int64_t seconds = ahead.count();
-        std::fstream file(File(),
-                          std::ios::in | std::ios::out | std::ios::binary); // never shorter: it is mapped
+        // The file must never become shorter, because the service maps it.
+        std::fstream file(File(), std::ios::in | std::ios::out | std::ios::binary);
         if (!file)
             file.open(File(), std::ios::out | std::ios::binary);
         file.write(reinterpret_cast<const char*>(&seconds), sizeof seconds);

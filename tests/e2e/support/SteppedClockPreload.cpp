@@ -1,5 +1,6 @@
-// Loaded into the program before the C library, whose functions for the wall clock it replaces by ones that
-// add the seconds which a file names; see SteppedClock.h. No other clock changes, least of all the machine's.
+// Loaded into the program before the C library. It replaces the C library's functions for the wall clock by
+// functions that add the seconds in a file; see SteppedClock.h. Other clocks do not change, nor does the
+// machine's own wall clock.
 
 #include <cstdint>
 #include <cstdlib>
@@ -13,7 +14,7 @@
 
 namespace {
 
-const std::int64_t* g_step = nullptr; ///< In the file, which the test writes at any time.
+const std::int64_t* g_step = nullptr; ///< The seconds in the file. The test may change them at any time.
 
 __attribute__((constructor)) void MapTheFile() {
     const int file = open(std::getenv("SSR_STEPPED_CLOCK_FILE"), O_RDONLY | O_CLOEXEC);
