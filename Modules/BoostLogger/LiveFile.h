@@ -39,7 +39,7 @@ public:
     /// The size of the file. It counts the bytes of other processes as of the last look.
     std::int64_t SizeBytes() const { return m_sizeBytes; }
 
-    /// Looks at the size now.
+    /// Updates SizeBytes now.
     void LookAtSize();
 
     /// Appends the line, which ends in a newline, with one system call. When this returns without a failure,

@@ -13,11 +13,11 @@
 
 namespace BoostLogger {
 
-/// Writes lines into the log's files: rotates them, keeps all files within the cap, and goes on when the disk
-/// fails:
+/// Writes lines into the log's files. It rotates the files, keeps all of them within the cap, and goes on
+/// when the disk fails:
 ///
-///   writing → (a step fails) → losing: lines are counted and dropped, one attempt a quarter of a second
-///           → (an attempt succeeds) → a record tells how many were lost and why → writing
+///   writing → (a step fails) → losing: lines are counted and dropped, at most four attempts a second
+///           → (an attempt succeeds) → a record says how many were lost and why → writing
 ///
 /// Threads: any may call Append and CountLost. Append blocks for as long as the file system does, and for up
 /// to 20 ms when another process rotates at the same moment.

@@ -10,7 +10,7 @@ namespace MetrikSdk {
 namespace {
 
 /// The most bytes of a module's id. The texts come from datagrams of 10 KiB, and every module's id stays in
-/// memory. Longer texts are cut; a module that is no attacker has none.
+/// memory. Longer texts are cut; no honest module has one.
 constexpr std::size_t MAX_ID_BYTES = 64;
 constexpr std::size_t MAX_TEXT_BYTES = 256; ///< The same for a version or a name.
 
@@ -70,7 +70,7 @@ void Sdk::Tell(report::Cause cause, const char* reason) noexcept {
     try {
         if (const auto text = m_registry.RecordFailure(cause, reason))
             Call(onFailure, report::NameOf(cause), *text);
-    } catch (...) { // no memory to tell it with
+    } catch (...) { // no memory for the report
     }
 }
 

@@ -26,8 +26,8 @@ struct CapSettings {
     std::size_t maxDropsAtOnce = 1000;
     /// Drops that are further apart than this are two incidents, and each of them is reported.
     std::chrono::milliseconds dropRunEnds = std::chrono::minutes(10);
-    /// Refused events are kept for a person to look at. A person looks at no more than this. A collector that
-    /// refuses everything must not move the whole outbox here.
+    /// Refused events are kept for a person to look at, and a person looks at no more than this. Without this
+    /// limit, a collector that refuses everything would move the whole outbox here.
     std::size_t maxDeadLetters = 10'000;
     std::size_t maxDeadLetterBytes = std::size_t{16} * 1024 * 1024;
     /// The largest event. A datagram carries 10 KiB, and what is a hundred times larger is no event any more.

@@ -115,8 +115,8 @@ std::string Database::GetLastErrorMsg() {
 }
 
 bool Database::Finish() {
-    // Set before the lock is taken. It ends the operations of a thread that runs one statement after the
-    // other; otherwise that thread would hardly ever leave the lock to us.
+    // Set before the lock is taken: later operations then fail at once. Otherwise a thread that runs one
+    // statement after the other would hardly ever leave the lock to us.
     m_isFinished = true;
     if (m_inside == std::this_thread::get_id() || m_committer.IsThisThread())
         return false; // this thread crashed in here, so its operation never ends

@@ -17,8 +17,8 @@ public:
 /// Whether the owner is this process's user or root. These two can do anything with this process anyway.
 bool IsOurs(const struct stat& status);
 
-/// Throws UnsafePath when another user could change the file or directory `shown`, because he owns it or may
-/// write to it. The rights of an access control list appear in the group's bits, so a right of the group to
+/// Throws UnsafePath when another user could change the file or directory `shown`, as its owner or by a right
+/// to write. The rights of an access control list appear in the group's bits, so a right of the group to
 /// write counts as a right of other users.
 void RequireOursAlone(const struct stat& status, const std::string& shown);
 

@@ -7,7 +7,7 @@
 namespace MetrikSdk::otlp {
 namespace {
 
-// 15 is the largest window; 16 asks for a gzip header, not a zlib header
+// 15 is the largest window; adding 16 asks for a gzip header and not for a zlib header.
 constexpr int GZIP_WINDOW_BITS = 15 + 16;
 constexpr int DEFAULT_MEMORY_LEVEL = 8;
 

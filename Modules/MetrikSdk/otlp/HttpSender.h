@@ -26,9 +26,9 @@ public:
     std::string Destination() const override { return WithoutSecrets(m_config.url); }
     std::vector<std::string> HeaderNames() const override;
 
-    /// For exit(): the TLS library is about to destroy its state, which must not be in use then. Ends every
-    /// request of the process, and lets no new one begin. Waits until no request is running, but at most
-    /// `patience`. (When the caller is a thread that crashed within a request, it waits in vain.)
+    /// Ends every request of the process, and lets no new one begin. Waits until no request is running, but
+    /// at most `patience`. exit() needs this before the TLS library destroys its state, which must not be in
+    /// use then. (When the caller is a thread that crashed within a request, it waits in vain.)
     static void AbandonAll(std::chrono::milliseconds patience);
 
 private:

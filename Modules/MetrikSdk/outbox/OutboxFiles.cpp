@@ -88,8 +88,8 @@ std::string SetAside(const Sqlite::SafeDirectory& directory, const std::string& 
     if (Sqlite::IdentityOf(directory.PathOf(name)) != identity)
         return {};
     const auto aside = UnusedName(directory, name + ".damaged-" + FileNameTime(now));
-    // The database is renamed last. A new database that is made beside the side files of the old one would
-    // take them for its own.
+    // The database is renamed last. Otherwise another process could make a new database beside the old side
+    // files, and SQLite would take them for the new database's own.
     for (const std::string suffix : Sqlite::SIDE_FILE_SUFFIXES)
         Rename(directory, name + suffix, aside + suffix);
     Rename(directory, name, aside);

@@ -8,7 +8,7 @@
 #include "Modules/MetrikSdk/outbox/StoreError.h"
 #include "Modules/Sqlite/ErrorKind.h"
 
-// What every operation of the store does around its SQL.
+// Helpers that every operation of the store puts around its SQL.
 namespace MetrikSdk::outbox {
 
 /// What the holder of the store must do about an error of SQLite.

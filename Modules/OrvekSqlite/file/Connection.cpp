@@ -39,7 +39,7 @@ void RequireOurFiles(const std::string& path) {
 }
 
 /// Takes all rights to the file away from other users. This must come before SQLite first looks at the file's
-/// mode: SQLite gives that mode to the side files that it makes, whatever the umask of the process is.
+/// mode: SQLite gives that mode to the side files that it makes, under any umask of the process.
 const std::string& MadePrivate(const std::string& path) {
     RequireOurFiles(path);
     SetMode(path, ModeOf(path) & PRIVATE);

@@ -7,8 +7,8 @@
 namespace OrvekSqlite::file {
 namespace {
 
-/// The search for a descriptor ends here. A new descriptor gets the lowest free number, and the service has
-/// some twenty.
+/// The search for a descriptor ends at this number. A new descriptor gets the lowest free number, and the
+/// service has some twenty.
 constexpr int MAX_DESCRIPTOR = 1024;
 
 /// The bytes that SQLite locks in a database file. SQLite documents them; they come after the first gigabyte.
@@ -34,8 +34,8 @@ bool OtherUsers::Exist() {
     lock.l_whence = SEEK_SET;
     lock.l_start = SHARED_FIRST;
     lock.l_len = SHARED_BYTES;
-    // This asks for the lock and does not take it. The locks of this process do not count: it asks about
-    // others.
+    // This only asks who holds the lock, and does not take it. Locks of this process are left out of the
+    // answer.
     return ::fcntl(m_descriptor, F_GETLK, &lock) != 0 || lock.l_type != F_UNLCK;
 }
 

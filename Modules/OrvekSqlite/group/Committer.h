@@ -25,7 +25,7 @@ public:
     /// `mutex` guards the group and the members of this class. The mutex and the group outlive the committer.
     Committer(std::mutex& mutex, Group& group) : m_mutex(mutex), m_group(group) {}
 
-    /// Stop must have been called.
+    /// Call Stop first.
     ~Committer() = default;
 
     /// Call this after each statement, with the mutex held: the group may be due at some time now.

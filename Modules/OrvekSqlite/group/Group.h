@@ -52,7 +52,7 @@ public:
 private:
     enum class State {
         Empty, ///< Nothing is kept.
-        Open,  ///< We hold the write lock, and the transaction holds the effect of every statement kept.
+        Open,  ///< We hold the write lock, and the transaction holds the effect of every kept statement.
         Uncommitted, ///< No transaction and no lock. The kept statements wait for the database to take them.
     };
 

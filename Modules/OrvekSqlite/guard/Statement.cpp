@@ -96,9 +96,9 @@ std::string Statement::Text(int column) const {
 void Statement::Fail(int code) const {
     if (m_guard.Refusal() != nullptr)
         throw SQLite::Exception(m_guard.Refusal(), code);
-    // VACUUM is stopped in one of two places: by the guard, when VACUUM attaches its copy, or earlier by
-    // SQLite, when a transaction is open. The error text must be the same for both, because it must not
-    // depend on whether other statements came just before.
+    // VACUUM is stopped by the guard when it attaches its copy, or earlier by SQLite when a transaction is
+    // open. Both must count as "not authorized": the error must not depend on whether other statements came
+    // just before.
     if (std::string_view(sqlite3_errmsg(m_connection)).starts_with("cannot VACUUM"))
         throw SQLite::Exception("not authorized: VACUUM", SQLITE_AUTH);
     throw SQLite::Exception(m_connection, code);
