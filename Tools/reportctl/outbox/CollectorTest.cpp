@@ -25,7 +25,7 @@ using MetrikSdk::otlp::HttpResult;
 
 constexpr std::size_t BODY_BYTES = 500;
 
-/// libcurl looks these up in its own process.
+/// libcurl reads these variables from the environment of this process.
 constexpr std::array PROXIES{"http_proxy", "https_proxy", "HTTPS_PROXY", "all_proxy",
                              "ALL_PROXY",  "no_proxy",    "NO_PROXY"};
 
@@ -66,7 +66,8 @@ std::string TestEvent() {
          .releases = {{1, {"reportctl", SystemTool::Version::Number(), "reportctl"}}}});
 }
 
-/// False when the collector's name has no address. With a proxy the proxy looks it up.
+/// Looks up the collector's name and prints the result. Returns false when the name has no address. With a
+/// proxy, the proxy looks the name up.
 bool TellNameResolution(const EndpointConfig& config, const service::Environment& environment) {
     const auto host = Poco::URI(config.url).getHost();
     if (HasProxy(environment)) {

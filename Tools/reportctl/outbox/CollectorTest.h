@@ -4,9 +4,9 @@
 
 namespace reportctl::outbox {
 
-/// Sends one test event to the collector that `environment` names, in the way of the service, and tells on
-/// standard output what came of it, step by step. The event's id is "reportctl.test", and its data says what
-/// it is; it does not go through the outbox. True when the collector took it.
+/// Sends one test event to the collector that `environment` names, as the service sends events, and prints
+/// the result of each step on standard output. The event's id is "reportctl.test", and its data says that it
+/// is a test. It does not go through the outbox. Returns true when the collector took it.
 bool TestCollector(const service::Environment& environment);
 
 } // namespace reportctl::outbox

@@ -9,14 +9,15 @@
 namespace reportctl::outbox {
 namespace {
 
-/// A transaction of so many keeps the service's next event waiting for a few milliseconds.
+/// The most dead letters of one transaction. With so many, the service's next event waits for a few
+/// milliseconds.
 constexpr int LETTERS_AT_ONCE = 500;
 
 constexpr auto OLDEST = "select id from dead_letter order by id limit ?1";
 constexpr auto WITH_UUID = "select id from dead_letter where uuid = ?1";
 
-/// The collector tells a repeated event by its uuid, so that stays. A sequence number counts what was stored,
-/// and this is stored anew; so is its age.
+/// The uuid stays, because the collector recognises a repeated event by it. The sequence number and the time
+/// of storing are new, because the event is stored again.
 constexpr auto PUT_BACK = R"sql(
 insert into event(uuid, module, release, sequence, event_id, payload, stored_ms, bytes)
     select d.uuid, d.module, d.release, m.last_sequence + row_number() over (partition by d.module order by d.id),
@@ -30,7 +31,8 @@ std::int64_t Run(SQLite::Database& database, const std::string& sql, const Argum
     return statement.exec();
 }
 
-/// Deletes the dead letters of this query and counts them off.
+/// Deletes the dead letters that the query selects, and subtracts them from the sums. Returns how many they
+/// were.
 template <typename Argument>
 std::int64_t Remove(SQLite::Database& database, const std::string& letters, const Argument& argument) {
     Run(database,
@@ -54,7 +56,8 @@ std::int64_t PutBack(SQLite::Database& database, const std::string& letters, con
 } // namespace
 
 std::int64_t RetryAll(SQLite::Database& database) {
-    // Those that the collector refuses meanwhile are not tried again: only what is there now.
+    // Only as many as there are now, so that events that the collector refuses again meanwhile are not
+    // retried.
     auto left = database.execAndGet("select count(*) from dead_letter").getInt64();
     std::int64_t all = 0;
     for (std::int64_t count = 1; count > 0 && left > 0; left -= count) {

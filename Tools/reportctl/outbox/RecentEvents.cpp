@@ -10,11 +10,11 @@ namespace {
 
 using SystemTool::IO::JsonDocument;
 
-/// Events that no line of the log speaks of must not fill the memory of a command that runs for days.
+/// Events that never match a line of the log must not fill the memory of a command that runs for days.
 constexpr std::size_t MAX_EVENTS_KEPT = 200'000;
 
 JsonDocument Parsed(const std::string& text) {
-    std::string ignored; // what is no JSON is null, and equals nothing
+    std::string ignored; // a text that is not JSON becomes null, which equals no event's data
     return JsonDocument().FromJson(text, ignored);
 }
 
@@ -26,8 +26,8 @@ std::string TimeIn(const std::string& payload) {
     return Parsed(payload).GetKeyValue("extend").GetKeyValue("createTime").ToString();
 }
 
-/// The service adds two members to the value, or replaces them. Added in the same way to the report's value,
-/// with the same texts, they must give the same data.
+/// Whether the payload was made of this value. The service sets two members in the value. When the same
+/// members with the same texts are set in the report's value, the result must be the payload's data.
 bool IsMadeOf(const std::string& payload, const std::string& value) {
     const auto data = Parsed(payload).GetKeyValue("eventData");
     auto expected = Parsed(value);
@@ -47,7 +47,7 @@ std::int64_t In(const std::map<std::string, std::int64_t>& counts, const std::st
 
 void RecentEvents::ReadNew(std::int64_t before) {
     auto database = OpenToLook(m_path);
-    database.exec("begin"); // events and counts of one moment
+    database.exec("begin"); // so that the events and the counts are those of one moment
     Read(database, Where::Waiting, m_lastWaiting, before);
     Read(database, Where::Dead, m_lastDead, before);
     m_stored = StoredByModule(database);
@@ -62,7 +62,7 @@ void RecentEvents::Read(SQLite::Database& database, Where where, std::int64_t& l
     const auto last = LastRow(database, where);
     if (m_isFirst)
         lastRow = std::max<std::int64_t>(last - before, 0);
-    if (last < lastRow) // it has been empty since, and rows are counted from 1 again
+    if (last < lastRow) // the table was empty meanwhile, and its row numbers began at 1 again
         lastRow = 0;
     ForEach(database, where, lastRow, [this](const Event& event) { Add(event); });
     lastRow = last;

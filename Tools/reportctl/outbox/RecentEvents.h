@@ -14,34 +14,38 @@
 
 namespace reportctl::outbox {
 
-/// What an event holds of the report that it was made of.
+/// The part of a report that the event made of it holds.
 struct EventContent {
     std::string eventID;
     std::string value; ///< empty, or JSON
     std::string createTime;
 };
 
-/// The youngest events of the outbox, waiting or dead, to be found by their content, and how many each module
-/// has stored: a delivered event has left the outbox, and only that number tells of it. An event is found
-/// once, so that two equal reports need two.
+/// Finds the newest events of the outbox, waiting or dead, by their content. Each event is found once only,
+/// so two equal reports need two events. It also knows how many events each module has stored: a delivered
+/// event has left the outbox, and only that number shows that it was there.
 ///
 /// One thread. Failure: ReadNew throws what OpenToLook throws.
 class RecentEvents {
 public:
     explicit RecentEvents(std::string path) : m_path(std::move(path)) {}
 
-    /// Reads what came since; the first time, the last `before` events.
+    /// Reads the events that were added since the last call. The first call reads the last `before` events of
+    /// each table.
     void ReadNew(std::int64_t before);
 
-    /// Whether an event was made of this report. It is then taken away, and no longer part of Uncounted.
+    /// Finds an event that was made of this report. It is then removed from this object, and is no longer
+    /// part of Uncounted. Returns false when there is no such event.
     bool Take(const EventContent& report, const std::string& module);
 
-    /// How many events the module has stored before the first reading, and since then without one that Take
-    /// found.
+    /// How many events the module had stored at the first reading.
     std::int64_t Before(const std::string& module) const;
+
+    /// How many events the module has stored since the first reading, without those that Take found or Count
+    /// was told.
     std::int64_t Uncounted(const std::string& module) const;
 
-    /// So many of Uncounted are reports that are known.
+    /// Subtracts so many events from Uncounted: the caller knows the reports that they were made of.
     void Count(const std::string& module, std::int64_t events) { m_counted[module] += events; }
 
 private:
@@ -61,10 +65,10 @@ private:
     std::int64_t m_lastDead = 0;
     std::unordered_map<std::string, std::deque<Known>> m_events; ///< by event id and time
     std::deque<std::pair<std::string, std::string>> m_order;     ///< keys and uuids, oldest first
-    std::unordered_set<std::string> m_uuids; ///< an event that becomes a dead letter is read twice
+    std::unordered_set<std::string> m_uuids; ///< an event that becomes a dead letter is read twice, kept once
     std::map<std::string, std::int64_t> m_before;
     std::map<std::string, std::int64_t> m_stored;
-    std::map<std::string, std::int64_t> m_counted; ///< of those since the first reading
+    std::map<std::string, std::int64_t> m_counted; ///< events since the first reading whose report is known
 };
 
 } // namespace reportctl::outbox

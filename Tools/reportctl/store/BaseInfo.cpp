@@ -12,8 +12,8 @@
 namespace reportctl::store {
 namespace {
 
-/// The service puts these texts into its statements without escaping them, and the database then refuses
-/// every report. What the suite uses as an id is its own affair, so this is no error here.
+/// Warns of a single quote: the service puts these texts into its statements without escaping them, so the
+/// database would refuse every report. It is a warning and no error, because the suite chooses its ids.
 void WarnOfQuotes(const terminal::Worklog& log, const std::string& text) {
     if (text.find('\'') != std::string::npos)
         log.Warn(fmt::format("\"{}\" holds a single quote: the service will not be able to store any report "
@@ -31,7 +31,7 @@ bool HasBaseInfo(SQLite::Database& database, const std::string& key, const std::
     return query.getColumn(0).getInt() > 0 && query.getColumn(0).getInt() == query.getColumn(1).getInt();
 }
 
-/// All rows of the key, where others left several: the service would take the last.
+/// Updates all rows of the key: other programs may have left several, and the service takes the last of them.
 void WriteBaseInfo(SQLite::Database& database, const std::string& key, const std::string& value) {
     SQLite::Transaction transaction(database, SQLite::TransactionBehavior::IMMEDIATE);
     SQLite::Statement update(database, "update BaseInfo set value = ? where key = ?");

@@ -14,7 +14,8 @@ namespace {
 
 constexpr int PAGES_AT_ONCE = 2048;
 
-/// What the check says, "ok" when the database is sound; its first words are enough for a message.
+/// The result of SQLite's check: "ok" when the database is sound, else the first fault, which is enough for a
+/// message.
 std::string CheckOf(SQLite::Database& database) {
     return database.execAndGet("pragma integrity_check(1)").getString();
 }
@@ -24,8 +25,8 @@ std::string CheckOf(SQLite::Database& database) {
 void CopyDatabase(const std::string& from, const std::string& to,
                   const std::function<void(int done, int total)>& progress) {
     auto source = OpenToRead(from);
-    // One read that lasts as long as the copy: without it, SQLite would begin the copy again after each write
-    // of the service, and never end it.
+    // This read transaction lasts as long as the copying. Without it, SQLite would begin the copy again after
+    // each write of the service and might never finish.
     source.exec("begin");
     source.execAndGet("select count(*) from sqlite_master");
     SQLite::Database copy(to, SQLite::OPEN_READWRITE | SQLite::OPEN_CREATE);

@@ -4,13 +4,13 @@
 
 namespace reportctl::store {
 
-/// The store of this user's service, whether it is there or not.
+/// The path of the store of this user's service. The file need not exist.
 std::string StorePath();
 
-/// The outbox that all modules share which name no directory of their own.
+/// The path of the service's own outbox. All modules that name no directory of their own share it.
 std::string OutboxPath();
 
-/// The ledger of this user's service.
+/// The path of the ledger of this user's service.
 std::string LedgerPath();
 
 } // namespace reportctl::store

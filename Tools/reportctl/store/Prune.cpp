@@ -16,7 +16,7 @@ namespace {
 
 using Clock = std::chrono::steady_clock;
 
-/// What SQLite calls a store whose free pages can be given back a few at a time.
+/// The value of `pragma auto_vacuum` of a store whose free pages can be given back a few at a time.
 constexpr std::int64_t AUTO_VACUUM_INCREMENTAL = 2;
 
 std::int64_t Ask(SQLite::Database& database, const std::string& query) {
@@ -43,14 +43,14 @@ std::int64_t CountIn(SQLite::Database& database, IdRange range, const ReportFilt
     return rows;
 }
 
-/// The id of the first row that stays when the oldest `removed` go.
+/// The id of the first row that stays when the oldest `removed` rows are deleted.
 std::int64_t IdAfter(SQLite::Database& database, std::int64_t removed) {
     SQLite::Statement query(database, "select id from OperLog order by id limit 1 offset ?");
     query.bind(1, removed);
     return query.executeStep() ? query.getColumn(0).getInt64() : AllIds(database).end;
 }
 
-/// How many of the oldest rows must go so that the others fit, when all are alike.
+/// How many of the oldest rows must be deleted so that the others fit, if all rows have the same size.
 std::int64_t RowsOverSize(SQLite::Database& database, std::int64_t rows, std::int64_t keepBytes) {
     const auto inUse = BytesInUse(database);
     if (inUse <= keepBytes || rows == 0)
@@ -59,8 +59,8 @@ std::int64_t RowsOverSize(SQLite::Database& database, std::int64_t rows, std::in
     return std::clamp(static_cast<std::int64_t>(part * double(rows)) + 1, std::int64_t{1}, rows);
 }
 
-/// Runs `work` in a transaction of its own and then leaves the lock alone for as long as it was held. Returns
-/// how long that was.
+/// Runs `work` in a transaction of its own. Then sleeps without the lock for as long as the lock was held, so
+/// that the service gets its turn. Returns that time.
 Clock::duration InTurn(SQLite::Database& database, const std::function<void()>& work) {
     SQLite::Transaction transaction(database, SQLite::TransactionBehavior::IMMEDIATE);
     const auto begin = Clock::now();
@@ -71,8 +71,8 @@ Clock::duration InTurn(SQLite::Database& database, const std::function<void()>& 
     return held;
 }
 
-/// The size of the next batch by how long the last one took: towards the time that one may take, in steps of
-/// at most two.
+/// The size of the next batch. It moves towards the size that takes the allowed time; one step at most
+/// doubles or halves the last size.
 std::int64_t NextBatch(std::int64_t last, Clock::duration took, const PruneSettings& settings) {
     const auto allowed = std::chrono::milliseconds(settings.batchMs);
     const double factor =
@@ -112,10 +112,12 @@ public:
     }
 
 private:
-    /// By size, it ends when the rest fits, also when the estimate was wrong.
+    /// With keepBytes, the deletion ends as soon as the other rows fit, because the plan was only an
+    /// estimate.
     bool IsEnough() { return m_rule.keepBytes && BytesInUse(m_database) <= *m_rule.keepBytes; }
 
-    /// No more than has to go, when all that are left are alike.
+    /// The most ids that the next batch may take. With keepBytes, no more than are too many if all rows have
+    /// the same size.
     std::int64_t MostFrom(IdRange left) {
         const auto ids = left.end - left.first;
         return m_rule.keepBytes ? RowsOverSize(m_database, ids, *m_rule.keepBytes) : ids;
@@ -128,7 +130,7 @@ private:
     SQLite::Statement m_delete;
 };
 
-/// Moves pages from the file's end into free ones, a few at a time, and cuts the file.
+/// Moves pages from the file's end into free pages, a few at a time, and so makes the file shorter.
 void GiveSpaceBack(SQLite::Database& database, const PruneSettings& settings) {
     std::int64_t pages = 16;
     while (Ask(database, "pragma freelist_count") > 0) {
@@ -136,14 +138,14 @@ void GiveSpaceBack(SQLite::Database& database, const PruneSettings& settings) {
         const auto took =
             InTurn(database, [&] { database.exec(fmt::format("pragma incremental_vacuum({})", pages)); });
         if (Ask(database, "pragma freelist_count") >= before)
-            return; // other programs free pages as fast
+            return; // other programs free pages as fast as we give them back
         pages = NextBatch(pages, took, settings);
     }
 }
 
-/// Merges the write-ahead log, which cuts the file. That takes a moment in which no other program writes:
-/// without one, the service's own next merge does it. A checkpoint that waits for the writers would keep them
-/// waiting for the disk.
+/// Merges the write-ahead log into the file, which makes the file shorter. It needs a moment in which no
+/// other program uses the log. When there is none, the service's next merge does the rest. We do not use a
+/// checkpoint that waits for the writers: it would make other writers wait for the disk.
 void MergeLog(SQLite::Database& database) {
     constexpr auto PATIENCE = std::chrono::seconds(2);
     constexpr auto BETWEEN_TRIES = std::chrono::milliseconds(20);
@@ -166,7 +168,7 @@ PrunePlan PlanPrune(SQLite::Database& database, const PruneRule& rule) {
             CountIn(database, ids, {.sinceMs = {}, .untilMs = rule.olderThanMs, .eventPrefix = {}});
         return plan;
     }
-    if (rule.keepBytes) { // how far it goes shows on the way
+    if (rule.keepBytes) { // endId stays the end: only the deletion itself shows how many rows must be deleted
         plan.removed = RowsOverSize(database, plan.rows, *rule.keepBytes);
         return plan;
     }

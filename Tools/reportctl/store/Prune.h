@@ -8,49 +8,52 @@
 
 namespace reportctl::store {
 
-/// What may go. One of the three is set.
+/// Which rows are deleted. Exactly one of the three is set.
 struct PruneRule {
-    std::optional<std::int64_t> olderThanMs; ///< rows whose time is before this, in milliseconds since 1970
-    std::optional<std::int64_t> keepRows;    ///< all but the newest so many rows, by their ids
-    std::optional<std::int64_t>
-        keepBytes; ///< the oldest rows, by their ids, until the others take so many bytes
+    /// Delete the rows whose time is before this, in milliseconds since 1970.
+    std::optional<std::int64_t> olderThanMs;
+    /// Keep so many rows, the newest by their ids, and delete all others.
+    std::optional<std::int64_t> keepRows;
+    /// Delete the oldest rows, by their ids, until the others need no more than so many bytes.
+    std::optional<std::int64_t> keepBytes;
 };
 
-/// What a rule means for a store as it is now.
+/// The effect of a rule on a store as it is now.
 struct PrunePlan {
-    std::int64_t rows = 0;    ///< that the store has
-    std::int64_t removed = 0; ///< that would go; an estimate by the mean row for PruneRule::keepBytes
+    std::int64_t rows = 0;    ///< how many rows the store has
+    std::int64_t removed = 0; ///< how many rows would be deleted; for keepBytes an estimate by the mean row
     std::int64_t endId = 0;   ///< rows with this id or a greater one stay
 };
 
-/// How much the service may be kept waiting, and how much memory and disk one step may take.
+/// The limits of one step: how long the service may have to wait, and how much memory and disk it may need.
 struct PruneSettings {
-    /// A transaction holds the write lock; the service's statements wait meanwhile. Its own groups hold the
-    /// lock for 10 ms.
+    /// The time that a transaction shall take, in milliseconds. It holds the write lock, and the service's
+    /// statements wait for it. For comparison: the service's own groups hold the lock for 10 ms.
     std::int64_t batchMs = 5;
-    /// Rows of the first batch. The next ones are as large as their time allows.
+    /// How many rows the first batch has. Each further batch is made as large as batchMs allows.
     std::int64_t firstBatch = 200;
     std::int64_t largestBatch = 20'000;
 };
 
-/// What was done.
+/// What Prune did.
 struct PruneResult {
     std::int64_t removed = 0;
-    std::int64_t bytesBefore = 0; ///< of Report.db
-    std::int64_t bytesAfter =
-        0; ///< Once the write-ahead log is merged, which a busy service may do a little later.
-    bool canShrink = true; ///< false: the file keeps its size, and the space is used by the rows to come
+    std::int64_t bytesBefore = 0; ///< the size of Report.db before
+    /// The size of Report.db after the write-ahead log is merged. With a busy service, that may be a little
+    /// later.
+    std::int64_t bytesAfter = 0;
+    bool canShrink = true; ///< false: the file keeps its size, and later rows use the free space in it
 };
 
-/// Reads the whole store, in pieces; changes nothing.
+/// Finds out the effect of a rule. Reads the whole store and changes nothing.
 PrunePlan PlanPrune(SQLite::Database& database, const PruneRule& rule);
 
-/// Deletes the rows of the plan in short transactions and gives the space back in further ones. Between two
-/// of them the lock is free for as long as it was held. `progress` is called with the ids that are done and
-/// the ids there are.
+/// Deletes the rows of the plan in short transactions, and gives the space back to the disk in further short
+/// transactions. After each transaction, the lock is free for as long as it was held. `progress` is called
+/// with the number of ids that are done and the number of all ids.
 ///
-/// After a failure or a kill, what was committed stays done and the store is sound; doing it again does the
-/// rest.
+/// After a failure or a kill, the transactions that were committed stay done, and the store is sound. Calling
+/// it again does the rest.
 PruneResult Prune(SQLite::Database& database, const PruneRule& rule, const PrunePlan& plan,
                   const PruneSettings& settings,
                   const std::function<void(std::int64_t done, std::int64_t total)>& progress);

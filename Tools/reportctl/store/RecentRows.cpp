@@ -9,14 +9,14 @@
 namespace reportctl::store {
 namespace {
 
-/// Rows that no line of the log speaks of must not fill the memory of a command that runs for days.
+/// Rows that never match a line of the log must not fill the memory of a command that runs for days.
 constexpr std::size_t MAX_ROWS_KEPT = 1'000'000;
 
 std::string KeyOf(const RowContent& content) {
     return content.eventID + '\0' + content.value + '\0' + content.createTime;
 }
 
-/// The service puts texts into its SQL as they are, where two quotes stand for one.
+/// The text as the row has it: the service puts it unchanged into its SQL, where two quotes mean one quote.
 std::string AsStored(const std::string& text) {
     std::string stored;
     for (std::size_t at = 0; at < text.size(); ++at) {
@@ -38,7 +38,7 @@ void RecentRows::ReadNew(std::int64_t before) {
     const auto last = LastId(database);
     if (m_lastId < 0)
         m_lastId = std::max<std::int64_t>(last - before, 0);
-    if (last < m_lastId) // another store is in its place
+    if (last < m_lastId) // the file was replaced by another store
         m_lastId = 0;
     SQLite::Statement rows(
         database,

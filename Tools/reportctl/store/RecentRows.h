@@ -7,26 +7,26 @@
 
 namespace reportctl::store {
 
-/// What a report's row holds of the report.
+/// The part of a report that its row in the store holds.
 struct RowContent {
     std::string eventID;
     std::string value;
     std::string createTime;
 };
 
-/// The youngest rows of the store, to be found by their content. A row is found once, so that two equal
-/// reports need two.
+/// Finds the newest rows of the store by their content. Each row is found once only, so two equal reports
+/// need two rows.
 ///
 /// One thread. Failure: ReadNew throws SQLite::Exception, and std::runtime_error when the store is missing.
 class RecentRows {
 public:
     explicit RecentRows(std::string path) : m_path(std::move(path)) {}
 
-    /// Reads the rows that came since; the first time, the last `before` rows.
+    /// Reads the rows that were added since the last call. The first call reads the last `before` rows.
     void ReadNew(std::int64_t before);
 
-    /// The id of the row that the service makes of this report, which is then taken away; 0 when there is
-    /// none.
+    /// Finds the row that the service makes of this report, and removes it from this object. Returns the
+    /// row's id, or 0 when there is no such row.
     std::int64_t Take(const RowContent& report);
 
 private:

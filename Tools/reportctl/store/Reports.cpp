@@ -5,8 +5,8 @@
 namespace reportctl::store {
 
 std::string TimeOf(const std::string& createTime) {
-    // To compare a text with a cast number is SQLite's own way to ask whether the text is a number: it turns
-    // a well-formed number into one, and leaves any other text a text, which equals no number.
+    // The comparison asks whether the text is a number. SQLite compares the text with a cast number, and for
+    // that it turns a well-formed text into a number. Any other text stays a text and equals no number.
     return fmt::format("case when {0} = cast({0} as numeric) and cast({0} as numeric) "
                        "between -62167219200000 and 253402300799999 then cast({0} as numeric) end",
                        createTime);

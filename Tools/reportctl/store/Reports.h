@@ -6,30 +6,31 @@
 
 #include <SQLiteCpp/Statement.h>
 
-/// The rows of the store as an analyst wants them. One statement says what the columns mean; the view
-/// `reports` of the store and the commands that read rows use the same text.
+/// The rows of the store with the columns that an analyst needs. The view `reports` of the store and the
+/// commands that read rows use the same SELECT, so the columns mean the same everywhere.
 namespace reportctl::store {
 
-/// SQL for the time of a row, in milliseconds since 1970, by the column or expression `createTime` that holds
-/// it as a text; NULL when that is no number, or no date between the years 0 and 9999. Such a row matches no
-/// bound on time.
+/// The SQL expression for a row's time in milliseconds since 1970. `createTime` is the column or expression
+/// that holds the time as a text. The result is NULL when the text is not a number, or not a date between the
+/// years 0 and 9999. A row with NULL matches no bound on time.
 std::string TimeOf(const std::string& createTime);
 
-/// `select` of all rows with the columns id, at, at_local, event, module, action, value, value_json, openid,
-/// suite_version, create_time and time. docs/Database.md tells what they mean.
+/// The SELECT of all rows with the columns id, at, at_local, event, module, action, value, value_json,
+/// openid, suite_version, create_time and time. docs/Database.md explains them.
 const std::string& ReportsSelect();
 
-/// The statement that makes the view `reports` of the first ten of these columns, to the letter as SQLite
-/// keeps it.
+/// The statement that makes the view `reports` of the first ten of these columns. Each letter is as SQLite
+/// keeps it, because set-up compares this text with the view that is there.
 const std::string& ReportsView();
 
-/// Which rows a command is about. A bound on time is in milliseconds since 1970.
+/// Which rows a command reads. A bound on time is in milliseconds since 1970.
 struct ReportFilter {
-    std::optional<std::int64_t> sinceMs; ///< the first moment that counts
-    std::optional<std::int64_t> untilMs; ///< the first moment that does not count any more
-    std::string eventPrefix;             ///< empty: every event
+    std::optional<std::int64_t> sinceMs; ///< the first moment that is included
+    std::optional<std::int64_t> untilMs; ///< the first moment that is no longer included
+    std::string eventPrefix;             ///< the beginning of the event ids; empty for every event
 
-    /// For `where`, with the parameters :since, :until and :prefix; "1" when nothing is asked for.
+    /// The condition for a WHERE clause, with the parameters :since, :until and :prefix; "1" when every row
+    /// matches.
     std::string Condition() const;
 
     void BindTo(SQLite::Statement& statement) const;

@@ -12,7 +12,7 @@
 namespace reportctl::store {
 namespace {
 
-/// The text as UTF-8. The service stores nothing else, but other programs may write into the store.
+/// The text as valid UTF-8. The service stores only valid UTF-8, but other programs may write into the store.
 class Utf8 {
 public:
     explicit Utf8(std::string_view text) : m_text(text) {
@@ -49,8 +49,8 @@ void WriteText(Writer& writer, const char* name, const ReportRow::Text& text) {
     writer.String(utf8.Text().data(), static_cast<rapidjson::SizeType>(utf8.Text().size()));
 }
 
-/// The JSON as it is, but on one line: a line's end is white space between the tokens, and cannot be inside
-/// one.
+/// Writes the JSON unchanged, but on one line. A line's end can become a space, because in valid JSON it is
+/// always white space between tokens.
 void WriteJson(Writer& writer, const char* name, std::string_view json) {
     writer.Key(name);
     std::string line(Utf8(json).Text());

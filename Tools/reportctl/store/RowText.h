@@ -8,7 +8,7 @@
 /// A row of the store as a line of text.
 namespace reportctl::store {
 
-/// What an export holds of a row. A text that the store does not have is nullopt.
+/// The columns of a row that an export has. A text that is NULL in the store is nullopt.
 struct ReportRow {
     using Text = std::optional<std::string_view>;
 
@@ -27,12 +27,14 @@ struct ReportRow {
 inline constexpr std::string_view CSV_HEADER =
     "id,at,event,module,action,value,openid,suite_version,create_time\n";
 
-/// Appends a line by RFC 4180, but for the line's end, which is a line feed: a field with a comma, a quote or
-/// a line's end is in quotes. NULL is an empty field, an empty text is "". What is no UTF-8 becomes U+FFFD.
+/// Appends the row as a line of CSV by RFC 4180, with one exception: the line ends with a line feed alone. A
+/// field with a comma, a quote or a line's end is put in quotes. NULL becomes an empty field, an empty text
+/// becomes "". Bytes that are not UTF-8 become U+FFFD.
 void AppendCsv(std::string& out, const ReportRow& row);
 
-/// Appends one JSON object with the names of CSV_HEADER, and a line feed. A value that is an object or an
-/// array stands as such, everything else but the id is a string or null. What is no UTF-8 becomes U+FFFD.
+/// Appends the row as a JSON object with the names of CSV_HEADER, and a line feed. The id is a number. A
+/// value that is an object or an array is written as JSON. All other members are strings or null. Bytes that
+/// are not UTF-8 become U+FFFD.
 void AppendJsonLine(std::string& out, const ReportRow& row);
 
 } // namespace reportctl::store

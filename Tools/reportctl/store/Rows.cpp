@@ -7,7 +7,7 @@
 namespace reportctl::store {
 
 IdRange AllIds(SQLite::Database& database) {
-    // Two statements: SQLite finds one end of an index at once, and scans the table for both together.
+    // Two inner selects: SQLite finds min or max alone at once, but scans the table for both in one select.
     SQLite::Statement query(database,
                             "select (select min(id) from OperLog), (select max(id) from OperLog) + 1");
     query.executeStep();

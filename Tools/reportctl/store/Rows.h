@@ -11,22 +11,23 @@
 
 namespace reportctl::store {
 
-/// The range of ids that rows may have: from `first` on, `end` excluded.
+/// A range of row ids: from `first` to before `end`.
 struct IdRange {
     std::int64_t first = 0;
     std::int64_t end = 0;
 };
 
-/// From the first id to the last one that the store has now; an empty range without rows. No scan.
+/// The range from the first to the last id that the store has now; empty when there are no rows. It reads the
+/// two ends only and does not scan the table.
 IdRange AllIds(SQLite::Database& database);
 
-/// Calls `visit` with each piece of `range`, in order, each of at most `idsAtOnce` ids.
+/// Divides `range` into pieces of at most `idsAtOnce` ids and calls `visit` with each of them, in order.
 ///
-/// A reader keeps SQLite from giving the write-ahead log's space back, so a command that reads the whole
-/// store reads it in pieces: each statement is over after some milliseconds.
+/// While a statement reads, SQLite cannot use the write-ahead log's space again. So a command that reads the
+/// whole store reads it in pieces, and each statement ends after some milliseconds.
 void InPieces(IdRange range, std::int64_t idsAtOnce, const std::function<void(IdRange)>& visit);
 
-/// The pieces in which a command reads. 50,000 rows are read in about 0.1 s.
+/// The size of the pieces in which a command reads. It takes about 0.1 s to read 50,000 rows.
 inline constexpr std::int64_t IDS_AT_ONCE = 50'000;
 
 /// A statement over the rows of ReportsSelect:
@@ -34,7 +35,7 @@ inline constexpr std::int64_t IDS_AT_ONCE = 50'000;
 SQLite::Statement SelectReports(SQLite::Database& database, const std::string& columns,
                                 const ReportFilter& filter, const std::string& rest);
 
-/// Prepares that statement for a piece: resets it and binds its ids.
+/// Prepares a statement of SelectReports for a piece: resets the statement and binds the piece's ids.
 void BindPiece(SQLite::Statement& statement, IdRange piece);
 
 } // namespace reportctl::store

@@ -16,7 +16,7 @@ namespace {
 
 struct Column {
     std::string name;
-    std::string type; ///< as it stands in the table's definition
+    std::string type; ///< as the table's definition writes it
     bool isKey = false;
 };
 using Columns = std::vector<Column>;
@@ -26,7 +26,7 @@ struct Table {
     Columns columns;
 };
 
-/// One row per stored report.
+/// The table that has one row for each stored report.
 const Table OPER_LOG{"OperLog",
                      {{"id", "INTEGER", true},
                       {"eventID", "TEXT"},
@@ -38,8 +38,8 @@ const Table OPER_LOG{"OperLog",
                       {"extData3", "TEXT"},
                       {"extData4", "TEXT"}}};
 
-/// Keys are not unique on purpose: the service takes the last row of a key, so another program of the suite
-/// may append where it does not want to update.
+/// The keys are not unique, deliberately. The service takes the last row of a key, so another program of the
+/// suite may append a row instead of updating one.
 const Table BASE_INFO{"BaseInfo", {{"key", "TEXT"}, {"value", "TEXT"}}};
 
 std::string Quoted(const std::string& name) {
@@ -75,7 +75,7 @@ Columns ColumnsIn(SQLite::Database& database, const std::string& table) {
     return columns;
 }
 
-/// Names of columns do not distinguish case in SQL.
+/// Finds a column by its name. In SQL, upper and lower case are the same in column names.
 const Column* Find(const Columns& columns, const std::string& name) {
     const auto found = std::find_if(columns.begin(), columns.end(), [&](const Column& column) {
         return sqlite3_stricmp(column.name.c_str(), name.c_str()) == 0;
@@ -83,8 +83,9 @@ const Column* Find(const Columns& columns, const std::string& name) {
     return found == columns.end() ? nullptr : &*found;
 }
 
-/// A key cannot be added to a table that exists, so its rows move into a new one, with every column that they
-/// have; their row numbers become the key, which keeps their order.
+/// Appends the statements that move the rows into a new table with a key, because SQLite cannot add a key to
+/// a table that exists. The rows keep all their columns. Their row numbers become the key, which keeps their
+/// order.
 void AppendRebuild(std::vector<std::string>& statements, const Table& table, const Columns& present) {
     Columns all = table.columns;
     for (const auto& column : present)
@@ -120,7 +121,7 @@ void AppendTable(std::vector<std::string>& statements, SQLite::Database& databas
         AppendMissingColumns(statements, table, present);
 }
 
-/// The text that SQLite keeps of the view's definition; empty without one.
+/// The definition of the view `reports` as SQLite keeps it; empty when there is no such view.
 std::string ViewIn(SQLite::Database& database) {
     SQLite::Statement query(database,
                             "select type, sql from sqlite_master where name = 'reports' collate nocase");
@@ -131,8 +132,8 @@ std::string ViewIn(SQLite::Database& database) {
     return query.getColumn(1);
 }
 
-/// The view is made anew around every change of a table: renaming one would have SQLite change the view's
-/// text.
+/// Puts statements around the others that drop the view and make it again. Otherwise SQLite would change the
+/// view's text when a table is renamed.
 void WrapInView(std::vector<std::string>& statements, SQLite::Database& database) {
     const auto present = ViewIn(database);
     if (statements.empty() && present == ReportsView())

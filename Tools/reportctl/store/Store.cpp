@@ -29,16 +29,18 @@ namespace fs = std::filesystem;
 
 constexpr auto PRIVATE_FILE = fs::perms::owner_read | fs::perms::owner_write;
 
-/// A running service holds the write lock for moments; a person can wait for five seconds, not for ever.
+/// A running service holds the write lock only for moments. A person can wait for five seconds, but not
+/// without an end.
 constexpr int BUSY_TIMEOUT_MS = 5000;
 
-/// What `pragma auto_vacuum` says of a store whose free pages can be given back a few at a time.
+/// The value of `pragma auto_vacuum` of a store whose free pages can be given back a few at a time.
 constexpr int AUTO_VACUUM_INCREMENTAL = 2;
 
-/// Rewritten in less than a second.
+/// A store of this size is rewritten in less than a second.
 constexpr std::uintmax_t MAX_BYTES_TO_REWRITE_UNASKED = std::uintmax_t{64} * 1024 * 1024;
 
-/// A new, private, empty file beside the one that it is for. Gone, with SQLite's files beside it, at the end.
+/// A new, private, empty file in the directory of `path`. The destructor removes it and the files that SQLite
+/// made beside it.
 class DraftFile {
 public:
     explicit DraftFile(const std::string& path) : m_path(path + ".new-XXXXXX") {
@@ -63,7 +65,7 @@ private:
     std::string m_path;
 };
 
-/// A path beside the store's at which there is nothing, nor anything that would be taken for its side file.
+/// A path beside the store that no file has, and whose side files do not exist either.
 std::string FreeName(const std::string& path) {
     const auto isTaken = [](const std::string& name) {
         return fs::exists(name) ||
@@ -75,10 +77,10 @@ std::string FreeName(const std::string& path) {
             return name;
 }
 
-/// Side files without their database: what a lost one left behind, or what a service that still has the
-/// deleted one open goes on writing. SQLite would read the new database through them and damage it. They may
-/// hold the newest rows, so they are kept, all under one new name: with their database beside them under that
-/// name, SQLite reads them again.
+/// Renames side files whose database is gone. Either a lost database left them, or a service that still has
+/// the deleted database open writes them. SQLite would use them with the new database and damage it. They may
+/// hold the newest rows, so they are kept, all under one new name: when their database gets that name, too,
+/// SQLite reads them again. Returns false when a file could not be renamed.
 bool MoveOrphanedSideFilesAway(terminal::Worklog& log, const std::string& path) {
     const auto name = FreeName(path);
     bool areAway = true;
@@ -95,11 +97,11 @@ void CreateStore(const std::string& path) {
     const DraftFile draft(path);
     {
         auto database = OpenStore(draft.Path());
-        database.exec("pragma auto_vacuum = incremental"); // holds when it comes before everything else
+        database.exec("pragma auto_vacuum = incremental"); // has an effect only before all other statements
         database.exec("pragma journal_mode = wal");
         RunInTransaction(database, StatementsToCurrentSchema(database));
     }
-    fs::create_hard_link(draft.Path(), path); // fails rather than replacing one that has appeared
+    fs::create_hard_link(draft.Path(), path); // fails when a store has appeared, and so never replaces it
 }
 
 bool EnsureNewStore(terminal::Worklog& log, const std::string& path) {
@@ -158,9 +160,8 @@ bool CanShrink(const std::string& path) {
     return OpenStoreToLook(path).execAndGet("pragma auto_vacuum").getInt() == AUTO_VACUUM_INCREMENTAL;
 }
 
-/// A store of an older set-up keeps the size that it once had. It is rewritten so that `prune` can give space
-/// back: at once when that is short, else when it is asked for, because the service can store nothing
-/// meanwhile.
+/// Rewrites the store of an older set-up, whose file cannot shrink, so that `prune` can give space back. A
+/// large store is rewritten only when `mayTakeLong`, because the service can store nothing meanwhile.
 void EnsureThatItCanShrink(terminal::Worklog& log, const std::string& path, bool mayTakeLong) {
     if (CanShrink(path) || (!mayTakeLong && fs::file_size(path) > MAX_BYTES_TO_REWRITE_UNASKED))
         return;
@@ -174,8 +175,8 @@ void EnsureThatItCanShrink(terminal::Worklog& log, const std::string& path, bool
         "Stop the service and run this again.");
 }
 
-/// The modes are looked at while the store is closed: opening it makes side files of the mode that is about
-/// to be changed.
+/// The modes are checked while the store is closed: opening it would make side files with the mode that the
+/// store has before the change.
 bool EnsureExistingStore(terminal::Worklog& log, const std::string& path, bool compact) {
     if (!EnsureSchema(log, path))
         return false;
@@ -190,7 +191,8 @@ bool IsOwner(const std::string& path) {
     return ::stat(path.c_str(), &file) != 0 || file.st_uid == ::geteuid();
 }
 
-/// What a full disk, and one that may only be read, answer to SQLite when it makes the -wal and the -shm.
+/// Whether SQLite failed because it could not make the -wal and the -shm: on a full disk, or on a disk that
+/// is read-only.
 bool IsForWantOfSideFiles(const SQLite::Exception& error) {
     switch (error.getErrorCode() & 0xff) {
     case SQLITE_IOERR:
@@ -222,7 +224,8 @@ SQLite::Database OpenStoreToLook(const std::string& path) {
     const auto log = path + "-wal";
     const bool hasRows = fs::exists(log) && fs::file_size(log) > 0;
     auto database = OpenStore(path);
-    // Without rows in it the side files go away at the end, as they should: they were made by this opening.
+    // When the log has no rows, SQLite removes the side files at the end. That is right: this opening made
+    // them.
     if (hasRows)
         sqlite3_db_config(database.getHandle(), SQLITE_DBCONFIG_NO_CKPT_ON_CLOSE, 1, nullptr);
     return database;
@@ -234,12 +237,12 @@ SQLite::Database OpenToRead(const std::string& path) {
         return OpenUnchanged(path);
     try {
         auto database = OpenStoreToLook(path);
-        database.execAndGet("pragma schema_version"); // reads, and so makes the side files
+        database.execAndGet("pragma schema_version"); // reads the file, which makes the side files
         return database;
     } catch (const SQLite::Exception& error) {
         if (!IsForWantOfSideFiles(error))
             throw;
-        // No service can write beside this reader then, either.
+        // The service cannot write on such a disk either, so reading without locks is safe.
         return OpenUnchanged(path);
     }
 }

@@ -9,25 +9,29 @@
 
 namespace reportctl::store {
 
-/// Makes sure of the database at `path`: mode 0600, write-ahead log, the tables of the current schema.
+/// Makes the database at `path`, or brings it up to date: mode 0600, write-ahead log, the tables of the
+/// current schema.
 ///
-/// A new one is built under another name and gets its own in one step: no program ever sees half a store, and
-/// one that appears meanwhile is not overwritten. An older schema is migrated, with its rows, in one
-/// transaction. A file that is no database, and a schema that is newer than this program, are left as they
-/// are. Side files without a store, which may hold rows, are renamed; where that fails no new store is made
-/// beside them.
+/// A new store is built under another name and then gets its own name in one step. So no program ever sees
+/// half a store, and a store that appears meanwhile is not overwritten. An older schema is migrated in one
+/// transaction, and its rows stay. A file that is not a database, and a schema that is newer than this
+/// program, are left as they are. Side files without a store may hold rows, so they are renamed. When that
+/// fails, no new store is made beside them.
 ///
-/// A store that an older set-up made, whose file cannot shrink, is rewritten: up to 64 MiB always, a larger
-/// one with `compact`. That takes the disk space of another one meanwhile, and the service waits.
+/// The file of a store that an older set-up made may not be able to shrink. Such a store is rewritten: always
+/// up to 64 MiB, a larger one only with `compact`. Meanwhile it needs its size on the disk again, and the
+/// service waits.
 ///
-/// False when there is no store to go on with; the log has the reason. True in a dry run that would make it.
+/// Returns false when there is no usable store; `log` has printed the reason. Returns true when a dry run
+/// would make it.
 bool EnsureStore(terminal::Worklog& log, const std::string& path, bool compact);
 
-/// Throws std::runtime_error, with what to do about it, when there is no store at the path, or the user may
-/// not see it.
+/// Throws std::runtime_error when there is no store at the path, with the command that makes it, or when this
+/// user may not see the path.
 void RequireStore(const std::string& path);
 
-/// Does the work, and puts the name of the database before the words of SQLite, which name none.
+/// Runs `work`. When SQLite reports an error, the path of the database is put before its text, because
+/// SQLite's texts name no file.
 template <typename Work>
 auto Naming(const std::string& path, const Work& work) {
     try {
@@ -37,17 +41,19 @@ auto Naming(const std::string& path, const Work& work) {
     }
 }
 
-/// Opens the database that is there, never makes one. Throws std::runtime_error, with what to do about it,
-/// when it is missing, and SQLite::Exception.
+/// Opens the database for reading and writing. Never makes one. Throws what RequireStore throws, and
+/// SQLite::Exception.
 SQLite::Database OpenStore(const std::string& path);
 
-/// The same for a look at it: rows that a killed service left in the write-ahead log stay there when this is
-/// closed. Otherwise the last one to close the store merges them into Report.db, and that would be a change.
+/// Opens the database as OpenStore does, but for reading: rows that a killed service left in the write-ahead
+/// log stay there when the database is closed. Otherwise the last process that closes the store merges them
+/// into Report.db, and that would be a change.
 SQLite::Database OpenStoreToLook(const std::string& path);
 
-/// For commands that read much. The owner reads with SQLite's own locks, so that a long read is sound beside
-/// any writer. Another user, an administrator, reads as OpenUnchanged does, and leaves no file that the owner
-/// could not use.
+/// Opens the database for commands that read much. The owner reads with SQLite's locks, so that a long read
+/// is correct beside any writer. Another user, such as an administrator, reads as OpenUnchanged does, and so
+/// leaves no file that the owner could not use. The owner reads like that, too, when the disk is full or
+/// read-only.
 SQLite::Database OpenToRead(const std::string& path);
 
 } // namespace reportctl::store

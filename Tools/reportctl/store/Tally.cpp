@@ -12,14 +12,15 @@
 namespace reportctl::store {
 namespace {
 
-/// Every time zone is a multiple of this from UTC, so an hour and a day of any zone is made of whole ones.
+/// The offset of every time zone from UTC is a multiple of this. So an hour or a day of any zone consists of
+/// whole quarter-hours.
 constexpr std::int64_t QUARTER_HOUR_MS = 15LL * 60 * 1000;
 constexpr std::int64_t QUARTER_HOUR_S = QUARTER_HOUR_MS / 1000;
 
-/// Rows are counted fast, so one statement may take more of them than where each row is written out.
+/// Counting a row is faster than writing it out, so one statement may take more rows.
 constexpr std::int64_t IDS_AT_ONCE_TO_COUNT = 4 * IDS_AT_ONCE;
 
-/// The events of an outbox with the columns that the rows of ReportsSelect have.
+/// Selects the events of an outbox with columns that have the same names as those of ReportsSelect.
 std::string EventsSelect() {
     return fmt::format(R"sql(select event_id as event,
     case when instr(event_id, '|') then substr(event_id, 1, instr(event_id, '|') - 1) end as module,
@@ -35,7 +36,7 @@ bool IsByTime(Grouping grouping) {
     return grouping == Grouping::Hour || grouping == Grouping::Day;
 }
 
-/// Division that rounds down, for times before 1970, too.
+/// The SQL for the key. A time is divided with rounding down, so that times before 1970 are right, too.
 std::string KeyColumn(Grouping grouping) {
     if (IsByTime(grouping))
         return fmt::format("(cast(time as integer) - ((cast(time as integer) % {0}) + {0}) % {0}) / {0}",
@@ -52,7 +53,7 @@ std::tm WallClock(std::time_t time, Zone zone) {
     return wall;
 }
 
-/// Such as 2026-11-21T14:00+01:00, or 2026-11-21.
+/// The key of an hour, such as 2026-11-21T14:00+01:00, or of a day, such as 2026-11-21.
 std::string TimeKey(std::int64_t quarterHour, Grouping grouping, Zone zone) {
     const auto wall = WallClock(quarterHour * QUARTER_HOUR_S, zone);
     if (grouping == Grouping::Day)

@@ -12,13 +12,13 @@
 
 namespace reportctl::store {
 
-/// What rows and events are counted by.
+/// By which key rows and events are counted.
 enum class Grouping { Hour, Day, Event, Module };
 
-/// Counts by key. A row that has none (no time, no bar in its event id) is under nullopt.
+/// Counts by key. A row without a key (it has no time, or no bar in its event id) counts under nullopt.
 using Tally = std::map<std::optional<std::string>, std::int64_t>;
 
-/// A key and its count, in the order in which a person reads them.
+/// A key and its count.
 struct Count {
     std::optional<std::string> key;
     std::int64_t count = 0;
@@ -26,27 +26,28 @@ struct Count {
     bool operator==(const Count&) const = default;
 };
 
-/// Where a day or an hour begins: in local time, or in UTC.
+/// In which time a day or an hour begins: in local time, or in UTC.
 enum class Zone { Local, Utc };
 
-/// Adds the rows of the store, in pieces (see InPieces).
+/// Counts the rows of the store into `tally`. Reads in pieces (see InPieces).
 void CountRows(SQLite::Database& database, Grouping grouping, const ReportFilter& filter, Zone zone,
                Tally& tally);
 
-/// Rows by the number of their quarter-hour since 1970. A reader in any time zone can add them up to hours
-/// and days.
+/// Numbers of rows by quarter-hour; a key is the number of the quarter-hour since 1970. A reader in any time
+/// zone can sum them to hours and days.
 using QuarterHours = std::map<std::int64_t, std::int64_t>;
 
-/// Counts the rows that have a time, in pieces.
+/// Counts the rows that have a time. Reads in pieces (see InPieces).
 QuarterHours CountByQuarterHour(SQLite::Database& database, const ReportFilter& filter);
 
-/// Adds the events of an outbox: those that wait, and its dead letters. Their time is what the sender gave
-/// them, else when they were stored, as a collector is told it.
+/// Counts the events of an outbox into `tally`: the waiting events and the dead letters. An event's time is
+/// the one that the sender gave it, else the time when it was stored. A collector gets the same time.
 void CountEvents(SQLite::Database& database, Grouping grouping, const ReportFilter& filter, Zone zone,
                  Tally& tally);
 
-/// Times in their order; everything else from the most frequent to the least. What has no key comes last. At
-/// most `top` of them, the most frequent ones, when that is not 0.
+/// The counts in the order in which a person reads them: hours and days by time, other keys from the most
+/// frequent to the least. The count without a key comes last. Unless `top` is 0, only the `top` most frequent
+/// ones are returned.
 std::vector<Count> Ranked(const Tally& tally, Grouping grouping, std::size_t top);
 
 } // namespace reportctl::store

@@ -7,9 +7,10 @@
 namespace reportctl::store {
 namespace {
 
-constexpr int BUSY_TIMEOUT_MS = 20; // a look must be quick; a writer in WAL mode makes no reader wait
+constexpr int BUSY_TIMEOUT_MS = 20; // reading must be quick; in WAL mode, a writer makes no reader wait
 
-/// The path in a URI, in which "?", "#" and "%" mean something.
+/// The path as a URI with parameters. The characters "?", "#" and "%" have a meaning there, so they are
+/// escaped.
 std::string UriOf(const std::string& path, const char* parameters) {
     static constexpr std::string_view DIGITS = "0123456789ABCDEF";
     std::string uri = "file:";
@@ -30,7 +31,8 @@ SQLite::Database OpenUnchanged(const std::string& path) {
     const auto logBytes = std::filesystem::file_size(path + "-wal", error);
     const bool hasLog = !error;
     const bool hasIndex = std::filesystem::exists(path + "-shm", error);
-    // SQLite would make what is missing of the two. Without a log, the database itself is all there is.
+    // SQLite would make a missing -wal or -shm. When there is no log, the database file alone has all rows,
+    // and "immutable" keeps SQLite from making the files.
     const bool isWhole = !hasLog || (logBytes == 0 && !hasIndex);
     SQLite::Database database(UriOf(path, isWhole ? "immutable=1" : "mode=ro&readonly_shm=1"),
                               SQLite::OPEN_READONLY | SQLite::OPEN_URI, BUSY_TIMEOUT_MS);
