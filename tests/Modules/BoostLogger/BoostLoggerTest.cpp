@@ -1,5 +1,5 @@
-// The plug-in through its two exports. The sink is the process's, so each scenario runs in a child and is
-// judged by what it leaves behind.
+// The plug-in, called through its two exports. The whole process has one sink, so each scenario runs in a
+// child process, and the test examines the files that the child leaves.
 
 #include <array>
 #include <cstdio>
@@ -27,7 +27,7 @@ namespace {
 
 class BoostLogger : public testing::Test {
 protected:
-    /// Runs `scenario` in a child whose standard output and error go to the file "output".
+    /// Runs `scenario` in a child process whose standard output and standard error go to the file "output".
     template <typename Scenario>
     void RunInChild(Scenario scenario) {
         ChildProcess child([&] {
@@ -289,7 +289,7 @@ TEST_F(BoostLogger, StaysWithItsDirectoryWhenTheProgramChangesToAnother) {
         if (chdir("/") != 0)
             return false;
         Log(loader, std::string(60, 'x'));
-        Log(loader, std::string(60, 'y')); // rotates, and so opens anew
+        Log(loader, std::string(60, 'y')); // this one rotates, so the file is opened again
         return true;
     });
     EXPECT_EQ(LogFilesOf(m_directory).size(), 2U);

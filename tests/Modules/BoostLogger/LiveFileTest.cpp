@@ -97,7 +97,7 @@ TEST_F(TheLiveFile, SaysWhyADirectoryCouldNotBeMade) {
                MakeDirectory(parent + "/log/metrik").Text() == "cannot make the directory: Permission denied";
     });
     EXPECT_EQ(child.Wait(), 0);
-    chmod(parent.c_str(), 0700); // so that the fixture can remove it
+    chmod(parent.c_str(), 0700); // so that the fixture can remove the directory
 }
 
 TEST_F(TheLiveFile, IsNoLinkAndNoPipeAndNoDirectory) {

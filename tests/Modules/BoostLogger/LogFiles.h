@@ -14,7 +14,7 @@ inline void WriteFile(const std::filesystem::path& path, const std::string& text
     std::ofstream(path, std::ios::binary) << text;
 }
 
-/// The lines of a file, without their newlines; a last line that has none counts too.
+/// The lines of a file, without their newlines. A last line without a newline counts, too.
 inline std::vector<std::string> ReadLines(const std::filesystem::path& path) {
     std::ifstream file(path, std::ios::binary);
     std::vector<std::string> lines;
@@ -23,7 +23,7 @@ inline std::vector<std::string> ReadLines(const std::filesystem::path& path) {
     return lines;
 }
 
-/// The rotated files of Report.log in the order of their numbers, the live file last.
+/// The rotated files of Report.log in the order of their numbers, and the live file as the last.
 inline std::vector<std::filesystem::path> LogFilesOf(const std::filesystem::path& directory) {
     std::vector<std::pair<std::uint64_t, std::filesystem::path>> files;
     for (const auto& entry : std::filesystem::directory_iterator(directory)) {

@@ -19,7 +19,7 @@ using namespace std::chrono_literals;
 
 namespace {
 
-/// What the time says is up to the test; see LogWriter::Append.
+/// The tests choose the time that they give to LogWriter::Append.
 class TheLogWriter : public testing::Test {
 protected:
     LogSettings Settings(std::int64_t maxFileBytes = 1000, std::int64_t maxTotalBytes = 10000) const {
@@ -171,8 +171,8 @@ TEST_F(TheLogWriter, DoesNotRotateAFileThatAnotherProcessHasRotatedAlready) {
     ASSERT_FALSE(other.Start());
     for (int i = 0; i < 10; ++i)
         one.Append(Line(100, 'a'), m_start);
-    other.Append(Line(50, 'b'), m_start); // looks at the file, which is full, and rotates
-    one.Append(Line(50, 'a'), m_start);   // follows
+    other.Append(Line(50, 'b'), m_start); // sees that the file is full, and rotates it
+    one.Append(Line(50, 'a'), m_start);   // opens the new file
     EXPECT_EQ(LogFilesOf(m_directory).size(), 2U);
     EXPECT_EQ(ContentOf(m_path), Line(50, 'b') + Line(50, 'a'));
 }
@@ -219,7 +219,7 @@ TEST_F(TheLogWriter, CountsWhatItCannotWriteAndTellsWhenItRecovers) {
     writer.Append("two\n", m_start + 1s);
     writer.Append("three\n", m_start + 1001ms);
     std::filesystem::remove(m_directory);
-    writer.Append("four\n", m_start + 1249ms); // between two attempts
+    writer.Append("four\n", m_start + 1249ms); // too early for the next attempt
     EXPECT_FALSE(std::filesystem::exists(m_directory));
     writer.Append("five\n", m_start + 1250ms);
     writer.Append("six\n", m_start + 1251ms);
@@ -254,8 +254,8 @@ TEST_F(TheLogWriter, DoesNotGlueALineToTheHalfOfOneThatAFullDiskCutOff) {
             return false;
         writer.Append(Line(100, 'a'), m_start);
         LimitFileSize(150);
-        writer.Append(Line(100, 'b'), m_start + 1s); // fifty bytes of it
-        writer.Append(Line(100, 'c'), m_start + 2s); // nothing
+        writer.Append(Line(100, 'b'), m_start + 1s); // only fifty bytes of it fit
+        writer.Append(Line(100, 'c'), m_start + 2s); // no byte of it fits
         LimitFileSize(RLIM_INFINITY);
         writer.Append(Line(100, 'd'), m_start + 3s);
         return true;
@@ -305,7 +305,7 @@ TEST_F(TheLogWriter, DoesNotHangWhileAnotherProcessHoldsTheRotationLock) {
     ASSERT_FALSE(stopped.Open(m_path));
     ASSERT_FALSE(stopped.Lock());
     for (int i = 0; i < 10000; ++i)
-        writer.Append(Line(100), m_start); // one attempt, 9999 drops
+        writer.Append(Line(100), m_start); // the first line tries, and the other 9999 are dropped
     EXPECT_LT(std::chrono::steady_clock::now() - m_start, 5s);
     EXPECT_EQ(std::filesystem::file_size(m_path), 1000U);
     stopped.Close();
@@ -315,7 +315,7 @@ TEST_F(TheLogWriter, DoesNotHangWhileAnotherProcessHoldsTheRotationLock) {
               std::string::npos);
 }
 
-#if !defined(__SANITIZE_THREAD__) // which keeps signals back until a system call is over
+#if !defined(__SANITIZE_THREAD__) // the thread sanitizer delays signals until a system call has returned
 namespace {
 
 LogWriter* g_interrupted = nullptr;
@@ -332,7 +332,7 @@ TEST_F(TheLogWriter, LosesARecordOfASignalHandlerRatherThanWaitForTheThreadThatI
         if (writer.Start())
             return false;
         g_interrupted = &writer;
-        std::signal(SIGXFSZ, LogFromTheHandler); // comes in the middle of the write
+        std::signal(SIGXFSZ, LogFromTheHandler); // this signal comes in the middle of the write
         LimitFileSize(0);
         writer.Append("one\n", m_start);
         LimitFileSize(RLIM_INFINITY);

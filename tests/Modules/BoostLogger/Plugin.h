@@ -7,7 +7,7 @@
 
 using LoggerLoader = SystemTool::ModuleLoader<SystemTool::IO::ILogger>;
 
-/// The arguments of InitLog, with what the tests do not care about filled in.
+/// The arguments of InitLog. The defaults are for tests to which the value does not matter.
 struct LogArguments {
     std::string directory;
     std::int64_t maxFileBytes = 10 * 1024 * 1024;
@@ -29,7 +29,7 @@ inline void Log(LoggerLoader& loader, const std::string& message, int level = 2)
     Log(loader.GetModule(), message, level);
 }
 
-/// What follows "] " after the site in a line.
+/// The message of a line: the text after the site.
 inline std::string MessageOf(const std::string& line) {
     const std::string site = "[App/ReportServer:42 Recv] ";
     const auto at = line.find(site);

@@ -1,4 +1,4 @@
-// Threads, processes and their ends.
+// The logger with several threads and processes, and at the end of a process.
 
 #include <chrono>
 #include <csignal>
@@ -21,7 +21,7 @@ using namespace std::chrono_literals;
 namespace {
 
 #if defined(__SANITIZE_THREAD__) || defined(__SANITIZE_ADDRESS__)
-constexpr int MANY = 5'000; // the sanitizers make a record ten times as slow
+constexpr int MANY = 5'000; // with a sanitizer, a record takes ten times as long
 #else
 constexpr int MANY = 100'000;
 #endif
@@ -40,7 +40,7 @@ protected:
             Log(logger, name + " " + std::to_string(i));
     }
 
-    /// Expects of each name in the log exactly the numbers from 0 to `count`, in order.
+    /// Expects that the log has, for each name, exactly the numbers from 0 to `count` - 1, in order.
     void ExpectNumbers(const std::vector<std::string>& names, int count) {
         std::map<std::string, int> next;
         for (const auto& line : ReadLog(m_temporary.Path())) {
@@ -58,7 +58,8 @@ protected:
     const std::string m_path = m_temporary.Path() + "/Report.log";
 };
 
-/// What the service does when it crashes: threads log on while exit() runs.
+/// Logs for ever on a thread of its own. When the service crashes, its threads log like this while exit()
+/// runs.
 void LogForEver(SystemTool::IO::ILogger* logger, const char* name) {
     std::thread([logger, name] {
         for (long i = 0;; ++i)
@@ -66,7 +67,7 @@ void LogForEver(SystemTool::IO::ILogger* logger, const char* name) {
     }).detach();
 }
 
-/// Logs when the statics are destroyed: made before the loader, hence destroyed after it.
+/// Logs while the statics are destroyed. It is made before the loader, so it is destroyed after the loader.
 struct LateStatic {
     ~LateStatic() {
         if (logger != nullptr)
@@ -119,9 +120,9 @@ TEST_F(BoostLoggerProcesses, TwoProcessesOnOneLogLoseAndTearNothingWhileBothRota
     ASSERT_EQ(other.Wait(), 0);
     ExpectNumbers({"one", "other"}, COUNT);
     EXPECT_GT(LogFilesOf(m_temporary.Path()).size(), 3U);
+    // Each process may write sixteen records too many.
     for (const auto& path : LogFilesOf(m_temporary.Path()))
-        EXPECT_LE(std::filesystem::file_size(path), 50'000U + 2 * 16 * 100)
-            << path; // sixteen records of each
+        EXPECT_LE(std::filesystem::file_size(path), 50'000U + 2 * 16 * 100) << path;
 }
 
 TEST_F(BoostLoggerProcesses, ASecondInstanceThatIsRefusedLeavesTheLogOfTheFirstAlone) {
@@ -204,7 +205,8 @@ TEST_F(BoostLoggerProcesses, UnloadingTheLastLoaderDoesNotHarmAThreadThatIsLoggi
     ExpectNumbers({"t"}, 20'000);
 }
 
-#if !defined(__SANITIZE_THREAD__) // which reports, rightly, that a logger is nothing for a signal handler
+// The thread sanitizer rightly reports that a signal handler must not use a logger.
+#if !defined(__SANITIZE_THREAD__)
 namespace {
 
 SystemTool::IO::ILogger* g_crashLogger = nullptr;

@@ -33,11 +33,11 @@ std::string ThisThread() {
 class RecordLine : public testing::Test {
 protected:
     RecordLine() {
-        setenv("TZ", "UTC-8", 1); // eight hours east of Greenwich
+        setenv("TZ", "UTC-8", 1); // eight hours east of UTC: POSIX reverses the sign
         tzset();
     }
 
-    const Time m_time = Time{} + 1795140930123ms; // 2026-11-20 02:15:30.123 in Greenwich
+    const Time m_time = Time{} + 1795140930123ms; // 2026-11-20 02:15:30.123 UTC
     LogRecord m_record{2, "", "App/ReportServer", "Recv", 42, "message"};
 };
 

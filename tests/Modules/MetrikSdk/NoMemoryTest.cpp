@@ -11,7 +11,8 @@
 #include "tests/support/FailingMemory.h"
 #include "tests/support/TemporaryDirectory.h"
 
-// The analytics SDK where each allocation fails once, and then each with all that follow it.
+// The analytics SDK while memory fails. In each test, one allocation fails, or one and all that follow it;
+// then the same for the next allocation.
 
 using namespace MetrikSdk;
 
@@ -23,15 +24,15 @@ OutboxSettings ToldEachTime() {
     return settings;
 }
 
-/// So little room that each event makes others go.
+/// So little room that each new event pushes older ones out.
 OutboxSettings RoomForThreeEvents() {
     OutboxSettings settings = ToldEachTime();
     settings.caps.maxWaitingBytes = 800;
     return settings;
 }
 
-/// To open an outbox takes some thousand allocations: every thirteenth has its turn, and all with
-/// SSR_EVERY_ALLOCATION set.
+/// How many allocations to go on by. To open an outbox takes some thousand allocations, so only every
+/// thirteenth one is made to fail. With SSR_EVERY_ALLOCATION set, every one is.
 int Step() {
     return std::getenv("SSR_EVERY_ALLOCATION") != nullptr ? 1 : 13;
 }
@@ -51,7 +52,7 @@ protected:
                            &Told::OnFailure, &Told::OnSuccess);
     }
 
-    /// Whether an allocation failed, with the operation's result in m_result.
+    /// Runs `operation` while memory fails, and keeps its result in m_result. True when an allocation failed.
     template <typename Operation>
     bool WithoutMemory(int first, Operation operation) {
         Told::Forget();
@@ -60,13 +61,14 @@ protected:
         return FailingMemory::Failed() > 0;
     }
 
-    /// The texts' copies are the caller's, who has memory for them.
+    /// The texts are copied by the caller, who has memory for them.
     bool ReportWithoutMemory(int first, Sdk& sdk, std::string event) {
         std::string payload = R"({"a":"a text of more than sixteen bytes"})";
         return WithoutMemory(first, [&] { return sdk.ReportEvent(std::move(event), std::move(payload)); });
     }
 
-    /// Told where one allocation fails; where all do, there is no memory for the text.
+    /// Expects that the event is stored exactly when the operation succeeded. When only one allocation
+    /// failed, a failure must also be reported; when all failed, there is no memory for such a text.
     void ExpectTheTruth(int first, const std::string& event) {
         EXPECT_EQ(Stored("event_id = '" + event + "'"), m_result ? 1 : 0) << "allocation " << first;
         if (GetParam() == 1) {
@@ -106,7 +108,7 @@ TEST_P(SdkWithoutMemory, TellsTheTruthOfAnEventAndStoresTheNext) {
 
 TEST_P(SdkWithoutMemory, TellsTheTruthOfAModulesFirstEventAndStoresTheNext) {
     const auto registry = Registry();
-    Sdk other(*registry); // which keeps the outbox open
+    Sdk other(*registry); // it keeps the outbox open
     ASSERT_TRUE(Init(other, "A"));
     int first = 1;
     for (bool failed = true; failed; ++first) {

@@ -16,8 +16,8 @@ protected:
     static std::ptrdiff_t CountEntries(const std::string& directory) {
         return std::distance(std::filesystem::directory_iterator(directory), {});
     }
-    /// Runs `test` in a new process that knows no directory yet: the plug-in remembers the first one for
-    /// good. To be called first thing, because that process runs the whole of the present test.
+    /// Runs `test` in a new process that knows no directory yet, because the plug-in keeps its first
+    /// directory for ever. It must be called first in a test, because the new process runs that whole test.
     template <typename Test>
     static void InAFreshProcess(Test test) {
         constexpr const char* MARK = "SSR_TEST_IS_FRESH";

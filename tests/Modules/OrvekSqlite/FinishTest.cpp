@@ -6,7 +6,7 @@
 #include "tests/Modules/OrvekSqlite/SqliteFixture.h"
 #include "tests/support/WaitUntil.h"
 
-// The end of a database object, linked directly.
+// How a database object ends. It is linked directly, without the plug-in.
 namespace {
 
 using namespace std::chrono_literals;
@@ -20,7 +20,7 @@ protected:
 
     void TearDown() override { (void)m_database.Finish(); }
 
-    /// Waits until an operation on another thread has the object.
+    /// Waits until an operation on another thread holds the object's lock.
     void WaitUntilBusy() {
         ASSERT_TRUE(WaitUntil([&] {
             m_probe = std::async([&] { return m_database.GetLastErrorMsg(); });

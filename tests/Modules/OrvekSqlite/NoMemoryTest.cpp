@@ -2,7 +2,8 @@
 #include "tests/Modules/OrvekSqlite/SqliteFixture.h"
 #include "tests/support/FailingMemory.h"
 
-// The store where each allocation fails once, and then each with all that follow it.
+// The store while memory fails. In each test, one allocation fails, or one and all that follow it; then the
+// same for the next allocation.
 
 namespace {
 
@@ -22,7 +23,7 @@ OrvekSqlite::GroupSettings AllTogether() {
 
 class StoreWithoutMemory : public SqliteFixture, public ::testing::WithParamInterface<int> {
 protected:
-    /// Ends as DestoryModule has it.
+    /// Ends the database as DestoryModule does.
     struct End {
         void operator()(OrvekSqlite::Database* database) const {
             EXPECT_TRUE(database->Finish());
@@ -41,7 +42,7 @@ protected:
         MakeStore(Store());
     }
 
-    /// Whether an allocation failed, with the operation's result in `result`.
+    /// Runs `operation` while memory fails, and keeps its result in m_result. True when an allocation failed.
     template <typename Operation>
     bool WithoutMemory(int first, Operation operation) {
         const FailingMemory memory(first, GetParam());

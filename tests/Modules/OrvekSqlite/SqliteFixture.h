@@ -15,8 +15,8 @@
 #include "tests/support/StoreTables.h"
 #include "tests/support/TemporaryDirectory.h"
 
-/// The plug-in beside the test program and a directory for its file. What the plug-in did is looked at
-/// through a connection of the test's own, never through the plug-in.
+/// The plug-in beside the test program, and a directory for its file. The tests examine the file through
+/// their own connection, never through the plug-in.
 class SqliteFixture : public testing::Test {
 protected:
     using Loader = SystemTool::ModuleLoader<ISqliteDatabase>;
@@ -27,7 +27,7 @@ protected:
         return SystemTool::IO::Directory::GetExcutableDirectory() + "libOrvekSqlite.dylib";
     }
 
-    /// A database as set-up leaves it.
+    /// Makes a database as set-up leaves it.
     static void MakeStore(const std::string& path) {
         SQLite::Database database(path, SQLite::OPEN_READWRITE | SQLite::OPEN_CREATE);
         database.exec("pragma journal_mode = wal");
@@ -36,7 +36,7 @@ protected:
         std::filesystem::permissions(path, std::filesystem::perms{0600});
     }
 
-    /// The store's own statement, character for character.
+    /// The service's own statement, character for character.
     static std::string Insert(const std::string& eventID, const std::string& value = "v",
                               const std::string& createTime = "1700000000000", const std::string& pType = "0",
                               const std::string& suiteVersion = "3.0.0.0",
@@ -46,8 +46,8 @@ protected:
                "')";
     }
 
-    /// The first cell that a query of the test's own connection returns; empty for NULL. Asked with the write
-    /// lock, so that a group of statements that is open is committed before.
+    /// The first cell that a query returns on the test's own connection; empty for NULL. It takes the write
+    /// lock first, so that an open group of statements is committed before.
     static std::string Ask(const std::string& path, const std::string& query) {
         SQLite::Database database(path, SQLite::OPEN_READWRITE, 5000);
         database.exec("begin immediate");

@@ -28,7 +28,7 @@ protected:
         fs::permissions(path, fs::perms{0600});
     }
 
-    /// Empty when SQLite may open the database.
+    /// Why SQLite must not open the database; empty when it may.
     std::string Refusal() const {
         try {
             RequireOurFiles(Database());
@@ -48,7 +48,7 @@ TEST_F(TheDatabaseFiles, MayBeOpenedWhenTheyAreTheirUsersOwnOrMissing) {
     for (const std::string suffix : SIDE_FILE_SUFFIXES)
         Make(Database() + suffix);
     EXPECT_EQ(Refusal(), "");
-    fs::permissions(Database(), fs::perms{0644}); // to be read by others is no danger to the database
+    fs::permissions(Database(), fs::perms{0644}); // it does no harm when others can read the database
     EXPECT_EQ(Refusal(), "");
     fs::remove(Database());
     EXPECT_EQ(Refusal(), "") << "SQLite says itself that it is missing";

@@ -62,7 +62,7 @@ TEST_F(TheDeletedLog, IsNoticedFileByFile) {
 TEST_F(TheDeletedLog, IsBroughtIntoTheDatabase) {
     Remove("-wal");
     Remove("-shm");
-    m_database->exec("insert into t values (2)"); // before it was noticed
+    m_database->exec("insert into t values (2)"); // before the deletion was noticed
     EXPECT_TRUE(Rescue());
     EXPECT_EQ(Ask("select group_concat(x) from t"), "1,2");
     EXPECT_EQ(Ask("pragma integrity_check"), "ok");
@@ -78,7 +78,7 @@ TEST_F(TheDeletedLog, IsLostWhenAnotherProgramHasBegunAnother) {
     m_database->exec("pragma wal_checkpoint(truncate); insert into t values (2)");
     Remove("-wal");
     Remove("-shm");
-    const auto another = "sqlite3 " + m_path + " 'insert into t values (3)'"; // a process of its own
+    const auto another = "sqlite3 " + m_path + " 'insert into t values (3)'"; // in a separate process
     ASSERT_EQ(std::system(another.c_str()), 0);
     EXPECT_FALSE(Rescue());
     EXPECT_EQ(Ask("select group_concat(x) from t"), "1,3");
@@ -90,7 +90,8 @@ TEST_F(TheDeletedLog, IsFoundThroughTheOpenDirectoryAsWell) {
     const auto path = directory.PathOf("o.db");
     SQLite::Database database(path, SQLite::OPEN_READWRITE | SQLite::OPEN_CREATE | SQLite::OPEN_NOFOLLOW, 0,
                               DirectoryVfs());
-    fs::rename(m_directory.Path() + "/db", m_directory.Path() + "/moved"); // and all that follows goes there
+    // Everything below must go to the moved directory.
+    fs::rename(m_directory.Path() + "/db", m_directory.Path() + "/moved");
     database.exec("pragma journal_mode = wal");
     database.exec("create table t (x)");
     SideFileWatch files(path);

@@ -19,12 +19,12 @@ namespace fs = std::filesystem;
 
 namespace {
 
-/// The data directory is below /tmp, which every user may write; and so is the place outside it.
+/// The data directory and the place outside it are both below /tmp, which every user may write.
 class TheSafeDirectory : public ::testing::Test {
 protected:
     std::string Open(const std::string& path) const { return SafeDirectory::Open(path, Home()).Path(); }
 
-    /// Why the path is refused, both when it is announced and when it is opened; empty when it is not.
+    /// Why the path is refused, both when it is announced and when it is opened; empty when it is accepted.
     std::string Refusal(const std::string& path) const {
         std::string announced;
         try {
@@ -44,7 +44,8 @@ protected:
     std::string Home() const { return m_home.Path(); }
     std::string Outside() const { return m_outside.Path(); }
 
-    /// Of this user alone, at the top of the file system: no component of its path may be written by others.
+    /// Makes a directory of this user near the root: other users cannot write to any part of its path. Empty
+    /// when that is not allowed.
     std::string PrivateRoot() const {
         const auto path = "/run/ssr-test-" + std::to_string(::getpid());
         return ::mkdir(path.c_str(), 0755) == 0 ? path : "";

@@ -9,11 +9,12 @@ namespace {
 
 using Manner = Reply::Manner;
 
-/// A collector that answers its first requests as listed and takes everything afterwards. It keeps account of
-/// what it took.
+/// A collector that answers its first requests as a list says, and accepts all later ones. It records what it
+/// accepted.
 class TheMisbehavingCollector : public PluginFixture {
 protected:
-    /// Before there is an uploader, so that a slow machine does not spread the events over more requests.
+    /// Reports events before there is an uploader. Otherwise, a slow machine would spread them over more
+    /// requests.
     void ReportBeforehand(int count) {
         Start();
         Report(count);
@@ -38,7 +39,8 @@ protected:
         Start();
     }
 
-    /// Every event is in exactly one place, and what the outbox calls delivered is what the collector took.
+    /// Expects that every event is in exactly one place, and that the collector accepted all events that the
+    /// outbox calls delivered.
     void ExpectEverythingDelivered(int count) {
         EXPECT_TRUE(WaitUntilNothingWaits());
         Stop();

@@ -50,7 +50,7 @@ rapidjson::Document Parsed(const Batch& batch, const otlp::ResourceConfig& confi
     return document;
 }
 
-/// The first log record of the first resource.
+/// A member of the first log record of the first resource.
 std::string Record(const Batch& batch, const char* member) {
     auto document = Parsed(batch);
     return Text(document["resourceLogs"][0]["scopeLogs"][0]["logRecords"][0][member]);
@@ -142,7 +142,7 @@ TEST(OtlpEncoder, FallsBackToTheTimeOfStoringForACreateTimeThatMakesNoSense) {
         EXPECT_EQ(Record(One(bad), "timeUnixNano"), R"("1800000000007000000")") << bad;
 }
 
-/// The attributes behind those that every record has.
+/// The attributes after those that every record has.
 std::string FurtherAttributes(const std::string& payload) {
     constexpr auto LAST = R"({"key":"metrik.event","value":{"stringValue":"A759|10001"}})";
     const auto text = Record(One(payload), "attributes");

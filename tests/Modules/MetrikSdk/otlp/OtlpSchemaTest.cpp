@@ -3,20 +3,20 @@
 
 #include "tests/Modules/MetrikSdk/support/PluginFixture.h"
 
-// Request bodies of the plug-in, under the eyes of the protocol's own definition.
+// Checks request bodies of the plug-in against the protocol's own definition.
 
 namespace {
 
 class TheOtlpSchema : public PluginFixture {
 protected:
-    /// Whether the definition accepts the body.
+    /// Whether the body conforms to the definition.
     bool Passes(const std::string& body) {
         const auto file = m_files.Path() + "/" + std::to_string(m_count++) + ".json";
         std::ofstream(file) << body;
         return std::system(("node '" OTLP_SCHEMA_DIR "/check.js' '" + file + "'").c_str()) == 0;
     }
 
-    /// The bodies with which the plug-in reports the events: one, unless the machine is slow.
+    /// The bodies with which the plug-in sends the events. There is one body, unless the machine is slow.
     std::vector<std::string> BodiesOf(const std::vector<std::string>& payloads) {
         LoopbackServer server([](const Request&) { return Reply(); });
         Configure("ENDPOINT", server.Url());

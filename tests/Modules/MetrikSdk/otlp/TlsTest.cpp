@@ -13,12 +13,13 @@ using namespace std::chrono_literals;
 
 namespace {
 
-/// Makes a key and a certificate that is signed by itself, as <name>.key and <name>.crt.
+/// Makes a key and a self-signed certificate, as <name>.key and <name>.crt.
 void MakeCertificate(const std::string& name, const std::string& host) {
+    // Two certificates of the same name could be confused.
     const auto command = "openssl req -x509 -newkey ec -pkeyopt ec_paramgen_curve:prime256v1 -nodes -days 2 "
                          "-keyout '" +
-                         name + ".key' -out '" + name + ".crt' -subj /CN=" +
-                         name.substr(name.rfind('/') + 1) + // two of one name would be taken for each other
+                         name + ".key' -out '" + name +
+                         ".crt' -subj /CN=" + name.substr(name.rfind('/') + 1) +
                          " -addext subjectAltName=" + host + " 2>/dev/null";
     ASSERT_EQ(std::system(command.c_str()), 0) << "openssl(1) is needed";
 }
@@ -102,7 +103,7 @@ TEST(HttpSender, TellsAnOptionThatTheLibraryRefuses) {
     MetrikSdk::otlp::EndpointConfig config;
     config.url = "https://127.0.0.1:1/";
     EXPECT_NO_THROW(MetrikSdk::otlp::HttpSender{config});
-    config.certificate = std::string(9'000'000, 'x'); // longer than the library takes any text
+    config.certificate = std::string(9'000'000, 'x'); // longer than any text that the library accepts
     EXPECT_THROW(MetrikSdk::otlp::HttpSender{config}, std::runtime_error);
 }
 

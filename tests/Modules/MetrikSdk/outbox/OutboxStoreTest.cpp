@@ -17,7 +17,7 @@ using namespace std::chrono_literals;
 namespace {
 
 const ModuleIdentity A759{"A759", "1", "default"};
-/// Written by a program of that version: three events of A759, of which the first was delivered.
+/// Written by a program of version 1: three events of A759, of which the first was delivered.
 constexpr auto VERSION_1 = SSR_SOURCE_DIR "/tests/Modules/MetrikSdk/outbox/outbox-1.sql";
 const WallTime NOW{1'800'000'000s};
 constexpr WallTime NEVER_TOO_OLD{};
@@ -187,7 +187,7 @@ TEST_F(TheOutboxStore, CountsEveryEventInExactlyOnePlace) {
 TEST_F(TheOutboxStore, DoesNotRemoveWhatIsNotTheSameEventAnyMore) {
     Store(A759, "old");
     const auto taken = m_store->Oldest(1, ANY_BYTES);
-    m_store->RemoveDelivered(taken, 0); // as another process would; the next event gets the same row
+    m_store->RemoveDelivered(taken, 0); // as another process would do it; the next event gets the same row
     Store(A759, "new");
     m_store->RemoveDelivered(taken, 0);
     m_store->MoveToDeadLetters(taken.events[0], {400, "bad"}, NOW);

@@ -248,7 +248,7 @@ TEST_F(TheOutbox, SetsAFileAsideThatIsDamagedWhileInUse) {
                                   '\x7f');
         file.write(rubbish.data(), static_cast<std::streamsize>(rubbish.size()));
     }
-    // The cache may hide the damage for a while; a connection that looks at the file does not.
+    // The cache may hide the damage for a while. A connection that reads the file sees it.
     EXPECT_TRUE(WaitUntil([&] {
         EXPECT_TRUE(Append(std::string(1000, 'y')))
             << "an event that meets the damage goes into the new file";
@@ -315,7 +315,7 @@ TEST_F(TheOutbox, TellsTheLossWhenAnotherProgramHasBegunALogOfItsOwn) {
     ASSERT_TRUE(Append());
     for (const std::string suffix : {"-wal", "-shm"})
         ASSERT_TRUE(std::filesystem::remove(File() + suffix));
-    // A file with nothing in it is enough: whose it is cannot be told.
+    // An empty file is enough: the outbox cannot know which program made it.
     std::ofstream(File() + "-wal").close();
     ::chmod((File() + "-wal").c_str(), 0600);
     EXPECT_TRUE(Append());
@@ -390,7 +390,7 @@ TEST_F(TheOutbox, OpensAnExistingFileWhileAnotherProcessHoldsTheLock) {
 TEST_F(TheOutbox, WaitsForALockOnceAndNotForEveryOpening) {
     std::filesystem::create_directories(m_path);
     SQLite::Database other(File(), SQLite::OPEN_READWRITE | SQLite::OPEN_CREATE);
-    other.exec("PRAGMA journal_mode = WAL"); // empty, so that opening has to write
+    other.exec("PRAGMA journal_mode = WAL"); // without tables, so that opening has to write
     other.exec("BEGIN IMMEDIATE");
     m_settings.file.lockPatience = 1s;
     m_outbox = std::make_unique<outbox::Outbox>(m_path, m_settings, m_notifier);
@@ -410,7 +410,8 @@ TEST_F(TheOutbox, StoresAnEventOnceTheLockIsReleasedWithinThePatience) {
     SQLite::Database other(File(), SQLite::OPEN_READWRITE);
     other.exec("BEGIN IMMEDIATE");
     std::thread releaser([&] {
-        // Released when the event below has been waiting for a moment: the wait cannot be seen from outside.
+        // Releases the lock a little later, when the event below is probably waiting: a wait cannot be seen
+        // from outside.
         const auto soon = std::chrono::steady_clock::now() + 50ms;
         WaitUntil([&] { return std::chrono::steady_clock::now() > soon; });
         other.exec("COMMIT");

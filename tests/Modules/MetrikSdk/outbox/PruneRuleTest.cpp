@@ -39,8 +39,8 @@ TEST(PruneRule, BelievesAClockThatGoesBack) {
               OPENED - std::chrono::days(31));
 }
 
-/// Whether events may be dropped by age after looks once a minute for so long, with one step of the wall
-/// clock.
+/// Whether events may be dropped for their age after this time of checks once a minute, in which the wall
+/// clock jumps once.
 bool MayDropAfter(std::chrono::minutes minutes, std::chrono::minutes stepAt, std::chrono::hours step) {
     const SteadyTime start{100h};
     auto watch = outbox::PruneRule::BeginWatch(OPENED, start);

@@ -22,7 +22,7 @@ TEST(Uuid, HasTheFormVersionAndVariantOfVersionSeven) {
 }
 
 TEST(Uuid, BeginsWithTheTime) {
-    // Later than every other test's time, so that nothing before it can have pushed it on.
+    // Later than the time in any other test, so that no earlier test can have moved the last time beyond it.
     const WallTime late{std::chrono::milliseconds(0x0fff'4567'89ab)};
     EXPECT_EQ(NewUuid(late).substr(0, 13), "0fff4567-89ab");
 }

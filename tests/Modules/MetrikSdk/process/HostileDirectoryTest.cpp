@@ -11,7 +11,7 @@
 #include "tests/support/OtherUser.h"
 #include "tests/support/TemporaryDirectory.h"
 
-// Directories come in datagrams, from any user of the machine.
+// Database directories come in datagrams, from any user of the machine.
 
 using namespace MetrikSdk;
 using ::testing::ElementsAre;
@@ -29,7 +29,7 @@ std::string BigEndian(std::uint32_t number) {
     return bytes;
 }
 
-/// A rollback journal that names another file as the one to delete when it has been played back.
+/// A rollback journal that names another file, which SQLite deletes after it has played the journal back.
 std::string JournalThatDeletes(const std::string& file) {
     static const std::string MAGIC("\xd9\xd5\x05\xf9\x20\xa1\x63\xd7", 8);
     constexpr std::uint32_t PAGE = 1024;
@@ -51,7 +51,8 @@ protected:
         return sdk.InitSdk("A1", "1", "m", "", directory, &Told::OnFailure, &Told::OnSuccess);
     }
 
-    /// What the module with the directory leaves where: an event in the first outbox, one line about it.
+    /// Expects that a module with this directory shares the first outbox: its event goes there, and one line
+    /// with the reason is logged.
     void ExpectToShareTheFirst(const std::string& directory, const std::string& reason) {
         Told::Forget();
         process::OutboxRegistry registry = Registry();
@@ -71,8 +72,8 @@ protected:
                 [this] { return m_home.Path(); }};
     }
 
-    /// A directory of the test's own whose way from the root no other user can change; empty without the
-    /// right to make one.
+    /// A directory of the test, such that no other user can change any part of its path. Empty when this user
+    /// must not make one.
     std::string MakePlace() {
         m_place = "/run/ssr-hostile-" + std::to_string(::getpid());
         return ::mkdir(m_place.c_str(), 0755) == 0 ? m_place : "";

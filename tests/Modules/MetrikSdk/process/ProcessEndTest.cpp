@@ -13,12 +13,12 @@ using namespace std::chrono_literals;
 namespace {
 
 #ifdef __SANITIZE_THREAD__
-constexpr int ROUNDS = 10; // uploading what fifty leave takes this sanitizer minutes
+constexpr int ROUNDS = 10; // with this sanitizer, it takes minutes to upload the events of fifty processes
 #else
 constexpr int ROUNDS = 50;
 #endif
 
-/// What happens to the outbox when its process ends, in every way in which processes end.
+/// What happens to the outbox when its process ends, for every way in which a process can end.
 class TheProcessEnd : public PluginFixture {
 protected:
     TheProcessEnd() { Configure("ENDPOINT", m_server.Url()); }
@@ -39,8 +39,8 @@ protected:
 
     enum class KillAfter { AnEvent, ARequest };
 
-    /// A "stream" child is killed a moment after its first event, or after the first request that the server
-    /// sees of it; the numbers that it was told were accepted.
+    /// Kills a "stream" child a moment after its first event, or after its first request at the server.
+    /// Returns the numbers of the events that the child saw accepted.
     std::vector<int> KillAtARandomMoment(int firstNumber, KillAfter what) {
         const auto before = m_server.RequestCount();
         ChildProgram child(m_directory.Path(), firstNumber, "stream");
@@ -71,12 +71,13 @@ protected:
         EXPECT_EQ(SQLite::Database(File()).execAndGet("PRAGMA integrity_check").getString(), "ok");
     }
 
-    std::mutex m_mutex; ///< Guards what the server's threads use, until the server is idle.
+    /// Guards what the server's threads use; once the server is idle, no lock is needed.
+    std::mutex m_mutex;
     Reply m_reply;
-    std::map<int, std::set<std::string>> m_uuids; ///< Under which ids each number arrived.
+    std::map<int, std::set<std::string>> m_uuids; ///< The ids under which each number arrived.
     std::set<std::int64_t> m_sequences;
     LoopbackServer m_server{[this](const Request& request) { return Take(request); }};
-    int m_roundsWithRequests = 0; ///< Kills before which events went out.
+    int m_roundsWithRequests = 0; ///< How many kills came after a request.
     std::mt19937 m_random{std::random_device{}()};
 };
 

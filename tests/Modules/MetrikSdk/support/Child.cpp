@@ -1,12 +1,14 @@
-// A process to kill: loads the plug-in as the service does, reports numbered events, and ends in the way that
-// the test wants.
+// A process that a test kills. It loads the plug-in as the service does, reports numbered events, and ends in
+// the way that the test chooses.
 //
 //     child <database directory> <first number> <way>
 //
-// Ways: "stream" reports without an end and writes the number of each accepted event as a line; the others
-// report a few thousand events and then call exit(0): "exit" on the main thread, "static" with a loader that
-// is destroyed during exit(), "crash" in the handler of a segmentation fault on another thread while the main
-// thread goes on reporting, "callback" on the uploader's own thread.
+// "stream" reports without end, and writes the number of each accepted event as a line. The other ways report
+// a few thousand events and then call exit(0):
+// "exit" on the main thread;
+// "static" on the main thread, with a loader that exit() destroys;
+// "crash" in the handler of a segmentation fault on another thread, while the main thread still reports;
+// "callback" on the uploader's thread.
 
 #include <csignal>
 #include <cstdlib>
@@ -27,7 +29,7 @@ using Loader = SystemTool::ModuleLoader<IMetrikSdk>;
 
 constexpr int EVENTS_BEFORE_EXIT = 3000;
 
-std::unique_ptr<Loader> g_loader; // destroyed during exit() when it is still there
+std::unique_ptr<Loader> g_loader; // exit() destroys it, unless it was released
 IMetrikSdk* g_sdk = nullptr;
 bool g_exitInCallback = false;
 
@@ -42,7 +44,7 @@ void OnSegmentationFault(int) {
     std::exit(0);
 }
 
-/// The signal itself and no bad access: the sanitizers would have their own say about that.
+/// Sends the signal and makes no bad access, because a sanitizer would report that itself.
 void Fault() {
     std::raise(SIGSEGV);
 }
@@ -77,14 +79,14 @@ bool Report(int number) {
 
 int main(int, char** arguments) {
     const std::string directory = arguments[1];
-    ::setenv("XDG_DATA_HOME", directory.c_str(), 1); // below which the plug-in may make what is missing
+    ::setenv("XDG_DATA_HOME", directory.c_str(), 1); // the plug-in may make missing directories below it
     int number = std::stoi(arguments[2]);
     const std::string way = arguments[3];
     g_exitInCallback = way == "callback";
     g_loader =
         std::make_unique<Loader>(SystemTool::IO::Directory::GetExcutableDirectory() + "libMetrikSdk.dylib");
     g_sdk = g_loader->GetModule();
-    if (way != "static") // the service's loaders are never destroyed by exit()
+    if (way != "static") // exit() never destroys the service's loaders
         static_cast<void>(g_loader.release());
     if (!g_sdk->InitSdk("A759", "1", "default", "", directory, &OnFailure, &OnSuccess))
         return 3;

@@ -21,8 +21,8 @@ void AddToVariable(const char* name, const std::string& more) {
     ::setenv(name, (std::string(value == nullptr ? "" : value) + ":" + more).c_str(), 1);
 }
 
-/// The service's crash handler makes unsafe calls and ends the process in the middle of everything, on
-/// purpose: nothing for the sanitizers to report, and no moment to look for leaks.
+/// The service's crash handler makes unsafe calls and ends the process while other threads work, on purpose.
+/// The sanitizers must not report that, nor look for leaks then.
 void RelaxSanitizers() {
     AddToVariable("TSAN_OPTIONS", "report_signal_unsafe=0");
     AddToVariable("ASAN_OPTIONS", "detect_leaks=0");
@@ -34,7 +34,8 @@ ChildProgram::ChildProgram(const std::string& directory, int firstNumber, const 
     std::array<int, 2> ends{};
     if (::pipe2(ends.data(), O_CLOEXEC) != 0)
         throw std::runtime_error("no pipe");
-    // Room for all that is written before it is read: the child must die at work, not while it waits for us.
+    // Makes the pipe large enough for all that the child writes before the test reads: the child must be
+    // killed while it works, not while it waits for the test.
     ::fcntl(ends[1], F_SETPIPE_SZ, 1 << 20);
     posix_spawn_file_actions_t actions;
     ::posix_spawn_file_actions_init(&actions);

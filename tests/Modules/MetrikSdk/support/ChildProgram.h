@@ -6,7 +6,7 @@
 
 #include <sys/types.h>
 
-/// The program of Child.cpp as a process. Killed with this object.
+/// The program of Child.cpp as a process. The destructor kills it.
 class ChildProgram {
 public:
     ChildProgram(const std::string& directory, int firstNumber, const std::string& way);
@@ -14,15 +14,15 @@ public:
     ChildProgram(const ChildProgram&) = delete;
     ChildProgram& operator=(const ChildProgram&) = delete;
 
-    /// Blocks until it has written something, or has ended.
+    /// Blocks until the child has written something or has ended.
     void AwaitOutput();
 
     void Kill();
 
-    /// Everything that it has written, after it has ended.
+    /// Everything that the child has written. To be called after its end.
     std::string Output();
 
-    /// How it ended, as waitpid tells it; nothing when it does not end in time.
+    /// The child's status as waitpid gives it; nothing when the child does not end in time.
     std::optional<int> AwaitEnd(std::chrono::milliseconds deadline = std::chrono::seconds(20));
 
 private:

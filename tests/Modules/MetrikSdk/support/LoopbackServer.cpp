@@ -90,13 +90,13 @@ void LoopbackServer::Serve(Poco::Net::StreamSocket socket, int number) {
             if (!Perform(socket, reply))
                 break;
         }
-    } catch (const Poco::Exception&) { // the client has gone, or does not trust us
+    } catch (const Poco::Exception&) { // the client closed the connection, or does not trust our certificate
     }
     socket.close();
 }
 
 bool LoopbackServer::Read(Poco::Net::StreamSocket& socket, std::string& buffer, Request& request) {
-    std::size_t wanted = std::string::npos; // of the buffer, once the head is there
+    std::size_t wanted = std::string::npos; // the size of the whole request, known when its head is there
     std::size_t head = 0;
     while (wanted == std::string::npos || buffer.size() < wanted) {
         if (m_stop)
@@ -107,7 +107,7 @@ bool LoopbackServer::Read(Poco::Net::StreamSocket& socket, std::string& buffer, 
         const int count = socket.receiveBytes(bytes.data(), static_cast<int>(bytes.size()));
         if (count == 0)
             return false;
-        if (count > 0) // less: the TLS layer wants more first
+        if (count > 0) // negative: the TLS layer must first read or write more
             buffer.append(bytes.data(), static_cast<std::size_t>(count));
         if (head == 0 && buffer.find("\r\n\r\n") != std::string::npos) {
             head = buffer.find("\r\n\r\n") + 4;

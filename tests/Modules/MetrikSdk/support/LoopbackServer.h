@@ -13,20 +13,20 @@
 #include <Poco/Net/ServerSocket.h>
 #include <Poco/Net/StreamSocket.h>
 
-/// A request as it came in.
+/// A request that the server received.
 struct Request {
     std::string line;                           ///< Such as "POST /v1/logs HTTP/1.1".
     std::map<std::string, std::string> headers; ///< Names in lower case.
     std::string body;                           ///< Unpacked when it was compressed.
-    int connection = 0;                         ///< Counts the connections from 1.
+    int connection = 0;                         ///< The number of its connection, from 1.
 };
 
-/// What the server does about a request.
+/// What the server does with a request.
 struct Reply {
     enum class Manner {
         Answer,
-        Never,          ///< Keep the connection open and say nothing.
-        Close,          ///< Close without a word.
+        Never,          ///< Keep the connection open and send nothing.
+        Close,          ///< Close the connection without an answer.
         CloseHalfway,   ///< Announce a body, send half of it, close.
         CloseInHeaders, ///< Send a status line and half a header, close.
         SpeakNonsense,  ///< Send something that is no HTTP.
@@ -38,18 +38,18 @@ struct Reply {
     Manner manner = Manner::Answer;
 };
 
-/// An HTTP server on an ephemeral port of the loopback address that does to each request what the script
-/// says. Unlike a library's server it can also misbehave.
+/// An HTTP server on a free port of the loopback address. It answers each request as the script says. A
+/// library's server could not misbehave on purpose.
 class LoopbackServer {
 public:
     using Script = std::function<Reply(const Request&)>;
 
     explicit LoopbackServer(Script script);
-    /// Over TLS, with the socket of the caller.
+    /// Over TLS. The caller has made the socket.
     LoopbackServer(Script script, const Poco::Net::ServerSocket& socket);
     ~LoopbackServer();
 
-    /// Without a trailing slash.
+    /// The server's address, without a trailing slash.
     std::string Url(const std::string& scheme = "http") const;
 
     std::vector<Request> Requests() const;
@@ -69,7 +69,7 @@ private:
     Script m_script;
     Poco::Net::ServerSocket m_socket;
     std::atomic<bool> m_stop = false;
-    mutable std::mutex m_mutex; ///< Guards the two lists, and serialises the script.
+    mutable std::mutex m_mutex; ///< Guards the two lists. The script is called under it.
     std::vector<Request> m_requests;
     std::list<Connection> m_connections;
     std::thread m_thread;

@@ -20,14 +20,14 @@
 #include "tests/support/TemporaryDirectory.h"
 #include "tests/support/WaitUntil.h"
 
-/// The real plug-in, loaded as the service loads it, with a database directory of its own.
+/// The real plug-in, loaded as the service loads it, with its own database directory.
 class PluginFixture : public testing::Test {
 protected:
     using Loader = SystemTool::ModuleLoader<IMetrikSdk>;
 
     PluginFixture() {
         Told::Forget();
-        SetVariable("XDG_DATA_HOME", m_directory.Path()); // below which the plug-in may make what is missing
+        SetVariable("XDG_DATA_HOME", m_directory.Path()); // the plug-in may make missing directories below it
     }
 
     /// After every test, the counters must agree with the tables.
@@ -42,8 +42,8 @@ protected:
             ::unsetenv(name.c_str());
     }
 
-    /// Sets OTEL_EXPORTER_OTLP_<name>; before Start, because the environment is read when an outbox is
-    /// opened.
+    /// Sets OTEL_EXPORTER_OTLP_<name>. To be called before Start, because the environment is read when an
+    /// outbox is opened.
     void Configure(const std::string& name, const std::string& value) {
         SetVariable("OTEL_EXPORTER_OTLP_" + name, value);
     }
@@ -78,7 +78,7 @@ protected:
         return MetrikSdk::outbox::OutboxStore(File(), std::chrono::seconds(5)).Status();
     }
 
-    /// In one statement, because an uploader that hangs may still be at work.
+    /// Reads all counters in one statement, because an uploader that hangs may still change them.
     void ExpectTheCountersToBeTrue() const {
         SQLite::Database outbox(File(), SQLite::OPEN_READWRITE);
         outbox.setBusyTimeout(5000);

@@ -11,10 +11,10 @@ struct ReceivedEvent {
     std::string uuid;
     std::string module;
     std::int64_t sequence = 0;
-    int number = -1; ///< The payload's own: see NumberedPayload.
+    int number = -1; ///< The number in its payload: see NumberedPayload.
 };
 
-/// A payload as the service makes it, recognisable by `number`.
+/// A payload as the service makes it. `number` identifies it.
 inline std::string NumberedPayload(int number) {
     return R"({"extend":{"hublinkVersion":"5.1.0.2","createTime":"1700000000123"},"eventData":{"number":)" +
            std::to_string(number) + R"(,"openid":"u1","sys_version":"Debian GNU/Linux 12"}})";

@@ -4,7 +4,7 @@
 
 #include "Modules/MetrikSdk/Settings.h"
 
-/// Production's settings, with the user's data directory at `directory`: there an outbox may be.
+/// The real settings, with `directory` as the user's data directory, where an outbox is allowed.
 inline MetrikSdk::OutboxSettings SettingsFor(const std::string& directory) {
     MetrikSdk::OutboxSettings settings;
     settings.file.dataDirectory = directory;

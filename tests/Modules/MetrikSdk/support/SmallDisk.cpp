@@ -23,7 +23,7 @@ bool EnterOwnMountNamespace() {
         return ::unshare(CLONE_NEWNS) == 0;
     if (::unshare(CLONE_NEWUSER | CLONE_NEWNS) != 0)
         return false;
-    // Both ids must be mapped there: a file system refuses files whose user or group has no mapping.
+    // Both ids need a mapping: a file system refuses files whose user or group has none.
     std::ofstream("/proc/self/setgroups") << "deny";
     std::ofstream("/proc/self/uid_map") << "0 " << user << " 1";
     std::ofstream("/proc/self/gid_map") << "0 " << group << " 1";

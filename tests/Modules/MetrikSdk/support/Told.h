@@ -5,7 +5,8 @@
 #include <string>
 #include <vector>
 
-/// What the callbacks were told. They are plain functions, so there is one of this in a test program.
+/// The texts that the callbacks got. Callbacks are plain functions, so a test program has one list of
+/// failures and one of successes.
 class Told {
 public:
     static Told& Failures() {
@@ -28,7 +29,7 @@ public:
         return m_texts;
     }
 
-    /// How many of them begin with `start`.
+    /// How many of the texts begin with `start`.
     std::ptrdiff_t Count(const std::string& start) const {
         const auto all = All();
         return std::count_if(all.begin(), all.end(),

@@ -15,7 +15,7 @@ RequestSize Events(std::size_t count) {
     return {count, count * 1000};
 }
 
-/// Lets a sizer work off `events` events of which `bad` are refused; the number of requests it took.
+/// Lets a sizer send `events` events, of which the `bad` ones are refused. Returns the number of requests.
 int WorkOff(std::size_t events, const std::set<std::size_t>& bad, std::set<std::size_t>& found) {
     BatchSizer sizer(512);
     std::size_t next = 0;
@@ -60,7 +60,7 @@ TEST(BatchSizer, SendsFullBatchesAgainWhenTheRefusalWasAPassingOne) {
     EXPECT_EQ(sizer.MaxEvents(), 512U);
 }
 
-/// Requests of `count` events fail without an answer where they have more than `most`. How many failed.
+/// Sends requests; one with more than `most` events fails without an answer. Returns how many failed.
 int SendOverASlowLine(BatchSizer& sizer, std::size_t most, int requests) {
     int failures = 0;
     for (int i = 0; i < requests; ++i) {

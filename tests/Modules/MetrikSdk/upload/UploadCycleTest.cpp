@@ -17,7 +17,7 @@ using namespace std::chrono_literals;
 
 namespace {
 
-/// Answers as told, and remembers what it was given.
+/// Answers as the test says, and keeps the bodies that it got.
 class FakeSender : public otlp::Sender {
 public:
     otlp::HttpResult Post(const std::string& body) override {
@@ -50,7 +50,7 @@ protected:
         m_sender.answer = [result](const auto&) { return result; };
     }
 
-    /// Refuses every request that holds one of the numbers.
+    /// Lets the collector refuse every request that holds one of these numbers.
     void Refuse(const std::set<int>& numbers) {
         m_sender.answer = [numbers](const std::vector<ReceivedEvent>& events) {
             for (const auto& event : events)
@@ -65,7 +65,8 @@ protected:
             ASSERT_TRUE(m_outbox.Append({"A759", "1", "default"}, "A759|1", NumberedPayload(m_next++)));
     }
 
-    /// The same by an answer that says nothing about the events.
+    /// Lets the collector answer such requests with `result`, which does not say that the events are at
+    /// fault.
     void AnswerLaterTo(const std::set<int>& numbers, const otlp::HttpResult& result) {
         m_sender.answer = [numbers, result](const std::vector<ReceivedEvent>& events) {
             for (const auto& event : events)
@@ -75,8 +76,8 @@ protected:
         };
     }
 
-    /// Passes, with the pauses that the cycle wants, for so long by its own clock; `eachMinute` comes about
-    /// once a minute.
+    /// Runs the cycle for this time on its own clock, with the pauses that the cycle asks for. Calls
+    /// `eachMinute` about once a minute.
     void RunFor(
         std::chrono::hours duration, const std::function<void()>& eachMinute = [] {}) {
         RunFor(std::chrono::minutes(duration), eachMinute);
@@ -93,7 +94,7 @@ protected:
         }
     }
 
-    /// Passes at a time when every event is old enough, until the cycle wants to wait.
+    /// Runs the cycle until it asks for a pause. The time is such that every event is old enough.
     upload::Pause RunUntilPause(int maxPasses = 1000) {
         for (int i = 0; i < maxPasses; ++i)
             if (const auto pause = m_cycle.Pass(WallNow() + 1h); pause.duration > 0ms)
@@ -109,7 +110,7 @@ protected:
     FakeSender m_sender;
     upload::UploadCycle m_cycle{m_outbox, m_sender, m_notifier, m_settings, [] { return 0.5; }};
     int m_next = 0;
-    WallTime m_clock = WallNow() + 1h; ///< Of RunFor.
+    WallTime m_clock = WallNow() + 1h; ///< The clock of RunFor.
 };
 
 TEST_F(TheUploadCycle, SleepsUntilAnEventComesWhenTheOutboxIsEmpty) {
@@ -201,7 +202,7 @@ TEST_F(TheUploadCycle, FindsSeveralPoisonousEvents) {
     EXPECT_EQ(m_outbox.Status().deadLettered, 4);
 }
 
-/// An answer that never came, though the request was on its way.
+/// A request that was sent and got no answer.
 otlp::HttpResult TimedOut() {
     otlp::HttpResult result;
     result.fault = "timed out";
@@ -381,7 +382,8 @@ TEST_F(TheUploadCycle, DeletesWhatWasDeliveredBeforeItSendsAnythingElse) {
     Append(2);
     SQLite::Database other(m_directory.Path() + "/MetrikOutbox.db", SQLite::OPEN_READWRITE);
     m_sender.answer = [&](const auto&) {
-        other.exec("BEGIN IMMEDIATE"); // taken, and now the outbox cannot be written
+        // The collector has accepted the events, and now the outbox cannot be written.
+        other.exec("BEGIN IMMEDIATE");
         return Status(200);
     };
     EXPECT_GT(RunUntilPause().duration, 0ms);

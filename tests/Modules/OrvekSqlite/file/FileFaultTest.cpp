@@ -8,7 +8,7 @@
 #include "tests/support/FileContent.h"
 #include "tests/support/OrdinaryUser.h"
 
-// What happens to the file while the service runs, and before.
+// Faults of the file, before the service opens it and while the service runs.
 namespace {
 
 namespace fs = std::filesystem;
@@ -35,7 +35,7 @@ protected:
         fs::permissions(path, fs::perms{0600});
     }
 
-    /// A good database, moved to the store's path in one step.
+    /// Replaces the store by a good database, in one step.
     void ReplaceStore() {
         const auto fresh = Directory() + "/fresh";
         MakeStore(fresh);
@@ -47,7 +47,7 @@ protected:
             EXPECT_EQ(fs::status(file).permissions(), fs::perms{0600}) << file.path();
     }
 
-    /// Root may write everything, so a test about rights gives its own up, and the files with them.
+    /// Becomes an ordinary user, who gets the files, because root may write everything.
     bool BecomeAnOrdinaryUser() const { return BecomeOrdinaryUser(Directory(), {Store()}); }
 
 private:
@@ -108,7 +108,7 @@ TEST_F(DatabaseFile, IsMadePrivateWhenSomebodyElseMadeItReadable) {
 TEST_F(DatabaseFile, IsNotOpenedWhileAnotherUserCouldHaveChangedIt) {
     OpenStore();
     ASSERT_TRUE(Exec(Insert("before"))) << Error();
-    Plugin()->Open(Directory() + "/none"); // lets go of it
+    Plugin()->Open(Directory() + "/none"); // this closes the store
     for (const auto* suffix : {"", "-wal", "-shm", "-journal"}) {
         const auto file = Store() + suffix;
         if (!fs::exists(file))
@@ -200,7 +200,7 @@ TEST_F(DatabaseFile, HoldsEveryRowThoughItsSideFilesWereDeletedAndTheProcessKill
         for (int i = 0; i < 3000; ++i)
             if (!Exec(Insert("later")))
                 return 2;
-        int count = 0; // asking commits the last group
+        int count = 0; // counting commits the last group
         if (!Plugin()->GetTotalCount("select 1", count))
             return 3;
         ::raise(SIGKILL);
@@ -285,7 +285,8 @@ TEST_F(DatabaseFile, TakesRowsOnceItMayBeWritten) {
         if (Exec(Insert("lost")) || Error() != "attempt to write a readonly database")
             return 2;
         fs::permissions(Store(), fs::perms{0600});
-        int count = 0; // asking commits the statement, which came too soon after the other to be alone
+        // Counting commits the statement, which shares a group because it came soon after another.
+        int count = 0;
         return Exec(Insert("kept")) && Plugin()->GetTotalCount("select 1", count) ? 0 : 3;
     });
     EXPECT_EQ(user.Wait(), 0);

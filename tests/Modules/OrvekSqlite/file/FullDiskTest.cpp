@@ -5,7 +5,7 @@
 #include "tests/Modules/OrvekSqlite/SqliteFixture.h"
 #include "tests/support/WaitUntil.h"
 
-// The real thing: a small file system of the test's own that has no room left.
+// A really full disk: a small file system of the test without any room left.
 namespace {
 
 class FullDisk : public SqliteFixture {
@@ -21,7 +21,7 @@ protected:
 
     bool Exec(const std::string& sql) { return Plugin()->ExecSql(sql); }
 
-    /// A file that takes all the room but so much.
+    /// Makes a file that takes all the room except `free` bytes.
     std::string FillUpTo(std::uintmax_t free) const {
         const auto filler = Directory() + "/filler";
         std::ofstream(filler) << std::string(std::filesystem::space(Directory()).available - free, 'x');
@@ -46,7 +46,7 @@ TEST_F(FullDisk, CostsNoStatementThatWasAccepted) {
         EXPECT_FALSE(Exec(Insert("refused")));
 
     std::filesystem::remove(filler);
-    // By itself: nothing follows.
+    // The plug-in does this by itself: no further statement comes.
     const auto all = "select group_concat(eventID || ',', '') from (select eventID from OperLog order by id)";
     EXPECT_TRUE(WaitUntil([&] { return Ask(Store(), all) == accepted; })) << Ask(Store(), all);
     EXPECT_EQ(Ask(Store(), "pragma integrity_check"), "ok");

@@ -10,14 +10,14 @@
 #include "tests/support/FileContent.h"
 #include "tests/support/WaitUntil.h"
 
-// What is committed when, as another connection sees it.
+// What is committed when, seen through another connection.
 namespace {
 
 namespace fs = std::filesystem;
 using namespace std::chrono_literals;
 using Clock = std::chrono::steady_clock;
 
-/// What a busy machine may add to ten milliseconds, sanitizers included.
+/// What a busy machine may add to ten milliseconds, also with a sanitizer.
 constexpr auto ALLOWANCE = 200ms;
 
 class GroupCommit : public SqliteFixture {
@@ -37,7 +37,7 @@ protected:
         ASSERT_TRUE(WaitUntil([&] { return Clock::now() - start > 10ms; }));
     }
 
-    /// Runs `count` statements as fast as it goes.
+    /// Runs `count` statements as fast as possible.
     void Burst(int count, const std::string& eventID = "burst") {
         for (int i = 0; i < count; ++i)
             ASSERT_TRUE(Exec(Insert(eventID, std::to_string(i)))) << Error();
@@ -70,8 +70,8 @@ protected:
         return rows;
     }
 
-    /// The commits in the write-ahead log: each ends with a frame that tells the size of the database. Too
-    /// few rows here for SQLite to start the log over.
+    /// The number of commits in the write-ahead log: each ends with a frame that holds the size of the
+    /// database. The tests write too few rows for SQLite to begin the log again.
     int Commits() const {
         const std::string content = ContentOf(Store() + "-wal");
         constexpr std::size_t HEADER = 32, FRAME = 24 + 4096;
@@ -138,7 +138,7 @@ TEST_F(GroupCommit, ComesInTimeThoughEveryStatementThatFollowsIsRefused) {
 TEST_F(GroupCommit, ComesWhileStatementsAreTooFarApartToFillAGroup) {
     const auto start = Clock::now();
     std::int64_t row = 0;
-    ASSERT_TRUE(WaitUntil([&] { // looks once in a millisecond
+    ASSERT_TRUE(WaitUntil([&] { // checks once in a millisecond
         EXPECT_TRUE(Exec(Insert("x")));
         ++row;
         return CommittedRows() < row && Clock::now() - start > 100ms;
@@ -234,7 +234,7 @@ TEST_F(GroupCommit, TellsAboutTheLastFailureOfTheCallersOwn) {
     EXPECT_EQ(Error(), error);
 }
 
-/// How often each thread but the caller's gave up the processor.
+/// How often each thread except the caller's gave up the processor.
 std::string SwitchesOfOtherThreads() {
     std::string all;
     for (const auto& thread : fs::directory_iterator("/proc/self/task")) {
@@ -256,7 +256,7 @@ TEST_F(GroupCommit, WakesNobodyAtRest) {
     const auto rows = OpenGroup();
     ASSERT_TRUE(WaitUntil([&] { return CommittedRows() == rows && IsWriteLockFree(); }));
     std::string before;
-    ASSERT_TRUE(WaitUntil([&] { // until it has gone to sleep again
+    ASSERT_TRUE(WaitUntil([&] { // until the plug-in's thread sleeps again
         const auto last = std::exchange(before, SwitchesOfOtherThreads());
         return last == before;
     }));

@@ -11,7 +11,7 @@
 #include "tests/support/Fastest.h"
 #include "tests/support/WaitUntil.h"
 
-// What becomes of a group whose commit fails.
+// What happens to a group whose commit fails.
 namespace {
 
 namespace fs = std::filesystem;
@@ -21,7 +21,7 @@ class UncommittedGroup : public SqliteFixture {
 protected:
     void SetUp() override {
         SqliteFixture::SetUp();
-        ::signal(SIGXFSZ, SIG_IGN); // the write fails instead
+        ::signal(SIGXFSZ, SIG_IGN); // so that the write fails and does not end the process
         ::getrlimit(RLIMIT_FSIZE, &m_unlimited);
         MakeStore(Store());
         ASSERT_TRUE(Plugin()->Open(Store())) << Error();
@@ -32,7 +32,7 @@ protected:
     bool Exec(const std::string& sql) { return Plugin()->ExecSql(sql); }
     std::string Error() { return Plugin()->GetLastErrorMsg(); }
 
-    /// No file can grow from here on. A write then fails in this process as it does on a full disk.
+    /// From now on, no file can grow. A write then fails in this process as it does on a full disk.
     void MakeFilesFull() {
         auto full = m_unlimited;
         full.rlim_cur = 1;
@@ -68,8 +68,8 @@ protected:
         return WaitUntil([&] { return All(Store()) == AllUpTo(count); });
     }
 
-    /// Makes room while another program has the lock, and lets the committer, which tries ten times a second
-    /// and does not wait, find it taken.
+    /// Makes room while another program holds the lock. The committer tries ten times a second and does not
+    /// wait for a lock; this waits until it has found the lock held.
     void MakeRoomUnderALock(SQLite::Database& other) {
         other.exec("begin immediate");
         MakeRoom();
@@ -77,7 +77,8 @@ protected:
         ASSERT_TRUE(WaitUntil([&] { return std::chrono::steady_clock::now() - start > 300ms; }));
     }
 
-    /// A group that could not be committed because the disk was full.
+    /// Leaves a group that could not be committed because the disk was full. Returns the number of accepted
+    /// statements.
     int LeaveAGroupUncommitted() {
         EXPECT_TRUE(Exec(Insert("0"))) << Error();
         MakeFilesFull();
@@ -121,9 +122,10 @@ TEST_F(UncommittedGroup, GoesBeforeTheStatementsThatFollow) {
 
 TEST_F(UncommittedGroup, LeavesTheLockToOthers) {
     SQLite::Database other(Store(), SQLite::OPEN_READWRITE);
-    other.exec("begin immediate; rollback"); // has all its files open before they are full
+    other.exec("begin immediate; rollback"); // opens all its files before they are full
     const int accepted = LeaveAGroupUncommitted();
-    EXPECT_TRUE(WaitUntil([&] { // between two tries of the plug-in, each of which takes the lock
+    // The lock is free between two attempts of the plug-in, each of which takes it.
+    EXPECT_TRUE(WaitUntil([&] {
         return sqlite3_exec(other.getHandle(), "begin immediate; rollback", nullptr, nullptr, nullptr) ==
                SQLITE_OK;
     }));
@@ -184,9 +186,9 @@ TEST_F(UncommittedGroup, SurvivesManyTriesWithoutDoubles) {
     EXPECT_TRUE(WaitForAllUpTo(accepted)) << All(Store());
 }
 
-/// A file that changes while a group is open. The group closes by itself after some milliseconds, so the
-/// change may come just after it: the statements until the first refusal are in one of the two files, in
-/// order, and none in both.
+/// The file changes while a group is open. The group is committed by itself after some milliseconds, so the
+/// change may also come just after that. Either way, all statements until the first refusal are in one of the
+/// two files, in order, and none is in both.
 class ChangedFile : public UncommittedGroup {
 protected:
     void ReplaceStore() {
@@ -205,12 +207,14 @@ protected:
 TEST_F(ChangedFile, HandsTheOpenGroupToTheOneThatReplacesIt) {
     const auto old = Directory() + "/Old.db";
     int next = Burst(0, 50);
-    fs::create_hard_link(Store(), old); // so that the replaced file can still be looked into
+    fs::create_hard_link(Store(), old); // so that the test can still read the replaced file
     MakeStore(Directory() + "/fresh");
     next = Burst(next, 50);
     fs::rename(Directory() + "/fresh", Store());
     next = Burst(next, 50);
-    int count = 0; // makes the plug-in look for its file: the test must not open it beside the old one's log
+    // Makes the plug-in look for its file. The test must not open the new file beside the write-ahead log of
+    // the old one.
+    int count = 0;
     ASSERT_TRUE(Plugin()->GetTotalCount("select count(*) from OperLog", count)) << Error();
     EXPECT_EQ(All(old) + All(Store()), AllUpTo(next));
     EXPECT_NE(Rows(Store()), "0");

@@ -15,24 +15,25 @@
 #include "tests/support/ChildProcess.h"
 #include "tests/support/WaitUntil.h"
 
-// Groups and other processes: what a kill costs, how a process ends in the middle of a burst, and whether
-// another program gets its turn.
+// Groups and other processes: what a kill loses, how a process ends in the middle of a burst, and whether
+// another program can write, too.
 namespace {
 
 using namespace std::chrono_literals;
 using Clock = std::chrono::steady_clock; ///< the same in every process of the machine
 
-/// What the machine may add to the ten milliseconds by not running the committer.
+/// How long the machine may delay the committer, in addition to the ten milliseconds.
 constexpr auto SCHEDULING = 50ms;
 
-/// How long a process may take to end. The thread sanitizer alone sleeps for a second before it lets one go.
+/// How long a process may take to end. The thread sanitizer alone sleeps for a second before the end.
 #if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
 constexpr auto END_LIMIT = 5s;
 #else
-constexpr auto END_LIMIT = 3s; // a second, and room for a busy disk: the end writes the log back
+constexpr auto END_LIMIT = 3s; // a second, and more for a busy disk, because the end writes the log back
 #endif
 
-/// What a streaming child tells its parent, also when it is killed in the middle.
+/// What a child that stores rows tells its parent through shared memory, also when it is killed in the
+/// middle.
 struct Progress {
     static constexpr std::size_t MAX = 1'000'000;
     std::atomic<std::size_t> returned;         ///< statements whose ExecSql has returned true
@@ -54,7 +55,7 @@ protected:
 
     void TearDown() override { ::munmap(m_progress, sizeof(Progress)); }
 
-    /// Stores numbered rows at full speed, in a child, for as long as it lives.
+    /// Stores numbered rows as fast as possible, in a child process, until the child ends.
     void Stream(ISqliteDatabase& database) {
         const auto first = m_progress->returned.load();
         for (auto i = first; i < first + Progress::MAX; ++i) {
@@ -80,7 +81,8 @@ protected:
     void ForgetProgress() { m_progress->returned = 0; }
     Progress& Shared() const { return *m_progress; }
 
-    /// Longer than what may be lost, so that a loss of more would show.
+    /// A random life time. It is longer than the time whose rows may be lost, so that a larger loss would be
+    /// seen.
     std::chrono::milliseconds ALifeTime() {
         return std::chrono::milliseconds(std::uniform_int_distribution(80, 160)(m_random));
     }
@@ -126,7 +128,7 @@ TEST_F(GroupAndProcesses, LoseAtMostTenMillisecondsOfABurstByAKill) {
     }
 }
 
-/// A child streams, and this process is the other program.
+/// A child process stores rows, and this process is the other program.
 class AnotherProgram : public GroupAndProcesses {
 protected:
     void SetUp() override {
@@ -167,7 +169,9 @@ TEST_F(AnotherProgram, FindsTheLockFreeForAboutHalfOfTheTime) {
 TEST_F(AnotherProgram, IsNotLockedOutForLongerThanAGroup) {
     SQLite::Database other(Store(), SQLite::OPEN_READWRITE);
     constexpr std::size_t STRETCHES = 100;
-    std::vector<Clock::duration> taken; // each from a look that finds it so to the next that finds it free
+    // How long the lock was held each time: from the first try that found it held to the next that found it
+    // free.
+    std::vector<Clock::duration> taken;
     auto since = Clock::now();
     for (bool wasFree = true; taken.size() < STRETCHES;) {
         const auto now = Clock::now();
@@ -187,7 +191,7 @@ TEST_F(AnotherProgram, IsNotLockedOutForLongerThanAGroup) {
     EXPECT_LT(taken.back(), 10ms + 1s);
 }
 
-/// As an ordinary program writes one: SQLite's own busy timeout, one insert after the other.
+/// Writes as an ordinary program does: with SQLite's own busy timeout, one insert after the other.
 TEST_F(AnotherProgram, HasItsTurnUnderConstantLoad) {
     SQLite::Database other(Store(), SQLite::OPEN_READWRITE, 5000);
     std::vector<Clock::duration> waits;
@@ -204,13 +208,13 @@ TEST_F(AnotherProgram, HasItsTurnUnderConstantLoad) {
     EXPECT_LT(waits.back(), 1s);
 }
 
-/// A program whose plug-in is destroyed by exit, while another thread streams.
+/// A program whose plug-in exit destroys while another thread stores rows.
 class ProcessThatExits : public GroupAndProcesses {
 protected:
     static constexpr int ROUNDS = 10;
 
-    /// Runs `end` in a child while another of its threads streams, which `end` is given. What the child's
-    /// Wait returned.
+    /// Runs `end` in a child process while another thread of that process stores rows; `end` gets that
+    /// thread. Returns what the child's Wait returned.
     int StreamAndEnd(const std::function<void(std::thread&)>& end) {
         ForgetProgress();
         const auto life = ALifeTime();
@@ -233,7 +237,7 @@ protected:
         EXPECT_TRUE(program.WaitUntilItTold());
         const auto status = program.WaitFor(30s);
         EXPECT_TRUE(status) << "the child hangs";
-        const auto alarm = status && *status > 128 ? 5s : 0s; // of the crash handler below
+        const auto alarm = status && *status > 128 ? 5s : 0s; // the alarm of the crash handler below
         EXPECT_LT(Clock::now() - EndBegan(), END_LIMIT + alarm);
         ExpectAllButTheLastTenMilliseconds();
         return status.value_or(-1);
@@ -259,8 +263,8 @@ TEST_F(ProcessThatExits, EndsAtOnceThoughAnotherThreadIsWriting) {
     }
 }
 
-/// The service's crash handler: it exits on the thread that crashed, wherever that was. Should that thread
-/// hold the allocator's lock, no exit handler can run; the service's alarm ends it then.
+/// Does what the service's crash handler does: it exits on the thread that crashed, wherever that thread was.
+/// When the thread holds the allocator's lock, no exit handler can run, and the alarm ends the process.
 void ExitAsTheCrashHandlerDoes(int) {
     ::alarm(5);
     std::exit(0);

@@ -8,7 +8,7 @@
 #include "tests/Modules/OrvekSqlite/SqliteFixture.h"
 #include "tests/support/WaitUntil.h"
 
-// Groups without their committer.
+// Groups without a committer thread.
 namespace {
 
 using OrvekSqlite::group::Clock;
@@ -21,8 +21,8 @@ protected:
         m_file.Set(Store());
     }
 
-    /// Runs statements until two have come so close together that they share a transaction, and waits until
-    /// that is to be committed.
+    /// Runs statements until two come so soon after each other that they share a transaction, and waits until
+    /// the transaction is due to be committed.
     void OpenDueGroup() {
         ASSERT_TRUE(WaitUntil([&] {
             m_group.Execute(Insert("x"));

@@ -10,8 +10,8 @@ using ::testing::ElementsAre;
 
 namespace {
 
-/// The literals of an INSERT with these values, quotes left out, integers with a #; "none" when it is
-/// SQLite's to judge.
+/// The literals of an INSERT with these values, without their quotes; integers have a # before them. "none"
+/// when the text is left to SQLite.
 std::vector<std::string> Values(const std::string& values) {
     const std::string sql = "insert into T (a,b2) values(" + values;
     const auto insert = LiteralInsert::Of(sql);

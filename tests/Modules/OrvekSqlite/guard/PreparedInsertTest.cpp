@@ -2,8 +2,8 @@
 
 #include "tests/Modules/OrvekSqlite/SqliteFixture.h"
 
-// Inserts that differ in their literals only are compiled once. No caller sees a difference: the stored rows
-// and the errors they give are those of SQLite running the same texts.
+// Inserts that differ only in their literals are compiled once. No caller sees a difference: the stored rows
+// and the errors are the same as when SQLite itself runs these texts.
 namespace {
 
 class PreparedInsert : public SqliteFixture {
@@ -13,13 +13,13 @@ protected:
         MakeStore(Store());
         MakeStore(Plain());
         ASSERT_TRUE(Plugin()->Open(Store())) << Plugin()->GetLastErrorMsg();
-        Run(Insert("the first is compiled")); // what follows is not
+        Run(Insert("the first is compiled")); // later inserts reuse it
     }
 
     std::string Plain() const { return Directory() + "/Plain.db"; }
 
-    /// Runs the text through the plug-in and through SQLite, and expects the same of both: no error, or this
-    /// one.
+    /// Runs the text through the plug-in and through SQLite itself. Expects the same of both: success, or the
+    /// same error.
     void Run(const std::string& sql) {
         const bool done = Plugin()->ExecSql(sql);
         try {
@@ -31,7 +31,7 @@ protected:
         }
     }
 
-    /// Another program's statement, in both.
+    /// Runs another program's statement in both databases.
     void Change(const std::string& sql) {
         for (const auto& path : {Store(), Plain()})
             SQLite::Database(path, SQLite::OPEN_READWRITE, 5000).exec(sql);

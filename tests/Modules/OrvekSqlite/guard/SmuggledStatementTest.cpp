@@ -5,15 +5,15 @@
 
 #include "tests/Modules/OrvekSqlite/SqliteFixture.h"
 
-// What a report may try: its text ends the literal that it was put into and goes on in SQL. Each attack is
-// tried through each of the six values of the statement. Each attack adds at most its own row or
-// leaves an error, and it is over at once.
+// What an attacker may try: the text of a report ends the literal that holds it, and goes on in SQL. Each
+// attack is tried in each of the six values of the statement. It must add at most its own row or leave an
+// error, and must be over at once.
 namespace {
 
 constexpr std::size_t VALUES = 6;
 constexpr std::size_t TYPE = 3; ///< the one value without quotes
 
-// Time of the processor: nothing here waits, and a busy machine is no fault of the statement.
+// Processor time: nothing here waits, and a busy machine must not fail the test.
 #if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
 constexpr double TIME_LIMIT_MS = 1000;
 #else
@@ -32,12 +32,12 @@ std::string StatementWith(std::size_t position, const std::string& text) {
     return sql + ")";
 }
 
-/// A text that makes `expression` a part of its value.
+/// A text that makes `expression` part of the value.
 std::string AsExpression(std::size_t position, const std::string& expression) {
     return position == TYPE ? "0+(" + expression + ")" : "x'||(" + expression + ")||'";
 }
 
-/// A text that writes the remaining columns itself, closes the row and goes on with `tail`; the rest of the
+/// A text that gives the remaining columns itself, closes the row and goes on with `tail`. The rest of the
 /// service's text becomes a comment.
 std::string AsTail(std::size_t position, const std::string& tail) {
     std::string text = position == TYPE ? "0" : "x'";
@@ -69,7 +69,8 @@ protected:
         ExpectAnUntouchedStore();
     }
 
-    /// Without the guard the text would be a statement: an attack that is only a typing error proves nothing.
+    /// Expects that the text would be a valid statement without the guard: an attack with a syntax error
+    /// proves nothing.
     void ExpectRealSql(const std::string& sql) {
         SQLite::Database bare(Store(), SQLite::OPEN_READWRITE);
         sqlite3_stmt* statement = nullptr;
@@ -105,7 +106,7 @@ private:
     }
 };
 
-/// Attacks that are good SQL without the guard, by what they try.
+/// Attacks that are valid SQL without the guard. The key says what each tries.
 const std::map<std::string, std::string> EXPRESSIONS = {
     {"sub-select", "select value from BaseInfo"},
     {"sub-select of values", "values('x')"},
