@@ -1,5 +1,5 @@
-// What one record costs through the real plug-in, beside the bare system call that it cannot do without and
-// beside the file backend that Boost.Log brings along.
+// The time of one record through the real plug-in. To compare: the bare system call, which is needed in any
+// case, and the file backend of Boost.Log.
 
 #include <cstdlib>
 #include <filesystem>
@@ -31,11 +31,12 @@ const std::string MESSAGE = R"({"eventID":"A759|10001","value":{"button":"open",
                             R"("duration":1532,"items":[1,2,3,4,5,6],"user":"visitor"},)"
                             R"("createTime":1700000000,"isDayReport":0,"pType":0,"n":1})";
 
-/// The same record as the plug-in writes it, for the comparison with the bare write.
+/// The same record as the plug-in writes it, to compare with the bare write.
 const std::string LINE =
     "2026-11-20 10:15:30.123 INFO  [12345:12346] [App/ReportServer:42 Recv] " + MESSAGE + "\n";
 
-/// Removed when the program ends. On the disk of the working directory: a log is not kept in memory.
+/// A log directory, which is removed when the program ends. It is on the disk of the working directory,
+/// because a real log is not kept in memory.
 class LogFolder {
 public:
     LogFolder() {
@@ -84,7 +85,7 @@ void TextFileBackendWithAutoFlush(benchmark::State& state) {
         BOOST_LOG(logger) << MESSAGE;
     state.SetItemsProcessed(state.iterations());
     logging::core::get()->remove_sink(sink);
-    logging::core::get()->set_global_attributes({}); // the plug-in's records do not have them
+    logging::core::get()->set_global_attributes({}); // the plug-in's records do not have these attributes
 }
 
 SystemTool::IO::ILogger* ConfiguredLogger() {
@@ -112,7 +113,7 @@ void PluginReport(benchmark::State& state) {
     PluginRecord(state, MESSAGE);
 }
 
-/// Every character takes the long way through the escaping.
+/// A text in which no character takes the fast way through the escaping.
 void PluginChineseText(benchmark::State& state) {
     std::string text;
     while (text.size() < MESSAGE.size())
@@ -120,7 +121,7 @@ void PluginChineseText(benchmark::State& state) {
     PluginRecord(state, text);
 }
 
-// This order: the plug-in's sink stays in the core once it is there.
+// The order matters: once the plug-in's sink is in the core, it stays there.
 BENCHMARK(BareWrite)->UseRealTime();
 BENCHMARK(TextFileBackendWithAutoFlush)->UseRealTime();
 BENCHMARK(PluginReport)->UseRealTime();

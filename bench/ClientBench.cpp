@@ -14,13 +14,13 @@
 #include <syslog.h>
 #include <unistd.h>
 
-// What reporting costs the program that reports, beside the least that any program could do (a bare sendto of
-// the same bytes), and beside what programs do in its place: a counter for a metrics daemon, a line for the
-// local syslog. In processor time of the sending thread. A socket listens to each, with room for all.
-// bench/client runs it.
+// What a report costs the program that sends it, in processor time of the sending thread. To compare: a bare
+// sendto of the same bytes, which is the least that any program needs, and what programs do instead of
+// reporting: a counter for a metrics daemon, and a line for the local syslog. A socket receives each of them,
+// with room for all. bench/client runs it.
 namespace {
 
-constexpr int BATCH = 50; // datagrams that wait in the listener's socket, as many as fit with room to spare
+constexpr int BATCH = 50; // datagrams in the listener's socket at once; more than these would fit
 
 sockaddr_in Loopback(std::uint16_t port) {
     sockaddr_in address{};
@@ -42,7 +42,7 @@ public:
     Listener(const Listener&) = delete;
     Listener& operator=(const Listener&) = delete;
 
-    /// Takes everything out; what came last.
+    /// Takes all datagrams out. Returns the last one.
     std::string Drain() const {
         std::array<char, 16'384> buffer{};
         std::string last;
@@ -61,7 +61,8 @@ double ThreadSeconds() {
     return static_cast<double>(now.tv_sec) + static_cast<double>(now.tv_nsec) * 1e-9;
 }
 
-/// Times `send`, a batch at a time; between two of them the listener takes them out.
+/// Times `send`, one batch at a time. After each batch, the listener takes the datagrams out, which is not
+/// timed.
 template <typename Send>
 void TimeSending(benchmark::State& state, const Listener& listener, Send send) {
     for (auto _ : state) {
@@ -94,7 +95,7 @@ void EventWithJson(benchmark::State& state) {
     SendEvent(state, JSON);
 }
 
-/// The same bytes, which cost nothing to make.
+/// The same bytes, which were made before.
 void SendBare(benchmark::State& state, const hublink::Value& value) {
     const Listener listener(AF_INET, Loopback(9997));
     hublink::Reporter().Event("B100|10001", value);
@@ -116,7 +117,7 @@ void BareSendtoOfJson(benchmark::State& state) {
     SendBare(state, JSON);
 }
 
-/// A counter as clients of metrics daemons send them: formatted, over UDP, and nothing more.
+/// A counter as clients of metrics daemons send it: formatted and sent over UDP, and nothing more.
 void StatsdCounter(benchmark::State& state) {
     const sockaddr_in daemon = Loopback(8125);
     const Listener listener(AF_INET, daemon);
@@ -132,7 +133,7 @@ void StatsdCounter(benchmark::State& state) {
     ::close(socket);
 }
 
-/// A line of the same text, to a daemon that does not format or store it.
+/// A log line of the same text. The receiving socket neither formats nor stores it.
 void LocalSyslog(benchmark::State& state) {
     sockaddr_un daemon{};
     daemon.sun_family = AF_UNIX;
@@ -140,7 +141,7 @@ void LocalSyslog(benchmark::State& state) {
     {
         const Listener listener(AF_UNIX, daemon);
         ::openlog("painter", LOG_PID | LOG_NDELAY, LOG_USER);
-        // Ten lines wait in a socket of this family, and the eleventh waits for room.
+        // A socket of this family holds ten lines. The eleventh would wait for room.
         for (auto _ : state) {
             const double begin = ThreadSeconds();
             for (int i = 0; i < 10; ++i)

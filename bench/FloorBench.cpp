@@ -1,5 +1,5 @@
-// The bare parts of a report's way that no other program measures: what any service would pay that does what
-// this one does. bench/run adds them to a bare receive and a bare insert, and calls the sum the floor.
+// The bare parts of a report's way that no other program here measures: what any service needs that does the
+// same work. bench/run adds them to a bare receive and a bare insert. The sum is called the floor.
 
 #include <cstdlib>
 #include <deque>
@@ -17,7 +17,7 @@
 
 namespace {
 
-/// The log's line of a report, to a file on the disk of the working directory.
+/// Writes the log line of a report to a file on the disk of the working directory.
 void Write(benchmark::State& state) {
     const std::string line =
         "2026-11-20 10:15:30.123 INFO  [12345:12346] [App/ReportServer:42 Recv] " + ReportOf180Bytes() + "\n";
@@ -31,8 +31,8 @@ void Write(benchmark::State& state) {
     close(file);
 }
 
-/// By the fastest parser that Debian has. All of the text is read and checked, since it comes from outside;
-/// its On-Demand interface would pass over what is not asked for.
+/// Parses with the fastest parser in Debian. It reads and checks the whole text, because the text comes from
+/// outside. The parser's On-Demand interface would skip what is not asked for.
 void Parse(benchmark::State& state) {
     const simdjson::padded_string report(ReportOf180Bytes());
     simdjson::dom::parser parser;
@@ -43,7 +43,7 @@ void Parse(benchmark::State& state) {
     state.SetItemsProcessed(state.iterations());
 }
 
-/// A copy of the text in and out, under a lock and on one thread: no thread waits for another.
+/// Copies the text into a queue and out of it, under a lock, on one thread: no thread waits for another.
 void Queue(benchmark::State& state) {
     const std::string report = ReportOf180Bytes();
     constexpr std::size_t WAITING = 100;
@@ -64,6 +64,6 @@ void Queue(benchmark::State& state) {
 
 } // namespace
 
-BENCHMARK(Write)->Iterations(200'000); // 50 MB; more would be the disk's work, too
+BENCHMARK(Write)->Iterations(200'000); // 50 MB; with more, the disk would be measured, too
 BENCHMARK(Parse);
 BENCHMARK(Queue);

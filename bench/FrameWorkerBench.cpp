@@ -13,11 +13,11 @@
 #include "tests/support/StoreTables.h"
 #include "tests/support/TemporaryDirectory.h"
 
-// One report through FrameWorker::Send into a real file, against a bare loop of the same statement's text,
-// and into files that have rows already.
+// One report through FrameWorker::Send into a real file, also into files that already have rows. To compare:
+// a bare loop of the same statement text.
 //
-// The bare loop runs first and makes SQLite count every allocation, which the plug-in would switch off in a
-// process that had not used SQLite before. So both pay for that here; in the service neither does.
+// The bare loop runs first and makes SQLite count every allocation. The plug-in would switch that off in a
+// process that has not used SQLite before. So both are a little slower here; in the service, neither is.
 namespace {
 
 const std::string VERSION = "3.0.0.0";
@@ -33,7 +33,7 @@ SyncServiceReport::ST_OptLog Record() {
     return log;
 }
 
-/// Rows as Send writes them, but all at once.
+/// Makes this many rows at once. They are as Send writes them.
 std::string Fill(std::int64_t rows) {
     const auto log = Record();
     return "insert into OperLog (eventID,value,createTime,pType,extData3,extData4)"
@@ -42,7 +42,7 @@ std::string Fill(std::int64_t rows) {
            "',0,'3.0.0.0','visitor' from n";
 }
 
-/// A user data directory with a store in it that has so many rows.
+/// A user data directory with a store that has this many rows.
 class Store {
 public:
     explicit Store(std::int64_t rows = 0) {
@@ -78,7 +78,7 @@ void StatementText(benchmark::State& state, std::string (*textOf)(const SyncServ
         benchmark::DoNotOptimize(textOf(log));
 }
 
-/// With a commit after as many rows as the argument says.
+/// Commits after as many rows as the argument says.
 void BareStatements(benchmark::State& state) {
     const Store store;
     SQLite::Database database(store.Path(), SQLite::OPEN_READWRITE);
@@ -117,5 +117,6 @@ void Send(benchmark::State& state) {
 BENCHMARK_CAPTURE(StatementText, Poco, TextByPoco);
 BENCHMARK_CAPTURE(StatementText, Fmt, TextByFmt);
 BENCHMARK(BareStatements)->ArgName("rows_per_commit")->Arg(1)->Arg(1000);
-// A fixed number of reports: finding one out would fill the file again each time.
+// The number of reports is fixed: while the library looked for a number, it would fill the file again each
+// time.
 BENCHMARK(Send)->ArgName("rows_before")->Iterations(200'000)->Arg(0)->Arg(1'000'000)->Arg(5'000'000);

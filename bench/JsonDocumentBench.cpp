@@ -6,7 +6,7 @@
 #include "SystemTool/IO/JsonDocument.h"
 #include "bench/Report.h"
 
-// One report of 180 bytes: parsed, its four members read, the object among them printed.
+// One report of 180 bytes: it is parsed, its four members are read, and the object among them is printed.
 namespace {
 
 void BareLibrary(benchmark::State& state) {
@@ -39,7 +39,8 @@ void Document(benchmark::State& state) {
     state.SetItemsProcessed(state.iterations());
 }
 
-/// One member of an object of as many as the argument says: the same cost for all, since nothing is copied.
+/// Reads one member of an object with as many members as the argument says. The time should not depend on the
+/// size, because nothing is copied.
 void MemberOfALargeDocument(benchmark::State& state) {
     std::string text = "{";
     for (std::int64_t i = 0; i < state.range(0); ++i)

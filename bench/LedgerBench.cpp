@@ -11,19 +11,19 @@
 #include "SystemTool/Platform.h"
 #include "bench/Report.h"
 
-// What the ledger costs a report: all that is counted from the socket to the store, in a real file, beside
-// the same without a ledger.
+// What the ledger adds to the time of a report: all counting from the socket to the store, in a real file. To
+// compare: the same without a ledger.
 namespace {
 
 using ReportLedger::Outcome;
 
-/// A ledger in a file of its own.
+/// A ledger with its own file.
 class Books {
 public:
     Books() {
         if (::mkdtemp(m_directory.data()) == nullptr ||
             !m_ledger.Open(m_directory, "0", "", SystemTool::Platform::CoarseTimeMs()))
-            std::abort(); // else the counts would be in memory, and the figure of something else
+            std::abort(); // otherwise the counts would be in memory, and the figure would be wrong
     }
     ~Books() { std::filesystem::remove_all(m_directory); }
     Books(const Books&) = delete;
@@ -50,7 +50,7 @@ private:
     SyncServiceReport::IntakeWatch m_intake{m_ledger, m_socket};
 };
 
-/// The counting alone, on one thread.
+/// Only the counting, on one thread.
 void CountedReport(benchmark::State& state) {
     Books books;
     for (auto _ : state) {
@@ -81,10 +81,10 @@ public:
     }
 
 private:
-    Books* m_books; ///< None: not counted.
+    Books* m_books; ///< Null: nothing is counted.
 };
 
-/// In and out of the queue on one thread, a thousand at a time.
+/// Into the queue and out of it on one thread, a thousand reports at a time.
 void Queued(benchmark::State& state, Books* books) {
     constexpr int REPORTS = 1000;
     const std::string report = ReportOf180Bytes();
@@ -107,7 +107,8 @@ void QueuedWithLedger(benchmark::State& state) {
     Queued(state, &books);
 }
 
-/// With a consumer of its own, as in the service: what the two threads' counters cost each other.
+/// With a consumer thread, as in the service: this shows how much the counters of the two threads slow each
+/// other down.
 void ToAnotherThread(benchmark::State& state, Books* books) {
     const std::string report = ReportOf180Bytes();
     Tasker tasker(books);

@@ -6,10 +6,10 @@
 #include "Common/LogText.h"
 #include "bench/Report.h"
 
-// The text of a datagram's log record. The datagram is its own format.
+// Builds the text of a datagram's log record. The datagram itself is the format.
 namespace {
 
-/// What the text costs, or the exception when it cannot be built.
+/// Measures how long it takes to build the text, or to throw the exception when it cannot be built.
 template <typename MakeText>
 void Measure(benchmark::State& state, MakeText makeText) {
     for (auto _ : state) {
@@ -32,7 +32,7 @@ void BareFormat(benchmark::State& state, const std::string& datagram) {
     Measure(state, [&] { return boost::format(datagram).str().size(); });
 }
 
-/// As much of `directive` as a datagram has room for.
+/// A datagram that is filled with `directive`.
 std::string DatagramOf(const std::string& directive) {
     constexpr std::size_t DATAGRAM_BYTES = 10240;
     std::string datagram;

@@ -1,5 +1,5 @@
-// The analytics outbox: what storing an event costs with an empty and with a long outbox, beside the least
-// that SQLite can do it for; and how fast events go out to a collector on the loopback address.
+// The analytics outbox: how long it takes to store an event, with an empty and with a long outbox, compared
+// with bare SQLite; and how fast events are sent to a collector on the loopback address.
 
 #include <fstream>
 #include <memory>
@@ -23,7 +23,7 @@ namespace {
 
 const ModuleIdentity MODULE{"A759", "1", "default"};
 
-/// As the service builds it from a usual report.
+/// The payload that the service makes of a usual report.
 const std::string PAYLOAD =
     R"({"extend":{"hublinkVersion":"5.1.0.2","createTime":"1700000000123"},"eventData":{"button":"ok",)"
     R"("count":3,"ratio":1.5,"openid":"visitor","sys_version":"Debian GNU/Linux 12 (bookworm) 6.1.0"}})";
@@ -53,12 +53,12 @@ void BareSqliteOneCommitEach(benchmark::State& state) {
     Bare(state, "NORMAL");
 }
 
-/// What it would cost to survive a power cut with the very last event.
+/// What it would take to keep even the last event after a power cut.
 void BareSqliteOneSyncEach(benchmark::State& state) {
     Bare(state, "FULL");
 }
 
-/// Puts `count` events into the outbox in one transaction, in the shape in which Append leaves them.
+/// Puts `count` events into the outbox in one transaction, in the form that Append gives them.
 void Fill(const std::string& directory, std::int64_t count) {
     if (count == 0)
         return;
@@ -75,22 +75,23 @@ void Fill(const std::string& directory, std::int64_t count) {
     insert.bind(4, static_cast<std::int64_t>(PAYLOAD.size()) + 90);
     insert.exec();
     transaction.commit();
-    // On the disk before anything is measured: writing it back would be charged to what comes next.
+    // Writes everything to the disk before the measurement, which would otherwise include it.
     database.exec("PRAGMA wal_checkpoint(TRUNCATE)");
 }
 
-/// A new outbox with one event and `more` filled in.
+/// A new outbox with one event, and `more` events filled in.
 std::unique_ptr<outbox::Outbox> MakeOutbox(const std::string& directory, std::int64_t more,
                                            report::Notifier& notifier) {
     auto settings = SettingsFor(directory);
-    settings.caps.maxWaitingBytes = std::size_t{4} << 30; // the benchmark may fill it well beyond the usual
+    settings.caps.maxWaitingBytes = std::size_t{4} << 30; // the benchmark may need more than the usual limit
     outbox::Outbox(directory, settings, notifier).Append(MODULE, "A759|10001", PAYLOAD);
     Fill(directory, more);
     return std::make_unique<outbox::Outbox>(directory, settings, notifier);
 }
 
-/// With so many events waiting. What has to be written for the longest outbox is written before every run,
-/// into another one where it is not wanted, because a disk is slow for a while after that.
+/// Stores an event while this many events wait. Each run first writes as many bytes as the longest outbox
+/// needs, and puts what it does not need into another outbox: a disk is slow for some time after such a
+/// write.
 void StoreAnEvent(benchmark::State& state) {
     constexpr std::int64_t MOST = 1'000'000;
     const TemporaryDirectory directory;
@@ -116,7 +117,7 @@ void EncodeABatch(benchmark::State& state) {
     state.SetItemsProcessed(state.iterations() * 512);
 }
 
-/// Until the last of so many waiting events is delivered and deleted.
+/// Uploads until the last of this many events is delivered and deleted.
 void UploadEverything(benchmark::State& state) {
     LoopbackServer collector([](const Request&) { return Reply(); });
     otlp::EndpointConfig endpoint;
@@ -139,7 +140,7 @@ void UploadEverything(benchmark::State& state) {
     state.SetItemsProcessed(state.iterations() * (state.range(0) + 1));
 }
 
-/// Storing while the uploader takes its share of the machine and of the outbox's lock.
+/// Stores events while the uploader uses the machine and the outbox's lock, too.
 void StoreWhileUploading(benchmark::State& state) {
     LoopbackServer collector([](const Request&) { return Reply(); });
     otlp::EndpointConfig endpoint;

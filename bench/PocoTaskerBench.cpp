@@ -25,7 +25,7 @@ void CopyOfTheText(benchmark::State& state) {
     state.SetItemsProcessed(state.iterations());
 }
 
-/// With as many items waiting as the argument says.
+/// Produces and consumes an item while as many items wait as the argument says.
 void Item(benchmark::State& state) {
     const std::string report = ReportOf180Bytes();
     for (auto _ : state) {
@@ -38,7 +38,7 @@ void Item(benchmark::State& state) {
     state.SetItemsProcessed(state.iterations() * state.range(0));
 }
 
-/// With a consumer of its own that waits for each, as in the service.
+/// With a consumer thread that waits for each item, as in the service.
 void ItemToAnotherThread(benchmark::State& state) {
     const std::string report = ReportOf180Bytes();
     Tasker tasker;

@@ -10,11 +10,11 @@
 #include "Common/Wire.h"
 #include "bench/Report.h"
 
-// One datagram from the socket to a text, with the datagrams waiting in the socket already: what the
-// receiving thread can do at most.
+// One datagram from the socket to a text. The datagrams already wait in the socket, so this is the most that
+// the receiving thread can do.
 namespace {
 
-constexpr int WAITING = 100; // as many as fit the kernel's default buffer with room to spare
+constexpr int WAITING = 100; // the kernel's default buffer holds more than these
 
 class Receiver final : public UDPServer {
 public:

@@ -1,5 +1,5 @@
-// A datagram's way through the server to fake destinations: what must reach one reaches it as the text says,
-// nothing reaches the other one, and the log tells of each datagram once.
+// A datagram through the server to fake destinations. What the text says must reach one destination, nothing
+// must reach the other, and the log must have each datagram once.
 
 #include <map>
 
@@ -30,11 +30,12 @@ struct Fakes {
     FakeSdkState& sdk = FakeSdk();
 };
 
-/// One server's life: the modules that announced themselves, and what must have come of each datagram.
+/// One server: the modules that announced themselves, and checks of what each datagram caused.
 class Session {
 public:
     Session(FuzzedServer& server, Fakes& fakes) : m_server(server), m_fakes(fakes) {
-        m_modules["A759"] = fakes.sdk.created; // a fresh server made the default module's object last
+        // The last object that a new server made is the default module's.
+        m_modules["A759"] = fakes.sdk.created;
     }
 
     void Take(const std::string& datagram) {
@@ -75,7 +76,7 @@ private:
 
     void ExpectNoStatement() const { Require(m_fakes.store.calls.empty(), "nothing reaches the store"); }
 
-    /// A report that goes nowhere, and a line of `function` says why.
+    /// Requires that the report goes to no destination, and that a line of `function` says why.
     void ExpectNothing(const std::string& function) const {
         ExpectNoStatement();
         Require(m_fakes.sdk.calls.empty(), "nothing reaches analytics");
@@ -168,8 +169,8 @@ private:
 
     FuzzedServer& m_server;
     Fakes& m_fakes;
-    std::map<std::string, int> m_modules; ///< The number of each one's SDK object.
-    ST_BaseInfo m_before;                 ///< As it was when the datagram came.
+    std::map<std::string, int> m_modules; ///< The number of each module's SDK object.
+    ST_BaseInfo m_before;                 ///< As it was before the datagram.
     bool m_hasChanged = false;
 };
 

@@ -1,5 +1,5 @@
-// A text through the JSON reader: what can be read prints as the same value, number by number, and what is
-// set can be got.
+// A text through the JSON reader. A text that can be read must print as the same value, number by number, and
+// a member that was set must be found.
 
 #include <charconv>
 #include <cmath>
@@ -90,7 +90,7 @@ void RequireStringSurvives(const JsonDocument& document) {
                  "a text that was read survives being set, printed and read");
 }
 
-/// Sets in a copy, of an object: the original does not change.
+/// Sets members in a copy of an object, and requires that the original does not change.
 void RequireMembersCanBeSet(const JsonDocument& document, const std::string& json) {
     JsonDocument copy = document;
     copy.SetKeyValue("value", document);
@@ -103,7 +103,7 @@ void RequireMembersCanBeSet(const JsonDocument& document, const std::string& jso
     RequireEqual(list.GetKeyValue("copy").ToJson(), copy.ToJson(), "an object within another is the same");
 }
 
-/// A text of any bytes, set as it is: prints as JSON.
+/// Sets a text of any bytes, and requires that the document prints as JSON.
 void RequireAnyTextCanBeSet(const std::string& bytes) {
     JsonDocument document;
     document.SetKeyValue(bytes, bytes);
@@ -111,7 +111,7 @@ void RequireAnyTextCanBeSet(const std::string& bytes) {
     RequireEqual(again.ToJson(), document.ToJson(), "any text can be set, printed and read");
 }
 
-/// A number is refused as too big only where it is.
+/// Requires that a number which was refused as too big really is.
 void RequireTooBig(const std::string& text, const std::string& error) {
     const std::string refusal = "Number too big to be stored in double. At byte ";
     if (!error.starts_with(refusal))

@@ -1,5 +1,5 @@
-// A text from outside as the log's format string, and on into the log's line: one record for any text, what
-// boost::format makes of it, within its size, and one line that the text cannot break.
+// A text from outside as the log's format string, up to the line in the log. Any text must give one record,
+// with what boost::format makes of it, within the size limits, and one line that the text cannot break.
 
 #include <algorithm>
 #include <chrono>
@@ -39,7 +39,8 @@ bool IsControl(char byte) {
     return static_cast<unsigned char>(byte) < 0x20 || byte == 0x7f;
 }
 
-/// The plug-in's line for the record: one, which does nothing to a terminal and reads as what it is.
+/// Requires that the plug-in makes one line of the record, that the line has no effect on a terminal, and
+/// that it does not look like something else.
 void RequireOneHarmlessLine(const LogRecord& record) {
     BoostLogger::LineBuffer buffer;
     BoostLogger::ComposeLine(buffer,
@@ -60,16 +61,16 @@ void RequireOneHarmlessLine(const LogRecord& record) {
         Require(line.find(mark) == std::string::npos, "nor one that ends or turns the line", line);
 }
 
-/// Whether a number is so long that boost::format would compute with it beyond the range of its integers.
+/// Whether a number is so long that boost::format would calculate with it beyond the range of its integers.
 bool HasALongNumber(std::string_view text) {
     const auto isDigit = [](char byte) { return byte >= '0' && byte <= '9'; };
     const auto same = [&](char byte, bool wanted) { return isDigit(byte) == wanted; };
     return std::search_n(text.begin(), text.end(), 10, true, same) != text.end();
 }
 
-/// boost::format makes room for the directives that it counts, and counts a tabulation whose fill is a
-/// percent sign as one too few. One that has parsed as many directives as there are percent signs before
-/// keeps the room for them.
+/// A boost::format object with enough room. boost::format makes room for the directives that it counts, but
+/// counts one too few for a tabulation whose fill is a percent sign. An object that has parsed as many
+/// directives as the text has percent signs keeps the room for them.
 boost::format WithRoom(const std::string& text) {
     std::string roomy;
     for (auto count = std::ranges::count(text, '%'); count > 0; --count)
@@ -79,7 +80,7 @@ boost::format WithRoom(const std::string& text) {
     return format;
 }
 
-/// What boost::format itself makes of the text, as the record's message.
+/// What boost::format itself makes of the text, in the form of the record's message.
 std::string FormattedByBoost(const std::string& text) {
     try {
         const boost::format format = WithRoom(text);
@@ -107,8 +108,8 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
         RequireEqual(record.message, FormattedByBoost(text), "the text is what boost::format makes of it");
     Require(record.message.size() <= text.size() + MAX_LOG_TEXT_GROWTH_BYTES, "a text hardly grows");
     RequireOneHarmlessLine(record);
-    // As an argument, a text is never a format. (A text from outside that is the format has no arguments
-    // anywhere.)
+    // As an argument, a text is never a format. (Nowhere in the service does a text from outside that is used
+    // as the format have arguments.)
     const std::string both = text + "-" + text;
     if (both.size() <= MAX_LOG_TEXT_BYTES)
         RequireEqual(Logged(logger, "%s-%s", text, text).message, both, "an argument stays as it is");

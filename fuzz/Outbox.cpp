@@ -1,13 +1,9 @@
-// Modules, events and a collector's answers through the analytics SDK and its own outbox: with any content,
-// what was accepted is counted in exactly one place, and what is sent is a request that a collector can read,
-// with each event under one id and one number.
+// Modules, events and a collector's answers through the analytics SDK and its own outbox, with any content.
+// Each accepted event must be counted in exactly one place. Each request must be one that a collector can
+// read, and each event must keep one id and one number.
 //
-// An input is a list of steps with a zero byte behind each. The first character says what a step is, line
-// ends part the texts in it:
-//     m id, version, name, directory     a module announces itself
-//     e event id, payload                the newest module reports
-//     a status, Retry-After, type, body  one pass of the uploader, which gets this answer
-//     f fault                            one pass that gets none
+// An input is a list of steps, with a zero byte after each. The first character says what the step is. Line
+// ends separate the texts of a step:
 
 #include <filesystem>
 #include <map>
@@ -33,7 +29,7 @@ void OnFailure(std::string what, std::string why) {
     Require(!what.empty() && !why.empty(), "a failure has a cause and a text", what);
 }
 
-void OnSuccess(std::string what, std::string /*detail*/) { // which is a module's id, and may be empty
+void OnSuccess(std::string what, std::string /*detail*/) { // the detail is a module's id and may be empty
     Require(!what.empty(), "a success has a name");
 }
 
@@ -47,7 +43,7 @@ std::vector<std::string> Parted(const std::string& text, char mark) {
     return parts;
 }
 
-/// The collector: reads each request, and checks it.
+/// The collector. It reads each request and checks it.
 class Collector final : public otlp::Sender {
 public:
     otlp::HttpResult Post(const std::string& body) override {
@@ -66,7 +62,7 @@ public:
     std::string Destination() const override { return "http://collector"; }
     std::vector<std::string> HeaderNames() const override { return {}; }
 
-    /// Shown by the modules.
+    /// The ids of the modules that announced themselves, as a collector gets them.
     std::set<std::string> modules;
     otlp::HttpResult answer;
 
@@ -108,7 +104,7 @@ private:
     std::map<std::pair<std::string, std::int64_t>, std::string> m_uuids;
 };
 
-/// The SDK of a process that has just started, with an empty data directory.
+/// The SDK as in a process that has just started, with an empty data directory.
 class Process {
 public:
     Process() { Announce({"A759", "1", "default", ""}); }
@@ -146,7 +142,7 @@ public:
                      "the file is sound");
     }
 
-    /// Directories are made where they may be, and hold outboxes.
+    /// Requires that only directories and outboxes are made.
     void RequireOutboxesOnly() {
         for (const auto& entry : std::filesystem::recursive_directory_iterator(m_home.Path()))
             Require(entry.is_directory() || entry.path().filename().string().starts_with("MetrikOutbox.db"),
@@ -154,7 +150,7 @@ public:
     }
 
 private:
-    static constexpr std::size_t MAX_MODULES = 64; ///< An input is to take no time.
+    static constexpr std::size_t MAX_MODULES = 64; ///< So that an input does not take long.
 
     std::string Directory() const { return m_home.Path() + "/hublink/database"; }
 
@@ -185,8 +181,9 @@ private:
         std::string id, version, name, directory;
     };
 
-    /// A directory of the input's is one below the data directory: as root, the target could use others.
-    /// Events in it are not counted, so its module is not the newest.
+    /// A directory that the input names is always below the data directory, because the target may run as
+    /// root, which could use other directories. Events in such a directory are not counted, so its module
+    /// does not become the newest.
     void Announce(const Announcement& module) {
         if (m_modules.size() >= MAX_MODULES || module.directory.find("..") != std::string::npos)
             return;
@@ -211,7 +208,7 @@ private:
             m_engine->Events(), m_collector, m_engine->Listeners(), OutboxSettings{}, [] { return 0.5; });
     }
 
-    /// So late that an event waits for no company.
+    /// Runs one pass of the uploader. The time is so late that no event waits for further ones.
     void Pass(otlp::HttpResult answer) {
         m_collector.answer = std::move(answer);
         const auto pause = m_cycle->Pass(WallNow() + std::chrono::hours(1));
@@ -220,7 +217,7 @@ private:
                 "the uploader comes back", std::to_string(pause.duration.count()));
     }
 
-    static constexpr std::size_t MAX_ID_BYTES = 64; ///< Longer ids are cut.
+    static constexpr std::size_t MAX_ID_BYTES = 64; ///< Longer ids are cut to this length.
 
     TemporaryDirectory m_home;
     process::OutboxRegistry m_registry{OutboxSettings{}, [](const char*) -> const char* { return nullptr; },

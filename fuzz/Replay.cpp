@@ -1,5 +1,5 @@
-// Runs a target once for each file of some folders: the fuzzer's place where there is none, so that what the
-// fuzzers once found stays found with every compiler.
+// Runs a target once for each file of some folders, in place of the fuzzer, which not every compiler has. So
+// what the fuzzers once found is tested with every compiler.
 
 #include <cstdint>
 #include <cstdio>
@@ -15,7 +15,7 @@ int main(int argc, char** argv) {
     for (int i = 1; i < argc; ++i) {
         for (const auto& file : std::filesystem::directory_iterator(argv[i])) {
             std::printf("%s\n", file.path().c_str());
-            std::fflush(stdout); // a crash comes without the rest of the buffer
+            std::fflush(stdout); // a crash would lose what is still in the buffer
             std::ifstream stream(file.path(), std::ios::binary);
             const std::vector<char> input(std::istreambuf_iterator<char>(stream), {});
             LLVMFuzzerTestOneInput(reinterpret_cast<const std::uint8_t*>(input.data()), input.size());

@@ -1,5 +1,5 @@
-// Datagrams through the server into the real store: with any text of a report in the statement,
-// the database gets one row of its table at most, and nothing else of it changes.
+// Datagrams through the server into the real store. Whatever text of a report is in the statement, the table
+// must get one row at most, and nothing else in the database must change.
 
 #include <filesystem>
 
@@ -22,7 +22,7 @@ constexpr auto ROWS =
     "insert into BaseInfo values ('OpenID', 'u1');"
     "insert into OperLog values (1, 'kept', 'v', '1700000000000', 0, null, null, '3.0.0.0', 'u1')";
 
-/// Everything of the database but the rows that reports add.
+/// Everything in the database except the rows that reports add.
 constexpr auto OTHERS =
     "select (select group_concat(name || sql) from sqlite_master) "
     "|| (select group_concat(key || value) from BaseInfo) || (select user_version from pragma_user_version) "
@@ -32,7 +32,7 @@ constexpr auto NEWEST =
     "select eventID || char(10) || value || char(10) || createTime || char(10) || pType || char(10) "
     "|| extData3 || char(10) || extData4 from OperLog order by id desc limit 1";
 
-/// The database, and a connection of the target's own to look at it.
+/// The database, and the target's own connection to examine it.
 class Store {
 public:
     Store() {
@@ -43,7 +43,7 @@ public:
         m_others = Ask(OTHERS);
     }
 
-    /// What is stored, with the rows of an open group.
+    /// How many rows are stored, including those of an open group.
     int Rows() {
         int committed = 0;
         Require(DBHelper::instance().GetTotalCount("select count(*) from OperLog", committed),
@@ -69,7 +69,7 @@ private:
         for (const auto& file : std::filesystem::directory_iterator(m_directory))
             Require(file.path().filename().string().starts_with("Report.db"), "no other file is made",
                     file.path().string());
-        m_look.exec("delete from OperLog where id > 1"); // counting stays quick
+        m_look.exec("delete from OperLog where id > 1"); // so that counting stays quick
     }
 
     std::string Ask(const std::string& query) {
@@ -90,14 +90,14 @@ private:
     int m_inputs = 0;
 };
 
-/// Whether none of the texts that go into the statement can end its literal, or the statement.
+/// Whether no text in the statement can end its literal or the statement.
 bool IsPlain(const ST_OptLog& report, const ST_BaseInfo& info) {
     const std::string texts =
         report.eventID + report.value + report.createTime + info.suiteVersion + info.openID;
     return texts.find_first_of(std::string_view("'\0", 2)) == std::string::npos;
 }
 
-/// A report's row, in the shape of Store::Newest; empty for one that is not stored as it is.
+/// The row of a report, in the form of Store::Newest; empty when the report is not stored as it is.
 std::string PlainRowOf(const std::string& datagram, const ST_BaseInfo& info) {
     const auto report = IsEventReport(datagram) ? ReportIn(datagram) : std::nullopt;
     if (!report || IsForAnalytics(*report) || !IsPlain(*report, info))

@@ -7,7 +7,7 @@
 
 #include <time.h>
 
-/// Raw nanoseconds: they travel between programs in files.
+/// Raw nanoseconds, because programs exchange them in files.
 inline std::int64_t NowNs(clockid_t clock) {
     timespec now{};
     ::clock_gettime(clock, &now);
@@ -24,7 +24,7 @@ inline void SleepUntil(std::int64_t monotonicNs) {
     ::clock_nanosleep(CLOCK_MONOTONIC, TIMER_ABSTIME, &until, nullptr);
 }
 
-/// As they are in memory; nothing when there are none.
+/// Writes the stamps as they are in memory. Writes no file when there are none.
 inline void WriteStamps(const std::string& path, const std::vector<std::int64_t>& stamps) {
     if (stamps.empty())
         return;

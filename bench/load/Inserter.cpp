@@ -1,7 +1,7 @@
-// Bare SQLite, opened as the plug-in opens it: the rows that the service makes of reports, and a commit after
-// every so many. Either each row is a statement's text, there already but for its number, which SQLite
-// compiles; or one statement is prepared and gets the values of each row, which is the least that a store can
-// do.
+// Bare SQLite, opened as the plug-in opens it. It inserts the rows that the service makes of reports, and
+// commits after a number of rows. Either each row is the text of a statement, which SQLite compiles; the text
+// is ready except for the report's number. Or one statement is prepared and gets the values of each row,
+// which is the least that a store can do.
 
 #include <iostream>
 #include <string>
@@ -22,7 +22,7 @@ struct Plan {
     bool isPrepared = false;
 };
 
-/// What becomes of the report of 180 bytes.
+/// The statement that the service makes of the report of 180 bytes.
 std::string Statement(std::int64_t number) {
     return fmt::format("insert into OperLog (eventID,value,createTime,pType,extData3,extData4) values("
                        "'B100|10001', '{{\"button\":\"save\",\"page\":\"editor\",\"count\":3,\"ratio\":1.5,"
@@ -30,8 +30,8 @@ std::string Statement(std::int64_t number) {
                        number);
 }
 
-/// The same row with a statement that is compiled once. All values are bound anew, as those of a report would
-/// have to be.
+/// The same row by a statement that is compiled once. All values are bound again for each row, as the values
+/// of a report must be.
 class PreparedRow {
 public:
     explicit PreparedRow(SQLite::Database& database)

@@ -7,11 +7,11 @@
 
 #include "bench/Report.h"
 
-/// The report of 180 bytes with its number in `createTime`, from where it gets into the stored row. Writing a
-/// number changes some bytes in place: it costs a loop that is measured next to nothing.
+/// The report of 180 bytes with its number in `createTime`, which becomes part of the stored row. To write a
+/// number changes some bytes in place, so it adds almost nothing to a measured loop.
 class NumberedReport {
 public:
-    /// `eventId` has the length of the usual report's, so that all reports have 180 bytes.
+    /// `eventId` must be as long as the usual one, so that all reports have 180 bytes.
     explicit NumberedReport(const std::string& eventId) : m_text(ReportOf180Bytes()) {
         const std::string usual = "B100|10001";
         if (eventId.size() != usual.size() || m_text.size() != 180)
@@ -30,8 +30,9 @@ public:
 
 private:
     static constexpr auto FIRST_TIME = "1700000000123";
-    static constexpr int DIGITS = 10; ///< at the end of the time: billions of reports keep its length
+    /// At the end of the time: billions of numbers fit without changing its length.
+    static constexpr int DIGITS = 10;
 
     std::string m_text;
-    std::size_t m_number; ///< behind the last digit
+    std::size_t m_number; ///< the place after the last digit
 };

@@ -1,5 +1,5 @@
-// The least that a receiver can do: one system call a datagram. Runs until it is killed; what it received and
-// what it cost, the kernel knows.
+// The least that a receiver can do: one system call for each datagram. It runs until it is killed. The kernel
+// knows how much it received and how much processor time it took.
 
 #include <array>
 #include <cstdio>
@@ -12,7 +12,8 @@
 
 int main() {
     const int receiver = ::socket(AF_INET, SOCK_DGRAM | SOCK_CLOEXEC, 0);
-    const int bufferBytes = 8 * 1024 * 1024; // what the service asks for; the kernel grants both the same
+    // The same as the service asks for, so the kernel grants the same.
+    const int bufferBytes = 8 * 1024 * 1024;
     ::setsockopt(receiver, SOL_SOCKET, SO_RCVBUF, &bufferBytes, sizeof bufferBytes);
     sockaddr_in address{};
     address.sin_family = AF_INET;

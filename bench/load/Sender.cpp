@@ -1,5 +1,5 @@
-// Sends numbered reports over UDP, paced or as fast as the kernel takes them, and prints what it did as JSON.
-// It does the same for each receiver: the service, the bare loop, another daemon.
+// Sends numbered reports over UDP, at a given rate or as fast as the kernel takes them, and prints what it
+// did as JSON. It does the same for each receiver: the service, the bare loop, another daemon.
 
 #include <chrono>
 #include <cstring>
@@ -22,17 +22,18 @@ namespace {
 
 struct Plan {
     std::int64_t count = 0;
-    double perSecond = 0; ///< 0: as fast as it goes
+    double perSecond = 0; ///< 0: as fast as possible
     std::string eventId = "B100|10001";
     std::string stampsFile; ///< gets the time before each send; empty for none
 };
 
-/// At least this long between two wake-ups, which cost more than a send does. The bursts that this leaves at
-/// 400,000 reports a second are 100 reports, a hundredth of what the socket's buffer holds at its largest.
+/// The shortest time between two wake-ups: a wake-up takes longer than a send. At 400,000 reports a second,
+/// each wake-up therefore sends a burst of 100 reports, a hundredth of what the socket's largest buffer
+/// holds.
 constexpr std::int64_t TICK_NS = 250'000;
 
-/// How much lateness is made up for. More would be a burst that the pace is there to prevent; it makes the
-/// run longer instead, and the rate that is reported lower.
+/// How much delay the sender makes up for. To make up for more would send a burst, which the fixed rate is
+/// there to prevent. A longer delay makes the run longer instead, and the reported rate lower.
 constexpr std::int64_t CATCH_UP_NS = 5'000'000;
 
 class Sender {
@@ -41,8 +42,9 @@ public:
         m_service.sin_family = AF_INET;
         m_service.sin_port = htons(Wire::PORT);
         m_service.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
+        // This also touches the memory, before the clock runs.
         if (!plan.stampsFile.empty())
-            m_stamps.resize(static_cast<std::size_t>(plan.count)); // and touched, before the clock runs
+            m_stamps.resize(static_cast<std::size_t>(plan.count));
     }
 
     void SendAll() {
@@ -64,7 +66,7 @@ public:
     const std::vector<std::int64_t>& Stamps() const { return m_stamps; }
 
 private:
-    /// When that report is due, counted from the first.
+    /// When the report with this number is due, counted from the first one.
     std::int64_t DueAfter(std::int64_t number) const {
         return static_cast<std::int64_t>(static_cast<double>(number) / m_plan.perSecond * 1e9);
     }
@@ -109,7 +111,7 @@ int main(int argc, char** argv) {
     } catch (const CLI::ParseError& error) {
         return app.exit(error);
     }
-    ::prctl(PR_SET_TIMERSLACK, 1UL); // sleeps end when they should
+    ::prctl(PR_SET_TIMERSLACK, 1UL); // so that sleeps end on time
     Sender sender(plan);
     const std::int64_t wallBegin = NowNs(CLOCK_REALTIME);
     const std::int64_t begin = MonotonicNs();

@@ -1,6 +1,6 @@
-// Sees rows appear as another program that reads the same database does: looks again and again whether
-// another program committed, and then reads the numbers of the new rows. What it prints as JSON tells, beside
-// the latencies, how often it looked, which is how exact they are.
+// Sees rows appear in the way that another program which reads the database does. It asks again and again
+// whether another program has committed, and then reads the numbers of the new rows. It prints the latencies
+// as JSON, and also how often it asked, because that limits how exact the latencies are.
 
 #include <algorithm>
 #include <iostream>
@@ -18,13 +18,15 @@ namespace {
 
 struct Plan {
     std::string database;
-    std::string query;        ///< gives id and time of the rows behind the id `?1`, by id
-    std::string stampsFile;   ///< gets when each report was seen, at the place of its number; 0 for never
-    std::int64_t count = 0;   ///< it ends when it has seen so many reports ...
-    int patienceSeconds = 10; ///< ... or none for so long
+    std::string query; ///< gives id and time of the rows after the id `?1`, ordered by id
+    /// Gets the time when each report was seen, at the place of its number; 0 for never.
+    std::string stampsFile;
+    std::int64_t count = 0;   ///< the watcher ends when it has seen this many reports ...
+    int patienceSeconds = 10; ///< ... or none for this long
 };
 
-/// Between two looks. Looking without a pause would take a core from those who are watched.
+/// The pause between two questions. Without a pause, the watcher would take a core away from the programs
+/// that it watches.
 constexpr std::int64_t PAUSE_NS = 50'000;
 
 constexpr std::int64_t FIRST_TIME = 1'700'000'000'000; ///< the time of the report with the number 0
@@ -35,7 +37,7 @@ public:
         : m_plan(plan), m_database(plan.database, SQLite::OPEN_READONLY, 10'000),
           m_version(m_database, "pragma data_version"), m_rows(m_database, plan.query),
           m_seen(static_cast<std::size_t>(plan.count)) {
-        Version(); // from here on, a change is another program's commit
+        Version(); // from now on, a change is a commit of another program
     }
 
     void Watch() {
@@ -59,7 +61,7 @@ public:
     const std::vector<std::int64_t>& Seen() const { return m_seen; }
     std::int64_t Found() const { return m_found; }
 
-    /// The gap between two looks that so large a part of all were within.
+    /// The time between two questions, as a quantile: a `part` of 0.5 gives the median.
     std::int64_t GapNs(double part) {
         std::sort(m_gaps.begin(), m_gaps.end());
         return m_gaps.empty()
@@ -82,7 +84,7 @@ private:
             m_lastId = m_rows.getColumn(0).getInt64();
             const auto number = static_cast<std::size_t>(m_rows.getColumn(1).getInt64() - FIRST_TIME);
             if (number >= m_seen.size())
-                continue; // not one of the sender's
+                continue; // not a report of the sender
             m_seen[number] = now;
             ++m_found;
         }
@@ -112,7 +114,7 @@ int main(int argc, char** argv) {
 
     ::prctl(PR_SET_TIMERSLACK, 1UL);
     Watcher watcher(plan);
-    std::cout << "watching" << std::endl; // the sender may begin
+    std::cout << "watching" << std::endl; // the sender may begin now
     watcher.Watch();
     WriteStamps(plan.stampsFile, watcher.Seen());
     std::cout << fmt::format(R"({{"found":{},"gap_ns_p50":{},"gap_ns_p99":{}}})", watcher.Found(),

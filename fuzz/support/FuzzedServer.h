@@ -8,13 +8,13 @@
 #include "App/ReportServer.h"
 #include "tests/fakes/FakeSdk.h"
 
-/// The service without its port and its threads: a text is received, queued and consumed on the target's
-/// thread, one after the other. Wants the fake SDK beside the program.
+/// The service without its port and its threads. A text is received, queued and consumed on the target's
+/// thread, one after the other. Needs the fake SDK beside the program.
 class FuzzedServer final : public SyncServiceReport::ReportServer {
 public:
     FuzzedServer() {
-        // A socket is bound once at most: so Start does not get the service's port, complains to standard
-        // output, and has no receiving thread, whose end would take 250 ms.
+        // A socket can be bound only once. So Start does not get the service's port, prints an error, and
+        // starts no receiving thread, whose end would take 250 ms.
         m_socket.bind(Poco::Net::SocketAddress("127.0.0.1", 0));
         std::streambuf* const output = std::cout.rdbuf(nullptr);
         Start();
@@ -25,7 +25,7 @@ public:
         m_suiteVersion = GetBaseInfo().suiteVersion;
     }
 
-    /// The queued text, which leaves the queue.
+    /// Takes the queued text out of the queue.
     std::string Dequeued() {
         const Poco::AutoPtr<Poco::Notification> item(m_queue.dequeueNotification());
         const auto* work = dynamic_cast<const WorkNotification<std::string>*>(item.get());
@@ -33,7 +33,7 @@ public:
     }
     bool IsQueueEmpty() const { return m_queue.empty(); }
 
-    /// Whether what it consumed made a difference to what comes after.
+    /// Whether the texts that it consumed change how it handles later ones.
     bool HasChanged() const {
         return FakeSdk().created != m_modules || GetBaseInfo().openID != m_openID ||
                GetBaseInfo().suiteVersion != m_suiteVersion;
@@ -45,19 +45,19 @@ private:
     std::string m_suiteVersion;
 };
 
-/// A server for each input, so that nothing but its file is needed to see a finding again. One that an input
-/// left as it was serves the next input too: a new one takes longer than most inputs.
+/// A server for each input, so that the input's file alone is enough to repeat a finding. A server that an
+/// input did not change serves the next input, too, because to make a new one takes longer than most inputs.
 class ServerPerInput {
 public:
     FuzzedServer& Next() {
         if (m_server == nullptr || m_server->HasChanged()) {
-            m_server.reset(); // its end comes before the next one's beginning, as in life
+            m_server.reset(); // the old server must end before the new one begins, as in the real service
             m_server = std::make_unique<FuzzedServer>();
         }
         return *m_server;
     }
 
 private:
-    FakeSdkState& m_sdk = FakeSdk(); ///< Loaded before the server, it outlives it.
+    FakeSdkState& m_sdk = FakeSdk(); ///< Loaded before the server, so that the fake outlives it.
     std::unique_ptr<FuzzedServer> m_server;
 };

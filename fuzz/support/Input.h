@@ -12,8 +12,8 @@ inline std::string TextOf(const std::uint8_t* data, std::size_t size) {
     return {reinterpret_cast<const char*>(data), size};
 }
 
-/// The datagrams of an input: one, or several with a zero byte behind each, which no datagram's text can
-/// hold. Cut as the receiver cuts them; empty ones are left out.
+/// The datagrams of an input: one, or several with a zero byte after each, which no datagram's text can
+/// contain. They are cut as the receiver cuts them. Empty ones are left out.
 inline std::vector<std::string> DatagramsOf(const std::uint8_t* data, std::size_t size) {
     const std::string input = TextOf(data, size);
     std::vector<std::string> datagrams;

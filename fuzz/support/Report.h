@@ -7,8 +7,8 @@
 #include "Common/Records.h"
 #include "SystemTool/IO/JsonDocument.h"
 
-// What a report's text says, worked out a second time in the plainest way, for comparison with what the
-// service made of it.
+// What a report's text says, computed a second time in the simplest way. The targets compare it with what the
+// service made of the report.
 
 inline std::string MillisecondsOf(const SystemTool::IO::JsonDocument& createTime) {
     const std::string text = createTime.ToString(); // an integer prints as its digits

@@ -4,7 +4,7 @@
 #include <iostream>
 #include <string_view>
 
-// How a target says that it found something: it ends the process, and the fuzzer keeps the input.
+// How a target reports a finding: it ends the process, and the fuzzer keeps the input.
 
 inline void Require(bool holds, std::string_view fact, std::string_view found = {}) {
     if (holds)
