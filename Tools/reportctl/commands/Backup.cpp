@@ -37,8 +37,8 @@ constexpr auto HELP = "Example:\n"
     throw std::system_error(errno, std::generic_category(), what);
 }
 
-/// The directory of the backup. It is this command's own: it must not exist before, and is gone after a
-/// failure.
+/// The directory of the backup. It must not exist before. The destructor removes it with everything in it,
+/// unless Keep was called.
 class NewDirectory {
 public:
     explicit NewDirectory(std::string path) : m_path(std::move(path)) {
@@ -53,7 +53,7 @@ public:
     NewDirectory(const NewDirectory&) = delete;
     NewDirectory& operator=(const NewDirectory&) = delete;
 
-    /// Has everything in it written to the disk, and keeps it.
+    /// Writes everything in the directory to the disk. From then on, the destructor keeps the directory.
     void Keep() {
         const int directory = ::open(m_path.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
         const bool isSafe = directory >= 0 && ::syncfs(directory) == 0;
@@ -79,7 +79,7 @@ void Copy(const std::string& from, const std::string& to) {
 }
 
 void Backup(const std::string& path) {
-    store::RequireStore(store::StorePath()); // before a directory is made for it
+    store::RequireStore(store::StorePath()); // checked before the directory is made
     NewDirectory directory(path);
     Copy(store::StorePath(), path + "/Report.db");
     if (fs::exists(store::OutboxPath()))

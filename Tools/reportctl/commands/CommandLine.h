@@ -8,9 +8,9 @@ class App;
 
 namespace reportctl::commands {
 
-/// The whole command line of reportctl: its commands, --help and --version. The program parses with it; the
-/// manual pages and the shells' completions are written from it. `exitCode` must outlive the parsing (see
-/// Add).
+/// The whole command line of reportctl: its commands, --help and --version. The program parses its arguments
+/// with it, and the manual pages and the shells' completions are written from it. `exitCode` must live until
+/// the parsing ends (see Add).
 std::unique_ptr<CLI::App> MakeCommandLine(int& exitCode);
 
 } // namespace reportctl::commands

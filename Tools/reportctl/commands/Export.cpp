@@ -49,7 +49,7 @@ struct ExportOptions {
 ReportRow::Text TextOf(const SQLite::Column& column) {
     if (column.isNull())
         return std::nullopt;
-    const auto* bytes = column.getText(); // before its length is asked for: a number becomes a text by this
+    const auto* bytes = column.getText(); // must come before getBytes: it turns a number into a text
     return std::string_view(bytes, static_cast<std::size_t>(column.getBytes()));
 }
 
@@ -66,7 +66,7 @@ ReportRow RowOf(SQLite::Statement& row) {
             .createTime = TextOf(row.getColumn(9))};
 }
 
-/// Writes the rows and returns how many they were.
+/// Writes the rows and returns their number.
 std::int64_t WriteRows(const ExportOptions& options, terminal::Result& output) {
     auto database = store::OpenToRead(store::StorePath());
     auto ids = store::AllIds(database);
@@ -83,7 +83,7 @@ std::int64_t WriteRows(const ExportOptions& options, terminal::Result& output) {
         lines.clear();
         for (store::BindPiece(rows, piece); rows.executeStep(); ++count)
             (isCsv ? store::AppendCsv : store::AppendJsonLine)(lines, RowOf(rows));
-        rows.reset(); // ends the read: none may be open while this waits for a slow pipe
+        rows.reset(); // ends the read, so that none is open while Write waits for a slow pipe
         output.Write(lines);
         progress.Show(piece.end - ids.first, ids.end - ids.first);
     });

@@ -7,16 +7,17 @@
 
 #include "Tools/reportctl/store/Reports.h"
 
-/// Options that mean the same in every command.
+/// Options that several commands share and that mean the same in each of them.
 namespace reportctl::commands {
 
 /// Checks that an option's text is a point in time, in one of terminal::TIME_FORMS.
 CLI::Validator IsTime();
 
-/// Reads a text that IsTime let through, in milliseconds since 1970. An age counts from now.
+/// The point in time that a text means, in milliseconds since 1970. IsTime must have accepted the text. An
+/// age such as 2h counts back from now.
 std::int64_t MillisecondsOf(const std::string& time);
 
-/// --since, --until and --event.
+/// The options --since, --until and --event.
 struct FilterOptions {
     std::string since;
     std::string until;

@@ -47,10 +47,10 @@ struct FindOptions {
     bool isJson = false;
 };
 
-/// The last ones of what was found in one place.
+/// The results of one place that was searched. Only the last ones are kept.
 struct Place {
     std::size_t found = 0;
-    std::string since; ///< how far back the place reaches; empty when nothing tells
+    std::string since; ///< how far back the place reaches; empty when that is not known
     std::deque<std::string> lines;
     std::string error;
 };
@@ -71,7 +71,7 @@ public:
         output.Finish();
     }
 
-    /// 0 when something was found and every place could be read.
+    /// The exit code: 0 when something was found and every place could be read, else 1.
     int ExitCode() const {
         const bool isFound = m_log.found + m_store.found + m_outbox.found > 0;
         return isFound && m_log.error.empty() && m_store.error.empty() && m_outbox.error.empty() ? 0 : 1;
@@ -129,7 +129,7 @@ private:
     void SearchOutbox() {
         std::error_code error;
         if (!std::filesystem::exists(store::OutboxPath(), error) && !error)
-            return; // no event was ever stored
+            return; // there is no outbox, so no event was ever stored
         auto database = outbox::OpenToLook(store::OutboxPath());
         const auto take = [this](const outbox::Event& event) {
             if (Holds(event.eventID) || Holds(event.payload) || Holds(event.uuid))

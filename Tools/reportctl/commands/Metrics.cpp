@@ -10,7 +10,7 @@
 namespace reportctl::commands {
 namespace {
 
-/// A collector is another user.
+/// All users may read the file, because a monitoring system runs as another user.
 constexpr mode_t READABLE = 0644;
 
 } // namespace

@@ -88,7 +88,7 @@ void List(const OutboxOptions& options) {
             output.Write(TextOf(event) + "\n");
         ++count;
     };
-    database.exec("begin"); // both tables of one moment: an event is in one of them
+    database.exec("begin"); // reads both tables as of one moment, so that each event is listed once
     if (!options.onlyDead)
         outbox::ForEach(database, Where::Waiting, 0, print);
     outbox::ForEach(database, Where::Dead, 0, print);

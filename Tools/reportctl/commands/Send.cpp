@@ -36,16 +36,16 @@ constexpr auto HELP =
     "\n";
 
 struct SendOptions {
-    std::optional<std::string> eventID; ///< of a report
+    std::optional<std::string> eventID; ///< for a report
     std::string value;
     std::optional<std::int64_t> time;
     bool isDayReport = false;
 
-    SyncServiceReport::ST_InitMsg module;     ///< of `init`
-    std::string openID;                       ///< of `open-id`
-    std::string suiteVersion;                 ///< of `open-id`
-    std::optional<std::string> file;          ///< of lines
-    std::optional<std::string> standardInput; ///< "-" when it was named
+    SyncServiceReport::ST_InitMsg module;     ///< for `init`
+    std::string openID;                       ///< for `open-id`
+    std::string suiteVersion;                 ///< for `open-id`
+    std::optional<std::string> file;          ///< for a file of lines
+    std::optional<std::string> standardInput; ///< "-" when the user gave it
 
     send::DeliverySettings delivery;
 };
@@ -84,7 +84,8 @@ int Send(const CLI::App& send, const SendOptions& options) {
     return SendLines(options.file ? *options.file : STANDARD_INPUT, options.delivery);
 }
 
-/// A message comes from one place. The command line's own rules do not see across subcommands.
+/// Checks that the user named exactly one source of messages. The parser cannot check it, because its rules
+/// do not work across subcommands.
 void RequireOneSource(const CLI::App& send, const SendOptions& options) {
     const auto sources = send.get_subcommands().size() + (options.eventID ? 1U : 0U) +
                          (options.file ? 1U : 0U) + (options.standardInput ? 1U : 0U);

@@ -58,7 +58,7 @@ struct StatsOptions {
     bool isCsv = false;
 };
 
-/// What was counted, and what to say about where it came from.
+/// The counts, and a text that says what was counted.
 struct Stats {
     std::vector<Count> counts;
     std::string sources;
@@ -94,7 +94,8 @@ Stats CountReports(const StatsOptions& options) {
 
 constexpr auto OUTCOME = "outcome";
 
-/// The ledger counts no event by its id, and keeps its counters of the last ten minutes only.
+/// Refuses filters: the ledger does not count by event id, and has counters of earlier times for the last ten
+/// minutes only.
 void RequireNoFilter(const FilterOptions& filter) {
     if (!filter.since.empty() || !filter.until.empty() || !filter.event.empty())
         throw CLI::ValidationError("--by outcome",
@@ -102,8 +103,8 @@ void RequireNoFilter(const FilterOptions& filter) {
                                    "--since, --until and --event out");
 }
 
-/// How the datagrams ended that the service received, and those that the system dropped before. The keys are
-/// the names in `reportctl status --json`.
+/// Counts by outcome: the datagrams that the service received, and those that the system dropped before. The
+/// keys are the names in `reportctl status --json`.
 Stats CountOutcomes(const StatsOptions& options) {
     const auto look = ReportLedger::LookAt(store::LedgerPath());
     if (look.sight != ReportLedger::Sight::Sound)

@@ -21,7 +21,7 @@ struct Options {
     double seconds = 2;
 };
 
-/// True on a terminal that knows colours, unless the user does not want them.
+/// Whether the output is a terminal that knows colours, and the user has not switched them off with NO_COLOR.
 bool WantsColours() {
     // NOLINTBEGIN(concurrency-mt-unsafe): one thread
     const char* const noColour = std::getenv("NO_COLOR");
@@ -39,14 +39,16 @@ int ShowOnce(const Options& options) {
     return static_cast<int>(judgement.verdict);
 }
 
-/// From the top left corner, each line wiped behind its end, and what is below: the screen does not flicker.
+/// The text with the control sequences that draw it over the last screen. It starts at the top left, clears
+/// the rest of each line and everything below. Clearing the whole screen first would make it flicker.
 std::string InPlace(std::string screen) {
     for (std::size_t at = 0; (at = screen.find('\n', at)) != std::string::npos; at += 4)
         screen.insert(at, "\x1b[K");
     return "\x1b[H" + screen + "\x1b[J";
 }
 
-/// Until a signal or the end of its reader ends it. The rates of now are those between two looks.
+/// Shows the status again and again, until a signal comes or the reader closes the pipe. From the second time
+/// on, the current rates are those since the time before.
 int Watch(const Options& options) {
     terminal::Watch watch;
     const auto pause =

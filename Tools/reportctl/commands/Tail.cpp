@@ -40,7 +40,8 @@ constexpr auto HELP = "Examples:\n"
 
 constexpr milliseconds LOOK_AGAIN{200};
 constexpr std::size_t LINES_UNASKED = 10;
-/// Without --since: two files are at least 10 MiB, which is tens of thousands of lines.
+/// How many rotated files are read without --since. With the live file, that is at least 10 MiB: tens of
+/// thousands of lines.
 constexpr std::size_t ROTATED_FILES_UNASKED = 1;
 
 struct TailOptions {
@@ -63,7 +64,8 @@ bool IsWanted(const log::Entry& entry, const TailOptions& options) {
            (options.level.empty() || level >= log::LevelOf(options.level));
 }
 
-/// Prints entries: of those that were in the log at the start only the last ones, of the others each.
+/// Prints entries. Of the entries that were in the log at the start, it prints only the last ones. It prints
+/// all later entries.
 class Tail {
 public:
     Tail(const TailOptions& options, std::size_t before)
@@ -80,7 +82,7 @@ public:
             m_lines.pop_front();
     }
 
-    /// Whether all of the entries that were there at the start are through.
+    /// Whether Take has got all of the entries that were in the log at the start.
     bool HasAllOfBefore() const { return m_before == 0; }
 
     void Print() {

@@ -7,9 +7,9 @@ namespace reportctl::pages {
 namespace {
 
 struct Tables {
-    std::string commands; ///< patterns of the words that lead to a command
-    std::string values;   ///< what completes an option's value
-    std::string words;    ///< what may come next in a command
+    std::string commands; ///< patterns for the words that lead to a command
+    std::string values;   ///< cases that complete an option's value
+    std::string words;    ///< cases for the words that may come next in a command
 };
 
 std::string ValueCase(const Command& command, const Option& option) {

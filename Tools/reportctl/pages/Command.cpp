@@ -10,14 +10,15 @@
 namespace reportctl::pages {
 namespace {
 
-/// The values in "TEXT:{csv,jsonl}", which is how a set that an option is checked against shows in its type.
+/// The values in a type such as "TEXT:{csv,jsonl}". CLI11 writes the set of an option's allowed values like
+/// that.
 std::vector<std::string> ChoicesIn(const std::string& type) {
     const auto begin = type.find('{');
     const auto end = type.find('}', begin);
     if (begin == std::string::npos || end == std::string::npos)
         return {};
     auto values = CLI::detail::split(type.substr(begin + 1, end - begin - 1), ',');
-    for (auto& value : values) // a mapping shows as "name->number"
+    for (auto& value : values) // CLI11 writes a mapping as "name->number"
         value = value.substr(0, value.find("->"));
     return values;
 }
@@ -33,7 +34,7 @@ std::vector<std::string> NamesOf(const CLI::Option& option) {
     return names;
 }
 
-/// Sorted, because the parser keeps them in the order of their addresses.
+/// The names are sorted, because CLI11 keeps the options in the order of their addresses.
 std::vector<std::string> NamesOf(const std::set<CLI::Option*>& options) {
     std::vector<std::string> names;
     names.reserve(options.size());

@@ -4,8 +4,8 @@
 
 #include "Tools/reportctl/pages/Command.h"
 
-/// What makes a shell complete reportctl's command line. An option's value is completed with its choices, or,
-/// when it has none, with names of files.
+/// The scripts with which shells complete reportctl's command line. An option's value is completed with its
+/// choices, or with names of files when it has no choices.
 namespace reportctl::pages {
 
 std::string BashCompletion(const Command& program);

@@ -17,7 +17,7 @@ std::string Quoted(const std::string& text) {
     return quoted + "'";
 }
 
-/// When the command line has come to this command, and to none below it.
+/// The condition that the command line names this command and no command below it.
 std::string Condition(const Command& command) {
     std::string condition;
     for (std::size_t i = 1; i < command.path.size(); ++i)

@@ -19,7 +19,7 @@ std::string UpperCase(std::string text) {
     return text;
 }
 
-/// "Fl h , Fl -help Ar TEXT"
+/// The option's names and value in mdoc, such as "Fl h , Fl -help Ar TEXT".
 std::string Terms(const Option& option, const std::string& separator) {
     if (option.isPositional)
         return "Ar " + mdoc::Words(option.names.front());
@@ -40,7 +40,7 @@ std::string Synopsis(const Command& command) {
     return text;
 }
 
-/// What --help shows beside the description.
+/// The option's facts that --help shows beside the description.
 std::string Remarks(const Option& option) {
     std::string text;
     if (!option.limits.empty())
@@ -75,7 +75,7 @@ std::string List(const std::string& introduction, const std::string& items) {
     return fmt::format(".Pp\n{}:\n.Bl -tag -width Ds\n{}.El\n", introduction, items);
 }
 
-/// Each group of options once, in the order in which --help comes to it.
+/// The groups of the options, each once, in the order of --help.
 std::vector<std::string> Groups(const Command& command) {
     std::vector<std::string> groups;
     for (const auto& option : command.options)
@@ -92,7 +92,7 @@ std::string Options(const Command& command) {
     return text;
 }
 
-/// The commands of a command, each with all that --help says of it.
+/// A section for each command below this command, with everything that --help says about it.
 std::string Sections(const Command& command) {
     std::string text;
     for (const auto& sub : command.commands)
@@ -116,8 +116,8 @@ std::string Description(const Command& command) {
     return text + Sections(command);
 }
 
-/// The paragraphs of --help that stand below the options. Each goes where readers of manual pages look for
-/// it.
+/// The paragraphs that --help prints below the options. Readers of manual pages look for each kind in another
+/// section.
 struct Footer {
     std::string notes;
     std::string examples;

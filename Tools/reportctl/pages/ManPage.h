@@ -6,8 +6,9 @@
 
 namespace reportctl::pages {
 
-/// The manual page of a command, in mdoc. Its own commands get pages of theirs when it is reportctl itself,
-/// and sections of this page otherwise. `date` is the version's, as mdoc writes it ("November 22, 2026").
+/// The manual page of a command, in mdoc. The page of reportctl itself lists its commands, which have pages
+/// of their own. The page of a command has sections for the commands below it. `date` is the date of the
+/// version, as mdoc writes it ("November 22, 2026").
 std::string ManPage(const Command& command, const std::string& date);
 
 } // namespace reportctl::pages

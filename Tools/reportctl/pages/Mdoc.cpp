@@ -7,14 +7,14 @@
 namespace reportctl::pages::mdoc {
 namespace {
 
-constexpr std::size_t LINE_LENGTH = 70; // escapes come on top, and mandoc complains from 80 on
+constexpr std::size_t LINE_LENGTH = 70; // escapes make a line longer, and mandoc warns from 80 on
 
 bool IsUpper(char c) {
     return std::isupper(static_cast<unsigned char>(c)) != 0;
 }
 
-/// A backslash begins an instruction; a bare hyphen may be shown as another character, which a shell does not
-/// know.
+/// Escapes backslashes and hyphens. A backslash would begin an instruction. A bare hyphen may be shown as
+/// another character, which a shell does not accept when a reader copies it.
 std::string Escaped(std::string_view text) {
     std::string escaped;
     for (const char c : text) {
@@ -28,13 +28,13 @@ std::string Escaped(std::string_view text) {
     return escaped;
 }
 
-/// A line that is no macro's.
+/// A line of text, which mandoc must not take for a macro.
 std::string Line(std::string_view text) {
     const bool looksLikeMacro = text.starts_with('.') || text.starts_with('\'');
     return (looksLikeMacro ? "\\&" : "") + Escaped(text) + "\n";
 }
 
-/// Behind the full stop of the first sentence that another one follows; npos when none does.
+/// The position after the first sentence's full stop; npos when no other sentence follows.
 std::size_t EndOfSentence(std::string_view text) {
     for (std::size_t i = 0; i + 2 < text.size(); ++i)
         if ((text[i] == '.' || text[i] == '!' || text[i] == '?') && text[i + 1] == ' ' &&
@@ -43,7 +43,7 @@ std::size_t EndOfSentence(std::string_view text) {
     return std::string_view::npos;
 }
 
-/// One sentence, in lines that people can read in the page's source as well.
+/// One sentence in short lines, so that people can also read the page's source.
 std::string Wrapped(std::string_view text) {
     std::string lines;
     while (text.size() > LINE_LENGTH) {

@@ -7,7 +7,8 @@
 namespace reportctl::pages {
 namespace {
 
-/// For a description within single quotes, where _arguments and _describe give brackets and colons a meaning.
+/// Escapes a description for single quotes. Brackets and colons are escaped, too, because they have a meaning
+/// in _arguments and _describe.
 std::string Quoted(const std::string& text) {
     std::string quoted;
     for (const char c : text) {
@@ -32,7 +33,7 @@ std::string Arguments(const Command& command) {
     std::string text;
     for (const auto& option : command.options) {
         if (option.isPositional) {
-            if (command.commands.empty()) // else the first word is a command's name
+            if (command.commands.empty()) // otherwise the first word is the name of a command
                 text += fmt::format(" \\\n        '::{}:_files'", Quoted(option.names.front()));
             continue;
         }
@@ -58,8 +59,8 @@ std::string Branches(const Command& command) {
     return text;
 }
 
-/// One function a command: it completes its own options, and hands the rest to the function of the command
-/// that follows.
+/// The shell function of a command, and those of the commands below it. A function completes the command's
+/// own options, and hands the rest to the function of the next command on the line.
 std::string Function(const Command& command) {
     if (command.commands.empty())
         return fmt::format("_{}() {{\n    _arguments -s{}\n}}\n", command.Name("_"), Arguments(command));

@@ -9,8 +9,8 @@
 #include "Tools/reportctl/pages/Completions.h"
 #include "Tools/reportctl/pages/ManPage.h"
 
-// reportctl_pages DIRECTORY DATE: writes reportctl's manual pages and completions. A part of the build, never
-// installed.
+// reportctl_pages DIRECTORY DATE writes reportctl's manual pages and completions. The build runs it; it is
+// not installed.
 namespace {
 
 using reportctl::pages::Command;
@@ -28,7 +28,7 @@ void WriteAll(const std::filesystem::path& directory, const std::string& date) {
     int unused = 0;
     const auto app = reportctl::commands::MakeCommandLine(unused);
     const Command program = reportctl::pages::Read(*app);
-    std::filesystem::remove_all(directory); // with the page of a command that is no more
+    std::filesystem::remove_all(directory); // so that no page of a removed command stays
     Write(directory / "man1/reportctl.1", reportctl::pages::ManPage(program, date));
     for (const auto& command : program.commands)
         Write(directory / "man1" / (command.Name("-") + ".1"), reportctl::pages::ManPage(command, date));

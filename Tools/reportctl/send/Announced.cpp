@@ -22,7 +22,7 @@ bool Runs(const std::string& process) {
     return number > 0 && (::kill(number, 0) == 0 || errno == EPERM);
 }
 
-/// The process that wrote the last whole line.
+/// The process that wrote the file's last whole line; empty when that line is not a record.
 std::string LastProcess(const std::string& path) {
     std::ifstream file(path, std::ios::binary);
     std::string last;
@@ -56,7 +56,7 @@ void Announced::ReadFile(const std::string& path) {
             continue;
         const auto module = line->message.substr(ANNOUNCED.size());
         m_modules.insert(module);
-        m_isWhole |= module == SyncServiceReport::DEFAULT_MODULE_ID; // the first thing that a service does
+        m_isWhole |= module == SyncServiceReport::DEFAULT_MODULE_ID; // every service adds this module first
     }
 }
 

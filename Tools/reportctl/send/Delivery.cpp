@@ -22,11 +22,11 @@ namespace {
 
 constexpr auto BLANK = " \t\r\n";
 
-/// Where a message came from, as it stands before what is said about it: empty, or "line 3: ".
+/// The beginning of an output line that says where a message came from: empty, or "line 3: ".
 using Origin = std::string;
 
 void TellError(const Origin& origin, const std::string& text) {
-    std::fflush(stdout); // where both go to one place, in the order of events
+    std::fflush(stdout); // keeps the order when standard output and standard error go to the same place
     fmt::print(stderr, "error: {}{}\n", origin, text);
 }
 
@@ -39,7 +39,7 @@ void TellWarning(const Origin& origin, const std::string& text) {
     fmt::print(stderr, "warning: {}{}\n", origin, text);
 }
 
-/// Tells what is wrong with a message. True when it is to be sent.
+/// Prints what is wrong with a message. Returns true when it shall be sent.
 bool MaySend(const Origin& origin, const Judgement& judgement, bool anyway) {
     for (const auto& warning : judgement.warnings)
         TellWarning(origin, warning);
@@ -48,8 +48,8 @@ bool MaySend(const Origin& origin, const Judgement& judgement, bool anyway) {
     return anyway || judgement.errors.empty();
 }
 
-/// What only the running service can tell: whether it knows the module. Asked for events alone, since it
-/// reads the log.
+/// Judges what depends on the running service: whether it knows the module. It looks only for events, because
+/// looking reads the log.
 class ServiceState {
 public:
     void Judge(Judgement& judgement, const std::string& text) {
@@ -76,16 +76,16 @@ private:
     }
 
     std::optional<Announced> m_known;
-    std::vector<std::string> m_announced; ///< by messages of this command
+    std::vector<std::string> m_announced; ///< the modules that messages of this command announce
 };
 
-/// The text alone on standard output, so that it can be piped into a file or another program.
+/// Prints only the text on standard output, so that it can be piped into a file or another program.
 void PrintText(const std::string& text) {
     std::fwrite(text.data(), 1, text.size(), stdout);
     std::fputc('\n', stdout);
 }
 
-/// A line that is too long for a datagram is not blank, with any content.
+/// Whether the line is blank. A line of which only the beginning was kept does not count as blank.
 bool IsBlank(const LineReader& lines) {
     return lines.IsWhole() && lines.Text().find_first_not_of(BLANK) == std::string::npos;
 }
@@ -94,12 +94,13 @@ std::string Count(std::size_t count, const std::string& thing) {
     return fmt::format("{} {}{}", count, thing, count == 1 ? "" : "s");
 }
 
-/// Sends the lines that are handed to it, at its pace, and counts.
+/// Sends the given lines at the pace of the settings, and counts them.
 class LineDelivery {
 public:
     explicit LineDelivery(const DeliverySettings& settings) : m_settings(settings) {}
 
-    /// False when there is no use in going on.
+    /// Judges and sends one line. Returns false when no further line should be sent, because no program
+    /// listens.
     bool Deliver(std::size_t number, const LineReader& lines) {
         const auto origin = fmt::format("line {}: ", number);
         const auto& line = lines.Text();
@@ -117,14 +118,14 @@ public:
         }
         try {
             return CountSent(number, line);
-        } catch (const Poco::Exception& error) { // too long even for the system
+        } catch (const Poco::Exception& error) { // the line is longer than any datagram can be
             TellError(origin, error.displayText());
             ++m_bad;
             return true;
         }
     }
 
-    /// What was sent last may still turn out to have had no listener.
+    /// Waits a moment, because the system may report late that no program listened to the last lines.
     void AwaitRefusal() {
         if (m_settings.dryRun || m_sent == 0 || !m_stop.empty() || m_sender.IsHeard())
             return;
@@ -132,7 +133,7 @@ public:
         m_stop = "; the last of them were lost";
     }
 
-    /// Says the last word and returns the exit code.
+    /// Prints the summary and returns the exit code.
     int Close() const {
         std::fflush(stdout);
         fmt::print(m_settings.dryRun ? stderr : stdout, "{} {} ({}){}{}\n",
@@ -172,7 +173,7 @@ private:
     std::size_t m_sent = 0;
     std::size_t m_bytes = 0;
     std::size_t m_bad = 0;
-    std::string m_stop; ///< why it ended early, for the last word
+    std::string m_stop; ///< why it ended early, for the summary
 };
 
 } // namespace

@@ -23,7 +23,8 @@ bool Contains(const std::string& text, const std::string& part) {
     return text.find(part) != std::string::npos;
 }
 
-/// Within an SQL literal two quotes stand for one; what is left over ends the literal.
+/// Whether the text has a quote that ends an SQL literal. In a literal, two quotes mean one quote, so a quote
+/// without a second one ends it.
 bool HasLoneQuote(const std::string& text) {
     for (auto quote = text.find('\''); quote != std::string::npos; quote = text.find('\'', quote)) {
         const auto end = std::min(text.find_first_not_of('\'', quote), text.size());
@@ -34,8 +35,8 @@ bool HasLoneQuote(const std::string& text) {
     return false;
 }
 
-/// What becomes of a text that goes into the SQL of the store, and what the sender can do about a quote in
-/// it.
+/// The words about a text that goes into the store's SQL: what happens when a character in it ends the SQL,
+/// and what the sender can do about a quote.
 struct InTheStore {
     const char* loss;
     const char* advice;
@@ -43,11 +44,11 @@ struct InTheStore {
 
 constexpr InTheStore OF_A_REPORT{"the database would reject the report", "Write the quote twice: ''"};
 
-/// The user's texts go to analytics too, and there each quote of two is kept.
+/// The user's texts go to analytics, too. There, a quote written twice stays two quotes.
 constexpr InTheStore OF_THE_USER{"the database would reject every report while it is set",
                                  "Written twice it is stored as one quote, and goes to analytics as two"};
 
-/// The service puts these texts into its SQL as they are.
+/// Judges a text that the service puts unchanged into its SQL.
 void JudgeForStore(Judgement& judgement, const std::string& name, const std::string& text,
                    const InTheStore& store) {
     if (HasLoneQuote(text))
@@ -61,7 +62,7 @@ void JudgeForStore(Judgement& judgement, const std::string& name, const std::str
                         name, store.loss));
 }
 
-/// As the service reads it, but for the zeros that it appends to seconds.
+/// The value as the service reads it: an object as JSON, any other value as a text.
 std::string ValueText(const JsonDocument& value) {
     return value.IsObject() ? value.ToJson() : value.ToString();
 }
@@ -106,7 +107,7 @@ void JudgeForAnalytics(Judgement& judgement, const std::string& eventID, const s
     JudgeAnalyticsValue(judgement, value);
 }
 
-/// Letters alone and small: what two spellings of one name share.
+/// Only the letters of the name, in lower case. Two spellings of one name give the same result.
 std::string Bare(std::string_view name) {
     std::string bare;
     for (const char c : name)
@@ -117,7 +118,7 @@ std::string Bare(std::string_view name) {
     return bare;
 }
 
-/// A member whose name is almost one that the service reads, and which it does not see.
+/// Warns of a member whose name is almost one that the service reads: the service does not see it.
 void JudgeNames(Judgement& judgement, const std::string& text) {
     rapidjson::Document document;
     document.Parse<rapidjson::kParseIterativeFlag>(text.data(), text.size());
@@ -221,7 +222,7 @@ bool IsControl(const JsonDocument& message) {
 }
 
 void JudgeMessage(Judgement& judgement, const std::string& text, const JsonDocument& message) {
-    // The service searches the raw text, before it parses anything.
+    // We search the raw text, because the service does so too, before it parses the text.
     if (!Contains(text, Wire::REPORT_MARK))
         JudgeControl(judgement, message);
     else if (IsControl(message))
@@ -237,7 +238,7 @@ std::string TooLong(std::uint64_t bytes) {
     return fmt::format("it has {} bytes, and the service cuts a text off after {}", bytes, Wire::MAX_BYTES);
 }
 
-/// Why nothing of the text can be used; empty when it can be.
+/// The reason why the service cannot use the text at all; empty when it can.
 std::string ReasonAgainstText(const std::string& text, JsonDocument& message) {
     if (text.size() > Wire::MAX_BYTES)
         return TooLong(text.size());

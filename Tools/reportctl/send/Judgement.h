@@ -8,19 +8,20 @@ namespace reportctl::send {
 
 /// What the service would do with a text.
 struct Judgement {
-    std::string what;                  ///< in words, with where it goes: event "B1", for the store
+    std::string what;                  ///< what it is and where it goes, such as: event "B1", for the store
     std::vector<std::string> errors;   ///< why it would be refused, cut, lost or without effect
-    std::vector<std::string> warnings; ///< it is taken, but something about it will surprise
+    std::vector<std::string> warnings; ///< the service takes it, but something in it has an unexpected effect
 };
 
-/// Judges a datagram's text as the service would, with the same parser and the same order of questions. What
-/// depends on the service's state (whether a module was announced, whether the store is there) is not judged.
+/// Judges a datagram's text as the service would, with the same parser and the same order of checks. It does
+/// not judge what depends on the service's state, such as whether a module was announced or whether the store
+/// exists.
 ///
-/// The line between errors and warnings: a report that would not end where its sender means it to is an
-/// error, since the sender would not learn of the loss.
+/// It is an error when a report would not arrive where its sender wants it, because the sender would not
+/// learn of the loss. Everything else is a warning.
 Judgement Judge(const std::string& text);
 
-/// The same for a text of which only the length is known, which no datagram can hold.
+/// Judges a text that is too long for a datagram, of which only the length is known.
 Judgement JudgeLonger(std::uint64_t bytes);
 
 } // namespace reportctl::send

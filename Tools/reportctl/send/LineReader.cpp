@@ -22,7 +22,7 @@ bool LineReader::Next() {
     return m_bytes > 0 && !m_hasFailed; // the last line may lack its line feed
 }
 
-/// False at the end, and when reading failed.
+/// Reads the next bytes into the buffer. Returns false at the end, and when reading failed.
 bool LineReader::Fill() {
     ssize_t count = 0;
     do {

@@ -11,11 +11,11 @@ namespace wire = hublink::wire;
 using SystemTool::IO::JsonDocument;
 using SystemTool::Text::ValidUtf8;
 
-/// What the client library writes, in as much room as it may need; a library's own datagrams end where the
-/// service would cut them. `bytes`: of all texts that go in.
+/// The message that the client library writes with `append`. The buffer is large enough for any message; the
+/// library itself uses one of a datagram's size. `bytes`: the length of all texts in the message.
 template <typename Append>
 std::string Written(std::size_t bytes, Append append) {
-    constexpr std::size_t LONGEST_ESCAPE = 6; // of one byte, as in \u0001
+    constexpr std::size_t LONGEST_ESCAPE = 6; // one byte becomes at most six characters, as in \u0001
     constexpr std::size_t REST = 512;
     std::string room(bytes * LONGEST_ESCAPE + REST, '\0');
     wire::Buffer buffer(room.data(), room.size());

@@ -12,9 +12,8 @@
 namespace reportctl::send {
 namespace {
 
-/// How long the system may take to tell that no program listens. Linux tells before the send over loopback
-/// returns, but nothing promises that, there or elsewhere. The wait at the end of a command is too short to
-/// be noticed.
+/// How long the system may take to report that no program listens. Over loopback, Linux reports it before the
+/// send returns, but no system promises that. A person does not notice this wait at the end of a command.
 constexpr long REFUSAL_WAIT_MS = 20;
 
 } // namespace
@@ -26,7 +25,7 @@ Sender::Sender() {
 bool Sender::Send(const std::string& text) {
     try {
         m_socket.sendBytes(text.data(), static_cast<int>(text.size()));
-    } catch (const Poco::Net::ConnectionRefusedException&) { // about the datagram before
+    } catch (const Poco::Net::ConnectionRefusedException&) { // the datagram before was refused
         return false;
     }
     return !IsRefused();
@@ -38,7 +37,7 @@ bool Sender::IsHeard() {
     return !IsRefused();
 }
 
-/// Asking takes the report from the socket.
+/// Whether the socket has the error of a refusal. Reading the error also clears it.
 bool Sender::IsRefused() const {
     return m_socket.impl()->socketError() == ECONNREFUSED;
 }

@@ -7,24 +7,24 @@
 
 namespace reportctl::send {
 
-/// Sends texts to the service, a datagram each.
+/// Sends texts to the service, each as one datagram.
 ///
-/// A datagram gets no answer, so this can tell only whether a program listens on the port: the socket is
-/// connected, and the system then reports a datagram for a port that no program has bound.
+/// The service does not answer, so this class knows only whether a program listens on the port. The socket is
+/// connected, and for a connected socket the system reports a datagram to a port that no program has bound.
 ///
-/// One thread. Failure: what the system refuses to send throws Poco::Exception.
+/// One thread. Failure: throws Poco::Exception when the system refuses to send.
 class Sender {
 public:
     Sender();
 
-    /// Sends one datagram. False when no program listens, as far as is known by then: the report about this
-    /// datagram may come later, and is then the answer to the next call.
+    /// Sends one datagram. Returns false when the system has reported that no program listens. The system may
+    /// report this later; then the next call returns false.
     bool Send(const std::string& text);
 
-    /// Waits a moment for a report that comes late. False when no program listens.
+    /// Waits a moment for such a late report. Returns false when no program listens.
     bool IsHeard();
 
-    /// The address that is sent to, for people.
+    /// The service's address, for people.
     static std::string Address();
 
 private:

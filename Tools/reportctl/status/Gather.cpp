@@ -18,7 +18,7 @@ namespace {
 namespace fs = std::filesystem;
 namespace Paths = SyncServiceReport::Paths;
 
-/// Of the file system of a directory, or of the nearest one above it that is there.
+/// The space of the file system that has the directory, or the nearest parent that exists.
 Disk LookAtDisk(fs::path directory) {
     std::error_code error;
     while (!fs::exists(directory, error) && directory.has_relative_path())
@@ -29,7 +29,8 @@ Disk LookAtDisk(fs::path directory) {
     return {std::uint64_t{space.f_bavail} * space.f_frsize, std::uint64_t{space.f_blocks} * space.f_frsize};
 }
 
-/// Whose service is meant: root may look at another user's.
+/// The user whose service is looked at: the owner of the data, because root may look at another user's
+/// service.
 uid_t OwnerOfData(const std::string& data) {
     struct stat status {};
     return ::stat(Paths::Suite(data).c_str(), &status) == 0 ? status.st_uid : ::geteuid();

@@ -19,7 +19,7 @@ using ReportLedger::Counts;
 
 constexpr std::array VERDICTS{"healthy", "degraded", "down"};
 
-/// Writes members in their order.
+/// Writes JSON. The members are in the order in which they are added.
 class Writer {
 public:
     Writer() : m_writer(m_text) { m_writer.SetIndent(' ', 2); }
@@ -48,13 +48,13 @@ public:
     }
     void AddNull(const char* key) { Key(key), m_writer.Null(); }
 
-    /// Null for nothing.
+    /// Writes null when there is no value.
     template <typename Value>
     void Add(const char* key, const std::optional<Value>& value) {
         value ? Add(key, *value) : AddNull(key);
     }
 
-    /// Null for never.
+    /// Writes a time; 0 means never and is written as null.
     void AddTime(const char* key, std::int64_t ms) { ms == 0 ? AddNull(key) : Add(key, IsoTime(ms)); }
 
     std::string Text() const { return terminal::ShownJson({m_text.GetString(), m_text.GetSize()}) + "\n"; }

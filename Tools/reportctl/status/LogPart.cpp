@@ -12,12 +12,12 @@ namespace {
 
 namespace fs = std::filesystem;
 
-/// So much of the log's end is read: some thousand lines, in a few milliseconds.
+/// How much of the log's end is read: some thousand lines, in a few milliseconds.
 constexpr std::uintmax_t MOST_READ = std::uintmax_t{1024} * 1024;
 constexpr std::size_t MOST_SHOWN = 5;
 constexpr std::int64_t RECENT_MS = 600'000;
 
-/// Where the outbox tells what went wrong, and that it is over.
+/// The place in the service that logs the outbox's failures, and that a failure is over.
 constexpr std::string_view OUTBOX_SITE = "Metrik/MetrikWorker:21 FailCallBackFun";
 
 constexpr std::size_t STAMP_BYTES = 23; // 2026-11-20 10:15:30.123
@@ -28,7 +28,7 @@ int NumberAt(std::string_view text, std::size_t at, std::size_t digits) {
     return number;
 }
 
-/// The log's times are local.
+/// The milliseconds since 1970 of a time in the log, which is local time.
 std::int64_t MillisecondsOf(std::string_view stamp) {
     std::tm local{};
     local.tm_year = NumberAt(stamp, 0, 4) - 1900;
@@ -41,8 +41,8 @@ std::int64_t MillisecondsOf(std::string_view stamp) {
     return std::int64_t{std::mktime(&local)} * 1000 + NumberAt(stamp, 20, 3);
 }
 
-/// A line such as "2026-11-20 10:15:30.123 ERROR [pid:tid] [App/ReportServer:42 Recv] message". Nothing for a
-/// line of a lower level, and for what is no record.
+/// Reads a line such as "2026-11-20 10:15:30.123 ERROR [pid:tid] [App/ReportServer:42 Recv] message". Returns
+/// nothing when the line's level is lower than a warning, or when the line is not a record.
 std::optional<Log::Line> WarningOrErrorIn(std::string_view text) {
     if (text.size() < STAMP_BYTES + 7 || text[4] != '-' || text[19] != '.')
         return std::nullopt;
@@ -58,7 +58,7 @@ std::optional<Log::Line> WarningOrErrorIn(std::string_view text) {
                      std::string(text.substr(site + 3, end - site - 3)), std::string(text.substr(end + 2))};
 }
 
-/// The end of a file, from the beginning of a line on.
+/// The last `bytes` of a file, from the first beginning of a line in them.
 std::string EndOf(const fs::path& path, std::uintmax_t bytes) {
     std::error_code error;
     const auto size = fs::file_size(path, error);
@@ -79,8 +79,8 @@ int NumberOf(const fs::path& path) {
     return name.starts_with("Report_") && name.ends_with(".log") ? NumberAt(name, 7, name.size() - 11) : 0;
 }
 
-/// The log's newest part: the end of the live file, and before it that of the newest rotated one, where there
-/// is room.
+/// The newest part of the log: the end of the live file. When that is shorter than MOST_READ, the end of the
+/// newest rotated file comes before it.
 std::string NewestPart(const std::string& directory, const fs::path& rotated) {
     auto newest = EndOf(directory + "/Report.log", MOST_READ);
     if (!rotated.empty() && newest.size() < MOST_READ)
@@ -106,7 +106,7 @@ Log LookAtLog(const std::string& directory, std::int64_t nowMs) {
     fs::path rotated;
     std::error_code error;
     for (const auto& entry : fs::directory_iterator(directory, error)) {
-        std::error_code gone; // rotated away meanwhile
+        std::error_code gone; // set when the file was rotated or deleted meanwhile
         const auto size = entry.file_size(gone);
         log.bytes += gone ? 0 : size;
         if (NumberOf(entry.path()) > NumberOf(rotated))

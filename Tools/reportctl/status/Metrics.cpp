@@ -8,7 +8,7 @@ namespace {
 
 using ReportLedger::Counts;
 
-/// Families of samples, each with its help and type. One whose value is not known is left out.
+/// Writes families of samples, each with its help and type. A family whose value is not known is left out.
 class Families {
 public:
     void Begin(const std::string& name, const char* type, const char* help) {

@@ -6,11 +6,11 @@
 
 namespace reportctl::status {
 
-/// A counter of the ledger, by its name in JSON and in metrics.
+/// A counter of the ledger, with its names in JSON and in metrics.
 struct Name {
     unsigned place;
     const char* json;
-    const char* metric; ///< Between "hublink_report_" and "_total".
+    const char* metric; ///< The part between "hublink_report_" and "_total".
     const char* help;
 };
 
@@ -18,7 +18,7 @@ inline constexpr unsigned Place(ReportLedger::Outcome outcome) {
     return static_cast<unsigned>(outcome);
 }
 
-/// What a datagram can be besides refused.
+/// All counters except those of the refused reports.
 inline constexpr std::array COUNTERS{
     Name{ReportLedger::RECEIVED, "received", "received", "Datagrams that the service took from its socket."},
     Name{ReportLedger::RECEIVED_BYTES, "receivedBytes", "received_bytes", "Bytes of these datagrams."},
@@ -39,7 +39,7 @@ inline constexpr std::array COUNTERS{
          "Reports that were received and not handled when the service ended."},
 };
 
-/// Why a report was refused.
+/// The counters of the refused reports, one for each reason.
 inline constexpr std::array REASONS{
     Name{Place(ReportLedger::Outcome::NotJson), "notJson", nullptr, nullptr},
     Name{Place(ReportLedger::Outcome::Store), "store", nullptr, nullptr},

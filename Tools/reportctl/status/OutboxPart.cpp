@@ -11,16 +11,16 @@
 namespace reportctl::status {
 namespace {
 
-/// Events of several modules are told apart up to so many: the table has no index, so that storing an event
-/// stays one step.
+/// Up to so many waiting events are counted by module. Counting reads the whole table: it has no index by
+/// module, because an index would make storing an event slower.
 constexpr std::int64_t MOST_TOLD_APART = 20'000;
 
-/// The words with which the outbox tells that a failure is over.
+/// The words with which the outbox logs that a failure is over.
 constexpr auto TAKEN_AGAIN = "events are taken again";
 constexpr auto STORED_AGAIN = "Events are stored again";
 
 void ReadTotals(SQLite::Database& database, Outbox& outbox) {
-    // An outbox of version 1 forgets no module, and does not know when it delivered last.
+    // An outbox of version 1 never forgets a module, and does not record when it delivered last.
     const bool isOld = database.execAndGet("pragma user_version").getInt() < 2;
     SQLite::Statement totals(
         database,
@@ -53,19 +53,19 @@ void ReadModules(SQLite::Database& database, Outbox& outbox) {
         return;
     SQLite::Statement waiting(database, "select (select count(*) from event where event.module = module.id) "
                                         "from module order by id");
-    if (outbox.modules.size() > 50) // one pass for each of them
+    if (outbox.modules.size() > 50) // counting would read the table once for each module
         return;
     for (auto& module : outbox.modules)
         if (waiting.executeStep())
             module.waiting = waiting.getColumn(0).getInt64();
 }
 
-/// As the service's SDK understood its environment when it started.
+/// The collector's address, read from the service's environment as the service's SDK read it at the start.
 std::optional<std::string> EndpointOf(const Service& service) {
     if (!service.process)
         return std::nullopt;
     std::vector<std::string> complaints;
-    std::vector<std::string> kept; // the looked-up texts must outlive the reading
+    std::vector<std::string> kept; // the texts must live until ReadEndpoint has returned
     kept.reserve(64);
     const auto lookUp = [&](const char* name) -> const char* {
         const auto value = service::EnvironmentOf(*service.process, name);
@@ -75,7 +75,7 @@ std::optional<std::string> EndpointOf(const Service& service) {
     return config ? std::optional(MetrikSdk::otlp::WithoutSecrets(config->url)) : std::nullopt;
 }
 
-/// The last that it told, unless it says that all is well again.
+/// The outbox's last line in the log, unless it says that the failure is over.
 std::optional<std::string> LastFailureIn(const Log& log) {
     const auto& line = log.lastFromOutbox;
     if (!line || line->text.find(TAKEN_AGAIN) != std::string::npos ||

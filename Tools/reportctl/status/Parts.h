@@ -4,19 +4,20 @@
 
 #include "Tools/reportctl/status/Status.h"
 
-/// Each part of the status, gathered by itself. Nothing throws for what is missing, damaged or another
-/// user's: it is then not known. No file is changed.
+/// The parts of the status; each function gathers one part. Nothing throws when something is missing, is
+/// damaged or belongs to another user: it is then not known. No file is changed.
 namespace reportctl::status {
 
-/// The service of the user `owner`, whose ledger was looked at.
+/// The service of the user `owner`. `ledger` is that user's ledger.
 Service LookAtService(const ReportLedger::Look& ledger, uid_t owner);
 
-/// Whether there is a file; `problem` says why not, unless there is nothing at all.
+/// Whether there is a file at the path. When there is something else, or when it cannot be known, `problem`
+/// gets the reason.
 bool IsFile(const std::string& path, std::string& problem);
 
 Store LookAtStore(const std::string& path);
 
-/// `service` has the settings, `log` what went wrong last.
+/// `service` gives the process whose settings name the collector, `log` the outbox's last failure.
 Outbox LookAtOutbox(const std::string& path, const Service& service, const Log& log);
 
 Log LookAtLog(const std::string& directory, std::int64_t nowMs);

@@ -12,7 +12,7 @@ namespace reportctl::status {
 namespace {
 
 constexpr std::size_t NAME_WIDTH = 10;
-constexpr std::size_t TEXT_WIDTH = 100; // of a line of the log
+constexpr std::size_t TEXT_WIDTH = 100; // how much of a long text is shown, in bytes
 
 std::string Bytes(std::uint64_t bytes) {
     if (bytes < 10'000)
@@ -48,7 +48,7 @@ std::string Duration(std::int64_t ms) {
     return seconds < 2 * DAY ? fmt::format("{} h", seconds / HOUR) : fmt::format("{} days", seconds / DAY);
 }
 
-/// The beginning of a text of others, as a terminal may show it.
+/// The beginning of a text that another program wrote, as a terminal may show it.
 std::string Shown(const std::string& text) {
     return terminal::Printable(SystemTool::Text::CutUtf8(text, TEXT_WIDTH)) +
            (text.size() > TEXT_WIDTH ? " ..." : "");
@@ -192,7 +192,7 @@ private:
                         ", last failure " + (outbox.lastFailure ? Shown(*outbox.lastFailure) : "-"));
     }
 
-    /// The last lines, equal ones counted.
+    /// Shows the last warnings and errors. Equal lines are shown once, with their number.
     void ShowLog() {
         const Log& log = m_status.log;
         Row("log", fmt::format("{}; in the last ten minutes {} errors, {} warnings", Bytes(log.bytes),

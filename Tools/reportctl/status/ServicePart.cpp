@@ -16,7 +16,8 @@ std::optional<std::string> Known(const std::string& text) {
     return text.empty() ? std::nullopt : std::optional(text);
 }
 
-/// When a process began to run: its folder in /proc is made then, or a moment later.
+/// When a process started, by the time of its folder in /proc. The folder is made at the start or a moment
+/// later.
 std::optional<std::int64_t> StartOf(pid_t process) {
     struct stat status {};
     if (::stat(("/proc/" + std::to_string(process)).c_str(), &status) != 0)
@@ -24,8 +25,8 @@ std::optional<std::int64_t> StartOf(pid_t process) {
     return std::int64_t{status.st_mtim.tv_sec} * 1000 + status.st_mtim.tv_nsec / 1'000'000;
 }
 
-/// The process that counts in this user's ledger; without a ledger, the one that holds the machine's lock, if
-/// it is this user's.
+/// Finds the service's process: the one that counts in this user's ledger. When none counts there, the
+/// process that holds the machine's lock, if it is this user's.
 void FindProcess(Service& service, const ReportLedger::Look& ledger, uid_t owner) {
     const auto holder = service::LockHolder();
     const auto user = holder ? service::OwnerOf(*holder) : std::nullopt;
@@ -51,7 +52,8 @@ void DescribeProcess(Service& service, const ReportLedger::Look& ledger) {
     }
 }
 
-/// Where another process's sockets cannot be seen, its user's socket is taken for its own.
+/// Whether the socket is the service's. When this user may not see the process's sockets, every socket of the
+/// process's user counts as the service's.
 bool IsOf(const service::BoundSocket& socket, const Service& service, uid_t owner) {
     return service.isRunning &&
            service::HasSocket(*service.process, socket.inode).value_or(socket.owner == owner);

@@ -10,15 +10,15 @@
 #include "Ledger/Reader.h"
 #include "Tools/reportctl/ledger/Rates.h"
 
-/// What can be known of one user's service at a moment. Plain values: what gathers them, what judges them and
-/// what shows them are apart. Nothing stands for what is not known or not there.
+/// The state of one user's service at one moment, as plain values. Gathering, judging and showing them are
+/// separate functions. An empty optional means that the value is not known or does not exist.
 namespace reportctl::status {
 
-/// Who has bound the service's port.
+/// The program that has bound the service's port.
 struct PortHolder {
-    std::optional<pid_t> process; ///< Another user's process is not always to be seen.
+    std::optional<pid_t> process; ///< Not known when this user may not see the process.
     std::optional<std::string> name;
-    std::string user; ///< Its name, or its number where it has none.
+    std::string user; ///< The user's name, or number when it has no name.
 };
 
 struct Service {
@@ -29,8 +29,8 @@ struct Service {
     std::optional<std::string> version;
     std::optional<std::string> buildId;
     std::optional<PortHolder> portHolder;
-    std::optional<std::string> otherUser; ///< Whose service holds the machine's lock, if it is not this one.
-    bool hasLogger = false;               ///< Its plug-ins: loaded, or beside the program while nothing runs.
+    std::optional<std::string> otherUser; ///< The user whose service holds the machine's lock instead.
+    bool hasLogger = false;               ///< The process has loaded it, or its file is beside the program.
     bool hasStore = false;
     bool hasSdk = false;
 };
@@ -43,9 +43,9 @@ struct Store {
     bool hasTables = false;
     std::optional<int> schemaVersion;
     std::optional<std::int64_t> rows;
-    bool areRowsCounted = true; ///< Else the span of their ids, which is more where rows between are gone.
+    bool areRowsCounted = true; ///< False: `rows` is last id - first id + 1, too much where ids are missing.
     std::optional<std::string> newestCreateTime;
-    std::string problem; ///< Why it could not be read.
+    std::string problem; ///< Why the store could not be read; empty when it could.
 };
 
 struct Outbox {
@@ -64,8 +64,8 @@ struct Outbox {
     std::optional<std::int64_t> dropped;
     std::optional<std::int64_t> lastDeliveredAtMs;
     std::vector<Module> modules;
-    std::optional<std::string> endpoint;    ///< Without secrets.
-    std::optional<std::string> lastFailure; ///< Its line of the log, unless events are taken again since.
+    std::optional<std::string> endpoint;    ///< The collector's address, without secrets.
+    std::optional<std::string> lastFailure; ///< The outbox's last line in the log, if the failure lasts.
     std::string problem;
 };
 
@@ -73,15 +73,15 @@ struct Log {
     struct Line {
         std::int64_t atMs = 0;
         std::string level;
-        std::string site; ///< With line and function.
+        std::string site; ///< Such as "App/ReportServer:42 Recv".
         std::string text;
     };
     std::string directory;
     std::uint64_t bytes = 0;
-    int errors = 0; ///< In the last ten minutes, as far as what was read reaches.
+    int errors = 0; ///< Of the last ten minutes, in the part of the log that was read.
     int warnings = 0;
-    std::vector<Line> last;             ///< Warnings and errors, the oldest first.
-    std::optional<Line> lastFromOutbox; ///< The last thing that the outbox told, however long ago.
+    std::vector<Line> last;             ///< The last warnings and errors, the oldest first.
+    std::optional<Line> lastFromOutbox; ///< The outbox's last warning or error, also when it is old.
 };
 
 struct Disk {
@@ -101,26 +101,26 @@ struct Status {
     Disk disk;
 };
 
-enum class Verdict { Healthy = 0, Degraded = 1, Down = 2 }; ///< Its number is the exit code.
+enum class Verdict { Healthy = 0, Degraded = 1, Down = 2 }; ///< The number is the exit code.
 
 struct Judgement {
     Verdict verdict = Verdict::Healthy;
-    std::vector<std::string> reasons; ///< The worst first; each says what to do.
+    std::vector<std::string> reasons; ///< The worst first. Each says what is wrong and what to do.
 };
 
-/// Looks at everything; changes no file.
+/// Gathers the whole status. Changes no file.
 Status Gather();
 
-/// A pure function of what was gathered.
+/// Judges the gathered status. A pure function.
 Judgement Judge(const Status& status);
 
-/// One object, with a line feed at its end. docs/Status.md names its members.
+/// The status as one JSON object, with a line feed at its end. docs/Status.md names its members.
 std::string JsonOf(const Status& status, const Judgement& judgement);
 
-/// One screen for a person.
+/// The status as one screen of text for a person.
 std::string ScreenOf(const Status& status, const Judgement& judgement, bool isColoured);
 
-/// In the text format that Prometheus reads.
+/// The status as metrics in the text format that Prometheus reads.
 std::string MetricsOf(const Status& status, const Judgement& judgement);
 
 /// Milliseconds since 1970 as "2026-11-21T14:05:06.789Z".

@@ -8,9 +8,9 @@ namespace {
 
 namespace fs = std::filesystem;
 
-/// Up to so many rows are counted one by one, which takes some milliseconds. Counting reads each page of the
-/// table, so of more rows only the span of the ids is taken: the number of rows, as long as rows were removed
-/// from the oldest end only.
+/// Up to so many rows are counted, which takes some milliseconds. Counting reads each page of the table. So
+/// for more rows, the difference between the last and the first id is used: it is the number of rows as long
+/// as only the oldest rows were deleted.
 constexpr std::int64_t MOST_COUNTED = 50'000;
 
 std::uint64_t SizeOf(const std::string& path) {

@@ -13,11 +13,11 @@ using ReportLedger::Outcome;
 
 constexpr std::chrono::milliseconds RECENT = 10min;
 constexpr std::uint64_t LEAST_FREE = 500'000'000;
-constexpr std::uint64_t SMALL_DISK = 10'000'000'000; // where the least is a part of it
+constexpr std::uint64_t SMALL_DISK = 10'000'000'000; // below this size, the least is a part of the disk
 constexpr std::uint64_t PART_OF_A_SMALL_DISK = 20;   // 5 %
 
-/// What is the service's fault, or the machine's, and what to do about it. Other refusals are senders'
-/// mistakes.
+/// A loss that is the fault of the service or the machine, with what to do about it. All other refusals are
+/// mistakes of senders.
 struct Fault {
     unsigned place;
     const char* what;
@@ -85,7 +85,8 @@ private:
             Add(Verdict::Down, "The service runs and does not listen on port 9997. Restart it.");
     }
 
-    /// The marks may be younger than the time of the last one, after a restart for example.
+    /// The sentence about a fault. `count` can be 0 although the last such report is recent, for example
+    /// after a restart, when the ledger's marks are younger than it. The sentence then says "a report".
     static std::string Told(const Fault& fault, std::uint64_t count) {
         return fmt::format("In the last ten minutes, {} {}. {}",
                            count > 1 ? fmt::format("{} reports were", count) : "a report was", fault.what,
