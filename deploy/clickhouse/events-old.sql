@@ -41,12 +41,14 @@ CREATE TABLE IF NOT EXISTS hublink.events_store
     time           DateTime('UTC'),
     milliseconds   UInt16,
     received       DateTime('UTC'),
+    source         String,
     module         String,
     event          String,
     user           String,
     suite_version  String,
     outbox         String,
     sequence       UInt64,
+    row            Int64,
     module_name    String,
     module_version String,
     os             String,
@@ -57,7 +59,7 @@ CREATE TABLE IF NOT EXISTS hublink.events_store
 )
 ENGINE = ReplacingMergeTree
 PARTITION BY if(toYear(time) BETWEEN 2020 AND 2039, toYYYYMM(time), 0)
-ORDER BY (module, event, time, uid);
+ORDER BY (module, event, uid);
 
 -- An attribute that is missing has index 0, and there is an empty text. What `reportctl outbox test` sends is
 -- no event.
@@ -67,12 +69,15 @@ SELECT
     toDateTime(substring(Timestamp, 1, 19), 'UTC') AS time,
     toUInt16OrZero(substring(Timestamp, 21, 3)) AS milliseconds,
     Received AS received,
+    if(has(LogAttributes.keys, 'hublink.source'),
+       LogAttributes.values[indexOf(LogAttributes.keys, 'hublink.source')], 'outbox') AS source,
     LogAttributes.values[indexOf(LogAttributes.keys, 'metrik.module')] AS module,
     LogAttributes.values[indexOf(LogAttributes.keys, 'metrik.event')] AS event,
     LogAttributes.values[indexOf(LogAttributes.keys, 'user.id')] AS user,
     LogAttributes.values[indexOf(LogAttributes.keys, 'hublink.version')] AS suite_version,
     ResourceAttributes.values[indexOf(ResourceAttributes.keys, 'metrik.outbox.id')] AS outbox,
     toUInt64OrZero(LogAttributes.values[indexOf(LogAttributes.keys, 'metrik.sequence')]) AS sequence,
+    toInt64OrZero(LogAttributes.values[indexOf(LogAttributes.keys, 'hublink.row')]) AS row,
     ServiceName AS module_name,
     ResourceAttributes.values[indexOf(ResourceAttributes.keys, 'service.version')] AS module_version,
     ResourceAttributes.values[indexOf(ResourceAttributes.keys, 'os.type')] AS os,
@@ -89,7 +94,9 @@ SELECT
                 ResourceAttributes.values, ResourceAttributes.keys) AS `resource.values`,
     Body AS body
 FROM hublink.otel_logs
-WHERE uid != '' AND module != '' AND outbox != 'reportctl-test';
+WHERE uid != ''
+    AND ResourceAttributes.values[indexOf(ResourceAttributes.keys, 'service.namespace')] = 'hublink'
+    AND outbox != 'reportctl-test';
 
 CREATE VIEW IF NOT EXISTS hublink.events AS SELECT * FROM hublink.events_store FINAL;
 
@@ -121,7 +128,7 @@ SELECT
         AS installations
 FROM hublink.otel_logs
 WHERE has(LogAttributes.keys, 'log.record.uid')
-    AND module != ''
+    AND ResourceAttributes.values[indexOf(ResourceAttributes.keys, 'service.namespace')] = 'hublink'
     AND NOT has(ResourceAttributes.values, 'reportctl-test')
 GROUP BY day, module, event, suite_version;
 

@@ -39,20 +39,23 @@ TTL Received + INTERVAL 7 DAY
 SETTINGS ttl_only_drop_parts = 1;
 
 -- The wide table. An event may arrive twice: both lines have the same key, and the engine keeps one of them
--- when it merges. Until then the view `events` leaves the second one out. All of the key comes from the event
--- itself, so that two copies have the same. Months before 2020 and after 2039 are wrong clocks and share a
--- partition.
+-- when it merges. Until then the view `events` leaves the second one out. The time is not in the key: a row
+-- of the local store that has none gets the time of each sending. The ids of the other events begin with
+-- their time, so lines of one time lie together all the same. Months before 2020 and after 2039 are wrong
+-- clocks, and share a partition.
 CREATE TABLE IF NOT EXISTS hublink.events_store
 (
     uid            String CODEC(ZSTD(1)),
     time           DateTime64(3, 'UTC') CODEC(Delta(8), ZSTD(1)),
     received       DateTime('UTC') CODEC(Delta(4), ZSTD(1)),
+    source         LowCardinality(String),
     module         LowCardinality(String),
     event          LowCardinality(String),
     user           String CODEC(ZSTD(1)),
     suite_version  LowCardinality(String),
     outbox         String CODEC(ZSTD(1)),
     sequence       UInt64 CODEC(Delta(8), ZSTD(1)),
+    row            Int64 CODEC(Delta(8), ZSTD(1)),
     module_name    LowCardinality(String),
     module_version LowCardinality(String),
     os             LowCardinality(String),
@@ -63,7 +66,7 @@ CREATE TABLE IF NOT EXISTS hublink.events_store
 )
 ENGINE = ReplacingMergeTree
 PARTITION BY if(toYear(time) BETWEEN 2020 AND 2039, toYYYYMM(time), 0)
-ORDER BY (module, event, time, uid);
+ORDER BY (module, event, uid);
 
 -- No function here may fail: the exporter's INSERT would fail with it, for all rows of the batch and for
 -- ever. What `reportctl outbox test` sends is no event.
@@ -72,12 +75,14 @@ SELECT
     LogAttributes['log.record.uid'] AS uid,
     toDateTime64(Timestamp, 3, 'UTC') AS time,
     Received AS received,
+    if(LogAttributes['hublink.source'] = '', 'outbox', LogAttributes['hublink.source']) AS source,
     LogAttributes['metrik.module'] AS module,
     LogAttributes['metrik.event'] AS event,
     LogAttributes['user.id'] AS user,
     LogAttributes['hublink.version'] AS suite_version,
     ResourceAttributes['metrik.outbox.id'] AS outbox,
     toUInt64OrZero(LogAttributes['metrik.sequence']) AS sequence,
+    toInt64OrZero(LogAttributes['hublink.row']) AS row,
     ServiceName AS module_name,
     ResourceAttributes['service.version'] AS module_version,
     ResourceAttributes['os.type'] AS os,
@@ -89,7 +94,7 @@ SELECT
     Body AS body
 FROM hublink.otel_logs
 WHERE LogAttributes['log.record.uid'] != ''
-    AND LogAttributes['metrik.module'] != ''
+    AND ResourceAttributes['service.namespace'] = 'hublink'
     AND ResourceAttributes['metrik.outbox.id'] != 'reportctl-test';
 
 -- Each event once.

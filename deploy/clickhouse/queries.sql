@@ -65,7 +65,7 @@ ORDER BY event;
 
 -- 5. Does everything arrive? The numbers of a module's events on an installation have no gap. A number that
 -- is missing was refused, dropped, is a dead letter, or is still on its way. What was lost before the first
--- event of these 30 days, or after the last one, does not show.
+-- event of these 30 days, or after the last one, does not show. Rows of the local store have no number.
 SELECT
     module,
     sum(expected) AS sent,
@@ -80,7 +80,7 @@ FROM
         max(sequence) - min(sequence) + 1 AS expected,
         uniqExact(sequence) AS present
     FROM hublink.events
-    WHERE time > now() - INTERVAL 30 DAY
+    WHERE time > now() - INTERVAL 30 DAY AND sequence > 0
     GROUP BY outbox, module
 )
 GROUP BY module

@@ -25,6 +25,7 @@ DEPLOY = fleet.ROOT / "deploy"
 COLLECTOR_PORT = 4318
 ENVIRONMENT = "deployment.environment.name"
 WIDE_COLUMNS = ["module", "event", "user", "suite_version", "milliseconds", "sequence", "os", "data", "body"]
+STORE_UID = "2c8f9a52-5f7a-5d6e-9b0a-0c3b5a1d7e42"
 # For the old engine, which takes a list or an object only as a text. docs/Analytics.md has the same.
 VALUE_AS_TEXT = '.value |= (if type == "object" or type == "array" then tojson else . end)'
 
@@ -90,14 +91,28 @@ def copies(number):
 
 
 def load(engine, collector):
-    """Writes what the collector has, with the test events of `reportctl`; every other batch twice; and a
-    record of another program."""
+    """Writes what the collector has, with the test events of `reportctl`; every other batch twice; a record
+    of another program; and a row of a local store, twice."""
     for statement in 2 * engines.statements(DEPLOY / "clickhouse" / engine.tables):
         engine.run(statement)
     for number, batch in enumerate(collector.batches):
         for _ in range(copies(number)):
             engine.insert_rows(batch)
-    engine.insert_rows([{**collector.batches[0][0], "LogAttributes": {"thread.name": "main"}}])
+    foreign = {**collector.batches[0][0], "ResourceAttributes": {"service.name": "another program"}}
+    engine.insert_rows([foreign, *store_row_twice(collector.batches[0][0])])
+
+
+def store_row_twice(row):
+    """A row of a local store without a time of its own: it has the time of each sending."""
+    attributes = {
+        "log.record.uid": STORE_UID,
+        "hublink.source": "store",
+        "hublink.row": "17",
+        "metrik.event": "started",
+        "metrik.data.mark": "17",
+    }
+    sent = ("2025-11-30 23:59:59.000000000", "2025-12-01 00:00:01.000000000")
+    return [{**row, "Timestamp": time, "LogAttributes": attributes} for time in sent]
 
 
 def wide_table(engine):
@@ -106,7 +121,7 @@ def wide_table(engine):
         f"""SELECT data.values[indexOf(data.keys, 'mark')], module, event, user, suite_version,
             {engine.milliseconds}, sequence, os,
             arrayStringConcat(data.keys, '~'), arrayStringConcat(data.values, '~'), body
-            FROM hublink.events"""
+            FROM hublink.events WHERE source = 'outbox'"""
     )
     found = {}
     for mark, *columns, names, values, body in lines:
@@ -122,9 +137,12 @@ def check_rows(engine, collector, truth):
     """Everything was delivered, some of it twice, and `events` has each event once."""
     delivered = sum(copies(number) * len(batch) for number, batch in enumerate(collector.batches))
     count = engine.number("SELECT count() FROM hublink.otel_logs")
-    expect(f"{engine.name}: rows in otel_logs", count, delivered + 1)
+    expect(f"{engine.name}: rows in otel_logs", count, delivered + 3)
     expect(f"{engine.name}: events came twice", delivered > len(truth.arrived), True)
     expect(f"{engine.name}: the wide table", wide_table(engine), truth.wide_table())
+    sql = f"SELECT source, row, event, module, sequence FROM hublink.events WHERE uid = '{STORE_UID}'"
+    stored = engine.rows(sql)
+    expect(f"{engine.name}: the row of a store", stored, [["store", "17", "started", "", "0"]])
 
 
 def check_columns(engine, truth):
@@ -135,7 +153,7 @@ def check_columns(engine, truth):
     count = engine.number(f"{home} AND NOT has(resource.keys, 'os.type')")
     expect(f"{engine.name}: one environment", count, truth.count_of("home"))
     names = engine.rows(
-        """SELECT DISTINCT module, module_name, module_version FROM hublink.events
+        """SELECT DISTINCT module, module_name, module_version FROM hublink.events WHERE source = 'outbox'
            ORDER BY module, module_version"""
     )
     expected = [["A100", "Painter", "2.1"], ["A100", "Painter", "2.2"], ["A200", "Writer", "1.0"]]
@@ -156,8 +174,25 @@ def check_merged(engine, truth):
     parts = "FROM system.parts WHERE database = 'hublink' AND table = 'events_store' AND active"
     for (partition,) in engine.rows(f"SELECT DISTINCT partition {parts}"):
         engine.run(f"OPTIMIZE TABLE hublink.events_store PARTITION {partition} FINAL")
-    count = engine.number("SELECT count() FROM hublink.events_store")
+    count = engine.number("SELECT count() FROM hublink.events_store WHERE source = 'outbox'")
     expect(f"{engine.name}: lines after a merge", count, len(truth.arrived))
+
+
+def check_clocks(engine, row, settings):
+    """A batch of desktops whose clocks are wrong by years is written, with the connection's settings."""
+    batch = [
+        {
+            **row,
+            "Timestamp": f"{year}-{month:02}-01 00:00:00.000000000",
+            "LogAttributes": {**row["LogAttributes"], "log.record.uid": f"clock-{year}-{month}"},
+        }
+        for year in range(1970, 2040)
+        for month in range(1, 13)
+    ]
+    pairs = ", ".join(f"{name} = {value}" for name, value in settings.items())
+    engine.insert_rows(batch, f"SETTINGS {pairs}")
+    count = engine.number("SELECT count() FROM hublink.events WHERE uid LIKE 'clock-%'")
+    expect(f"{engine.name}: events of wrong clocks", count, len(batch))
 
 
 # --- the rows of the stores
@@ -207,6 +242,8 @@ def check_engine(engine, collector, truth, exports):
         check_queries(engine, truth)
         check_merged(engine, truth)
         check_exports(engine, exports)
+        if engine.has_settings:
+            check_clocks(engine, collector.batches[0][0], configs.connection_settings(DEPLOY))
         print(f"{engine.name}, {engine.run('SELECT version()').strip()}: {len(truth.arrived)} events")
     finally:
         engine.stop()

@@ -126,6 +126,12 @@ def check_fluent_bit(path, expect):
     expect(f"{path.name}: what waits is on the disk", source["storage.type"], "filesystem")
 
 
+def connection_settings(deploy):
+    """What the exporter tells ClickHouse with each INSERT."""
+    configuration = yaml.safe_load((deploy / "collector/clickhouse.yaml").read_text())
+    return configuration["exporters"]["clickhouse"]["connection_params"]
+
+
 def check(deploy, expect):
     for path in sorted((deploy / "collector").glob("*.yaml")):
         check_collector(path, expect)

@@ -64,14 +64,14 @@ class Engine:
     def number(self, sql):
         return int(self.run(sql))
 
-    def insert(self, table, columns, lines):
+    def insert(self, table, columns, lines, settings=""):
         names = ", ".join(f"`{each}`" for each in columns)
-        self.run(f"INSERT INTO {table} ({names}) FORMAT JSONEachRow\n" + "\n".join(lines))
+        self.run(f"INSERT INTO {table} ({names}) {settings} FORMAT JSONEachRow\n" + "\n".join(lines))
 
-    def insert_rows(self, batch):
+    def insert_rows(self, batch, settings=""):
         lines = [self.as_stored(row) for row in batch]
         if lines:
-            self.insert("hublink.otel_logs", lines[0], [json.dumps(each) for each in lines])
+            self.insert("hublink.otel_logs", lines[0], [json.dumps(each) for each in lines], settings)
 
 
 class Current(Engine):
@@ -81,6 +81,7 @@ class Current(Engine):
     tables = "events.sql"
     milliseconds = "toUnixTimestamp64Milli(time)"
     has_milliseconds = True
+    has_settings = True
     takes_objects = True
 
     def __init__(self, modules):
@@ -116,6 +117,7 @@ class Old(Engine):
     tables = "events-old.sql"
     milliseconds = "toUInt64(toUnixTimestamp(time)) * 1000 + milliseconds"
     has_milliseconds = False
+    has_settings = False
     takes_objects = False
 
     def __init__(self, program, directory):
