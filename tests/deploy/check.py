@@ -18,6 +18,7 @@ import engines
 import fleet
 import lua
 import rows
+from broker import Broker
 from collector import REJECTED_EVENT, Collector
 from expected import Expected, body_of
 
@@ -25,6 +26,8 @@ DEPLOY = fleet.ROOT / "deploy"
 COLLECTOR_PORT = 4318
 ENVIRONMENT = "deployment.environment.name"
 WIDE_COLUMNS = ["module", "event", "user", "suite_version", "milliseconds", "sequence", "os", "data", "body"]
+TOPIC = "hublink.rows"
+TOPIC_SECONDS = 120  # a first reader waits some 20 for its partitions
 STORE_UID = "2c8f9a52-5f7a-5d6e-9b0a-0c3b5a1d7e42"
 # For the old engine, which takes a list or an object only as a text. docs/Analytics.md has the same.
 VALUE_AS_TEXT = '.value |= (if type == "object" or type == "array" then tojson else . end)'
@@ -211,7 +214,7 @@ def check_exports(engine, exports):
     expected = []
     for source, export in sorted(exports.items()):
         lines = [json.loads(line) for line in export.splitlines()]
-        text = export if engine.takes_objects else piped(export, "jq", "-c", VALUE_AS_TEXT)
+        text = export if engine.is_current else piped(export, "jq", "-c", VALUE_AS_TEXT)
         text = piped(text, "sed", f's/^{{/{{"source":"{source}",/')
         for _ in range(2):
             engine.insert("hublink.reports_store", ["source", *lines[0]], text.splitlines())
@@ -224,14 +227,39 @@ def check_exports(engine, exports):
 # --- fluent-bit
 
 
+def records_of(collector):
+    return [record for request in collector.requests for record in rows.records(request)]
+
+
+def rows_of_script(collector):
+    return lua.run(DEPLOY / "fluent-bit/otel_logs.lua", records_of(collector))
+
+
 def check_script(collector):
     """The script of fluent-bit makes the rows that the collector writes."""
-    records = [record for request in collector.requests for record in rows.records(request)]
-    for record, row in zip(records, lua.run(DEPLOY / "fluent-bit/otel_logs.lua", records)):
+    for record, row in zip(records_of(collector), rows_of_script(collector)):
         expected = {name: value for name, value in rows.row(*record).items() if value not in ("", {}, 0)}
         expected["SeverityNumber"] = str(expected["SeverityNumber"])
         expected["Body"], row["Body"] = json.loads(expected["Body"]), json.loads(row["Body"])
         expect("the row that fluent-bit's script makes", row, expected)
+
+
+def check_topic(engine, collector, truth):
+    """The engine reads the script's rows from a topic; with them come those that the collector rejected."""
+    broker = Broker(TOPIC)
+    for statement in engines.statements(DEPLOY / "clickhouse/from-kafka.sql"):
+        engine.run(statement.replace("kafka.example:9093", broker.address))
+    in_table = "SELECT count() FROM hublink.otel_logs"
+    before = engine.number(in_table)
+    made = [{"@timestamp": 1.5, **row} for row in rows_of_script(collector)]
+    expect("the broker takes the rows", broker.send(json.dumps(row).encode() for row in made), True)
+
+    def arrived():  # the wide table is the last to have them
+        sql = "SELECT count() FROM hublink.events WHERE source = 'outbox'"
+        return engine.number(sql) == len(truth.sequences)
+
+    fleet.until("the rows' way from the topic", arrived, TOPIC_SECONDS)
+    expect(f"{engine.name}: rows from the topic", engine.number(in_table), before + len(made))
 
 
 def check_engine(engine, collector, truth, exports):
@@ -242,7 +270,8 @@ def check_engine(engine, collector, truth, exports):
         check_queries(engine, truth)
         check_merged(engine, truth)
         check_exports(engine, exports)
-        if engine.has_settings:
+        if engine.is_current:
+            check_topic(engine, collector, truth)
             check_clocks(engine, collector.batches[0][0], configs.connection_settings(DEPLOY))
         print(f"{engine.name}, {engine.run('SELECT version()').strip()}: {len(truth.arrived)} events")
     finally:

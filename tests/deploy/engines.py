@@ -80,9 +80,7 @@ class Current(Engine):
     name = "current engine"
     tables = "events.sql"
     milliseconds = "toUnixTimestamp64Milli(time)"
-    has_milliseconds = True
-    has_settings = True
-    takes_objects = True
+    is_current = True
 
     def __init__(self, modules):
         self.process = subprocess.Popen(
@@ -116,9 +114,7 @@ class Old(Engine):
     name = "Debian's engine"
     tables = "events-old.sql"
     milliseconds = "toUInt64(toUnixTimestamp(time)) * 1000 + milliseconds"
-    has_milliseconds = False
-    has_settings = False
-    takes_objects = False
+    is_current = False
 
     def __init__(self, program, directory):
         self.log = directory / "errors"

@@ -19,7 +19,7 @@ def day(event):
 def last(events, engine):
     """The latest time as the engine prints it: the old one has no milliseconds in it."""
     text = rows.time_text(max(event.time_ms for event in events) * 1_000_000)[:-6]
-    return text if engine.has_milliseconds else text[:-4]
+    return text if engine.is_current else text[:-4]
 
 
 def users(events):

@@ -31,11 +31,11 @@ class Event:
     mark: int
 
 
-def until(what, condition):
-    deadline = time.monotonic() + DEADLINE_SECONDS
+def until(what, condition, seconds=DEADLINE_SECONDS):
+    deadline = time.monotonic() + seconds
     while not condition():
         if time.monotonic() > deadline:
-            sys.exit(f"FAILED: {what} did not happen in {DEADLINE_SECONDS} seconds")
+            sys.exit(f"FAILED: {what} did not happen in {seconds} seconds")
         time.sleep(0.02)
 
 
