@@ -3,8 +3,8 @@
     from hublink_report import Module, Reporter, Result
 
     reporter = Reporter(Module("A100", "2.1", "Painter"))
-    reporter.event("A100|10001", {"page": "start"})  # begins with A: to analytics
-    reporter.event("B100|10001", "it's open")        # any other: to the local store
+    reporter.event("A100|10001", {"page": "start"})  # the id begins with A: goes to analytics
+    reporter.event("B100|10001", "it's open")        # any other id: goes to the local store
 
 Purpose: a text arrives exactly as it was given, or the result says why it was not sent. A reporter doubles quotes for
 the store and escapes JSON. It announces its own module and tells the service who is signed in, and it does both again
@@ -373,8 +373,8 @@ _NOT_OURS = {errno.EBADF, errno.ENOTSOCK, errno.EDESTADDRREQ, errno.ENOTCONN}
 
 
 def _connected() -> socket.socket:
-    """A new socket that is connected to the service's port. Only for a connected socket the system reports that no
-    program listens."""
+    """A new socket that is connected to the service's port. The system would not report to an unconnected socket that
+    no program listens."""
     made = socket.socket(socket.AF_INET, socket.SOCK_DGRAM)
     try:
         made.setblocking(False)

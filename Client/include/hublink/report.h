@@ -71,7 +71,8 @@ HUBLINK_C_EXPORT hublink_result hublink_reporter_event_json(hublink_reporter* re
 HUBLINK_C_EXPORT hublink_result hublink_reporter_set_user(hublink_reporter* reporter, const char* open_id,
                                                           const char* suite_version);
 
-/* How many calls of the event functions and of set_user with this reporter returned this result. */
+/* How many calls of hublink_reporter_event, hublink_reporter_event_json and hublink_reporter_set_user with
+ * this reporter returned this result. */
 HUBLINK_C_EXPORT uint64_t hublink_reporter_count(const hublink_reporter* reporter, hublink_result result);
 
 /* The result's name, such as "NobodyListens". The text stays valid until the program ends. */

@@ -72,7 +72,7 @@ struct Module {
 struct Options {
     /// A machine runs one service, for one user. By default, a program of another user does not report to it,
     /// because the reports would end in a store that is not its user's: calls return OtherUsersService. Set
-    /// this to true to report all the same. Only on Linux the library can see whose service it is; on other
+    /// this to true to report all the same. The library can see whose service it is on Linux only. On other
     /// systems it always reports.
     bool allowOtherUsersService = false;
 };
@@ -115,10 +115,10 @@ private:
 ///
 /// Announcements: the service must know a module before the module's first event. It forgets modules and user
 /// when it ends. The reporter announces its module before the module's first event, and it announces the user
-/// that was set. It announces both again before the next event after the service was gone or was restarted.
+/// that was set. After the service was gone or was restarted, it announces both again before the next event.
 /// When no event was sent between the service's end and its new start, the reporter finds the restart by the
-/// service's socket in /proc/net/udp, where it looks at most once a second; events of that second can get
-/// lost. On a system without that file, it announces everything again every three minutes.
+/// service's socket in /proc/net/udp. It looks there once a second while events are sent; events of that
+/// second can get lost. On a system without that file, it announces everything again every three minutes.
 ///
 /// Threads: any thread may call at any time. Threads wait for each other only while one of them hands a
 /// datagram to the system or looks for the service's socket. The library starts no thread.

@@ -12,10 +12,10 @@ ForkGuard* g_first = nullptr;
 
 } // namespace
 
-/// The handlers are registered when the library is loaded. With the first guard would be too late: a fork in
-/// another thread could happen at that moment. Without memory for the handlers, a child shares its parent's
-/// socket, and each can get the error of the other's datagram; a lock that another thread held at the fork
-/// stays locked in the child.
+/// The handlers are registered when the library is loaded. Registering them with the first guard would be too
+/// late: another thread could fork at that moment. Without memory for the handlers, a child shares its
+/// parent's socket, and each can get the error of the other's datagram; a lock that another thread held at
+/// the fork stays locked in the child.
 const int ForkGuard::HANDLERS = ::pthread_atfork(&BeforeFork, &AfterForkInParent, &AfterForkInChild);
 
 void ForkGuard::Enlist() noexcept {

@@ -4,8 +4,8 @@
 
 namespace hublink {
 
-/// A socket that is connected to the service's port. Only for a connected socket the system reports that no
-/// program has bound the port.
+/// A socket that is connected to the service's port. It is connected because the system would not report to
+/// an unconnected socket that no program has bound the port.
 ///
 /// Threads: one at a time.
 class Socket {

@@ -14,7 +14,7 @@ enum class ValueForm {
     Nothing,  ///< There is no value.
     Text,     ///< A text, as a JSON string.
     Json,     ///< JSON, as it is. The service reads it; an object is printed again.
-    JsonText, ///< JSON, as the contents of a JSON string. The service does not change it, as any text.
+    JsonText, ///< JSON, as the contents of a JSON string. The service does not change it.
 };
 
 struct Report {

@@ -109,7 +109,7 @@ std::string Redaction::OfLogLine(const std::string& text) const {
     const auto line = log::ReadLine(text);
     if (!line)
         return Sizes("half a line", text.size());
-    const auto begin = text.find("] ", text.find("] [") + 2) + 2; // of the message
+    const auto begin = text.find("] ", text.find("] [") + 2) + 2; // where the message begins
     return OfText(text.substr(0, begin) + terminal::Printable(Redacted(*line)));
 }
 

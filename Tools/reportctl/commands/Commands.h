@@ -21,7 +21,7 @@ Add AddStatus;  ///< `status` shows whether the service is healthy, and what to 
 Add AddMetrics; ///< `metrics` writes the status as figures for a monitoring system.
 Add AddSend;  ///< `send` sends the running service a report or a control message, from flags or line by line.
 Add AddTail;  ///< `tail` follows the log.
-Add AddFind;  ///< `find` shows where a report arrived.
+Add AddFind;  ///< `find` shows where a report is: in the log, the store or the outbox.
 Add AddStats; ///< `stats` counts reports.
 Add AddExport; ///< `export` writes the rows of the store as CSV or JSON Lines.
 Add AddBackup; ///< `backup` copies the databases.

@@ -23,8 +23,8 @@ const char* WordFor(Outcome outcome);
 /// One entry of the log as a person reads it: a datagram with its outcome, or another line.
 ///
 ///     arrived (Unknown) ──┬─► Refused       by a line of the log: Pairing
-///                         ├─► Control       it is one, and no line says otherwise: Pairing
-///                         └─► Stored, ToAnalytics   by what the databases hold: Outcomes
+///                         ├─► Control       a control message that no line refuses: Pairing
+///                         └─► Stored, ToAnalytics   by the rows and events of the databases: Outcomes
 struct Entry {
     Line line; ///< for a datagram the line of its arrival: line.message is the datagram's text
     message::Message message;

@@ -54,9 +54,8 @@ terminal::TimePoint TimeOf(std::string_view stamp) {
                                std::chrono::milliseconds(NumberAt(stamp, SECONDS_SIZE + 1, 3)));
 }
 
-/// Removes the text up to and with `end` from `rest`, and returns it without `end`. Nothing when `rest` has
-/// no
-/// `end`.
+/// Removes the text before `end`, and `end` itself, from `rest`. Returns that text, or nothing when `rest`
+/// has no such `end`.
 std::optional<std::string_view> TakeUntil(std::string_view& rest, std::string_view end) {
     const auto at = rest.find(end);
     if (at == std::string_view::npos)

@@ -11,8 +11,8 @@ namespace {
 
 using message::Kind;
 
-/// So many more rows and events are read than the log has datagrams, because some arrive after the log was
-/// read and before the databases are.
+/// How many more rows and events are read than the log has datagrams. Some datagrams arrive after the log was
+/// read and before the databases are read.
 constexpr std::int64_t SLACK = 1000;
 
 bool IsOpenEvent(const Entry& entry) {
@@ -71,9 +71,9 @@ void Outcomes::Resolve(Pairing& pairing) {
         CountSince(pairing);
 }
 
-/// Decides about the events that arrived before the first reading. For them it is not known which number of
-/// stored events belongs to which datagram. When a module has stored at least as many events as the log has
-/// datagrams of it, and no line of the log says that an event could not be kept, all of them were stored.
+/// Decides about the events that arrived before the first reading. For such an event, it is not known how
+/// many events its module had stored before it. When a module has stored at least as many events as the log
+/// has datagrams of it, and no line of the log says that an event could not be kept, all of them were stored.
 void Outcomes::CountBefore(Pairing& pairing) {
     if (pairing.AnalyticsFailures() > 0)
         return;

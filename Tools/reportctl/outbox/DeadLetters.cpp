@@ -56,8 +56,8 @@ std::int64_t PutBack(SQLite::Database& database, const std::string& letters, con
 } // namespace
 
 std::int64_t RetryAll(SQLite::Database& database) {
-    // Only as many as there are now, so that events that the collector refuses again meanwhile are not
-    // retried.
+    // Puts back as many as there are now, the oldest first. Events that the collector refuses again meanwhile
+    // are not retried.
     auto left = database.execAndGet("select count(*) from dead_letter").getInt64();
     std::int64_t all = 0;
     for (std::int64_t count = 1; count > 0 && left > 0; left -= count) {

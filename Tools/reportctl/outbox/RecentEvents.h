@@ -14,7 +14,7 @@
 
 namespace reportctl::outbox {
 
-/// The part of a report that the event made of it holds.
+/// The parts of a report that its event in the outbox holds.
 struct EventContent {
     std::string eventID;
     std::string value; ///< empty, or JSON

@@ -18,7 +18,7 @@ struct Judgement {
 /// exists.
 ///
 /// It is an error when a report would not arrive where its sender wants it, because the sender would not
-/// learn of the loss. Everything else is a warning.
+/// learn of the loss.
 Judgement Judge(const std::string& text);
 
 /// Judges a text that is too long for a datagram, of which only the length is known.

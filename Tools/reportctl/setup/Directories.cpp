@@ -33,8 +33,8 @@ struct Kind {
 constexpr Kind PRIVATE{PRIVATE_MODE, PRIVATE_MODE, O_DIRECTORY | O_RDONLY | O_CLOEXEC};
 constexpr Kind SHARED{SHARED_MODE, READABLE_MODE, O_DIRECTORY | O_RDONLY | O_CLOEXEC | O_NOFOLLOW};
 
-/// Changes the mode through a descriptor, so that only a directory is changed, and a symbolic link only where
-/// `openFlags` allow one.
+/// Changes the mode through a descriptor, so that nothing but a directory is changed, and so that `openFlags`
+/// decide whether a symbolic link is followed.
 void SetMode(const std::string& path, mode_t mode, int openFlags) {
     const SystemTool::IO::Descriptor directory(::open(path.c_str(), openFlags));
     if (!directory.IsOpen() || ::fchmod(directory.Number(), mode) != 0)

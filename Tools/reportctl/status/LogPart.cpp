@@ -17,7 +17,7 @@ constexpr std::uintmax_t MOST_READ = std::uintmax_t{1024} * 1024;
 constexpr std::size_t MOST_SHOWN = 5;
 constexpr std::int64_t RECENT_MS = 600'000;
 
-/// The place in the service that logs the outbox's failures, and that a failure is over.
+/// The place in the service that logs when the outbox has a failure, and when the failure is over.
 constexpr std::string_view OUTBOX_SITE = "Metrik/MetrikWorker:21 FailCallBackFun";
 
 constexpr std::size_t STAMP_BYTES = 23; // 2026-11-20 10:15:30.123

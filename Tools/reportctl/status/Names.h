@@ -18,7 +18,7 @@ inline constexpr unsigned Place(ReportLedger::Outcome outcome) {
     return static_cast<unsigned>(outcome);
 }
 
-/// All counters except those of the refused reports.
+/// The counters that have a name, except those of the refused reports.
 inline constexpr std::array COUNTERS{
     Name{ReportLedger::RECEIVED, "received", "received", "Datagrams that the service took from its socket."},
     Name{ReportLedger::RECEIVED_BYTES, "receivedBytes", "received_bytes", "Bytes of these datagrams."},

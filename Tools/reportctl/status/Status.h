@@ -30,7 +30,9 @@ struct Service {
     std::optional<std::string> buildId;
     std::optional<PortHolder> portHolder;
     std::optional<std::string> otherUser; ///< The user whose service holds the machine's lock instead.
-    bool hasLogger = false;               ///< The process has loaded it, or its file is beside the program.
+    /// Whether the process has loaded the plug-ins. When that is not known, for example because nothing runs:
+    /// whether their files are beside the program.
+    bool hasLogger = false;
     bool hasStore = false;
     bool hasSdk = false;
 };

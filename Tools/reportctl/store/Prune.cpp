@@ -116,8 +116,8 @@ private:
     /// estimate.
     bool IsEnough() { return m_rule.keepBytes && BytesInUse(m_database) <= *m_rule.keepBytes; }
 
-    /// The most ids that the next batch may take. With keepBytes, no more than are too many if all rows have
-    /// the same size.
+    /// The most ids that the next batch may take. With keepBytes, it is the number of rows that are too many
+    /// if all rows have the same size.
     std::int64_t MostFrom(IdRange left) {
         const auto ids = left.end - left.first;
         return m_rule.keepBytes ? RowsOverSize(m_database, ids, *m_rule.keepBytes) : ids;

@@ -7,7 +7,7 @@
 
 namespace reportctl::store {
 
-/// The part of a report that its row in the store holds.
+/// The parts of a report that its row in the store holds.
 struct RowContent {
     std::string eventID;
     std::string value;

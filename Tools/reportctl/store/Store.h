@@ -26,8 +26,8 @@ namespace reportctl::store {
 /// would make it.
 bool EnsureStore(terminal::Worklog& log, const std::string& path, bool compact);
 
-/// Throws std::runtime_error when there is no store at the path, with the command that makes it, or when this
-/// user may not see the path.
+/// Throws std::runtime_error when there is no store at the path, or when this user may not see the path. The
+/// message about a missing store names the command that makes it.
 void RequireStore(const std::string& path);
 
 /// Runs `work`. When SQLite reports an error, the path of the database is put before its text, because

@@ -29,7 +29,7 @@ std::string DirectoryOf(const std::string& path) {
 }
 
 /// Ends the program as SIGPIPE does by default: the reader closed the pipe because it has read enough, which
-/// is no failure. We raise the signal here, because a library that this program links has it ignored.
+/// is no failure. We raise the signal here, because a library that this program links sets it to be ignored.
 [[noreturn]] void EndByTheClosedPipe() {
     std::signal(SIGPIPE, SIG_DFL);
     std::raise(SIGPIPE);
