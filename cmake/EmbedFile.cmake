@@ -1,5 +1,6 @@
-# ssr_embed_file(<target> <name> <file>): gives the target a function `std::string_view <name>()` in the namespace `embedded`
-# that returns the file's bytes, so that a program needs no data file beside it. Declare the function where it is used.
+# ssr_embed_file(<target> <name> <file>): gives the target a function `std::string_view <name>()` in the
+# namespace `embedded` that returns the file's bytes. So a program needs no data file. Declare the function
+# where it is used.
 function(ssr_embed_file target name file)
     set(source ${CMAKE_CURRENT_BINARY_DIR}/embedded/${name}.cpp)
     add_custom_command(OUTPUT ${source} DEPENDS ${file} ${PROJECT_SOURCE_DIR}/cmake/EmbedFileStep.cmake

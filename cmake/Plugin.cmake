@@ -1,14 +1,15 @@
 # ssr_add_plugin(<target> <library name> <source>...)
 #
 # A plug-in is a shared library that is opened at run time by its exact file name, lib<name>.dylib on every
-# platform. It exports CreateModule and DestoryModule and nothing else, so that two plug-ins that link the same static
-# library never share state by accident. 
+# platform. It exports CreateModule and DestoryModule and nothing else, so that two plug-ins that link the
+# same static library never share state by accident.
 #
-# Its code outlives its user: once opened, a plug-in stays in memory until the process ends. exit() destroys the last
-# loaders while other threads may still be inside a plug-in: in WriteLog, in a statement, in an upload that hangs in the
-# file system or in libcurl's resolver. To wait for them could take for ever. So a plug-in leaves objects that are in use
-# where they are, and the linker's flag keeps the code. (On macOS no flag is needed: dyld never unloads an image with
-# thread-local variables, and each of the plug-ins has some.)
+# The code of a plug-in stays in memory: once opened, a plug-in is never unloaded before the process ends.
+# exit() destroys the last loaders while other threads may still run code of a plug-in: in WriteLog, in a
+# statement, in an upload that hangs in the file system or in libcurl's resolver. To wait for these threads
+# could take for ever. So a plug-in does not destroy objects that are in use, and the linker's flag below
+# keeps the code. (macOS needs no flag: it never unloads a library with thread-local variables, and each of
+# the plug-ins has some.)
 function(ssr_add_plugin target name)
     add_library(${target} MODULE ${ARGN})
     target_link_libraries(${target} PRIVATE ssr_options ssr_package_note)
@@ -20,7 +21,7 @@ function(ssr_add_plugin target name)
             -Wl,--version-script=${exports} -Wl,--no-undefined -Wl,-z,nodelete)
         set_property(TARGET ${target} APPEND PROPERTY LINK_DEPENDS ${exports})
         if(SSR_SANITIZE)
-            # The sanitizer's runtime is the program's; the linker cannot see it from here.
+            # The sanitizer's runtime is in the program, and the linker does not see it here.
             target_link_options(${target} PRIVATE -Wl,-z,undefs)
         endif()
     endif()

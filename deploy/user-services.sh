@@ -1,6 +1,6 @@
-# For the maintainer scripts of packages: starts users' services again, or stops them. Sourced; any POSIX shell, and root.
-# Talks to each user's service manager as that user, by its own socket: that needs no system bus, and a user who put
-# something else in its place deceives nobody else.
+# For the maintainer scripts of packages: restarts users' services, or stops them. To be sourced, by any POSIX
+# shell, as root. It talks to each user's service manager as that user, through the manager's own socket. So
+# it needs no system bus, and a user who puts something else in the socket's place deceives only themselves.
 
 ssr_unit=sync-service-report.service
 ssr_program=/usr/lib/sync-service-report/SyncServiceReport
@@ -13,13 +13,13 @@ ssr_each_manager() {
         ssr_uid=${ssr_runtime##*/}
         ssr_gid=$(getent passwd "$ssr_uid" | cut -d: -f4)
         [ -n "$ssr_gid" ] || continue
-        # A manager that hangs must not keep the package from being installed.
+        # A manager that hangs must not stop the installation of the package.
         timeout 20 setpriv --reuid "$ssr_uid" --regid "$ssr_gid" --init-groups \
             env XDG_RUNTIME_DIR="$ssr_runtime" systemctl --user --quiet "$@" </dev/null || true
     done
 }
 
-# ssr_processes: the ids of processes that run the service as it was installed, also when its file has been replaced.
+# ssr_processes: the ids of processes that run the installed service, also when its file has been replaced.
 ssr_processes() {
     for ssr_process in /proc/[0-9]*; do
         case $(readlink "$ssr_process/exe" 2>/dev/null || true) in
@@ -31,7 +31,8 @@ ssr_processes() {
 restart_user_services() {
     ssr_each_manager daemon-reload
     ssr_each_manager try-restart "$ssr_unit"
-    # What no manager looks after was started by the suite, which may not start it again before the next login.
+    # A process that no manager controls was started by the suite. The suite may not start it again before the
+    # next login, so it is not stopped here.
     for ssr_process in $(ssr_processes); do
         case $(readlink "/proc/$ssr_process/exe" 2>/dev/null || true) in
         *' (deleted)' | *.dpkg-*)

@@ -1,7 +1,7 @@
-# For ./run: sends the service one message of each kind and shows where each ended, as it is found in the store, the
-# outbox and the log. Sourced; needs bash.
+# For ./run: sends the service one message of each kind, and shows where each ended, as found in the store,
+# the outbox and the log. To be sourced; needs bash.
 
-# wait_for COMMAND...: until the command succeeds, for ten seconds at the most.
+# wait_for COMMAND...: repeats the command until it succeeds, for ten seconds at most.
 wait_for() {
     local tries
     for ((tries = 0; tries < 200; tries++)); do
@@ -17,25 +17,28 @@ send() {
     printf '%s' "$1" >/dev/udp/127.0.0.1/9997
 }
 
-# in_log TEXT: the log's lines with that text; fails when there is none. Rotated files are part of the log.
+# in_log TEXT: prints the log's lines with that text; fails when there is none. Rotated files are part of the
+# log.
 in_log() {
     grep -hF -- "$1" "$log_directory"/Report*.log
 }
 
-# whole_log: all of it, the oldest line first: the rotated files in the order of their numbers, then the live one.
+# whole_log: prints the whole log, the oldest line first: the rotated files in the order of their numbers,
+# then the live file.
 whole_log() {
     local file number
     for file in "$log_directory"/Report_*.log; do
         number=${file##*_}
         printf '%s %s\n' "${number%.log}" "$file"
     done | sort -n | cut -d ' ' -f 2- | while read -r file; do
-        cat "$file" 2>/dev/null || true # none was rotated, or this one was deleted meanwhile
+        cat "$file" 2>/dev/null || true # there may be no rotated file, or this one was just deleted
     done
     cat "$log_directory"/Report.log
 }
 
-# line_after MESSAGE TEXT: the first line of the log with that text behind the line that logs the message's arrival.
-# Reads all of it: a reader that left early would fail the writer. Through the environment, since -v reads escapes.
+# line_after MESSAGE TEXT: prints the first line of the log with that text after the line that logs the
+# message's arrival. It reads the whole log, because the writer would fail if the reader stopped early. The
+# texts are passed in the environment, because awk interprets escapes in -v.
 line_after() {
     whole_log | message="Recv] $1" text=$2 awk \
         'seen && !found && index($0, ENVIRON["text"]) { print; found = 1 } index($0, ENVIRON["message"]) { seen = 1 }'
@@ -66,14 +69,15 @@ found_quietly() {
     [ -n "$("$@" 2>/dev/null)" ]
 }
 
-# can_be_sent_back TEXT: whether it may stand as it is in JSON, in a format string, which the service takes each message
-# for when it logs it, and in an SQL literal.
+# can_be_sent_back TEXT: whether the text can be used unchanged in JSON, in a format string (the service logs
+# each message as one) and in an SQL literal.
 can_be_sent_back() {
     [[ $1 != *[\"\\%\'[:cntrl:]]* ]]
 }
 
-# send_and_show DATA_DIRECTORY STARTED: true when each message ended where it belongs. STARTED is "yes" when nobody else
-# has been using the service. Otherwise a line that does not name its message may be another message's.
+# send_and_show DATA_DIRECTORY STARTED: true when each message ended where it belongs. STARTED is "yes" when
+# this script started the service, so that no other program has sent anything. Otherwise a line that does not
+# name its message may belong to another program's message.
 send_and_show() {
     local store=$1/database/Report.db outbox=$1/database/MetrikOutbox.db
     local log_directory=$1/log/metrik
@@ -88,7 +92,7 @@ send_and_show() {
         where eventID='DEMO|$id'"
     found "log " in_log "$message"
 
-    # An event that a collector took has left the outbox; the module's count tells that it was there.
+    # An event that a collector accepted has left the outbox. The module's counter shows that it was there.
     local before
     before=$(query "$outbox" "select last_sequence from module where module_id='A759'")
     message='{"eventID":"A759|'$id'","value":{"page":"start"},"createTime":'${id:0:10}'}'
@@ -103,7 +107,7 @@ send_and_show() {
     send "$message"
     found "log " in_log "Add metrik module :DEMO$id"
 
-    # With the user and version that stand in the row above: what really is so must not change.
+    # Sends the user and version of the row above, because the real values must not change.
     local user version
     user=$(query "$store" "select extData4 from OperLog where eventID='DEMO|$id'")
     version=$(query "$store" "select extData3 from OperLog where eventID='DEMO|$id'")

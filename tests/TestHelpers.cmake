@@ -1,6 +1,7 @@
 include(GoogleTest)
 
-# ssr_put_beside(<program> <folder> [<plug-in>...]): builds the program into that folder and puts the plug-ins beside it.
+# ssr_put_beside(<program> <folder> [<plug-in>...]): builds the program into that folder and copies the
+# plug-ins there.
 function(ssr_put_beside program folder)
     set_target_properties(${program} PROPERTIES RUNTIME_OUTPUT_DIRECTORY ${folder})
     foreach(plugin IN LISTS ARGN)
@@ -11,8 +12,9 @@ function(ssr_put_beside program folder)
     endforeach()
 endfunction()
 
-# ssr_precompile_test_headers(<program>): compiles what nearly every test includes once for the program, where that is less
-# work than to compile it for each of its files: two seconds of the three that a test's file took.
+# ssr_precompile_test_headers(<program>): compiles the headers that nearly every test includes once for the
+# whole program, when that is less work than to compile them for each file. A test's file took three seconds,
+# and two of them were for these headers.
 function(ssr_precompile_test_headers program)
     get_target_property(sources ${program} SOURCES)
     list(LENGTH sources count)
@@ -22,8 +24,9 @@ function(ssr_precompile_test_headers program)
     target_precompile_headers(${program} PRIVATE <chrono> <filesystem> <fstream> <functional> <map> <optional> <string>
         <thread> <vector> <gmock/gmock.h> <gtest/gtest.h>)
     if(CMAKE_CXX_COMPILER_ID STREQUAL "GNU")
-        # -fpch-preprocess: without it, ccache does not cache such a file. With a precompiled header, GCC 12 takes some
-        # inlined copies of std::string for reads and writes out of bounds; the sources of what ships keep the warnings.
+        # Without -fpch-preprocess, ccache does not cache such a file. With a precompiled header, GCC 12
+        # wrongly reports some inlined copies of std::string as reads and writes out of bounds. The sources
+        # that ship keep these warnings.
         target_compile_options(${program} PRIVATE -fpch-preprocess -Wno-array-bounds -Wno-restrict -Wno-stringop-overflow
             -Wno-stringop-overread)
     endif()
@@ -32,11 +35,12 @@ endfunction()
 # ssr_add_test(<name> [SANDBOX] [EARLY] [SOURCES <file>...] [LINK <target>...] [FAKES <target>...]
 #     [LABELS <label>...] [SERIAL <filter>])
 #
-# A test program in a folder of its own. A program loads its plug-ins from its own folder, so the FAKES, plug-ins under
-# the real ones' file names, are put there; a plug-in that is not named is missing for that program. With SANDBOX, each
-# test runs with port 9997 and the pid file's directory to itself (see in-sandbox). EARLY tests wait for seconds (a lock, a
-# time-out), so they start before the others, which work meanwhile. The tests that the filter SERIAL names, in GoogleTest's
-# words, have the machine to themselves: what they say about time would not hold beside others.
+# A test program in a folder of its own. A program loads its plug-ins from its own folder, so the FAKES are
+# put there: plug-ins with the file names of the real ones. A plug-in that is not named is missing for that
+# program. With SANDBOX, each test has port 9997 and the pid file's directory for itself (see in-sandbox).
+# EARLY tests wait for seconds (for a lock, for a time-out), so they start before the others, which run
+# meanwhile. The filter SERIAL, in GoogleTest's syntax, names tests that run alone: what they measure would be
+# wrong beside other tests.
 function(ssr_add_test name)
     cmake_parse_arguments(arg "SANDBOX;EARLY" "SERIAL" "SOURCES;LINK;FAKES;LABELS" ${ARGN})
     set(folder ${PROJECT_BINARY_DIR}/tests/${name})
@@ -45,7 +49,7 @@ function(ssr_add_test name)
     ssr_precompile_test_headers(${name})
     ssr_put_beside(${name} ${folder} ${arg_FAKES})
     if(arg_SANDBOX)
-        # The launcher of the test's program, in CMake's words.
+        # CMake's name for the program that starts the test's program.
         set_property(TARGET ${name} PROPERTY CROSSCOMPILING_EMULATOR ${PROJECT_SOURCE_DIR}/tests/in-sandbox)
     endif()
     set(discovery TEST_PREFIX ${name}. WORKING_DIRECTORY ${folder} DISCOVERY_TIMEOUT 60)
