@@ -39,12 +39,13 @@ def measured(options):
             result = measures.MEASURES[measure][2](subject, chosen, bar.tell)
             report["results"].setdefault(measure, {})[subject] = result
     bar.finish()
-    return json.loads(json.dumps(report))  # with texts for keys, as it is read again from a file
+    return json.loads(json.dumps(report))  # keys become texts, as when it is read from a file
 
 
 def main():
+    # This also ends the programs that it has started.
     options = arguments()
-    signal.signal(signal.SIGTERM, lambda *_: sys.exit("ended by a signal"))  # and ends what it has started
+    signal.signal(signal.SIGTERM, lambda *_: sys.exit("ended by a signal"))
     report = json.loads(options.file.read_text()) if options.file else measured(options)
     output.write(report)
     print(output.text(report))

@@ -6,7 +6,8 @@ import time
 import procfs
 import runs
 
-RATE = 100_000  # fills the queue with a million before the plug-in has waited for the lock too long (docs/Database.md)
+# Fast enough to queue a million reports before the plug-in gives up waiting for the lock (docs/Database.md).
+RATE = 100_000
 
 
 def measure(subject_class, reports):

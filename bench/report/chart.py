@@ -7,7 +7,7 @@ import tables
 WIDTH, HEIGHT = 760, 420
 LEFT, RIGHT, TOP, BOTTOM = 70, 40, 48, 60
 COLOURS = {"service": "#2f7ed8", "analytics": "#2aa198", "daemon": "#e07b39", "bare": "#8a8a8a"}
-# Grey that is read on white and on black, and no ground: the page's shows through.
+# A grey that can be read on white and on black. The chart has no background of its own.
 STYLE = ("text{font:13px sans-serif;fill:#7f7f7f}.grid{stroke:#7f7f7f;stroke-opacity:.25}"
          ".axis{stroke:#7f7f7f}polyline{fill:none;stroke-width:2}")
 

@@ -15,11 +15,11 @@ def measure(subject_class, rate, seconds):
         watcher = subprocess.Popen([PROGRAMS / "bench_watcher", subject.database(), "--query", subject.watch,
                                     "--stamps", seen, "--count", str(count)], stdout=subprocess.PIPE, text=True)
         try:
-            watcher.stdout.readline()  # it has said that it watches
+            watcher.stdout.readline()  # its first line says that it watches
             sender = runs.send(subject, count, rate, sent)
             watched = json.loads(watcher.communicate()[0])
         finally:
-            watcher.kill()  # unless it has ended
+            watcher.kill()  # no effect when it has ended
             watcher.wait()
         return {"rate": rate, "offered": count / sender["seconds"], "sent": count, "seen": watched["found"],
                 "look_ms_p50": watched["gap_ns_p50"] / 1e6, "look_ms_p99": watched["gap_ns_p99"] / 1e6,

@@ -115,7 +115,7 @@ def rest(_, plan, __):
                 "resident_bytes": procfs.memory_bytes(service.process.pid, "VmRSS")}
 
 
-MEASURES = {  # name: of what, seconds for one, how
+MEASURES = {  # name: the subjects, the seconds for one subject, the function
     "rest": (("service",), lambda plan: plan.rest_seconds, rest),
     "baselines": (("sqlite",), lambda plan: sum(rows for _, rows in plan.baselines) / 1e5, bare_sqlite),
     "floods": (tuple(SUBJECTS), lambda plan: plan.flood_reports / 60_000 + 2, flood),

@@ -6,21 +6,21 @@ import dataclasses
 class Plan:
     flood_reports: int = 1_000_000
     probe_seconds: float = 4
-    probes: int = 10             # as many as it takes, about; for the bar
+    probes: int = 10             # about as many as are needed; for the progress bar
     confirm_seconds: float = 20
-    lag: float = 0.05            # of a run's time, in which the last row may come after the last report
-    tries: int = 2               # at each rate: a loss is the subject's doing when it happens again
-    exactness: float = 1.05      # the search ends when the last rate without loss and the first with one are so close
+    lag: float = 0.05            # the last row may come this part of the run's time after the last report
+    tries: int = 2               # at each rate: only a loss that happens again is the subject's fault
+    exactness: float = 1.05      # the search ends when the rates without and with loss are this close
     searched: tuple = ("service", "analytics", "daemon", "bare")
     latency_seconds: float = 20
     latency_rates: tuple = (10, 100, 1_000, 20_000)
-    baselines: tuple = (("1", 100_000), ("1000", 1_000_000), ("1000 prepared", 1_000_000))  # rows to a commit, rows
+    baselines: tuple = (("1", 100_000), ("1000", 1_000_000), ("1000 prepared", 1_000_000))  # commit after, rows
     rows_before: tuple = (0, 1_000_000, 5_000_000)
     growth_reports: int = 500_000
-    growth_rounds: int = 3       # in turn, so that a disturbance meets all sizes; the median counts
+    growth_rounds: int = 3       # all sizes in turn, so that a disturbance affects each; the median counts
     queued_reports: int = 1_000_000
     rest_seconds: float = 10
-    repetitions: int = 5         # of the benchmarks of single parts; the least counts
+    repetitions: int = 5         # of the benchmarks of single parts; the smallest result counts
     repetition_seconds: float = 0.5
 
 

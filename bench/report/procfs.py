@@ -5,7 +5,7 @@ import re
 import subprocess
 import time
 
-PORT = ": 0100007F:270D "  # 127.0.0.1:9997, as the kernel's tables have it
+PORT = ": 0100007F:270D "  # 127.0.0.1:9997, as the kernel writes it in its tables
 
 
 def _line_of_the_port():
@@ -57,7 +57,7 @@ def waits_for_disk(pid):
     return any(text.rpartition(")")[2].split()[0] == "D" for text in texts if text)
 
 
-# Of x86-64 and of arm64: the calls in which a thread waits for a socket.
+# The system calls in which a thread waits for a socket, on x86-64 and on arm64.
 _SOCKET_WAITS = {"x86_64": {"7", "23", "45", "47", "232", "270", "271", "281", "299"},
                  "aarch64": {"22", "72", "73", "207", "212", "243"}}[os.uname().machine]
 

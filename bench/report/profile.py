@@ -9,9 +9,9 @@ import measures
 import runs
 
 SECONDS = 5
-LEAST_PART = 0.03     # of a thread's samples; a function with fewer is not told
-LEAST_SAMPLES = 100   # a thread with fewer did nothing to speak of
-# What the code calls by name; the inside of the libraries and of the kernel is theirs.
+LEAST_PART = 0.03     # of a thread's samples; functions with fewer are left out
+LEAST_SAMPLES = 100   # a thread with fewer did almost nothing
+# The functions that our code calls. Functions inside the libraries and the kernel are left out.
 TOLD = re.compile(r"(UDPServer|SyncServiceReport|BoostLogger|OrvekSqlite|Metrik|SystemTool|Poco|fmt::v\d+::vformat"
                   r"|boost::(log|basic_format)|sqlite3_(step|exec|prepare|bind|wal)|rapidjson::GenericReader"
                   r"|do_syscall_64|__x64_sys_)")

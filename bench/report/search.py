@@ -6,9 +6,9 @@ search would find how much memory a subject takes.
 import runs
 
 FIRST_RATE = 50_000
-LEAST_RATE = 1_000   # below, nothing is searched
-STEP_DOWN = 1.05     # at least, when the long run does not keep up where the short ones did
-WORTH_IT = 1.1       # a sender that doubles its pace and does not get so much faster is the limit itself
+LEAST_RATE = 1_000   # no lower rate is tried
+STEP_DOWN = 1.05     # the smallest step down when the long run fails at a rate at which short runs succeeded
+WORTH_IT = 1.1       # the sender is the limit when its doubled rate makes it less than this many times as fast
 
 
 def highest_rate(subject_class, plan, tell):

@@ -19,15 +19,15 @@ class Subject:
     name = ""
     title = ""
     event = "B100|10001"
-    process = None       # not started yet
-    longest_pause = 1.0  # in seconds, while it has work
+    process = None       # until it is started
+    longest_pause = 1.0  # in seconds: the longest time without progress while there is work
     watch = "select id, createTime from OperLog where id > ?1 order by id"  # the new rows, for the watcher
 
     def __enter__(self):
         self.directory = pathlib.Path(tempfile.mkdtemp(prefix="bench.", dir=ROOT / "build"))
         try:
             self.prepare()
-            os.sync()  # what this and the run before left to write is no part of the run
+            os.sync()  # writes what this and earlier runs left, so that the measured run does not
             self.start()
         except BaseException:
             if self.process:
@@ -44,7 +44,8 @@ class Subject:
         pass
 
     def start(self):
-        errors = self.directory / "errors"  # a file: a pipe that nobody reads would hold the program up once it is full
+        # A file, because a full pipe without a reader would stop the program.
+        errors = self.directory / "errors"
         with errors.open("w") as file:
             self.process = subprocess.Popen(self.command(), env=self.environment(), stdout=file, stderr=file)
         begin = time.monotonic()

@@ -6,7 +6,7 @@ import subprocess
 
 from subject import PROGRAMS, ROOT, Subject
 
-# Rows as the service makes them of the sender's reports.
+# Makes rows like those that the service makes of the sender's reports.
 FILL = """with recursive n(i) as (select 0 union all select i + 1 from n limit :rows)
           insert into OperLog (eventID, value, createTime, pType, extData3, extData4) select 'B100|10001',
           '{"button":"save","page":"editor","count":3,"ratio":1.5,"text":"a text as people write it"}',
@@ -56,7 +56,8 @@ class FilledService(Service):
         super().prepare()
         connection = sqlite3.connect(self.database(), isolation_level=None)
         connection.execute(FILL, {"rows": self.rows_before})
-        connection.execute("pragma wal_checkpoint(truncate)")  # what is left to write would be the run's to write
+        # Otherwise the measured run would have to write the rows back.
+        connection.execute("pragma wal_checkpoint(truncate)")
         connection.close()
 
     def stored(self):
@@ -73,7 +74,7 @@ class Analytics(Service):
         return self.directory / "hublink/database/MetrikOutbox.db"
 
     def refused(self):
-        return None  # the outbox says why it refuses events, not how many
+        return None  # the outbox says why it refuses events, but not how many
 
     def stored(self):
         return self.query("select stored from outbox_status") if self.last_write_ns() else 0
@@ -82,7 +83,7 @@ class Analytics(Service):
 class Daemon(Subject):
     name = "daemon"
     title = "syslog-ng, rows to SQLite"
-    longest_pause = 3.0  # after a statement that failed it waits for a second before it tries again
+    longest_pause = 3.0  # after a failed statement, it waits a second before it tries again
 
     @staticmethod
     def is_installed():

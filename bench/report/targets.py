@@ -7,7 +7,7 @@ class Target(NamedTuple):
     text: str
     limit: float
     at_least: bool
-    value: Callable  # of the results; None or KeyError when they lack a part of it
+    value: Callable  # gets the results; None or KeyError when a part of them is missing
     unit: str = "×"
 
 
@@ -77,7 +77,7 @@ def _verdict(target, results):
     limit = f"{'at least' if target.at_least else 'at most'} {target.limit:g}{target.unit}"
     try:
         value = target.value(results)
-    except (KeyError, TypeError):  # a part of it was not measured, or there was no rate without loss
+    except (KeyError, TypeError):  # a part was not measured, or there was no rate without loss
         return Verdict(target.text, limit, "not measured", None)
     reached = value >= target.limit if target.at_least else value <= target.limit
     return Verdict(target.text, limit, f"{value:,.4g}{target.unit}", reached)

@@ -215,7 +215,7 @@ class Chart(unittest.TestCase):
         for x, y in points:
             self.assertTrue(chart.LEFT <= x <= chart.WIDTH - chart.RIGHT, x)
             self.assertTrue(chart.TOP <= y <= chart.HEIGHT - chart.BOTTOM, y)
-        for (_, y), part in zip(points, (0, 0.01, 1)):  # at 100,000/s the median of three
+        for (_, y), part in zip(points, (0, 0.01, 1)):  # at 100,000/s, the median of three
             self.assertAlmostEqual(y, chart._y(part), 1)
 
     def test_ends_each_line_with_the_subjects_flood(self):

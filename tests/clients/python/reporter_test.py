@@ -96,7 +96,7 @@ class ARestart(Reporting):
                 with later(seconds):
                     self.expect(Result.SENT)
         told = ["updateOpenID", "init"]
-        # The reporter has not seen a system without a table before, so it begins with both.
+        # This is the first time that the reporter finds no table, so it announces both first.
         self.assertEqual(self.listener.kinds(), told + ["A100|1"] * 3 + told + ["A100|1"] * 2 + told + ["A100|1"])
 
     def test_that_the_system_tells_late_costs_no_event(self):
@@ -187,7 +187,7 @@ class AFullBuffer(Reporting):
     def test_is_told_and_never_waited_for(self):
         if not shutil.which("tc"):
             self.skipTest("needs tc")
-        # A network that takes a byte a second, so that what is sent stays in the sender's buffer.
+        # A network that passes a byte a second, so that sent datagrams stay in the sender's buffer.
         tc = ["tc", "qdisc", "add", "dev", "lo", "root", "tbf", "rate", "8bit", "burst", "4000", "limit", "10000000"]
         with Listener():
             self.expect(Result.SENT)
@@ -226,7 +226,7 @@ class AnErrorOfTheSystem(Reporting):
         with Listener() as listener, tempfile.TemporaryFile() as file:
             self.expect(Result.SENT)
             number = self.reporter._socket.fileno()
-            os.dup2(file.fileno(), number)  # a program that closed all of its files, and opened others
+            os.dup2(file.fileno(), number)  # as in a program that closed all of its files and opened others
             self.addCleanup(os.close, number)
             self.expect(Result.SENT)
             self.assertNotEqual(self.reporter._socket.fileno(), number)
@@ -308,11 +308,11 @@ class AFork(Reporting):
 
 class Threads(Reporting):
     THREADS, ROUNDS = 8, 100
-    EVENTS = Listener.AT_ONCE // THREADS  # of a thread in a round
+    EVENTS = Listener.AT_ONCE // THREADS  # each thread's events in a round
 
     def test_send_each_event_once_and_the_announcement_first(self):
         self.addCleanup(sys.setswitchinterval, sys.getswitchinterval())
-        sys.setswitchinterval(1e-6)  # so that threads meet everywhere
+        sys.setswitchinterval(1e-6)  # so that threads switch at every place
         received, self.turn = [], threading.Barrier(self.THREADS + 1)
         workers = [threading.Thread(target=self.report, args=(name,)) for name in range(self.THREADS)]
         with Listener() as listener:
@@ -326,7 +326,7 @@ class Threads(Reporting):
                 worker.join()
         sent = self.ROUNDS * self.EVENTS
         self.assertEqual(received[0], "init")
-        for name in range(self.THREADS):  # the events of one thread are in their order
+        for name in range(self.THREADS):  # the events of one thread must be in order
             self.assertEqual([kind for kind in received if kind.startswith(f"A100|{name}.")],
                              [f"A100|{name}.{number}" for number in range(sent)])
         self.assertEqual(len(received), 1 + self.THREADS * sent)

@@ -11,7 +11,7 @@ from hublink_report import Json, Module, Reporter, Result
 
 PROGRAMS, CASES = sys.argv[1], int(sys.argv[2])
 SEED = random.randrange(2**32)
-AT_ONCE_BYTES = 100_000  # what the service's buffer surely holds, with the system's own bookkeeping
+AT_ONCE_BYTES = 100_000  # the service's buffer holds this much in any case, with what the system adds
 
 PIECES = ["'", "''", "\"", "\\", "%", "%s", "%1%", "\\u0027", "\\'", "eventID", '"eventID":"A1|1"', "|", "\n",
           "\r\n", "\t", "\x01", "\x1f", "\x7f", "\u00e4", "\u2028", "\ufeff", "\uffff", "\U0001f600", "\U0010ffff",
@@ -34,11 +34,12 @@ class Cases:
         if self.random.random() < 0.01:
             pieces.append(self.random.choice(BROKEN))
         if self.random.random() < 0.3:
-            low, high = self.random.choice([(1, 0xd800), (0xe000, 0x110000)])  # all but the surrogates
+            low, high = self.random.choice([(1, 0xd800), (0xe000, 0x110000)])  # all except the surrogates
             pieces.append(chr(self.random.randrange(low, high)))
         self.random.shuffle(pieces)
         if longest > 20 and self.random.random() < 0.02:
-            pieces.append("\u00e4" * self.random.randrange(4900, 5200))  # to both sides of the longest datagram
+            # Some longer than the longest datagram, some shorter.
+            pieces.append("\u00e4" * self.random.randrange(4900, 5200))
         if self.random.random() < 0.01:
             pieces *= self.random.randrange(1, 400)
         return "".join(pieces)
@@ -183,7 +184,7 @@ class Sent(unittest.TestCase):
         self.assertGreater(len(self.kept), CASES / 20, counts)
         self.assertEqual([result for result in (Result.NOBODY_LISTENS, Result.OTHER_USERS_SERVICE, Result.WOULD_BLOCK,
                                                 Result.SYSTEM_ERROR) if counts[result]], [])
-        if CASES >= 10_000:  # fewer may miss one by chance
+        if CASES >= 10_000:  # fewer cases may miss one by chance
             self.assertEqual([result for result in (Result.TOO_LONG, Result.INVALID_TEXT, Result.INVALID_JSON,
                                                     Result.INVALID_EVENT_ID) if not counts[result]], [])
 
@@ -191,7 +192,7 @@ class Sent(unittest.TestCase):
         for case in self.results[Result.INVALID_TEXT]:
             self.assertTrue(any(broken(all_of(text)) for text in case[:2]), case)
         for case in self.results[Result.TOO_LONG]:
-            # A piece has at most six bytes for each of its own, behind two escapes.
+            # A byte of the text takes at most six bytes in the datagram, even after it was escaped twice.
             self.assertGreater(6 * len("".join(map(all_of, case[:2])).encode("utf-8", "replace")), 9000, case)
         for event_id, *_ in self.results[Result.INVALID_EVENT_ID]:
             module, bar, _ = event_id.partition("|")

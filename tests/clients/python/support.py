@@ -73,7 +73,7 @@ def listener_of_another_user():
     child = subprocess.Popen([sys.executable, "-c", script], stdin=subprocess.PIPE, stdout=subprocess.PIPE, text=True)
     child.stdout.readline()
     try:
-        yield lambda: child.communicate()[0].strip()  # ends it, and tells what it got
+        yield lambda: child.communicate()[0].strip()  # ends the child, and returns what it got
     finally:
         child.kill()
         child.wait()

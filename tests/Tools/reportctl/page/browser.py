@@ -24,7 +24,8 @@ class Browser:
         self._read, from_browser = os.pipe()
 
         def in_child():
-            # The browser reads commands from descriptor 3 and writes to 4. Both may be taken by the pipes themselves.
+            # The browser reads commands from descriptor 3 and writes answers to 4. The pipes themselves may
+            # have these numbers, so they are moved first.
             read, write = os.dup(to_browser), os.dup(from_browser)
             high_read, high_write = os.dup2(read, 100), os.dup2(write, 101)
             os.dup2(high_read, 3)
@@ -126,7 +127,7 @@ class Browser:
     def _holds(self, expression):
         try:
             return self.value(expression)
-        except RuntimeError:  # the page is being replaced right now
+        except RuntimeError:  # a new page is just being loaded
             return False
 
     def screenshot(self, path):

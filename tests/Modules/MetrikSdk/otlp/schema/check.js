@@ -2,8 +2,9 @@
 //
 //     node check.js <file with a body>...
 //
-// A body passes when the definition verifies it and when it comes back unchanged from its binary form: a member that
-// the definition does not know, or a value of another type than it wants, would be lost or changed on the way.
+// A body passes when the definition accepts it and when it is unchanged after a conversion to the binary form
+// and back. A member that the definition does not know would be lost in that, and a value of a wrong type would
+// change.
 // Exit code 0: all pass.
 
 'use strict';
@@ -22,7 +23,8 @@ function check(body) {
   assert.deepStrictEqual(plain(Message.toObject(decoded, { longs: String })), plain(body));
 }
 
-// Without what makes no difference: prototypes, the order of members, and empty lists, which the binary form leaves out.
+// Removes differences that do not matter: prototypes, the order of members, and empty lists, which the binary
+// form leaves out.
 function plain(value) {
   const isEmptyList = (member) => Array.isArray(member) && member.length === 0;
   return JSON.parse(JSON.stringify(value, (key, member) =>
