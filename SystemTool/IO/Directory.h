@@ -6,9 +6,8 @@
 namespace SystemTool::IO::Directory {
 
 /// The directory of the running executable, ending in a separator, so that a file name can be appended
-/// directly.
-/// "./" when the system does not tell where the executable is. The misspelling is part of the name: the
-/// suite's programs share it.
+/// directly. "./" when the system does not say where the executable is. The misspelling is part of the name:
+/// the suite's programs share it.
 std::string GetExcutableDirectory();
 
 /// Copies `in` to `out` and replaces each backslash by a slash. Returns false and leaves `out` unchanged for

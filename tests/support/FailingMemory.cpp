@@ -41,10 +41,10 @@ int FailingMemory::Failed() {
 }
 
 #if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
-#define HAS_HEAP_OF_A_SANITIZER // as gcc tells it
+#define HAS_HEAP_OF_A_SANITIZER // gcc's way to say it
 #elif defined(__has_feature)
 #if __has_feature(address_sanitizer) || __has_feature(thread_sanitizer)
-#define HAS_HEAP_OF_A_SANITIZER // as clang does
+#define HAS_HEAP_OF_A_SANITIZER // clang's way
 #endif
 #endif
 
