@@ -11,7 +11,7 @@
 namespace SyncServiceReport {
 
 /// Counts in the ledger what only the receiver sees: each datagram, also an empty or a cut one, and the
-/// datagrams that the kernel dropped. It also calls the ledger's Tick often enough.
+/// datagrams that the kernel dropped. It also calls the ledger's Tick, about once a second or more often.
 ///
 /// Threads: the receiving thread only.
 ///

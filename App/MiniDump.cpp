@@ -70,7 +70,7 @@ void MiniDump::EnableAutoStack(const std::string& logPath, const std::string& lo
     ::signal(SIGSEGV, OnStackCallBack);
 }
 
-// clang-tidy distrusts exit and strerror here. exit is intended, also while other threads run. The C
+// clang-tidy warns about exit and strerror here. exit is intended, also while other threads run. The C
 // library's strerror keeps a text of its own for each thread.
 // NOLINTBEGIN(concurrency-mt-unsafe)
 

@@ -40,7 +40,7 @@ public:
 
     /// Makes and initialises the destinations, binds the socket and starts both threads. False when an
     /// exception was caught; the steps before the exception stay done. A destination or a socket that does
-    /// not work throws none, so the result is true then.
+    /// not work throws no exception, so the result is true then.
     bool Start();
 
     void Stop();

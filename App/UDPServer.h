@@ -9,8 +9,8 @@
 #include <Poco/Runnable.h>
 #include <Poco/Thread.h>
 
-/// An observer of the receiver: gets the events that the texts do not show. All calls come on the receiving
-/// thread. An implementation must not throw and must not wait.
+/// An observer of the receiver: it gets the receiver's events that the texts do not show. All calls come on
+/// the receiving thread. An implementation must not throw and must not wait.
 class DatagramWatch {
 public:
     virtual ~DatagramWatch() = default;

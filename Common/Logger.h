@@ -15,7 +15,7 @@
 // would use the logger of one of them.
 
 /// Loads the logger plug-in. Each source file that logs has its own loader and its own logger. Only App/main
-/// configures its logger; all loggers of the process then write into that sink.
+/// configures its logger. All loggers of the process then write into that logger's sink.
 static SystemTool::ModuleLoader<SystemTool::IO::ILogger>
     g_LoggerLoader(SystemTool::IO::Directory::GetExcutableDirectory() + "libBoostLogger.dylib");
 

@@ -16,7 +16,7 @@ inline std::string Databases(const std::string& userData) {
     return Suite(userData) + "/database";
 }
 
-/// The local store.
+/// The file of the local store.
 inline std::string Store(const std::string& userData) {
     return Databases(userData) + "/Report.db";
 }

@@ -22,8 +22,8 @@ std::uint64_t EndedIn(const Counts& counts);
 /// The number of reports in the queue, including the one that is being handled.
 std::uint64_t WaitingIn(const Counts& counts);
 
-/// The received datagrams minus those of which the ledger knows what became of them. 0 when the ledger
-/// balances. For a moment it is not 0, while a datagram or its end has been counted only in part.
+/// The number of received datagrams minus the number of those that the ledger knows the fate of. 0 when the
+/// ledger balances. It is not 0 for a moment while a datagram or its end has been counted only in part.
 std::int64_t UnaccountedIn(const Counts& counts);
 
 } // namespace ReportLedger

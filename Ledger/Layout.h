@@ -58,9 +58,9 @@ struct Header {
     std::uint32_t version;     ///< The version of the layout.
     std::uint32_t fileBytes;
     std::uint32_t counters; ///< How many words `total`, `lastMs` and `atStart` have each.
-    std::uint32_t marks;    ///< How many marks `marks` has: one in ten seconds.
+    std::uint32_t marks;    ///< The number of marks in `marks`, one for each ten seconds.
     std::uint32_t markSeconds;
-    std::uint32_t recentMarks; ///< How many marks `recent` has: one in a second.
+    std::uint32_t recentMarks; ///< The number of marks in `recent`, one for each second.
     std::int64_t begunAtMs;    ///< When the file's counting began.
     Begun begun;
     Word starts;              ///< Odd while a starting process writes the fields below and `atStart`.
@@ -89,8 +89,10 @@ inline constexpr unsigned RECENT_MARKS = 4; ///< One each second, for the rate o
 /// lines of its own.
 struct alignas(64) File {
     Header header;
-    alignas(64) Counters total;  ///< Since the counting began.
-    alignas(64) Counters lastMs; ///< When each counter last changed, in milliseconds since 1970; 0 for never.
+    alignas(64) Counters total; ///< Since the counting began.
+    /// When a counter last changed, in milliseconds since 1970; 0 for never. Only the places of RECEIVED, of
+    /// each Outcome, of DROPPED_BY_KERNEL and of LOST_AT_ENDS are written.
+    alignas(64) Counters lastMs;
     alignas(64) Counters atStart; ///< The value of `total` when the process that counts was started.
     std::array<Mark, MARKS> marks;
     std::array<Mark, RECENT_MARKS> recent;

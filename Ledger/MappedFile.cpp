@@ -86,7 +86,7 @@ std::unique_ptr<MappedFile> MappedFile::Open(const std::string& directory, std::
         file = OpenAndLock(path, O_CREAT | O_EXCL);
         state = FileState::Unfinished;
     } else if (*state == FileState::Unfinished && ::ftruncate(file.Number(), 0) != 0) {
-        return nullptr; // an interrupted process has left bytes here, and they must become zeros
+        return nullptr; // the bytes of an interrupted process could not be removed
     }
     if (!file.IsOpen() || ::fchmod(file.Number(), FILE_MODE) != 0)
         return nullptr;

@@ -16,8 +16,8 @@ namespace ReportLedger {
 /// blocks allocated → mapped. What is written to the memory survives the end of the process, also a kill, but
 /// not a power failure of the machine.
 ///
-/// Failure: Open returns null and removes the file that it made. While the file is mapped, it must not be
-/// cut: access to the missing part raises a signal, and no handler for that is installed.
+/// Failure: Open returns null and removes a file that it made. While the file is mapped, it must not be cut:
+/// access to the missing part raises a signal, and no handler for that is installed.
 class MappedFile {
 public:
     /// Makes what is missing: the directory and its parents with mode 0700, the file with mode 0600. When

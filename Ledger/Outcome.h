@@ -18,7 +18,7 @@ enum class Outcome : unsigned {
     Exception,         ///< The report was lost by an exception.
 };
 
-/// Names how the report ends that this thread handles. It is called where the cause is known. Only the first
+/// Names how the report that this thread handles ends. It is called where the cause is known. Only the first
 /// call counts: the code nearest to a failure calls first, and its callers, which know only the result, call
 /// later. While no report is handled, a call has no lasting effect.
 void Ended(Outcome outcome) noexcept;

@@ -146,8 +146,8 @@ private:
 Look LookAt(const std::string& path) {
     const OpenFile file(path);
     if (file.GetSight() == Sight::Sound) {
-        // We test the lock before we read the counters. After the reading, a process that counts further and
-        // then ends would look dead, and its last reports would look lost.
+        // We test the lock before we read the counters. If we tested it afterwards, a process that counted
+        // more and then ended would look dead, and the reports that it ended meanwhile would look lost.
         const bool counting = file.IsLocked();
         return LookAt(file.Content(), counting, SystemTool::Platform::CoarseTimeMs());
     }

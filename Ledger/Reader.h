@@ -9,7 +9,7 @@
 
 namespace ReportLedger {
 
-/// What was found at the ledger's path. Only with Sound there is something to read.
+/// What was found at the ledger's path. Only Sound means that there are counters to read.
 enum class Sight {
     Sound,
     Missing,    ///< There is no file.

@@ -10,9 +10,9 @@
 namespace ReportLedger {
 namespace {
 
-/// Only for the thread that owns the counter. Readers, and a kill at any instruction, find this store only
-/// after what the thread counted before: that is what the release is for. On processors that keep stores in
-/// order anyway, it costs nothing.
+/// Adds to a counter. Only the thread that owns the counter may call it. The release order makes sure that a
+/// reader, also after a kill at any instruction, never sees this store without what the thread counted before
+/// it. On processors that keep stores in order anyway, this costs nothing.
 void Add(Word& word, std::uint64_t count) noexcept {
     word.store(word.load(std::memory_order_relaxed) + count, std::memory_order_release);
 }
@@ -97,8 +97,7 @@ void Writer::BeginProcess(const std::string& programVersion, const std::string& 
 }
 
 /// Counts the datagrams that were received and did not end. The number is computed from the totals and not
-/// added to the old number, so that a kill between any two of these stores makes the next start count nothing
-/// twice.
+/// added to the old number. So nothing is counted twice when a kill comes between two of these stores.
 void Writer::CountWhatWasLost(std::int64_t nowMs) {
     Counters& total = m_content->total;
     const Counts counts = CopyOf(total);

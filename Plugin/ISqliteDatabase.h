@@ -11,10 +11,10 @@
 /// Failure: an operation that returns false has stored its reason for GetLastErrorMsg.
 ///
 /// Durability: when a statement comes alone (no other statement in the 10 ms before it) and ExecSql returns
-/// true, its effect survives kill -9. In a burst, statements share a transaction. It is committed after at
-/// most 10 ms or 1,000 statements, also when no further statement comes, so that kill -9 loses at most the
-/// last 10 ms of the burst. Only a single statement that itself runs longer delays the commit. Every other
-/// operation on the database commits first.
+/// true, its effect survives kill -9. In a burst, statements share a transaction. The transaction is
+/// committed after at most 10 ms or 1,000 statements, also when no further statement comes, so that kill -9
+/// loses at most the last 10 ms of the burst. Only a single statement that itself runs longer delays the
+/// commit. Every other operation on the database commits first.
 ///
 /// Errors in a burst: a statement's own error is its own result and does not affect the others. A commit that
 /// fails loses nothing: the plug-in keeps the statements and commits them, in order, once the database
