@@ -43,8 +43,8 @@ bool AllocateFile(int file, std::int64_t bytes);
 /// way. Never waits. False when the lock is already held, or when the file system has no locks.
 bool TryLockFile(int file);
 
-/// Whether the file is locked through another open file descriptor. Takes no lock itself, so it disturbs no
-/// other process.
+/// Whether the file is locked through another open() of it. Takes no lock itself, so it disturbs no other
+/// process.
 bool IsFileLocked(int file);
 
 /// How many datagrams the system has dropped at this socket since the socket was made, mostly because its

@@ -75,8 +75,8 @@ JsonDocument::Value& JsonDocument::Editable() {
     return m_tree->document;
 }
 
-/// Makes this document null after a change that ran out of memory: the object may count a member's room as
-/// its own although it did not get it.
+/// Makes this document null after a change that ran out of memory. Its object may assume that it has room for
+/// a member, although it did not get the memory.
 void JsonDocument::Abandon() {
     *this = JsonDocument();
 }

@@ -12,12 +12,12 @@ class JsonAllocator;
 
 /// A JSON value with reading and light editing.
 ///
-/// Purpose: reads JSON from outside and never fails because of its shape. A member that is absent, or a member
-/// of a value that is no object, reads as null. Null reads as empty text, 0 and false. So a caller can write
-/// `document.GetKeyValue("a").GetKeyValue("b").ToString()` without a test in between.
+/// Purpose: reads JSON from outside and never fails because of its shape. A member that is absent, or a
+/// member of a value that is no object, reads as null. Null reads as empty text, 0 and false. So a caller can
+/// write `document.GetKeyValue("a").GetKeyValue("b").ToString()` without a test in between.
 ///
-/// Cost: all values of a text share one tree. To copy a JsonDocument, or to take a member, copies a pointer
-/// and not the value, however large it is. Only SetKeyValue copies values: the one that it sets, and its own
+/// Cost: all values of a text share one tree. Copying a JsonDocument or taking a member copies a pointer and
+/// not the value, however large it is. Only SetKeyValue copies values: the one that it sets, and its own
 /// document when another document shares the tree. No operation uses more of the call stack for a deeper
 /// text.
 ///

@@ -12,7 +12,7 @@ namespace {
 int ErrorUnlessDirectory(const std::string& path, int error) {
     struct stat status {};
     if (::stat(path.c_str(), &status) != 0)
-        return error; // mkdir's reason; that of stat would explain nothing
+        return error; // why mkdir failed: why stat failed would explain nothing
     return S_ISDIR(status.st_mode) ? 0 : ENOTDIR;
 }
 
