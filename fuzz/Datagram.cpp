@@ -15,7 +15,7 @@ using SystemTool::IO::JsonDocument;
 
 namespace {
 
-constexpr int INIT_SDK = 2; // the SDK's slots
+constexpr int INIT_SDK = 2; // a place in the SDK's interface
 constexpr int REPORT_EVENT = 3;
 
 struct Fakes {

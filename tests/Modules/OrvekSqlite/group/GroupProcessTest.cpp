@@ -37,7 +37,7 @@ constexpr auto END_LIMIT = 3s; // a second, and more for a busy disk, because th
 struct Progress {
     static constexpr std::size_t MAX = 1'000'000;
     std::atomic<std::size_t> returned;         ///< statements whose ExecSql has returned true
-    std::atomic<Clock::duration::rep> at[MAX]; ///< when each did
+    std::atomic<Clock::duration::rep> at[MAX]; ///< when each of them returned
     std::atomic<Clock::duration::rep> endedAt; ///< when the child began to end itself
     std::atomic<bool> failed;
 };
