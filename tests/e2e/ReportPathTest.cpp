@@ -156,11 +156,10 @@ TEST_F(ReportPath, AnAnalyticsValueThatIsNoJsonIsLoggedAndNotForwarded) {
 TEST_F(ReportPath, LettersAndKeysDecideAsTheyAreWritten) {
     Service::Send(R"({"eventID":"a759|1"})");                     // a lower-case letter: to the store
     Service::Send(R"({"eventID":""})");                           // an empty id: to the store
-    Service::Send(R"({"other":"eventID"})");                      // "eventID" is in it: a report
+    Service::Send(R"({"other":"eventID"})");                      // "eventID": a report
     Service::Send(R"({"msgType":"Init","exdata":{"openID":1}})"); // an unknown kind: ignored
     Service::Send("");                                            // no bytes: not even logged
-    Service::Send(
-        R"({"msgType":"updateOpenID","exdata":{"openID":"eventID"}})"); // "eventID" is in it: a report
+    Service::Send(R"({"msgType":"updateOpenID","exdata":{"openID":"eventID"}})"); // "eventID": a report
     m_service.AwaitQuiet();
     EXPECT_THAT(m_service.Rows("eventID,extData4"),
                 ElementsAre("a759|1|visitor", "|visitor", "|visitor", "|visitor"));
