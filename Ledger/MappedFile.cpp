@@ -88,9 +88,11 @@ std::unique_ptr<MappedFile> MappedFile::Open(const std::string& directory, std::
     } else if (*state == FileState::Unfinished && ::ftruncate(file.Number(), 0) != 0) {
         return nullptr; // the bytes of an interrupted process could not be removed
     }
-    if (!file.IsOpen() || ::fchmod(file.Number(), FILE_MODE) != 0)
+    if (!file.IsOpen())
         return nullptr;
-    File* const content = Platform::AllocateFile(file.Number(), FILE_BYTES) ? Map(file.Number()) : nullptr;
+    const bool isWhole =
+        ::fchmod(file.Number(), FILE_MODE) == 0 && Platform::AllocateFile(file.Number(), FILE_BYTES);
+    File* const content = isWhole ? Map(file.Number()) : nullptr;
     if (content == nullptr) {
         if (*state == FileState::Unfinished)
             ::unlink(path.c_str());

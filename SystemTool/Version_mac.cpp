@@ -31,7 +31,7 @@ std::string Hexadecimal(const std::uint8_t (&bytes)[N]) {
 
 /// The version stays empty: the note that holds it exists only in ELF files.
 Program Of(const std::string& file) {
-    std::ifstream input(input, std::ios::binary);
+    std::ifstream input(file, std::ios::binary);
     const auto header = At<mach_header_64>(input, 0);
     std::streamoff offset = sizeof header;
     for (std::uint32_t i = 0; input && header.magic == MH_MAGIC_64 && i < header.ncmds; ++i) {
