@@ -2,8 +2,9 @@
 #include <filesystem>
 #include <functional>
 #include <memory>
+#include <set>
 #include <string>
-#include <vector>
+#include <thread>
 
 #include <CLI/CLI.hpp>
 #include <fmt/format.h>
@@ -20,7 +21,6 @@
 #include "Tools/reportctl/terminal/Json.h"
 #include "Tools/reportctl/terminal/Printable.h"
 #include "Tools/reportctl/terminal/Result.h"
-#include "Tools/reportctl/terminal/Watch.h"
 
 namespace reportctl::commands {
 namespace {
@@ -47,10 +47,10 @@ struct FindOptions {
     bool isJson = false;
 };
 
-/// The results of one place that was searched. Only the last ones are kept.
+/// The last ones of what was found in one place.
 struct Place {
     std::size_t found = 0;
-    std::string since; ///< how far back the place reaches; empty when that is not known
+    std::string since; ///< how far back the place reaches; empty when nothing tells
     std::deque<std::string> lines;
     std::string error;
 };
@@ -62,7 +62,7 @@ public:
     void Run() {
         Try(m_log, [this] { SearchLog(); });
         Try(m_store, [this] { store::Naming(store::StorePath(), [this] { SearchStore(); }); });
-        Try(m_outbox, [this] { store::Naming(store::OutboxPath(), [this] { SearchOutbox(); }); });
+        Try(m_outbox, [this] { SearchOutboxes(); });
     }
 
     void Print() const {
@@ -71,7 +71,7 @@ public:
         output.Finish();
     }
 
-    /// The exit code: 0 when something was found and every place could be read, else 1.
+    /// 0 when something was found and every place could be read.
     int ExitCode() const {
         const bool isFound = m_log.found + m_store.found + m_outbox.found > 0;
         return isFound && m_log.error.empty() && m_store.error.empty() && m_outbox.error.empty() ? 0 : 1;
@@ -105,7 +105,9 @@ private:
         if (const auto reason = log::ReasonAgainst(log::LiveFile(directory)); !reason.empty())
             throw std::runtime_error(fmt::format("{}: {}", log::LiveFile(directory), reason));
         log::Stream stream(directory, log::RotatedFiles(directory));
-        auto left = stream.Read();
+        auto left = stream.Begin();
+        for (const auto& file : stream.OutboxFiles())
+            m_outboxes.insert(file);
         const auto take = [&](const log::Entry& entry) {
             if (m_log.since.empty())
                 m_log.since = log::IsoTime(entry.line.time);
@@ -113,9 +115,12 @@ private:
                 Add(m_log, m_options.isJson ? log::JsonOf(entry) : log::TextOf(entry));
             left -= left > 0 ? 1 : 0;
         };
-        terminal::Watch watch;
-        for (stream.TakeFinished(take); left > 0 && watch.Wait(LOOK_AGAIN); stream.TakeFinished(take))
+        for (bool isFirst = true; left > 0 && !stream.IsAtEnd(); isFirst = false) {
+            if (!isFirst && !stream.HasMore())
+                std::this_thread::sleep_for(LOOK_AGAIN); // the newest ones wait for their outcome
             stream.Read();
+            stream.TakeFinished(take);
+        }
     }
 
     void SearchStore() {
@@ -126,11 +131,17 @@ private:
         });
     }
 
-    void SearchOutbox() {
+    /// The service's own, unless no event was ever stored, and those of modules that announced a directory.
+    void SearchOutboxes() {
         std::error_code error;
-        if (!std::filesystem::exists(store::OutboxPath(), error) && !error)
-            return; // there is no outbox, so no event was ever stored
-        auto database = outbox::OpenToLook(store::OutboxPath());
+        if (std::filesystem::exists(store::OutboxPath(), error) || error)
+            m_outboxes.insert(store::OutboxPath());
+        for (const auto& file : m_outboxes)
+            store::Naming(file, [&] { SearchOutbox(file); });
+    }
+
+    void SearchOutbox(const std::string& file) {
+        auto database = outbox::OpenToLook(file);
         const auto take = [this](const outbox::Event& event) {
             if (Holds(event.eventID) || Holds(event.payload) || Holds(event.uuid))
                 Add(m_outbox, m_options.isJson ? JsonOf(event) : TextOf(event));
@@ -218,6 +229,7 @@ private:
     Place m_log;
     Place m_store;
     Place m_outbox;
+    std::set<std::string> m_outboxes; ///< files
 };
 
 int RunFind(const FindOptions& options) {

@@ -20,23 +20,25 @@ namespace {
 
 using std::chrono::milliseconds;
 
-constexpr auto HELP = "Examples:\n"
-                      "  reportctl tail\n"
-                      "  reportctl tail --module B100 --since 10m\n"
-                      "  reportctl tail --refused --since 2026-11-20 --no-follow\n"
-                      "  reportctl tail --json | jq -r .eventID\n"
-                      "\n"
-                      "Each line: the time of arrival, \"report\" for the store, \"event\" for analytics or "
-                      "\"control\", the event "
-                      "id, the\n"
-                      "beginning of the value, and where it ended: \"stored\" when its row was found in the "
-                      "store, \"toAnalytics\" "
-                      "when the\n"
-                      "outbox has it or has counted it, \"refused\" with the reason, else \"unknown\". A "
-                      "line waits up to a second "
-                      "for that.\n"
-                      "Ctrl-C ends it.\n"
-                      "\n";
+constexpr auto HELP =
+    "Examples:\n"
+    "  reportctl tail\n"
+    "  reportctl tail --module B100 --since 10m\n"
+    "  reportctl tail --refused --since 2026-11-20 --no-follow\n"
+    "  reportctl tail --json | jq -r .eventID\n"
+    "\n"
+    "Each line: the time of arrival, \"report\" for the store, \"event\" for analytics or "
+    "\"control\", the event id, the\n"
+    "beginning of the value, and where it ended: \"stored\" when its row was found in the "
+    "store, \"toAnalytics\" when an\n"
+    "outbox has it or has counted it, \"refused\" with the reason, else \"unknown\". A "
+    "line waits up to a second for that.\n"
+    "Unknown stay: what the log could not write (\"[BoostLogError]\", a percent sign in the "
+    "text), a report whose row\n"
+    "was deleted since, and an event of a module whose announcement, with a directory of its "
+    "own, is older than the log.\n"
+    "Ctrl-C ends it.\n"
+    "\n";
 
 constexpr milliseconds LOOK_AGAIN{200};
 constexpr std::size_t LINES_UNASKED = 10;
@@ -85,8 +87,11 @@ public:
     /// Whether Take has got all of the entries that were in the log at the start.
     bool HasAllOfBefore() const { return m_before == 0; }
 
+    /// Nothing more of what was there at the start will come.
+    void EndBefore() { m_before = 0; }
+
     void Print() {
-        if (!HasAllOfBefore())
+        if (!HasAllOfBefore() && m_kept != SIZE_MAX)
             return;
         for (; !m_lines.empty(); m_lines.pop_front())
             m_output.Write(m_lines.front());
@@ -108,16 +113,18 @@ void TellComplaints(log::Stream& stream) {
 
 int Follow(const TailOptions& options, log::Stream& stream) {
     terminal::Watch watch;
-    Tail tail(options, stream.Read());
+    Tail tail(options, stream.Begin());
     for (;;) {
+        stream.Read();
         TellComplaints(stream);
         stream.TakeFinished([&](const log::Entry& entry) { tail.Take(entry); });
+        if (stream.IsAtEnd())
+            tail.EndBefore(); // a file may have been deleted since the count
         tail.Print();
         if (options.noFollow && tail.HasAllOfBefore())
             return 0;
-        if (!watch.Wait(LOOK_AGAIN))
+        if (!watch.Wait(stream.HasMore() ? milliseconds(0) : LOOK_AGAIN))
             return 0;
-        stream.Read();
     }
 }
 

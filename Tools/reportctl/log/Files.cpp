@@ -21,18 +21,7 @@ namespace fs = std::filesystem;
 constexpr std::string_view PREFIX = "Report_";
 constexpr std::string_view SUFFIX = ".log";
 
-std::optional<std::uint64_t> NumberOf(const std::string& name) {
-    if (!name.starts_with(PREFIX) || !name.ends_with(SUFFIX))
-        return std::nullopt;
-    const auto* const begin = name.data() + PREFIX.size();
-    const auto* const end = name.data() + name.size() - SUFFIX.size();
-    std::uint64_t number = 0;
-    const auto read = std::from_chars(begin, end, number);
-    return read.ec == std::errc() && read.ptr == end && begin != end ? std::optional(number) : std::nullopt;
-}
-
-/// When the file was last written, rounded up to a second. A file that was deleted meanwhile counts as older
-/// than every time.
+/// A file that is gone meanwhile was written before every time.
 terminal::TimePoint LastWritten(const std::string& path) {
     struct stat status {};
     if (::stat(path.c_str(), &status) != 0)
@@ -41,6 +30,17 @@ terminal::TimePoint LastWritten(const std::string& path) {
 }
 
 } // namespace
+
+std::optional<std::uint64_t> NumberOf(const std::string& path) {
+    const std::string name = fs::path(path).filename();
+    if (!name.starts_with(PREFIX) || !name.ends_with(SUFFIX))
+        return std::nullopt;
+    const auto* const begin = name.data() + PREFIX.size();
+    const auto* const end = name.data() + name.size() - SUFFIX.size();
+    std::uint64_t number = 0;
+    const auto read = std::from_chars(begin, end, number);
+    return read.ec == std::errc() && read.ptr == end && begin != end ? std::optional(number) : std::nullopt;
+}
 
 std::string LogDirectory() {
     return SyncServiceReport::Paths::ServiceLogs(SystemTool::CommonTool::GetUserDataDir());
@@ -62,7 +62,7 @@ std::vector<std::string> RotatedFiles(const std::string& directory) {
     std::error_code error;
     fs::directory_iterator entry(directory, error);
     for (; !error && entry != fs::directory_iterator(); entry.increment(error))
-        if (const auto number = NumberOf(entry->path().filename()))
+        if (const auto number = NumberOf(entry->path()))
             byNumber[*number] = entry->path();
     std::vector<std::string> files;
     files.reserve(byNumber.size());

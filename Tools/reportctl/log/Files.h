@@ -18,6 +18,9 @@ std::string LiveFile(const std::string& directory);
 /// The system's message why the file cannot be read now; empty when it can be read.
 std::string ReasonAgainst(const std::string& path);
 
+/// The number in a rotated file's name. Returns nothing for other files.
+std::optional<std::uint64_t> NumberOf(const std::string& path);
+
 /// The rotated files, oldest first. Their numbers give the order; the times of the files do not.
 std::vector<std::string> RotatedFiles(const std::string& directory);
 

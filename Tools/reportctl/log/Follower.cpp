@@ -1,5 +1,6 @@
 #include "Tools/reportctl/log/Follower.h"
 
+#include <algorithm>
 #include <array>
 
 #include <fcntl.h>
@@ -9,10 +10,24 @@
 #include "Tools/reportctl/log/Files.h"
 
 namespace reportctl::log {
+namespace {
+
+/// Four times the longest record: each byte of a text of 64 KiB may be an escape of four. More is a damaged
+/// file.
+constexpr std::size_t MOST_LINE_BYTES = std::size_t{1024} * 1024;
+
+} // namespace
 
 Follower::Follower(std::string directory, const std::vector<std::string>& rotated)
     : m_directory(std::move(directory)), m_live(LiveFile(m_directory)),
-      m_files(rotated.begin(), rotated.end()) {}
+      m_files(rotated.begin(), rotated.end()) {
+    const auto all = RotatedFiles(m_directory);
+    if (!rotated.empty())
+        m_read = NumberOf(rotated.front()).value_or(1) - 1;
+    else if (!all.empty())
+        m_read = NumberOf(all.back()).value_or(0);
+    OpenNext();
+}
 
 bool Follower::Next(std::string& line) {
     for (;;) {
@@ -24,18 +39,28 @@ bool Follower::Next(std::string& line) {
 }
 
 bool Follower::TakeLine(std::string& line) {
-    const auto end = m_unread.find('\n', m_taken);
+    const auto end = m_unread.find('\n', m_searched);
     if (end == std::string::npos) {
         m_unread.erase(0, m_taken);
         m_taken = 0;
+        if (m_unread.size() > MOST_LINE_BYTES)
+            m_unread.erase(0, m_unread.size() - 1); // the file is damaged; the line's end is still to come
+        m_searched = m_unread.size();
         return false;
     }
     line.assign(m_unread, m_taken, end - m_taken);
     m_taken = end + 1;
+    m_searched = m_taken;
     return true;
 }
 
-/// Reads the next bytes of the open file. Returns false at its end.
+void Follower::ForgetUnread() {
+    m_unread.clear();
+    m_taken = 0;
+    m_searched = 0;
+}
+
+/// Reads some more of the open file; false at its end.
 bool Follower::Fill() {
     if (!m_file.IsOpen())
         return false;
@@ -57,7 +82,7 @@ bool Follower::MoveOn() {
     if (now.st_dev == m_device && now.st_ino == m_inode) {
         if (now.st_size >= ::lseek(m_file.Number(), 0, SEEK_CUR))
             return false;
-        m_unread.clear(); // the file was cut, so everything in it now is new
+        ForgetUnread(); // cut: what is in it now is new
         return ::lseek(m_file.Number(), 0, SEEK_SET) == 0;
     }
     if (Fill()) // lines that were written after we reached the end and before the rotation
@@ -65,30 +90,49 @@ bool Follower::MoveOn() {
     return OpenNext();
 }
 
-/// Queues the rotated files that come after the open file, which has been read to its end.
+/// The rotated files that came after the open one, which has been read to its end. It may itself have been
+/// rotated, or deleted since for the log's bound, as well as some after it.
 void Follower::QueueSuccessors() {
-    const auto files = RotatedFiles(m_directory);
-    auto next = files.end();
-    for (auto file = files.begin(); file != files.end(); ++file) {
+    m_files.clear();
+    for (auto& file : RotatedFiles(m_directory)) {
         struct stat status {};
-        if (::stat(file->c_str(), &status) == 0 && status.st_dev == m_device && status.st_ino == m_inode)
-            next = file + 1;
+        const bool isThere = ::stat(file.c_str(), &status) == 0;
+        const auto number = NumberOf(file).value_or(0);
+        if (isThere && m_file.IsOpen() && status.st_dev == m_device && status.st_ino == m_inode) {
+            m_read = number;
+            m_files.clear();
+        } else if (number > m_read) {
+            m_files.push_back(std::move(file));
+        }
     }
-    m_files.assign(next, files.end());
 }
 
 bool Follower::OpenNext() {
     m_isLive = false;
-    if (m_files.empty() && m_file.IsOpen())
-        QueueSuccessors();
+    if (OpenRotated())
+        return true;
+    QueueSuccessors();
+    if (OpenRotated())
+        return true;
+    if (!Open(m_live))
+        return false;
+    QueueSuccessors(); // it may just have been rotated, and this be another one
+    if (OpenRotated())
+        return true;
+    m_isLive = true;
+    return true;
+}
+
+/// The first of the queued ones that is still there.
+bool Follower::OpenRotated() {
     while (!m_files.empty()) {
         const auto path = m_files.front();
         m_files.pop_front();
-        if (Open(path)) // this fails when the file was deleted meanwhile, because the log was too large
+        m_read = std::max(m_read, NumberOf(path).value_or(0));
+        if (Open(path))
             return true;
     }
-    m_isLive = Open(m_live);
-    return m_isLive;
+    return false;
 }
 
 bool Follower::Open(const std::string& path) {
@@ -99,8 +143,7 @@ bool Follower::Open(const std::string& path) {
     m_file = std::move(file);
     m_device = status.st_dev;
     m_inode = status.st_ino;
-    m_unread.clear(); // half a line of the file before, whose rest does not come
-    m_taken = 0;
+    ForgetUnread(); // a half line, which nothing will end
     return true;
 }
 

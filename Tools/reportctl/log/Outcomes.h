@@ -1,6 +1,8 @@
 #pragma once
 
 #include <cstdint>
+#include <deque>
+#include <map>
 #include <set>
 #include <string>
 #include <vector>
@@ -11,51 +13,71 @@
 
 namespace reportctl::log {
 
-/// How many reports and events the log has at the command's start. So many rows and events of the databases
-/// are read.
-struct Backlog {
+/// Counts of what the log has at the command's start.
+struct Survey {
+    std::size_t entries = 0;
     std::int64_t reports = 0;
-    std::int64_t events = 0;
+    std::map<std::string, std::int64_t> events; ///< by module; refused ones are not counted
+    int analyticsFailures = 0;                  ///< see Pairing::AnalyticsFailures
+    std::set<std::string> directories;          ///< the database directories that modules announced
+
+    void Add(const Entry& entry);
 };
 
-/// Finds out which datagrams the store or the outbox has.
+/// Finds out which datagrams the store or an outbox has. It reads the outbox in the service's own directory,
+/// and the outboxes in directories that modules announced in the log. It does not read an outbox in a
+/// directory that other users may write to.
 ///
 /// An event that was delivered has left the outbox. It counts as toAnalytics when its module has stored as
 /// many events as the log has datagrams of the module, so that none can be missing. Otherwise its outcome
 /// stays unknown.
 ///
-/// Call Read, then read the log, then call Resolve. In another order, an event could be read that has no line
-/// yet, and it would be counted for another datagram. Only the first time, the log is read before Read, which
-/// needs to know the backlog.
+/// Call ReadNew, then read the log, then call Resolve. In another order, an event could be read that has no
+/// line yet, and it would be counted for another datagram.
+///
+/// Memory: about 50 bytes for each report and 150 bytes for each event of the survey.
 ///
 /// One thread. Failure: nothing throws when a database is missing or cannot be read; TakeComplaints returns
 /// the reason.
 class Outcomes {
 public:
-    Outcomes(const std::string& storePath, const std::string& outboxPath)
-        : m_storePath(storePath), m_outboxPath(outboxPath), m_rows(storePath), m_events(outboxPath) {}
+    Outcomes(std::string storePath, const std::string& outboxPath);
 
-    /// Reads the rows and events that were added since the last call. The first call reads as many as
-    /// `backlog` needs.
-    void Read(const Backlog& backlog);
+    /// Reads as many rows and events as the survey needs. Call it once, before all else.
+    void Begin(const Survey& survey);
 
-    /// Gives an outcome to every open entry whose outcome is known now.
-    void Resolve(Pairing& pairing);
+    /// Reads the rows and events that were added since the last call.
+    void ReadNew();
+
+    /// Gives an outcome to every open entry whose outcome is known now. The first `before` entries are those
+    /// that the survey counted.
+    void Resolve(Pairing& pairing, std::size_t before);
 
     /// The reasons why some outcomes cannot be known. Each reason is returned once.
     std::vector<std::string> TakeComplaints();
 
+    /// The paths of the outboxes that exist.
+    std::vector<std::string> OutboxFiles() const;
+
 private:
+    struct Outbox {
+        std::string path;
+        outbox::RecentEvents events;
+    };
+
     void Complain(const std::string& reason);
+    void Know(const std::string& directory);
+    void ReadRows(std::int64_t before);
+    void ReadEvents(std::int64_t before);
     void Find(Entry& entry);
-    void CountBefore(Pairing& pairing);
-    void CountSince(Pairing& pairing);
+    bool TakeEvent(const message::Message& report);
+    void CountSince(Pairing& pairing, std::size_t before);
 
     std::string m_storePath;
-    std::string m_outboxPath;
     store::RecentRows m_rows;
-    outbox::RecentEvents m_events;
-    bool m_isFirst = true;
+    std::deque<Outbox> m_outboxes;     ///< the first one is in the service's own directory
+    std::set<std::string> m_known;     ///< announced directories whose outbox was found
+    std::set<std::string> m_allStored; ///< modules that stored all events that the survey counted
     std::vector<std::string> m_complaints;
     std::set<std::string> m_told;
 };

@@ -106,7 +106,7 @@ void Pairing::Take(Line line) {
     if (IsArrival(line))
         AddDatagram(std::move(line));
     else if (line.level < WARN || !Refuse(line))
-        m_entries.push_back({.line = std::move(line), .message = {}, .reason = {}});
+        Add({.line = std::move(line), .message = {}, .reason = {}});
 }
 
 void Pairing::AddDatagram(Line line) {
@@ -121,10 +121,16 @@ void Pairing::AddDatagram(Line line) {
     else
         entry.reason = "the log could not write its text";
     JudgeControl(entry);
+    Add(std::move(entry));
+}
+
+void Pairing::Add(Entry entry) {
+    m_bytes += entry.line.message.size();
     m_entries.push_back(std::move(entry));
 }
 
 void Pairing::DropFront() {
+    m_bytes -= m_entries.front().line.message.size();
     m_entries.pop_front();
     m_handled -= m_handled > 0 ? 1 : 0;
 }

@@ -26,14 +26,27 @@ public:
     std::deque<Entry>& Entries() { return m_entries; }
     void DropFront();
 
+    /// Whether it holds the most entries that it should hold, or half of them. The limit keeps the memory
+    /// small. A refusal that comes more entries later than this does not find its datagram any more.
+    bool IsFull() const { return IsOver(MOST_ENTRIES, MOST_BYTES); }
+    bool IsHalfFull() const { return IsOver(MOST_ENTRIES / 2, MOST_BYTES / 2); }
+
     /// How many lines said until now that analytics may have refused events. The service logs the same cause
     /// only once a minute, so later events may have been refused without a line of their own.
     int AnalyticsFailures() const { return m_analyticsFailures; }
 
 private:
+    static constexpr std::size_t MOST_ENTRIES = 20'000;
+    static constexpr std::size_t MOST_BYTES = std::size_t{16} * 1024 * 1024; ///< of their texts
+
+    bool IsOver(std::size_t entries, std::size_t bytes) const {
+        return m_entries.size() > entries || m_bytes > bytes;
+    }
+
     using Fits = std::function<bool(const Entry&)>;
 
     void AddDatagram(Line line);
+    void Add(Entry entry);
     bool Refuse(const Line& line);
     bool RefuseFirst(const Line& line, const std::string& reason, const Fits& fits);
     bool RefuseOnly(const Line& line, const std::string& reason, const Fits& fits);
@@ -41,6 +54,7 @@ private:
     void Mark(std::size_t index, const Line& line, const std::string& reason);
 
     std::deque<Entry> m_entries;
+    std::size_t m_bytes = 0;   ///< of the entries' texts
     std::size_t m_handled = 0; ///< the service has handled so many entries at the front
     std::string m_process;
     int m_analyticsFailures = 0;

@@ -1,5 +1,6 @@
 #include "Tools/reportctl/message/Message.h"
 
+#include "Common/ServiceConstants.h"
 #include "Common/Wire.h"
 #include "SystemTool/IO/JsonDocument.h"
 
@@ -53,7 +54,10 @@ Message Read(const std::string& text) {
     }
     message.kind = Kind::Control;
     message.control = document.GetKeyValue(Wire::MESSAGE_KIND).ToString();
-    message.module = document.GetKeyValue(Wire::MESSAGE_DATA).GetKeyValue("moduleID").ToString();
+    const auto data = document.GetKeyValue(Wire::MESSAGE_DATA);
+    message.module = data.GetKeyValue("moduleID").ToString();
+    if (message.control == SyncServiceReport::ORVEK_REPORT_MODULEINIT)
+        message.directory = data.GetKeyValue("dbPath").ToString();
     return message;
 }
 

@@ -27,6 +27,7 @@ struct Message {
     /// The part of the event id before its first bar, or the module that a control message announces. Empty
     /// when there is none.
     std::string module;
+    std::string directory; ///< that an announcement names for the module's events; empty without one
 };
 
 Message Read(const std::string& text);

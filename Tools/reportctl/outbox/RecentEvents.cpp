@@ -18,24 +18,27 @@ JsonDocument Parsed(const std::string& text) {
     return JsonDocument().FromJson(text, ignored);
 }
 
-std::string KeyOf(const std::string& eventID, const std::string& createTime) {
-    return eventID + '\0' + createTime;
-}
-
-std::string TimeIn(const std::string& payload) {
-    return Parsed(payload).GetKeyValue("extend").GetKeyValue("createTime").ToString();
-}
-
-/// Whether the payload was made of this value. The service sets two members in the value. When the same
-/// members with the same texts are set in the report's value, the result must be the payload's data.
-bool IsMadeOf(const std::string& payload, const std::string& value) {
-    const auto data = Parsed(payload).GetKeyValue("eventData");
-    auto expected = Parsed(value);
-    if (!value.empty() && !expected.IsObject() && expected.ToJson() != "null")
-        return false;
+/// The service adds these two members to a report's value, or replaces them there.
+JsonDocument WithoutTheServicesOwn(JsonDocument data) {
     for (const auto* added : {"openid", "sys_version"})
-        expected.SetKeyValue(added, data.GetKeyValue(added).ToString());
-    return expected.ToJson() == data.ToJson();
+        data.SetKeyValue(added, std::string());
+    return data;
+}
+
+std::size_t HashOf(const std::string& eventID, const std::string& createTime, const JsonDocument& data) {
+    return std::hash<std::string>()(eventID + '\0' + createTime + '\0' +
+                                    WithoutTheServicesOwn(data).ToJson());
+}
+
+std::size_t HashOf(const Event& event) {
+    const auto payload = Parsed(event.payload);
+    return HashOf(event.eventID, payload.GetKeyValue("extend").GetKeyValue("createTime").ToString(),
+                  payload.GetKeyValue("eventData"));
+}
+
+/// What the service takes as the data of an event.
+bool IsData(const std::string& value, const JsonDocument& parsed) {
+    return value.empty() || parsed.IsObject() || parsed.ToJson() == "null";
 }
 
 std::int64_t In(const std::map<std::string, std::int64_t>& counts, const std::string& module) {
@@ -69,41 +72,38 @@ void RecentEvents::Read(SQLite::Database& database, Where where, std::int64_t& l
 }
 
 void RecentEvents::Add(const Event& event) {
-    if (!m_uuids.insert(event.uuid).second)
+    const auto uuid = std::hash<std::string>()(event.uuid);
+    if (!m_uuids.insert(uuid).second)
         return;
-    auto key = KeyOf(event.eventID, TimeIn(event.payload));
-    m_events[key].push_back({event.uuid, event.payload, event.sequence});
-    m_order.emplace_back(std::move(key), event.uuid);
+    const auto report = HashOf(event);
+    m_events.emplace(report, Known{uuid, event.sequence});
+    m_order.emplace_back(report, uuid);
 }
 
 void RecentEvents::Trim() {
     for (; m_order.size() > MAX_EVENTS_KEPT; m_order.pop_front()) {
-        const auto& [key, uuid] = m_order.front();
+        const auto [report, uuid] = m_order.front();
         m_uuids.erase(uuid);
-        const auto found = m_events.find(key);
-        if (found == m_events.end())
-            continue;
-        std::erase_if(found->second, [&uuid = uuid](const Known& known) { return known.uuid == uuid; });
-        if (found->second.empty())
-            m_events.erase(found);
+        const auto [begin, end] = m_events.equal_range(report);
+        const auto event =
+            std::find_if(begin, end, [uuid = uuid](const auto& known) { return known.second.uuid == uuid; });
+        if (event != end)
+            m_events.erase(event);
     }
 }
 
 bool RecentEvents::Take(const EventContent& report, const std::string& module) {
-    const auto found = m_events.find(KeyOf(report.eventID, report.createTime));
-    if (found == m_events.end())
+    const auto data = Parsed(report.value);
+    if (!IsData(report.value, data))
         return false;
-    auto& events = found->second;
-    const auto event = std::find_if(events.begin(), events.end(), [&](const Known& known) {
-        return IsMadeOf(known.payload, report.value);
-    });
-    if (event == events.end())
+    const auto [begin, end] = m_events.equal_range(HashOf(report.eventID, report.createTime, data));
+    const auto first = std::min_element(
+        begin, end, [](const auto& a, const auto& b) { return a.second.sequence < b.second.sequence; });
+    if (first == end)
         return false;
-    if (event->sequence > Before(module))
+    if (first->second.sequence > Before(module))
         ++m_counted[module];
-    events.erase(event);
-    if (events.empty())
-        m_events.erase(found);
+    m_events.erase(first);
     return true;
 }
 

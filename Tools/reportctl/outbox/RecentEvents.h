@@ -25,6 +25,8 @@ struct EventContent {
 /// so two equal reports need two events. It also knows how many events each module has stored: a delivered
 /// event has left the outbox, and only that number shows that it was there.
 ///
+/// Memory: about 150 bytes for each event. Only hashes of its texts are kept.
+///
 /// One thread. Failure: ReadNew throws what OpenToLook throws.
 class RecentEvents {
 public:
@@ -49,9 +51,10 @@ public:
     void Count(const std::string& module, std::int64_t events) { m_counted[module] += events; }
 
 private:
+    using Hash = std::size_t;
+
     struct Known {
-        std::string uuid;
-        std::string payload;
+        Hash uuid = 0;
         std::int64_t sequence = 0;
     };
 
@@ -63,9 +66,9 @@ private:
     bool m_isFirst = true;
     std::int64_t m_lastWaiting = 0;
     std::int64_t m_lastDead = 0;
-    std::unordered_map<std::string, std::deque<Known>> m_events; ///< by event id and time
-    std::deque<std::pair<std::string, std::string>> m_order;     ///< keys and uuids, oldest first
-    std::unordered_set<std::string> m_uuids; ///< an event that becomes a dead letter is read twice, kept once
+    std::unordered_multimap<Hash, Known> m_events; ///< by the hash of the report's texts
+    std::deque<std::pair<Hash, Hash>> m_order;     ///< hashes of the report and of the uuid, oldest first
+    std::unordered_set<Hash> m_uuids; ///< an event that becomes a dead letter is read twice, kept once
     std::map<std::string, std::int64_t> m_before;
     std::map<std::string, std::int64_t> m_stored;
     std::map<std::string, std::int64_t> m_counted; ///< events since the first reading whose report is known

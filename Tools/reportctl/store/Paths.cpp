@@ -13,7 +13,7 @@ std::string StorePath() {
 }
 
 std::string OutboxPath() {
-    return Paths::Databases(SystemTool::CommonTool::GetUserDataDir()) + "/MetrikOutbox.db";
+    return Paths::Databases(SystemTool::CommonTool::GetUserDataDir()) + "/" + OUTBOX_FILE;
 }
 
 std::string LedgerPath() {

@@ -7,7 +7,10 @@ namespace reportctl::store {
 /// The path of the store of this user's service. The file need not exist.
 std::string StorePath();
 
-/// The path of the service's own outbox. All modules that name no directory of their own share it.
+/// The name of an outbox's file, in whichever directory.
+inline constexpr auto OUTBOX_FILE = "MetrikOutbox.db";
+
+/// The outbox that all modules share which name no directory of their own.
 std::string OutboxPath();
 
 /// The path of the ledger of this user's service.

@@ -12,11 +12,7 @@ namespace {
 /// Rows that never match a line of the log must not fill the memory of a command that runs for days.
 constexpr std::size_t MAX_ROWS_KEPT = 1'000'000;
 
-std::string KeyOf(const RowContent& content) {
-    return content.eventID + '\0' + content.value + '\0' + content.createTime;
-}
-
-/// The text as the row has it: the service puts it unchanged into its SQL, where two quotes mean one quote.
+/// The service puts texts into its SQL as they are, where two quotes stand for one.
 std::string AsStored(const std::string& text) {
     std::string stored;
     for (std::size_t at = 0; at < text.size(); ++at) {
@@ -47,32 +43,33 @@ void RecentRows::ReadNew(std::int64_t before) {
     rows.bind(1, m_lastId);
     while (rows.executeStep()) {
         m_lastId = rows.getColumn(0).getInt64();
-        Add(m_lastId, KeyOf({rows.getColumn(1).getString(), rows.getColumn(2).getString(),
-                             rows.getColumn(3).getString()}));
+        Add(HashOf(
+            {rows.getColumn(1).getString(), rows.getColumn(2).getString(), rows.getColumn(3).getString()}));
     }
 }
 
-void RecentRows::Add(std::int64_t id, std::string key) {
-    m_ids[key].push_back(id);
-    m_order.push_back(std::move(key));
-    for (; m_order.size() > MAX_ROWS_KEPT; m_order.pop_front())
-        if (const auto found = m_ids.find(m_order.front()); found != m_ids.end()) {
-            found->second.pop_front();
-            if (found->second.empty())
-                m_ids.erase(found);
-        }
+RecentRows::Hash RecentRows::HashOf(const RowContent& content) {
+    return std::hash<std::string>()(content.eventID + '\0' + content.value + '\0' + content.createTime);
 }
 
-std::int64_t RecentRows::Take(const RowContent& report) {
-    const auto found =
-        m_ids.find(KeyOf({AsStored(report.eventID), AsStored(report.value), AsStored(report.createTime)}));
-    if (found == m_ids.end())
-        return 0;
-    const auto id = found->second.front();
-    found->second.pop_front();
-    if (found->second.empty())
-        m_ids.erase(found);
-    return id;
+void RecentRows::Add(Hash row) {
+    ++m_rows[row];
+    m_order.push_back(row);
+    for (; m_order.size() > MAX_ROWS_KEPT; m_order.pop_front())
+        Remove(m_order.front());
+}
+
+bool RecentRows::Remove(Hash row) {
+    const auto found = m_rows.find(row);
+    if (found == m_rows.end())
+        return false;
+    if (--found->second == 0)
+        m_rows.erase(found);
+    return true;
+}
+
+bool RecentRows::Take(const RowContent& report) {
+    return Remove(HashOf({AsStored(report.eventID), AsStored(report.value), AsStored(report.createTime)}));
 }
 
 } // namespace reportctl::store

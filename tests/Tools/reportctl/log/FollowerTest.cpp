@@ -68,6 +68,42 @@ TEST_F(LogFollower, GoesOnAfterRotationsOfWhichItSawNone) {
     EXPECT_THAT(All(follower), ElementsAre("two", "three", "four"));
 }
 
+TEST_F(LogFollower, GoesOnAfterARotationThatComesBeforeTheFirstLook) {
+    Append("Report_6.log", "not asked for\n");
+    Append("Report.log", "one\n");
+    Follower follower(Directory(), {});
+    Rotate(7);
+    Append("Report.log", "two\n");
+    Rotate(8);
+    Append("Report.log", "three\n");
+    EXPECT_THAT(All(follower), ElementsAre("one", "two", "three"));
+    EXPECT_THAT(All(follower), ElementsAre());
+}
+
+TEST_F(LogFollower, GoesOnWithWhatIsThereAfterAFileThatWasDeletedForTheLogsBound) {
+    Append("Report.log", "one\n");
+    Follower follower(Directory(), {});
+    EXPECT_THAT(All(follower), ElementsAre("one"));
+    Rotate(7);
+    std::filesystem::remove(Path("Report_7.log"));
+    Append("Report.log", "two\n");
+    Rotate(8);
+    Append("Report.log", "three\n");
+    EXPECT_THAT(All(follower), ElementsAre("two", "three"));
+    Rotate(9);
+    Append("Report.log", "four\n");
+    EXPECT_THAT(All(follower), ElementsAre("four"));
+}
+
+TEST_F(LogFollower, KeepsNothingOfALineThatIsTooLongForARecord) {
+    Append("Report.log", std::string(30 << 20, 'x') + "\none\n");
+    Follower follower(Directory(), {});
+    const auto lines = All(follower);
+    ASSERT_EQ(lines.size(), 2u);
+    EXPECT_LT(lines[0].size(), 2u << 20);
+    EXPECT_EQ(lines[1], "one");
+}
+
 TEST_F(LogFollower, WaitsForALogThatIsNotThereYet) {
     Follower follower(Directory() + "/later", {});
     EXPECT_THAT(All(follower), ElementsAre());

@@ -25,7 +25,7 @@ protected:
 
     /// The standard output of reportctl, without its standard error.
     std::string OutputOf(const std::string& arguments, const std::string& shell = {}) const {
-        return Reportctl(arguments + " 2>'" + Errors() + "'", shell).output;
+        return Reportctl(arguments + " 2>'" + Errors() + "'; }", "{ " + shell).output;
     }
 
     std::string Errors() const { return Data() + "/errors"; }
