@@ -1,7 +1,6 @@
 #include "Modules/OrvekSqlite/guard/LiteralInsert.h"
 
 #include <algorithm>
-#include <utility>
 
 namespace OrvekSqlite::guard {
 namespace {
@@ -42,40 +41,43 @@ std::optional<Literal> TakeInteger(std::string_view& rest) {
     return literal;
 }
 
-/// The literals up to the parenthesis that ends `rest`; nothing when `rest` holds anything else.
-std::optional<std::vector<Literal>> TakeLiterals(std::string_view rest) {
-    std::vector<Literal> literals;
-    literals.reserve(LiteralInsert::MAX_LITERALS / 4);
-    while (literals.size() < LiteralInsert::MAX_LITERALS) {
+/// Takes the literals up to the parenthesis that ends `rest`; false when there is anything else.
+bool TakeLiterals(std::string_view rest, LiteralInsert& insert) {
+    while (insert.literals.size() < LiteralInsert::MAX_LITERALS) {
         while (rest.starts_with(' '))
             rest.remove_prefix(1);
         const auto literal = rest.starts_with('\'') ? TakeText(rest) : TakeInteger(rest);
         if (!literal)
-            return std::nullopt;
-        literals.push_back(*literal);
+            return false;
+        insert.literals.push_back(*literal);
         if (rest == ")")
-            return literals;
+            return true;
         if (!rest.starts_with(','))
-            return std::nullopt;
+            return false;
         rest.remove_prefix(1);
     }
-    return std::nullopt;
+    return false;
+}
+
+/// What stands before the literals; empty when it is not what it has to be.
+std::string_view HeadOf(std::string_view sql) {
+    const std::size_t values = sql.find(VALUES);
+    if (!sql.starts_with(BEGIN) || values == std::string_view::npos)
+        return {};
+    const std::string_view head = sql.substr(0, values + VALUES.size());
+    return std::all_of(head.begin(), head.end(), IsOfNames) ? head : std::string_view();
 }
 
 } // namespace
 
-std::optional<LiteralInsert> LiteralInsert::Of(std::string_view sql) {
-    const std::size_t values = sql.find(VALUES);
-    if (!sql.starts_with(BEGIN) || values == std::string_view::npos ||
-        sql.find('\0') != std::string_view::npos)
-        return std::nullopt;
-    const std::string_view head = sql.substr(0, values + VALUES.size());
-    if (!std::all_of(head.begin(), head.end(), IsOfNames))
-        return std::nullopt;
-    auto literals = TakeLiterals(sql.substr(head.size()));
-    if (!literals)
-        return std::nullopt;
-    return LiteralInsert{head, std::move(*literals)};
+std::optional<LiteralInsert> LiteralInsert::Of(std::string_view sql, std::string_view knownHead) {
+    const bool isKnown = !knownHead.empty() && sql.starts_with(knownHead);
+    std::optional<LiteralInsert> insert(
+        LiteralInsert{isKnown ? sql.substr(0, knownHead.size()) : HeadOf(sql), {}});
+    if (insert->head.empty() || sql.find('\0') != std::string_view::npos ||
+        !TakeLiterals(sql.substr(insert->head.size()), *insert))
+        insert.reset();
+    return insert;
 }
 
 } // namespace OrvekSqlite::guard

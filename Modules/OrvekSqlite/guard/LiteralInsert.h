@@ -3,7 +3,8 @@
 #include <cstddef>
 #include <optional>
 #include <string_view>
-#include <vector>
+
+#include <boost/container/static_vector.hpp>
 
 namespace OrvekSqlite::guard {
 
@@ -22,13 +23,15 @@ struct LiteralInsert {
     /// More than the store's statement needs.
     static constexpr std::size_t MAX_LITERALS = 32;
 
-    std::string_view head; ///< everything up to the parenthesis after "values", with that parenthesis
-    std::vector<Literal> literals;
+    std::string_view head; ///< up to and with the parenthesis behind "values"
+    boost::container::static_vector<Literal, MAX_LITERALS> literals;
 
-    /// Returns nothing for any other text, and in doubtful cases: an expression, a comment, a sign, a zero
-    /// byte, upper-case keywords, anything after the closing parenthesis. Such a text is no error; SQLite
-    /// decides about it.
-    static std::optional<LiteralInsert> Of(std::string_view sql);
+    /// `knownHead`: the head of another text for which there was a result, or empty. The next text mostly has the same, and
+    /// to read it again was half of the work.
+    ///
+    /// Nothing for any other text, and when in doubt: an expression, a comment, a sign, a zero byte, upper-case keywords,
+    /// anything behind the closing parenthesis. Such a text is no error, it is SQLite's to judge.
+    static std::optional<LiteralInsert> Of(std::string_view sql, std::string_view knownHead = {});
 };
 
 } // namespace OrvekSqlite::guard

@@ -71,7 +71,7 @@ bool PreparedInsert::Execute(const std::string& sql) {
     const auto limit = sqlite3_limit(m_connection, SQLITE_LIMIT_SQL_LENGTH, -1);
     if (sql.size() >= static_cast<std::size_t>(limit))
         return false;
-    const auto insert = LiteralInsert::Of(sql);
+    const auto insert = LiteralInsert::Of(sql, m_head);
     if (!insert)
         return false;
     const Use use(*this);
@@ -86,14 +86,15 @@ bool PreparedInsert::Execute(const std::string& sql) {
 }
 
 bool PreparedInsert::Prepare(const LiteralInsert& insert) {
-    const std::string text = WithParameters(insert);
-    if (text == m_text)
+    if (m_statement != nullptr && insert.head == m_head && insert.literals.size() == m_places)
         return true;
     Forget();
+    const std::string text = WithParameters(insert);
     if (sqlite3_prepare_v3(m_connection, text.c_str(), static_cast<int>(text.size() + 1),
                            SQLITE_PREPARE_PERSISTENT, &m_statement, nullptr) != SQLITE_OK)
         return false;
-    m_text = text;
+    m_head = insert.head;
+    m_places = insert.literals.size();
     return true;
 }
 
@@ -108,7 +109,7 @@ bool PreparedInsert::Bind(const LiteralInsert& insert) {
 void PreparedInsert::Forget() {
     sqlite3_finalize(m_statement);
     m_statement = nullptr;
-    m_text.clear();
+    m_head.clear();
 }
 
 } // namespace OrvekSqlite::guard

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstddef>
 #include <string>
 
 #include <sqlite3.h>
@@ -38,7 +39,8 @@ private:
     sqlite3* m_connection;
     StatementGuard& m_guard;
     sqlite3_stmt* m_statement = nullptr;
-    std::string m_text; ///< The text of m_statement, with parameters in the places of the literals.
+    std::string m_head;       ///< Of the text of m_statement; empty without one.
+    std::size_t m_places = 0; ///< Parameters, in the literals' places.
 };
 
 } // namespace OrvekSqlite::guard
