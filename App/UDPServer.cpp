@@ -61,8 +61,9 @@ void PrintCaughtException() noexcept {
 /// text ends there also when a datagram fills the buffer.
 class UDPServer::Buffer {
 public:
-    /// All bytes are zero afterwards. Only what the datagram before has left is written: zeroing all of the buffer, in which
-    /// a usual report fills a fiftieth, was a tenth of what the program itself does for a datagram.
+    /// All bytes are zero afterwards. Only what the datagram before has left is written: zeroing all of the
+    /// buffer, in which a usual report fills a fiftieth, was a tenth of what the program itself does for a
+    /// datagram.
     void Clear() {
         std::fill_n(m_bytes.begin(), m_used, '\0');
         m_used = 0;
@@ -87,8 +88,8 @@ private:
     std::size_t m_used = 0; ///< How many of them may be other than zero.
     std::string m_text;     ///< Kept, with its room.
 
-    /// Not checked: every program of this machine may send. As the system has it: an address of the library's takes an
-    /// allocation for each datagram.
+    /// Not checked: every program of this machine may send. As the system has it: an address of the library's
+    /// takes an allocation for each datagram.
     sockaddr_storage m_sender{};
 };
 

@@ -20,12 +20,13 @@
 // numbers in the same way.
 namespace SystemTool::IO {
 
-// Numbers come as their texts. The parser's own conversion loses some: 1.84467440737095516155 runs over in its 64 bits
-// and comes out as anything, 10e308 as next to nothing, and 17976931348623159e292 as an infinity, which JSON cannot hold.
+// Numbers come as their texts. The parser's own conversion loses some: 1.84467440737095516155 runs over in
+// its 64 bits and comes out as anything, 10e308 as next to nothing, and 17976931348623159e292 as an infinity,
+// which JSON cannot hold.
 //
-// In situ: the values point into a copy of the text, which the tree owns. Else the parser copies each string byte by byte
-// into a stack and from there into the tree, and the second copy waits for the first one's bytes to leave the processor's
-// store buffer: that was a third of the cost of a usual report.
+// In situ: the values point into a copy of the text, which the tree owns. Else the parser copies each string
+// byte by byte into a stack and from there into the tree, and the second copy waits for the first one's bytes
+// to leave the processor's store buffer: that was a third of the cost of a usual report.
 inline constexpr unsigned JSON_PARSE_FLAGS =
     rapidjson::kParseInsituFlag | rapidjson::kParseIterativeFlag | rapidjson::kParseNumbersAsStringsFlag;
 
@@ -55,8 +56,8 @@ class JsonGuard {
 public:
     using Ch = char;
 
-    /// `hasEscapes`: whether the text has any. Half a surrogate pair comes from an escape only, and to look for one in
-    /// each string was a third of the cost of a usual report.
+    /// `hasEscapes`: whether the text has any. Half a surrogate pair comes from an escape only, and to look
+    /// for one in each string was a third of the cost of a usual report.
     JsonGuard(JsonTree& document, int maxDepth, bool hasEscapes)
         : m_document(document), m_maxDepth(maxDepth), m_hasEscapes(hasEscapes) {}
 
@@ -72,8 +73,9 @@ public:
             return m_document.Int64(*integer);
         if (const auto integer = IntegerOf<std::uint64_t>({text, length}))
             return m_document.Uint64(*integer);
-        // Not std::from_chars, which the standard library of macOS lacks for doubles. The decimal point is that of the
-        // C locale, which no program of ours leaves. Of a copy, which ends where the number does: strtod takes 0x1 for one.
+        // Not std::from_chars, which the standard library of macOS lacks for doubles. The decimal point is
+        // that of the C locale, which no program of ours leaves. Of a copy, which ends where the number does:
+        // strtod takes 0x1 for one.
         const double number = std::strtod(std::string(text, length).c_str(), nullptr);
         return std::isinf(number) ? Refuse("Number too big to be stored in double.")
                                   : m_document.Double(number);

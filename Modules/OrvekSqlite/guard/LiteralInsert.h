@@ -26,11 +26,12 @@ struct LiteralInsert {
     std::string_view head; ///< up to and with the parenthesis behind "values"
     boost::container::static_vector<Literal, MAX_LITERALS> literals;
 
-    /// `knownHead`: the head of another text for which there was a result, or empty. The next text mostly has the same, and
-    /// to read it again was half of the work.
+    /// `knownHead`: the head of another text for which there was a result, or empty. The next text mostly has
+    /// the same, and to read it again was half of the work.
     ///
-    /// Nothing for any other text, and when in doubt: an expression, a comment, a sign, a zero byte, upper-case keywords,
-    /// anything behind the closing parenthesis. Such a text is no error, it is SQLite's to judge.
+    /// Nothing for any other text, and when in doubt: an expression, a comment, a sign, a zero byte,
+    /// upper-case keywords, anything behind the closing parenthesis. Such a text is no error, it is SQLite's
+    /// to judge.
     static std::optional<LiteralInsert> Of(std::string_view sql, std::string_view knownHead = {});
 };
 
