@@ -88,30 +88,30 @@ void LiveFile::LookAtSize() {
         m_sizeBytes = status.st_size;
 }
 
-FileFailure LiveFile::Append(std::string_view line) {
+FileFailure LiveFile::AppendLines(std::string_view& lines) {
     char newline = '\n';
     // writev takes its texts through pointers to non-const and does not change them.
-    iovec parts[] = {{&newline, 1}, {const_cast<char*>(line.data()), line.size()}};
+    iovec parts[] = {{&newline, 1}, {const_cast<char*>(lines.data()), lines.size()}};
     const bool mends = m_endsInHalfLine;
-    const std::size_t size = line.size() + (mends ? 1 : 0);
     ssize_t written = 0;
     do {
-        written = mends ? writev(m_descriptor, parts, 2) : write(m_descriptor, line.data(), line.size());
+        written = mends ? writev(m_descriptor, parts, 2) : write(m_descriptor, lines.data(), lines.size());
     } while (written < 0 && errno == EINTR);
     if (written < 0)
         return {errno, "write to the file"};
-    // After an append, the file offset is the end of the file, so it counts what other processes appended.
-    // Asking for the offset after each line took a sixth of the line's time, so we ask once in LINES_PER_LOOK
-    // lines.
-    m_sizeBytes = ++m_lines % LINES_PER_LOOK == 0 ? lseek(m_descriptor, 0, SEEK_CUR) : m_sizeBytes + written;
-    if (static_cast<std::size_t>(written) == size) {
-        m_endsInHalfLine = false;
-        return {};
-    }
-    // We do not cut the half line off. Another process may have appended a line after it, and that line would
-    // be cut off, too.
-    m_endsInHalfLine = written > (mends ? 1 : 0) || (written == 0 && mends);
-    return {ENOSPC, "write a whole line to the file"};
+    KeepSize(written, lines.find('\n') + 1 == lines.size());
+    const auto done = lines.substr(0, static_cast<std::size_t>(mends && written > 0 ? written - 1 : written));
+    // Cutting half a line off again could cut off what another process appended after it.
+    m_endsInHalfLine = written == 0 ? mends : !done.empty() && done.back() != '\n';
+    lines.remove_prefix(done.rfind('\n') + 1); // without one, npos + 1 is 0
+    return lines.empty() ? FileFailure{} : FileFailure{ENOSPC, "write a whole line to the file"};
+}
+
+/// The offset after an append is the end of the file, with what other processes appended. Asking for it after
+/// each line was a sixth of the line's cost.
+void LiveFile::KeepSize(ssize_t written, bool isOneLine) {
+    const bool looks = !isOneLine || ++m_lines % LINES_PER_LOOK == 0;
+    m_sizeBytes = looks ? lseek(m_descriptor, 0, SEEK_CUR) : m_sizeBytes + written;
 }
 
 // They change the lock of the file, so neither is const. NOLINTBEGIN(readability-make-member-function-const)

@@ -4,6 +4,8 @@
 #include <string>
 #include <string_view>
 
+#include <sys/types.h>
+
 #include "Modules/BoostLogger/FileFailure.h"
 
 namespace BoostLogger {
@@ -32,8 +34,8 @@ public:
     /// deleted our file. Also updates SizeBytes when there is a file at `path`.
     bool IsGoneFrom(const std::string& path);
 
-    /// How many lines are appended between two looks at the size. When several processes write at once, each
-    /// of them may exceed a size limit by as many lines.
+    /// How many lines are appended between two looks at the size, at most. So many may each writer go beyond
+    /// a limit where several write at once.
     static constexpr unsigned LINES_PER_LOOK = 16;
 
     /// The size of the file. It counts the bytes of other processes as of the last look.
@@ -42,10 +44,13 @@ public:
     /// Updates SizeBytes now.
     void LookAtSize();
 
-    /// Appends the line, which ends in a newline, with one system call. When this returns without a failure,
-    /// the whole line is in the file, and no other process's text is in the middle of it. When only a part
-    /// could be written, the next line starts with a newline, so that the two do not become one line.
-    FileFailure Append(std::string_view line);
+    /// Appends the lines, each of which ends in a newline, with one system call: they are in the file, each
+    /// as a whole and not torn by other writers, when this returns. Where only a part of them could be
+    /// written, those that are not whole in the file stay in `lines`; after half a line, the next one starts
+    /// with a newline, so that the two are not glued together.
+    FileFailure AppendLines(std::string_view& lines);
+
+    FileFailure Append(std::string_view line) { return AppendLines(line); }
 
     /// Takes the exclusive lock for a rotation. It is held until Unlock or Close. Waits 20 ms at most.
     FileFailure Lock();
@@ -55,6 +60,7 @@ public:
 private:
     FileFailure Examine();
     bool EndsInHalfLine() const;
+    void KeepSize(ssize_t written, bool isOneLine);
 
     int m_descriptor = -1;
     std::int64_t m_sizeBytes = 0;

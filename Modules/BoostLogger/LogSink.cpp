@@ -29,6 +29,13 @@ using Payload = const LogRecord*;
 
 const char* const PAYLOAD_NAME = "BoostLoggerRecord";
 
+constexpr int ERROR = 4;
+
+/// A failure and a crash trace are the last words of many a process, and take with them what waits.
+LogWriter::Haste HasteOf(const LogRecord& record) {
+    return record.level < ERROR ? LogWriter::Haste::MayWait : LogWriter::Haste::AtOnce;
+}
+
 /// Copies lines to standard output. Failures are ignored: there is nowhere to report them to.
 class Console {
 public:
@@ -65,7 +72,7 @@ public:
             return;
         LineBuffer line;
         ComposeLine(line, **payload, std::chrono::system_clock::now());
-        m_writer.Append(TextOf(line), std::chrono::steady_clock::now());
+        m_writer.Append(TextOf(line), std::chrono::steady_clock::now(), HasteOf(**payload));
         if (m_console)
             m_toConsole.Write(TextOf(line));
     }
@@ -102,6 +109,10 @@ FileFailure LogSink::Start() {
 
 void LogSink::Retire() {
     m_core->remove_sink(m_sink);
+}
+
+void LogSink::Finish() noexcept {
+    m_backend->Writer().Finish();
 }
 
 void LogSink::Write(const LogRecord& record) noexcept {

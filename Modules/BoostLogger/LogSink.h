@@ -34,6 +34,9 @@ public:
 
     void Write(const LogRecord& record) noexcept;
 
+    /// The process ends: see LogWriter.
+    void Finish() noexcept;
+
 private:
     const boost::log::core_ptr m_core;
     const boost::log::attribute_name m_attributeName;

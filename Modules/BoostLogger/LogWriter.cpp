@@ -3,9 +3,12 @@
 #include <algorithm>
 #include <cerrno>
 #include <string>
+#include <thread>
 
+#include <pthread.h>
 #include <sys/resource.h>
 
+#include "Modules/BoostLogger/InsideLog.h"
 #include "Modules/BoostLogger/RecordLine.h"
 
 namespace BoostLogger {
@@ -24,22 +27,33 @@ const char* const NO_LINE = "out of memory, or logged by a signal handler inside
 
 constexpr int WARNING = 3;
 
-/// Set while this thread waits for the writer's lock or holds it. The crash handler logs on the thread that
-/// crashed. If that thread crashed in here, it would wait for the lock for ever, so its records are counted
-/// as lost.
-thread_local bool t_isInside = false;
+/// How long the end of the process waits for a thread that writes.
+constexpr std::chrono::milliseconds FINISH_PATIENCE{200};
 
-struct Inside {
-    Inside() { t_isInside = true; }
-    ~Inside() { t_isInside = false; }
-    Inside(const Inside&) = delete;
-    Inside& operator=(const Inside&) = delete;
-};
+/// How often a process forked before it became this one. A child has the lines that waited, which are its
+/// parent's to write, and lacks the thread that writes them.
+std::atomic<unsigned> g_forks = 0;
+
+[[maybe_unused]] const int g_forkHandler = pthread_atfork(nullptr, nullptr, [] { ++g_forks; });
+
+/// Behind the last newline within `maxBytes`; 0 when there is none.
+std::size_t WholeLines(std::string_view lines, std::int64_t maxBytes) {
+    if (maxBytes <= 0)
+        return 0;
+    if (lines.size() <= static_cast<std::uint64_t>(maxBytes))
+        return lines.size();
+    return lines.rfind('\n', static_cast<std::size_t>(maxBytes) - 1) + 1; // without one, npos + 1 is 0
+}
+
+std::uint64_t LinesIn(std::string_view lines) {
+    return static_cast<std::uint64_t>(std::count(lines.begin(), lines.end(), '\n'));
+}
 
 } // namespace
 
 LogWriter::LogWriter(const LogSettings& settings)
-    : m_settings(settings), m_path(settings.LivePath()), m_rotated(settings.directory, settings.fileName) {}
+    : m_settings(settings), m_path(settings.LivePath()), m_rotated(settings.directory, settings.fileName),
+      m_forks(g_forks) {}
 
 FileFailure LogWriter::Start() {
     const std::lock_guard lock(m_mutex);
@@ -52,38 +66,78 @@ FileFailure LogWriter::Start() {
     return {};
 }
 
-void LogWriter::Append(std::string_view line, TimePoint now) noexcept {
-    if (t_isInside)
+void LogWriter::Append(std::string_view line, TimePoint now, Haste haste) noexcept {
+    if (InsideLog::IsThisThread())
         return CountLost();
-    // Set before the lock is taken: a signal handler that logs in between would otherwise wait for ever.
-    const Inside inside;
+    const InsideLog inside; // before the lock: a signal between the two would wait for the lock for ever
     const std::lock_guard lock(m_mutex);
-    try {
-        AppendLocked(line, now);
-    } catch (...) { // no memory for the list of rotated files
-        CountLost();
+    if (m_forks != g_forks.load(std::memory_order_relaxed)) {
+        m_mayWait = false;
+        m_waiting.Clear();
     }
+    if (haste == Haste::MayWait && LetWait(line, now))
+        return;
+    WriteWaiting(now);
+    Write(line, now);
 }
 
-void LogWriter::AppendLocked(std::string_view line, TimePoint now) {
+/// Whether the line needs no write of its own.
+bool LogWriter::LetWait(std::string_view line, TimePoint now) {
+    if (!m_mayWait || !m_waiting.Take(line, now))
+        return false;
+    if (m_waiting.AreDue(now) || !m_flusher.Notice())
+        WriteWaiting(now);
+    return true;
+}
+
+void LogWriter::Finish() noexcept {
+    if (InsideLog::IsThisThread())
+        return; // the thread that crashed in here is not coming back
+    const InsideLog inside;
+    const auto deadline = std::chrono::steady_clock::now() + FINISH_PATIENCE;
+    while (!m_mutex.try_lock()) {
+        if (std::chrono::steady_clock::now() > deadline)
+            return;
+        std::this_thread::sleep_for(std::chrono::milliseconds(1));
+    }
+    const std::lock_guard lock(m_mutex, std::adopt_lock);
+    m_mayWait = false;
+    if (m_forks == g_forks)
+        WriteWaiting(std::chrono::steady_clock::now());
+}
+
+void LogWriter::WriteWaiting(TimePoint now) noexcept {
+    if (!m_waiting.Due())
+        return;
+    Write(m_waiting.Text(), now);
+    m_waiting.Clear();
+}
+
+void LogWriter::Write(std::string_view lines, TimePoint now) noexcept {
     if (m_losing && now < m_nextAttempt)
-        return CountLost();
-    const FileFailure failure = Deliver(line, now);
+        return CountLost(LinesIn(lines));
+    FileFailure failure;
+    try {
+        failure = Deliver(lines, now);
+    } catch (...) { // no memory for the list of rotated files
+        return CountLost(LinesIn(lines));
+    }
     m_losing = static_cast<bool>(failure);
     if (!m_losing)
         return;
-    CountLost();
+    CountLost(LinesIn(lines));
     m_failure = failure;
     m_nextAttempt = now + RETRY_INTERVAL;
 }
 
-FileFailure LogWriter::Deliver(std::string_view line, TimePoint now) {
+/// Takes away of `lines` what is in the file.
+FileFailure LogWriter::Deliver(std::string_view& lines, TimePoint now) {
     if (const FileFailure failure = FollowPath(now))
         return failure;
     if (m_lost.load(std::memory_order_relaxed) > 0)
         if (const FileFailure failure = ReportLoss())
             return failure;
-    return Put(line);
+    return Put(lines);
 }
 
 FileFailure LogWriter::FollowPath(TimePoint now) {
@@ -118,24 +172,41 @@ FileFailure LogWriter::ReportLoss() {
     LineBuffer line;
     ComposeLine(line, {WARNING, "", "Modules/BoostLogger", "ReportLoss", __LINE__, message},
                 std::chrono::system_clock::now());
-    if (const FileFailure failure = Put(TextOf(line)))
+    std::string_view text = TextOf(line);
+    if (const FileFailure failure = Put(text))
         return failure;
     m_lost.fetch_sub(lost, std::memory_order_relaxed);
     m_failure = {};
     return {};
 }
 
-FileFailure LogWriter::Put(std::string_view line) {
-    const auto size = static_cast<std::int64_t>(line.size());
-    if (m_systemLimit != NO_LIMIT)
-        m_live.LookAtSize(); // before each line, because what another process appended counts, too
-    if (m_live.SizeBytes() > 0 &&
-        m_live.SizeBytes() + size > std::min(m_settings.maxFileBytes, m_systemLimit))
-        if (const FileFailure failure = Rotate())
+FileFailure LogWriter::Put(std::string_view& lines) {
+    while (!lines.empty()) {
+        std::string_view part = Fitting(lines);
+        if (part.empty() && m_live.SizeBytes() > 0) {
+            if (const FileFailure failure = Rotate())
+                return failure;
+            part = Fitting(lines);
+        }
+        if (part.empty()) // one that is too large for any file gets one of its own
+            part = lines.substr(0, lines.find('\n') + 1);
+        if (static_cast<std::int64_t>(part.size()) > m_systemLimit)
+            return {EFBIG, "write to the file"};
+        const std::size_t before = part.size();
+        const FileFailure failure = m_live.AppendLines(part);
+        lines.remove_prefix(before - part.size());
+        if (failure)
             return failure;
-    if (size > m_systemLimit)
-        return {EFBIG, "write to the file"};
-    return m_live.Append(line);
+    }
+    return {};
+}
+
+/// The lines that the live file has room for.
+std::string_view LogWriter::Fitting(std::string_view lines) {
+    if (m_systemLimit != NO_LIMIT)
+        m_live.LookAtSize(); // before each write: what another process appended counts, too
+    const std::int64_t limit = std::min(m_settings.maxFileBytes, m_systemLimit);
+    return lines.substr(0, WholeLines(lines, limit - m_live.SizeBytes()));
 }
 
 /// The lock is on the live file itself. A process that waited for the lock may find that the path leads to

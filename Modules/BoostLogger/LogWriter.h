@@ -7,9 +7,11 @@
 #include <mutex>
 #include <string_view>
 
+#include "Modules/BoostLogger/Flusher.h"
 #include "Modules/BoostLogger/LiveFile.h"
 #include "Modules/BoostLogger/LogSettings.h"
 #include "Modules/BoostLogger/RotatedFiles.h"
+#include "Modules/BoostLogger/WaitingLines.h"
 
 namespace BoostLogger {
 
@@ -19,8 +21,10 @@ namespace BoostLogger {
 ///   writing → (a step fails) → losing: lines are counted and dropped, at most four attempts a second
 ///           → (an attempt succeeds) → a record says how many were lost and why → writing
 ///
-/// Threads: any may call Append and CountLost. Append blocks for as long as the file system does, and for up
-/// to 20 ms when another process rotates at the same moment.
+/// In a burst, lines share a write: see WaitingLines and Flusher.
+///
+/// Threads: all from any. Append blocks for no longer than the file system does, and 20 ms where another
+/// process rotates at the same moment.
 class LogWriter {
 public:
     using TimePoint = std::chrono::steady_clock::time_point;
@@ -32,23 +36,35 @@ public:
     /// file as soon as that works.
     FileFailure Start();
 
+    enum class Haste { MayWait, AtOnce };
+
     /// Appends one line, its newline included. When this returns the line is in the file and survives the end
-    /// of this process, or it is counted as lost.
-    void Append(std::string_view line, TimePoint now) noexcept;
+    /// of this process, with all lines before it, or it is counted as lost. One that may wait is there a
+    /// millisecond later at most if it comes in a burst.
+    void Append(std::string_view line, TimePoint now, Haste haste = Haste::AtOnce) noexcept;
+
+    /// The process ends: writes the lines that wait, and lets none wait from now on. Gives up when another
+    /// thread keeps the lock for a fifth of a second.
+    void Finish() noexcept;
 
     /// Counts a record that was lost before it became a line.
-    void CountLost() noexcept { m_lost.fetch_add(1, std::memory_order_relaxed); }
+    void CountLost(std::uint64_t records = 1) noexcept {
+        m_lost.fetch_add(records, std::memory_order_relaxed);
+    }
 
 private:
     static constexpr std::int64_t NO_LIMIT = std::numeric_limits<std::int64_t>::max();
 
     static std::int64_t FileSizeLimit();
-    void AppendLocked(std::string_view line, TimePoint now);
-    FileFailure Deliver(std::string_view line, TimePoint now);
+    bool LetWait(std::string_view line, TimePoint now);
+    void WriteWaiting(TimePoint now) noexcept;
+    void Write(std::string_view lines, TimePoint now) noexcept;
+    FileFailure Deliver(std::string_view& lines, TimePoint now);
     FileFailure FollowPath(TimePoint now);
     FileFailure Reopen();
     FileFailure ReportLoss();
-    FileFailure Put(std::string_view line);
+    FileFailure Put(std::string_view& lines);
+    std::string_view Fitting(std::string_view lines);
     FileFailure Rotate();
     void Prune();
 
@@ -64,6 +80,10 @@ private:
     TimePoint m_nextAttempt; ///< When to try again after a failure; lines that come before are dropped.
     FileFailure m_failure;   ///< The last failure. The record that reports the loss names it.
     bool m_losing = false;
+    bool m_mayWait = true; ///< Until the process ends.
+    unsigned m_forks = 0;  ///< See Forks, when a line waited last.
+    WaitingLines m_waiting;
+    Flusher m_flusher{m_mutex, m_waiting, [this] { WriteWaiting(std::chrono::steady_clock::now()); }};
 };
 
 } // namespace BoostLogger

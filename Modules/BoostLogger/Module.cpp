@@ -2,6 +2,7 @@
 // the process.
 
 #include <atomic>
+#include <cstdlib>
 #include <filesystem>
 #include <memory>
 #include <mutex>
@@ -45,8 +46,15 @@ void CheckSettings(const LogSettings& settings) {
                "");
 }
 
+/// The end of the process by exit, which a crash handler calls, too.
+void FinishSink() {
+    if (LogSink* sink = g_sink.load(std::memory_order_acquire))
+        sink->Finish();
+}
+
 /// The sink is leaked on purpose, see LogSink.
 void StartSink(const LogSettings& settings) {
+    [[maybe_unused]] static const int registered = std::atexit(FinishSink);
     auto sink = std::make_unique<LogSink>(settings);
     const FileFailure failure = sink->Start();
     if (LogSink* failed = g_sink.exchange(sink.release(), std::memory_order_acq_rel))

@@ -350,3 +350,113 @@ TEST_F(TheLogWriter, SaysWhyItCannotStart) {
     WriteFile(m_directory, "in the way");
     EXPECT_EQ(LogWriter(Settings()).Start().Text(), "cannot make the directory: Not a directory");
 }
+
+namespace {
+
+/// Appends `count` lines of a hundred bytes that may wait, all at `now`.
+void AppendBurst(LogWriter& writer, int count, LogWriter::TimePoint now) {
+    for (int i = 0; i < count; ++i)
+        writer.Append(Line(100), now, LogWriter::Haste::MayWait);
+}
+
+} // namespace
+
+TEST_F(TheLogWriter, WritesTheFirstSixteenLinesOfAMillisecondAtOnce) {
+    LogWriter writer(Settings(100'000, 1'000'000));
+    ASSERT_FALSE(writer.Start());
+    for (int line = 1; line <= 16; ++line) {
+        AppendBurst(writer, 1, m_start);
+        ASSERT_EQ(std::filesystem::file_size(m_path), 100U * static_cast<unsigned>(line));
+    }
+    AppendBurst(writer, 16, m_start + 1ms);
+    EXPECT_EQ(std::filesystem::file_size(m_path), 3200U) << "another millisecond";
+}
+
+TEST_F(TheLogWriter, LetsSixteenLinesOfABurstShareAWrite) {
+    const auto never = m_start + 1h; // so that the thread does not write them
+    LogWriter writer(Settings(100'000, 1'000'000));
+    ASSERT_FALSE(writer.Start());
+    AppendBurst(writer, 16 + 15, never);
+    EXPECT_EQ(std::filesystem::file_size(m_path), 1600U);
+    AppendBurst(writer, 1, never);
+    EXPECT_EQ(std::filesystem::file_size(m_path), 3200U);
+}
+
+TEST_F(TheLogWriter, WritesALineThatMayNotWaitAtOnceBehindThoseThatDid) {
+    LogWriter writer(Settings(100'000, 1'000'000));
+    ASSERT_FALSE(writer.Start());
+    AppendBurst(writer, 16 + 5, m_start + 1h);
+    writer.Append("urgent\n", m_start + 1h);
+    const auto lines = ReadLines(m_path);
+    ASSERT_EQ(lines.size(), 22U);
+    EXPECT_EQ(lines.back(), "urgent");
+}
+
+TEST_F(TheLogWriter, WritesWaitingLinesWithoutAFurtherLine) {
+    LogWriter writer(Settings(100'000, 1'000'000));
+    ASSERT_FALSE(writer.Start());
+    for (int round = 1; round <= 3; ++round) { // the thread wakes again, too
+        AppendBurst(writer, 16 + 5, std::chrono::steady_clock::now());
+        ASSERT_TRUE(WaitUntil(
+            [&] { return std::filesystem::file_size(m_path) == 2100U * static_cast<unsigned>(round); }));
+    }
+}
+
+TEST_F(TheLogWriter, WritesWhatWaitsWhenTheProcessEndsAndLetsNothingWaitAfterThat) {
+    LogWriter writer(Settings(100'000, 1'000'000));
+    ASSERT_FALSE(writer.Start());
+    AppendBurst(writer, 16 + 5, m_start + 1h);
+    writer.Finish();
+    EXPECT_EQ(std::filesystem::file_size(m_path), 2100U);
+    AppendBurst(writer, 30, m_start + 1h);
+    EXPECT_EQ(std::filesystem::file_size(m_path), 5100U);
+}
+
+TEST_F(TheLogWriter, LeavesWaitingLinesToTheParentOfAFork) {
+    LogWriter writer(Settings(100'000, 1'000'000));
+    ASSERT_FALSE(writer.Start());
+    AppendBurst(writer, 16 + 5, m_start + 1h);
+    ChildProcess child([&] {
+        AppendBurst(writer, 3, m_start + 1h);
+        writer.Finish();
+        return true;
+    });
+    ASSERT_EQ(child.Wait(), 0);
+    EXPECT_EQ(std::filesystem::file_size(m_path), 1900U) << "the child's own lines, and at once";
+    writer.Finish();
+    EXPECT_EQ(std::filesystem::file_size(m_path), 2400U);
+}
+
+TEST_F(TheLogWriter, RotatesInABurstWhereItRotatesOtherwise) {
+    LogWriter writer(Settings());
+    ASSERT_FALSE(writer.Start());
+    AppendBurst(writer, 25, m_start + 1h);
+    writer.Finish();
+    EXPECT_EQ(std::filesystem::file_size(m_directory + "/Report_1.log"), 1000U);
+    EXPECT_EQ(std::filesystem::file_size(m_directory + "/Report_2.log"), 1000U);
+    EXPECT_EQ(std::filesystem::file_size(m_path), 500U);
+}
+
+TEST_F(TheLogWriter, CountsTheLinesOfASharedWriteThatAFullDiskCutsOff) {
+    ChildProcess child([this] {
+        LogWriter writer(Settings(100'000, 1'000'000));
+        if (writer.Start())
+            return false;
+        std::signal(SIGXFSZ, SIG_IGN);
+        AppendBurst(writer, 16 + 10, m_start + 1h);
+        LimitFileSize(1650 + 200); // two of the ten, and half of a third
+        writer.Finish();
+        LimitFileSize(RLIM_INFINITY);
+        writer.Append("after\n", m_start + 2h);
+        return true;
+    });
+    ASSERT_EQ(child.Wait(), 0);
+    const auto lines = ReadLines(m_path);
+    ASSERT_EQ(lines.size(), 21U);
+    EXPECT_EQ(lines[17], Line(100).substr(0, 99));
+    EXPECT_EQ(lines[18], Line(51).substr(0, 50));
+    EXPECT_NE(lines[19].find("8 records could not be written: cannot write a whole line to the file"),
+              std::string::npos)
+        << lines[19];
+    EXPECT_EQ(lines[20], "after");
+}

@@ -40,6 +40,9 @@ protected:
             Log(logger, name + " " + std::to_string(i));
     }
 
+    /// By exit, as a program ends: what waits is written then.
+    [[noreturn]] static bool Ended() { std::exit(0); }
+
     /// Expects that the log has, for each name, exactly the numbers from 0 to `count` - 1, in order.
     void ExpectNumbers(const std::vector<std::string>& names, int count) {
         std::map<std::string, int> next;
@@ -98,7 +101,7 @@ TEST_F(BoostLoggerProcesses, EightThreadsGetEveryRecordOutWholeAndInOrder) {
             threads.emplace_back([&] { LogNumbers(loader.GetModule(), name, MANY); });
         for (auto& thread : threads)
             thread.join();
-        return true;
+        return Ended();
     });
     ASSERT_EQ(child.Wait(), 0);
     ExpectNumbers(names, MANY);
@@ -111,7 +114,7 @@ TEST_F(BoostLoggerProcesses, TwoProcessesOnOneLogLoseAndTearNothingWhileBothRota
             LoggerLoader loader(BOOST_LOGGER_PATH);
             Init(loader, {m_temporary.Path(), 50'000, 1024 * 1024 * 1024});
             LogNumbers(loader.GetModule(), name, COUNT);
-            return true;
+            return Ended();
         };
     };
     ChildProcess one(scenario("one"));
@@ -131,7 +134,7 @@ TEST_F(BoostLoggerProcesses, ASecondInstanceThatIsRefusedLeavesTheLogOfTheFirstA
         LoggerLoader loader(BOOST_LOGGER_PATH);
         Init(loader, {m_temporary.Path()});
         LogNumbers(loader.GetModule(), "first", COUNT);
-        return true;
+        return Ended();
     });
     ASSERT_TRUE(WaitUntil([&] { return !ContentOf(m_path).empty(); }));
     struct stat before {};
@@ -140,7 +143,7 @@ TEST_F(BoostLoggerProcesses, ASecondInstanceThatIsRefusedLeavesTheLogOfTheFirstA
         LoggerLoader loader(BOOST_LOGGER_PATH);
         Init(loader, {m_temporary.Path()});
         Log(loader, "second 0");
-        return true;
+        return Ended();
     });
     EXPECT_EQ(second.Wait(), 0);
     EXPECT_EQ(first.Wait(), 0);
@@ -172,6 +175,21 @@ TEST_F(BoostLoggerProcesses, ARecordIsInTheFileWhenWriteLogReturnsEvenIfTheProce
     ExpectNumbers({"last"}, 3);
 }
 
+TEST_F(BoostLoggerProcesses, AKillInABurstCostsSixteenRecordsAtMost) {
+    ChildProcess child([&] {
+        LoggerLoader loader(BOOST_LOGGER_PATH);
+        Init(loader, {m_temporary.Path()});
+        LogNumbers(loader.GetModule(), "t", 1000);
+        raise(SIGKILL);
+        return true;
+    });
+    EXPECT_EQ(child.Wait(), 128 + SIGKILL);
+    const auto lines = ReadLog(m_temporary.Path());
+    ASSERT_GE(lines.size(), 1000U - 15U);
+    for (std::size_t i = 0; i < lines.size(); ++i)
+        ASSERT_EQ(MessageOf(lines[i]), "t " + std::to_string(i));
+}
+
 TEST_F(BoostLoggerProcesses, ExitEndsWhileOtherThreadsAreLogging) {
     for (int round = 0; round < EXITS; ++round) {
         const TemporaryDirectory directory;
@@ -199,7 +217,7 @@ TEST_F(BoostLoggerProcesses, UnloadingTheLastLoaderDoesNotHarmAThreadThatIsLoggi
         std::thread thread([logger] { LogNumbers(logger, "t", 20'000); });
         loader.reset();
         thread.join();
-        return true;
+        return Ended();
     });
     ASSERT_EQ(child.Wait(), 0);
     ExpectNumbers({"t"}, 20'000);
@@ -217,6 +235,22 @@ void LogAndExit(int signal) {
 }
 
 } // namespace
+
+TEST_F(BoostLoggerProcesses, AllRecordsBeforeACrashAreInTheFileBeforeItsTrace) {
+    ChildProcess child([&]() -> bool {
+        LoggerLoader loader(BOOST_LOGGER_PATH);
+        Init(loader, {m_temporary.Path()});
+        LogNumbers(loader.GetModule(), "t", 1000);
+        Log(loader, "Signal[11]", 4);
+        raise(SIGKILL); // so that it is the trace that wrote them, and not the end
+        return false;
+    });
+    EXPECT_EQ(child.Wait(), 128 + SIGKILL);
+    const auto lines = ReadLog(m_temporary.Path());
+    ASSERT_EQ(lines.size(), 1001U);
+    EXPECT_EQ(MessageOf(lines[999]), "t 999");
+    EXPECT_EQ(MessageOf(lines[1000]), "Signal[11]");
+}
 
 TEST_F(BoostLoggerProcesses, ACrashHandlerCanLogAndExitWhileOtherThreadsAreLogging) {
     ChildProcess child([&]() -> bool {
