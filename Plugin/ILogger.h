@@ -17,7 +17,8 @@ public:
     /// Makes `logDir` when it is missing, and opens `fileName` in it for appending. The file is rotated at
     /// `maxFileBytes`. The oldest rotated files are deleted, so that the live file and all rotated ones
     /// together stay within `maxTotalBytes`. When `flushEach` is not 0, a record is in the file when WriteLog
-    /// returns; in a burst, a millisecond later at most. When `console` is not 0, records are also copied to standard output.
+    /// returns; in a burst, a millisecond later at most. When `console` is not 0, records are also copied to
+    /// standard output.
     ///
     /// Throws SystemTool::BSException when the directory or the file cannot be used. Records are lost from
     /// then on. As soon as the file can be written, the log begins with a record that says how many were

@@ -29,11 +29,11 @@ using Payload = const LogRecord*;
 
 const char* const PAYLOAD_NAME = "BoostLoggerRecord";
 
-constexpr int ERROR = 4;
+constexpr int INFORMATION = 2;
 
-/// A failure and a crash trace are the last words of many a process, and take with them what waits.
+/// Warnings, failures and a crash trace are the last words of many a process, and take with them what waits.
 LogWriter::Haste HasteOf(const LogRecord& record) {
-    return record.level < ERROR ? LogWriter::Haste::MayWait : LogWriter::Haste::AtOnce;
+    return record.level <= INFORMATION ? LogWriter::Haste::MayWait : LogWriter::Haste::AtOnce;
 }
 
 /// Copies lines to standard output. Failures are ignored: there is nowhere to report them to.
