@@ -17,6 +17,7 @@ using ::testing::ContainsRegex;
 using ::testing::ElementsAre;
 using ::testing::HasSubstr;
 using ::testing::IsEmpty;
+using ::testing::Not;
 
 // How the program starts, with everything in its place and without each thing in turn.
 
@@ -66,6 +67,16 @@ TEST_F(StartUp, LogsItsDestinationsAndNothingElse) {
     EXPECT_THAT(MessagesOf(m_service.LogLines()),
                 ElementsAre("Add metrik module :A759", "FrameWorker load success"));
     EXPECT_EQ(m_service.Output().find("Error"), std::string::npos);
+}
+
+TEST_F(StartUp, LoadsNoLibraryOfTheNetworkWithoutACollector) {
+    m_service.Install();
+    m_service.Start();
+    std::ifstream maps("/proc/" + std::to_string(m_service.Process()) + "/maps");
+    const std::string text{std::istreambuf_iterator<char>(maps), {}};
+    EXPECT_THAT(text, HasSubstr("libMetrikSdk.dylib"));
+    EXPECT_THAT(text, Not(HasSubstr("libcurl")));
+    EXPECT_THAT(text, Not(HasSubstr("libssl")));
 }
 
 TEST_F(StartUp, HoldsThePidFileAndAUmaskOfZero) {

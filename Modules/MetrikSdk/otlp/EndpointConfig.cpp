@@ -5,9 +5,9 @@
 #include <charconv>
 #include <cstdint>
 #include <memory>
+#include <stdexcept>
 
-#include <curl/curl.h>
-
+#include "Modules/MetrikSdk/otlp/CurlLibrary.h"
 #include "Modules/MetrikSdk/otlp/VariableText.h"
 
 namespace MetrikSdk::otlp {
@@ -32,16 +32,16 @@ using Url = std::unique_ptr<CURLU, decltype(&::curl_url_cleanup)>;
 
 std::string Part(const Url& url, CURLUPart part) {
     char* text = nullptr;
-    if (::curl_url_get(url.get(), part, &text, 0) != CURLUE_OK)
+    if (Curl().url_get(url.get(), part, &text, 0) != CURLUE_OK)
         return {};
-    const std::unique_ptr<char, decltype(&::curl_free)> owner(text, &::curl_free);
+    const std::unique_ptr<char, decltype(&::curl_free)> owner(text, Curl().free);
     return text;
 }
 
 /// Null when `text` is no http or https URL.
 Url ParseUrl(const std::string& text) {
-    Url url(::curl_url(), &::curl_url_cleanup);
-    const bool parsed = ::curl_url_set(url.get(), CURLUPART_URL, text.c_str(), 0) == CURLUE_OK;
+    Url url(Curl().url(), Curl().url_cleanup);
+    const bool parsed = Curl().url_set(url.get(), CURLUPART_URL, text.c_str(), 0) == CURLUE_OK;
     const auto scheme = parsed ? Part(url, CURLUPART_SCHEME) : std::string();
     if (scheme != "http" && scheme != "https")
         url.reset();
@@ -161,7 +161,7 @@ private:
             return endpoint.value;
         auto path = Part(url, CURLUPART_PATH);
         path += (path.ends_with('/') ? "" : "/");
-        ::curl_url_set(url.get(), CURLUPART_PATH, (path + LOGS_PATH).c_str(), 0);
+        Curl().url_set(url.get(), CURLUPART_PATH, (path + LOGS_PATH).c_str(), 0);
         return Part(url, CURLUPART_URL);
     }
 
@@ -238,7 +238,12 @@ std::optional<EndpointConfig> ReadEndpoint(const LookUp& lookUp, std::vector<std
     Reader reader(lookUp, complaints);
     if (reader.IsDisabled())
         return std::nullopt;
-    return reader.Read();
+    try {
+        return reader.Read();
+    } catch (const std::runtime_error& error) { // of the library: the events wait in the outbox
+        complaints.push_back(std::string("No event is sent: ") + error.what());
+        return std::nullopt;
+    }
 }
 
 std::string WithoutSecrets(const std::string& url) {
@@ -246,7 +251,7 @@ std::string WithoutSecrets(const std::string& url) {
     if (!parsed)
         return "(no URL)";
     for (const auto part : {CURLUPART_USER, CURLUPART_PASSWORD, CURLUPART_QUERY, CURLUPART_FRAGMENT})
-        ::curl_url_set(parsed.get(), part, nullptr, 0);
+        Curl().url_set(parsed.get(), part, nullptr, 0);
     return Part(parsed, CURLUPART_URL);
 }
 

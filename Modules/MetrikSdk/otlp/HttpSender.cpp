@@ -10,6 +10,7 @@
 #include <utility>
 
 #include "Modules/MetrikSdk/Version.h"
+#include "Modules/MetrikSdk/otlp/CurlLibrary.h"
 #include "Modules/MetrikSdk/otlp/Gzip.h"
 
 namespace MetrikSdk::otlp {
@@ -35,7 +36,7 @@ public:
 /// Runs once in a process, on the thread that comes first. It is never undone, because other parts of the
 /// process may use the library, too.
 void InitialiseLibrary() {
-    [[maybe_unused]] static const CURLcode done = ::curl_global_init(CURL_GLOBAL_DEFAULT);
+    [[maybe_unused]] static const CURLcode done = Curl().global_init(CURL_GLOBAL_DEFAULT);
 }
 
 /// The library's minimum version knows every option that we use. It may refuse one all the same, for example
@@ -43,18 +44,18 @@ void InitialiseLibrary() {
 /// than the configuration asks for.
 template <typename Value>
 void Set(CURL* easy, CURLoption option, Value value) {
-    if (const auto code = ::curl_easy_setopt(easy, option, value); code != CURLE_OK)
-        throw std::runtime_error("HTTP option " + std::to_string(option) + ": " + ::curl_easy_strerror(code));
+    if (const auto code = Curl().easy_setopt(easy, option, value); code != CURLE_OK)
+        throw std::runtime_error("HTTP option " + std::to_string(option) + ": " + Curl().easy_strerror(code));
 }
 
 } // namespace
 
 HttpSender::HttpSender(EndpointConfig config)
-    : m_config(std::move(config)), m_headers(nullptr, &::curl_slist_free_all),
-      m_multi(nullptr, &::curl_multi_cleanup), m_easy(nullptr, &::curl_easy_cleanup) {
+    : m_config(std::move(config)), m_headers(nullptr, Curl().slist_free_all),
+      m_multi(nullptr, Curl().multi_cleanup), m_easy(nullptr, Curl().easy_cleanup) {
     InitialiseLibrary();
-    m_multi.reset(::curl_multi_init());
-    m_easy.reset(::curl_easy_init());
+    m_multi.reset(Curl().multi_init());
+    m_easy.reset(Curl().easy_init());
     if (!m_multi || !m_easy)
         throw std::bad_alloc();
     ConfigureHeaders();
@@ -112,7 +113,7 @@ void HttpSender::ConfigureHeaders() {
 }
 
 void HttpSender::AddHeader(const std::string& line) {
-    auto* longer = ::curl_slist_append(m_headers.get(), line.c_str());
+    auto* longer = Curl().slist_append(m_headers.get(), line.c_str());
     if (longer == nullptr)
         throw std::bad_alloc();
     static_cast<void>(m_headers.release());
@@ -145,40 +146,40 @@ bool HttpSender::MustEnd() const {
 }
 
 CURLcode HttpSender::Perform() {
-    if (::curl_multi_add_handle(m_multi.get(), m_easy.get()) != CURLM_OK)
+    if (Curl().multi_add_handle(m_multi.get(), m_easy.get()) != CURLM_OK)
         return CURLE_FAILED_INIT;
     CURLcode code = CURLE_ABORTED_BY_CALLBACK;
     int running = 1;
     while (!MustEnd() && running > 0) {
-        if (::curl_multi_perform(m_multi.get(), &running) != CURLM_OK)
+        if (Curl().multi_perform(m_multi.get(), &running) != CURLM_OK)
             break;
         if (running > 0)
-            ::curl_multi_poll(m_multi.get(), nullptr, 0, POLL_MS, nullptr);
+            Curl().multi_poll(m_multi.get(), nullptr, 0, POLL_MS, nullptr);
     }
     int left = 0;
-    while (const auto* message = ::curl_multi_info_read(m_multi.get(), &left))
+    while (const auto* message = Curl().multi_info_read(m_multi.get(), &left))
         if (message->msg == CURLMSG_DONE)
             code = message->data.result;
-    ::curl_multi_remove_handle(m_multi.get(), m_easy.get());
+    Curl().multi_remove_handle(m_multi.get(), m_easy.get());
     return code;
 }
 
 HttpResult HttpSender::Finish(CURLcode code, Answer& answer) {
     auto result = std::move(answer.result);
-    ::curl_easy_getinfo(m_easy.get(), CURLINFO_RESPONSE_CODE, &result.status);
+    Curl().easy_getinfo(m_easy.get(), CURLINFO_RESPONSE_CODE, &result.status);
     const char* type = nullptr;
-    if (::curl_easy_getinfo(m_easy.get(), CURLINFO_CONTENT_TYPE, &type) == CURLE_OK && type != nullptr)
+    if (Curl().easy_getinfo(m_easy.get(), CURLINFO_CONTENT_TYPE, &type) == CURLE_OK && type != nullptr)
         result.contentType = type;
     if (answer.headersEnded && (code == CURLE_OK || (code == CURLE_WRITE_ERROR && answer.cut)))
         return result;
     result.abandoned = MustEnd();
     curl_off_t sent = 0;
-    ::curl_easy_getinfo(m_easy.get(), CURLINFO_SIZE_UPLOAD_T, &sent);
+    Curl().easy_getinfo(m_easy.get(), CURLINFO_SIZE_UPLOAD_T, &sent);
     result.began = sent > 0;
     if (code == CURLE_OK) // the library accepts an answer that ends after its status line
         result.fault = "the answer ended inside its headers";
     else
-        result.fault = m_error[0] != '\0' ? m_error : ::curl_easy_strerror(code);
+        result.fault = m_error[0] != '\0' ? m_error : Curl().easy_strerror(code);
     return result;
 }
 

@@ -5,7 +5,7 @@
 #include <cstdint>
 #include <system_error>
 
-#include <curl/curl.h>
+#include "Modules/MetrikSdk/otlp/CurlLibrary.h"
 
 namespace MetrikSdk::otlp {
 
@@ -18,7 +18,7 @@ std::optional<std::chrono::milliseconds> ParseRetryAfter(const std::string& head
         return header[0] == '-' ? std::chrono::milliseconds(0) : std::chrono::milliseconds::max();
     if (parsed.ec == std::errc() && parsed.ptr == end)
         return std::chrono::seconds(std::clamp<std::int64_t>(seconds, 0, FAR));
-    const auto date = ::curl_getdate(header.c_str(), nullptr);
+    const auto date = Curl().getdate(header.c_str(), nullptr);
     if (date < 0)
         return std::nullopt;
     const auto today = std::chrono::floor<std::chrono::seconds>(now).time_since_epoch().count();

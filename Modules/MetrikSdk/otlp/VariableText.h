@@ -4,7 +4,7 @@
 #include <memory>
 #include <string>
 
-#include <curl/curl.h>
+#include "Modules/MetrikSdk/otlp/CurlLibrary.h"
 
 // How the values of OTEL_* variables are read.
 namespace MetrikSdk::otlp {
@@ -25,7 +25,7 @@ inline std::string LowerCase(std::string text) {
 inline std::string PercentDecoded(const std::string& text) {
     int length = 0;
     const std::unique_ptr<char, decltype(&::curl_free)> decoded(
-        ::curl_easy_unescape(nullptr, text.c_str(), static_cast<int>(text.size()), &length), &::curl_free);
+        Curl().easy_unescape(nullptr, text.c_str(), static_cast<int>(text.size()), &length), Curl().free);
     return decoded ? std::string(decoded.get(), static_cast<std::size_t>(length)) : std::string();
 }
 

@@ -8,13 +8,13 @@
 #include <memory>
 
 #include <SQLiteCpp/Statement.h>
-#include <curl/curl.h>
 #include <fmt/format.h>
 #include <sqlite3.h>
 #include <sys/utsname.h>
 #include <unistd.h>
 
 #include "Common/Paths.h"
+#include "Modules/MetrikSdk/otlp/CurlLibrary.h"
 #include "SystemTool/CommonTool.h"
 #include "SystemTool/IO/Directory.h"
 #include "Tools/reportctl/log/Files.h"
@@ -52,7 +52,7 @@ std::string OutputOf(const std::string& command) {
 
 std::string Versions() {
     return fmt::format("{}\nSQLite {}\n{}\n", service::VersionText(), ::sqlite3_libversion(),
-                       ::curl_version());
+                       MetrikSdk::otlp::Curl().version());
 }
 
 std::string SizeOf(const fs::path& path) {
