@@ -54,7 +54,9 @@ int main() {
     Poco::Event stopEvent(Poco::Event::EVENT_AUTORESET);
     Poco::SharedPtr<ReportServer> server(new ReportServer);
     OpenLedger(server->Ledger());
-    server->Start();  // a failed start has been logged, and the parts that run are kept
+    server->Start(); // a failed start has been logged, and the parts that run are kept
+    // What only the start needed is not held by a service that mostly waits.
+    SystemTool::Platform::LetGoOfCode();
     stopEvent.wait(); // for ever: the service ends by a signal
     return 0;
 }

@@ -6,8 +6,10 @@
 #include <fstream>
 
 #include <fcntl.h>
+#include <link.h>
 #include <linux/sock_diag.h>
 #include <pwd.h>
+#include <sys/mman.h>
 #include <sys/socket.h>
 #include <sys/syscall.h>
 #include <sys/utsname.h>
@@ -146,6 +148,23 @@ std::optional<std::uint32_t> DatagramsDropped(int socket) {
     if (::getsockopt(socket, SOL_SOCKET, SO_MEMINFO, figures.data(), &size) != 0 || size != sizeof figures)
         return std::nullopt;
     return figures[SK_MEMINFO_DROPS];
+}
+
+/// Only segments that no relocation writes to, so that each page is the file's.
+void LetGoOfCode() {
+    const auto letGo = [](dl_phdr_info* library, std::size_t, void*) {
+        const auto page = static_cast<ElfW(Addr)>(::sysconf(_SC_PAGESIZE));
+        for (int i = 0; i < library->dlpi_phnum; ++i) {
+            const auto& segment = library->dlpi_phdr[i];
+            if (segment.p_type != PT_LOAD || (segment.p_flags & (PF_X | PF_W)) != PF_X)
+                continue;
+            const ElfW(Addr) begin = (library->dlpi_addr + segment.p_vaddr) / page * page;
+            const ElfW(Addr) end = library->dlpi_addr + segment.p_vaddr + segment.p_memsz;
+            static_cast<void>(::madvise(reinterpret_cast<void*>(begin), end - begin, MADV_DONTNEED));
+        }
+        return 0;
+    };
+    ::dl_iterate_phdr(letGo, nullptr);
 }
 
 } // namespace SystemTool::Platform
