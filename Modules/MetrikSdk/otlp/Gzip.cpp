@@ -11,11 +11,15 @@ namespace {
 constexpr int GZIP_WINDOW_BITS = 15 + 16;
 constexpr int DEFAULT_MEMORY_LEVEL = 8;
 
+/// Of events as the suite reports them, level 3 makes 5 % of their size in 1.7 us an event. The usual level,
+/// 6, makes 4 % and takes 3.8 us.
+constexpr int LEVEL = 3;
+
 class Deflater {
 public:
     Deflater() {
-        if (::deflateInit2(&m_stream, Z_DEFAULT_COMPRESSION, Z_DEFLATED, GZIP_WINDOW_BITS,
-                           DEFAULT_MEMORY_LEVEL, Z_DEFAULT_STRATEGY) != Z_OK)
+        if (::deflateInit2(&m_stream, LEVEL, Z_DEFLATED, GZIP_WINDOW_BITS, DEFAULT_MEMORY_LEVEL,
+                           Z_DEFAULT_STRATEGY) != Z_OK)
             throw std::bad_alloc(); // with the constants above, only a lack of memory can fail
     }
     ~Deflater() { ::deflateEnd(&m_stream); }
