@@ -100,9 +100,9 @@ class HighestRate(unittest.TestCase):
 
 
 class Verdict(unittest.TestCase):
-    RESULTS = {"floods": {"service": run(0, rows_per_second=600.0), "daemon": run(0, rows_per_second=400.0),
+    RESULTS = {"floods": {"service": run(0, rows_per_second=600.0), "daemon": run(0, rows_per_second=240.0),
                           "bare": run(0, cpu={"receiving": 1000, "storing": 0, "others": 0})},
-               "rates": {"service": {"confirmed": run(3000)}, "daemon": {"confirmed": run(2001)}},
+               "rates": {"service": {"confirmed": run(3000)}, "daemon": {"confirmed": run(1201)}},
                "baselines": {"sqlite": {"1000": {"cpu_ns": 3000}}}}
 
     def verdict(self, start, results=None):
