@@ -42,10 +42,13 @@ std::size_t SkipNumber(std::string_view json, std::size_t at) {
 
 /// A text with the number's value that the parser accepts. Empty when the value is beyond the range of a
 /// double, and for a zero without an exponent, which the parser accepts as it is.
+///
+/// The text of a zero has an exponent, too. Without one, the invalid 0e0e309 would become 0.0e309, and the
+/// parser would call that a number that is too big.
 std::string StandIn(const std::string& number) {
     const double value = std::strtod(number.c_str(), nullptr);
     if (value == 0)
-        return number.find_first_of("eE") == std::string::npos ? "" : std::signbit(value) ? "-0.0" : "0.0";
+        return number.find_first_of("eE") == std::string::npos ? "" : std::signbit(value) ? "-0e0" : "0e0";
     std::array<char, 32> text{};
     // Seventeen digits identify each double exactly.
     if (std::isfinite(value))

@@ -205,6 +205,7 @@ TEST(JsonDocument, AnErrorBehindANumberThatTheParserRefusesIsToldWithItsByte) {
     EXPECT_EQ(ErrorOf("\xef\xbb\xbf[0e309,nul]"), "Invalid value. At byte 13.");
     EXPECT_EQ(ErrorOf("[0e309.5]"), ErrorOf("[0e300.5]"));
     EXPECT_NE(ErrorOf("[0e309e5]"), "");
+    EXPECT_EQ(ErrorOf("[0e309,-0e0e309]"), ErrorOf("[0e300,-0e0e309]"));
     EXPECT_NE(ErrorOf("[0e309,\"0e309"), "");
     EXPECT_NE(ErrorOf("[0e309,-"), "");
     EXPECT_NE(ErrorOf("[0e309,\"\\"), "");
