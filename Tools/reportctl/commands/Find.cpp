@@ -126,9 +126,15 @@ private:
     void SearchStore() {
         auto database = store::OpenToRead(store::StorePath());
         m_store.since = store::OldestTime(database);
-        store::Search(database, m_options.text, [this](const store::FoundRow& row) {
-            Add(m_store, m_options.isJson ? JsonOf(row) : TextOf(row));
+        std::deque<store::FoundRow> last; // a line is made of those alone that are shown
+        store::Search(database, m_options.text, [&](const store::FoundRow& row) {
+            ++m_store.found;
+            last.push_back(row);
+            if (last.size() > m_options.limit)
+                last.pop_front();
         });
+        for (const auto& row : last)
+            m_store.lines.push_back(m_options.isJson ? JsonOf(row) : TextOf(row));
     }
 
     /// The service's own, unless no event was ever stored, and those of modules that announced a directory.

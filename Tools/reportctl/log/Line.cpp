@@ -111,6 +111,20 @@ int LevelOf(std::string_view word) {
     return NumberAt(word, 0, word.size());
 }
 
+std::string WordFor(int level) {
+    const auto place = static_cast<std::size_t>(level - 1);
+    return std::string(place < LEVELS.size() ? LEVELS[place] : "");
+}
+
+int LevelIn(std::string_view text) {
+    if (text.size() <= STAMP_FORM.size())
+        return 0;
+    auto word = text.substr(STAMP_FORM.size() + 1);
+    word.remove_prefix(std::min(word.find_first_not_of(' '), word.size()));
+    word = word.substr(0, word.find(' '));
+    return LevelOf(word);
+}
+
 std::optional<Line> ReadLine(std::string_view text) {
     if (!IsStamp(text.substr(0, STAMP_FORM.size())))
         return std::nullopt;
@@ -124,13 +138,12 @@ std::optional<Line> ReadLine(std::string_view text) {
     if (!function)
         return std::nullopt;
     const auto stamp = text.substr(0, STAMP_FORM.size());
-    auto word = level->substr(std::min(level->find_first_not_of(' '), level->size()));
-    word = word.substr(0, word.find(' '));
     return Line{.time = TimeOf(stamp),
                 .stamp = std::string(stamp),
-                .level = LevelOf(word),
+                .level = LevelIn(text),
                 .process = std::string(*process),
                 .site = Unescaped(*site),
+                .number = std::string(*number),
                 .function = Unescaped(function->substr(0, function->find(" #"))),
                 .message = Unescaped(rest)};
 }

@@ -16,7 +16,6 @@ using message::Kind;
 
 constexpr std::string_view UNREADABLE = "[BoostLogError]";
 constexpr std::string_view INSERT = "-insert into OperLog ";
-constexpr int WARN = 3;
 
 bool IsFrom(const Line& line, std::string_view site, std::string_view function) {
     return line.site == site && line.function == function;

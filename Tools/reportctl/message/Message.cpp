@@ -2,16 +2,11 @@
 
 #include "Common/ServiceConstants.h"
 #include "Common/Wire.h"
-#include "SystemTool/IO/JsonDocument.h"
 
 namespace reportctl::message {
 namespace {
 
 using SystemTool::IO::JsonDocument;
-
-std::string ValueText(const JsonDocument& value) {
-    return value.IsObject() ? value.ToJson() : value.ToString();
-}
 
 /// The time in milliseconds. Like the service, it takes every time of ten characters for seconds.
 std::string TimeText(const JsonDocument& createTime) {
@@ -41,6 +36,10 @@ const char* WordFor(Kind kind) {
     default:
         return "other";
     }
+}
+
+std::string ValueText(const JsonDocument& value) {
+    return value.IsObject() ? value.ToJson() : value.ToString();
 }
 
 Message Read(const std::string& text) {

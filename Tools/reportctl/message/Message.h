@@ -2,6 +2,8 @@
 
 #include <string>
 
+#include "SystemTool/IO/JsonDocument.h"
+
 namespace reportctl::message {
 
 /// What kind of message a text is.
@@ -29,6 +31,9 @@ struct Message {
     std::string module;
     std::string directory; ///< that an announcement names for the module's events; empty without one
 };
+
+/// The value as the service reads it: an object as JSON, any other value as a text.
+std::string ValueText(const SystemTool::IO::JsonDocument& value);
 
 Message Read(const std::string& text);
 

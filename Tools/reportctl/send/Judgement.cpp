@@ -8,6 +8,7 @@
 #include "Common/ServiceConstants.h"
 #include "Common/Wire.h"
 #include "SystemTool/IO/JsonDocument.h"
+#include "Tools/reportctl/message/Message.h"
 #include "Tools/reportctl/terminal/Printable.h"
 
 namespace reportctl::send {
@@ -60,11 +61,6 @@ void JudgeForStore(Judgement& judgement, const std::string& name, const std::str
             fmt::format("its {} holds a zero character (\\u0000). The service puts the "
                         "text into its SQL as it is, and {}",
                         name, store.loss));
-}
-
-/// The value as the service reads it: an object as JSON, any other value as a text.
-std::string ValueText(const JsonDocument& value) {
-    return value.IsObject() ? value.ToJson() : value.ToString();
 }
 
 bool IsNumber(const std::string& text) {
@@ -137,7 +133,7 @@ void JudgeNames(Judgement& judgement, const std::string& text) {
 
 void JudgeReport(Judgement& judgement, const JsonDocument& report) {
     const auto eventID = report.GetKeyValue(Wire::REPORT_MARK).ToString();
-    const auto value = ValueText(report.GetKeyValue("value"));
+    const auto value = message::ValueText(report.GetKeyValue("value"));
     const auto time = report.GetKeyValue("createTime").ToString();
     const bool isForAnalytics = eventID.starts_with(Wire::ANALYTICS_PREFIX);
     judgement.what = fmt::format("event {}, for {}", report.GetKeyValue(Wire::REPORT_MARK).ToJson(),

@@ -36,7 +36,7 @@ void Read(SQLite::Database& database, Store& store) {
         return;
     CountRows(database, store);
     SQLite::Statement newest(database, "select createTime from OperLog order by rowid desc limit 1");
-    if (newest.executeStep())
+    if (newest.executeStep() && !newest.getColumn(0).isNull())
         store.newestCreateTime = newest.getColumn(0).getString();
 }
 

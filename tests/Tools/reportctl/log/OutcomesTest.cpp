@@ -48,6 +48,7 @@ protected:
                         .level = 2,
                         .process = "1",
                         .site = "App/ReportServer",
+                        .number = {},
                         .function = "Recv",
                         .message = text});
     }

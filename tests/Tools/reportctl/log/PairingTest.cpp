@@ -20,6 +20,7 @@ protected:
                         .level = level,
                         .process = process,
                         .site = site,
+                        .number = {},
                         .function = function,
                         .message = message});
     }
