@@ -1,12 +1,10 @@
-#include <atomic>
-#include <chrono>
 #include <filesystem>
-#include <thread>
 
 #include <SQLiteCpp/Database.h>
 #include <gtest/gtest.h>
 
 #include "tests/e2e/support/Service.h"
+#include "tests/e2e/support/SteadyReports.h"
 #include "tests/support/WaitUntil.h"
 
 // What people do with the store while the service writes to it. No report that is sent meanwhile may be lost
@@ -17,41 +15,9 @@ namespace {
 using namespace std::chrono_literals;
 
 constexpr int OLD_ROWS = 150'000;
-#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
-constexpr int RATE = 200; // reports a second; a program with a sanitizer is much slower
-#else
-constexpr int RATE = 2'000;
-#endif
-
-/// Sends reports at a fixed rate on a thread of its own, until Stop.
-class Stream {
-public:
-    Stream() : m_thread([this] { Run(); }) {}
-    ~Stream() { Stop(); }
-    Stream(const Stream&) = delete;
-    Stream& operator=(const Stream&) = delete;
-
-    /// Stops sending. Returns how many reports were sent.
-    int Stop() {
-        m_stop = true;
-        if (m_thread.joinable())
-            m_thread.join();
-        return m_sent;
-    }
-
-private:
-    void Run() {
-        const auto begin = std::chrono::steady_clock::now();
-        for (; !m_stop; ++m_sent) {
-            std::this_thread::sleep_until(begin + std::chrono::microseconds(1'000'000LL * m_sent / RATE));
-            Service::Send(R"({"eventID":"new|1","value":"as people write it","createTime":1900000000})");
-        }
-    }
-
-    std::atomic<bool> m_stop = false;
-    int m_sent = 0;
-    std::thread m_thread;
-};
+std::string NewReport(int) {
+    return R"({"eventID":"new|1","value":"as people write it","createTime":1900000000})";
+}
 
 class StoreInUse : public testing::Test {
 protected:
@@ -84,7 +50,7 @@ protected:
 
 TEST_F(StoreInUse, IsPrunedWithoutAReportLost) {
     const auto before = std::filesystem::file_size(m_service.DatabaseFile());
-    Stream reports;
+    SteadyReports reports(NewReport);
     ASSERT_EQ(m_service.Reportctl({"prune", "--older-than", "2025-01-01", "--yes"}), 0) << m_service.Output();
     const auto walBytes = WalBytes();
     // The file becomes shorter when the write-ahead log has been merged and no writer has newer pages in it.
@@ -99,7 +65,7 @@ TEST_F(StoreInUse, IsPrunedWithoutAReportLost) {
 
 TEST_F(StoreInUse, IsExportedCountedAndCopiedWithoutAReportLost) {
     const auto copy = m_service.DataDirectory() + "/backup";
-    Stream reports;
+    SteadyReports reports(NewReport);
     for (const auto& arguments :
          {std::vector<std::string>{"export", "--output", m_service.DataDirectory() + "/out.csv"},
           std::vector<std::string>{"stats", "--by", "hour"}, std::vector<std::string>{"backup", copy}})

@@ -113,9 +113,13 @@ pid_t Service::Spawn(const std::string& program, const std::vector<std::string>&
     return process;
 }
 
+pid_t Service::LaunchReportctl(const std::vector<std::string>& arguments) const {
+    return Spawn(std::string(SSR_BIN_DIR) + "/reportctl", arguments);
+}
+
 int Service::Reportctl(const std::vector<std::string>& arguments) const {
     int status = 0;
-    ::waitpid(Spawn(std::string(SSR_BIN_DIR) + "/reportctl", arguments), &status, 0);
+    ::waitpid(LaunchReportctl(arguments), &status, 0);
     return CodeOf(status);
 }
 

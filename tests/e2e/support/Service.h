@@ -43,7 +43,10 @@ public:
     /// output goes to Output().
     int Reportctl(const std::vector<std::string>& arguments) const;
 
-    /// Does what an installation does: runs `reportctl setup`.
+    /// Starts `reportctl` in the same way and waits for nothing; the caller ends it.
+    pid_t LaunchReportctl(const std::vector<std::string>& arguments) const;
+
+    /// What an installation does: `reportctl setup`.
     void Install() const;
 
     /// Starts the program, and waits until it takes datagrams (see Bound) or has ended.
