@@ -92,6 +92,7 @@ void AddStatus(CLI::App& app, int& exitCode) {
                          "Show it again every SECONDS (2 unless given), until a signal ends it.")
             ->type_name("SECONDS")
             ->expected(0, 1)
+            ->default_str(fmt::format("{}", options->seconds)) // else it is 0 when the number is left out
             ->check(CLI::Range(0.1, 86400.0));
     status->callback([options, watch, &exitCode] {
         options->isWatch = watch->count() > 0;

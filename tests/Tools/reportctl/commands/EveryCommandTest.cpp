@@ -128,6 +128,12 @@ TEST_F(EveryCommand, EndsQuietlyWhenItsReaderHasGone) {
     }
 }
 
+TEST_F(EveryCommand, WaitsBetweenTwoLooksAlsoWhereNoTimeIsGiven) {
+    const auto text = OutputOf("status --watch", "timeout --signal=INT 1 env");
+    EXPECT_EQ(text.find("verdict"), text.rfind("verdict")) << "it looked more than once in a second";
+    EXPECT_NE(text, "");
+}
+
 TEST_F(EveryCommand, SaysThatWhatItPrintsCannotBeWritten) {
     auto commands = LOOK;
     commands.insert(commands.end(), CHANGE.begin(), CHANGE.end());
