@@ -13,6 +13,11 @@ namespace {
 /// All users may read the file, because a monitoring system runs as another user.
 constexpr mode_t READABLE = 0644;
 
+constexpr auto HELP = "Examples:\n"
+                      "  reportctl metrics\n"
+                      "  reportctl metrics --output /var/lib/prometheus/node-exporter/hublink-report.prom\n"
+                      "\n";
+
 } // namespace
 
 void AddMetrics(CLI::App& app, int& exitCode) {
@@ -25,6 +30,7 @@ void AddMetrics(CLI::App& app, int& exitCode) {
             "--output", *file,
             "Write them to FILE, readable for all users: the whole of it or, on a failure, none of it.")
         ->type_name("FILE");
+    metrics->footer(HELP + app.get_footer());
     metrics->callback([file, &exitCode] {
         const auto status = status::Gather();
         terminal::Result result(*file, READABLE);

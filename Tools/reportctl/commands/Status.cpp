@@ -15,6 +15,14 @@
 namespace reportctl::commands {
 namespace {
 
+constexpr auto HELP = "Examples:\n"
+                      "  reportctl status\n"
+                      "  reportctl status --watch 5\n"
+                      "  reportctl status --json | jq -r '.reasons[]'\n"
+                      "\n"
+                      "Exit codes: 0 healthy; 1 degraded; 2 down; 100 and above: the command line was not "
+                      "understood.";
+
 struct Options {
     bool isJson = false;
     bool isWatch = false;
@@ -94,6 +102,7 @@ void AddStatus(CLI::App& app, int& exitCode) {
             ->expected(0, 1)
             ->default_str(fmt::format("{}", options->seconds)) // else it is 0 when the number is left out
             ->check(CLI::Range(0.1, 86400.0));
+    status->footer(HELP);
     status->callback([options, watch, &exitCode] {
         options->isWatch = watch->count() > 0;
         exitCode = options->isWatch ? Watch(*options) : ShowOnce(*options);
