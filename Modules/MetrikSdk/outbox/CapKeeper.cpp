@@ -6,9 +6,7 @@ namespace MetrikSdk::outbox {
 
 void CapKeeper::FileOpened(OutboxStore& store, SteadyTime now) {
     Recount(store);
-    const auto wall = WallNow();
-    m_clocks = {now, wall, PruneRule::BeginWatch(wall, now)};
-    m_nextAgeCheck = now;
+    m_watch.FileOpened(WallNow(), now);
 }
 
 void CapKeeper::EventStored(std::size_t bytes) {
@@ -26,24 +24,13 @@ void CapKeeper::Recount(OutboxStore& store) {
 
 void CapKeeper::KeepWithinCaps(OutboxStore& store, SteadyTime now, std::vector<report::News>& news) {
     TellIfOver(now, news);
-    const auto excess = PruneRule::ExcessBytes(m_waitingBytes, m_caps);
-    if (excess == 0 && now < m_nextAgeCheck)
+    if (!m_watch.IsDue(m_waitingBytes, now))
         return;
-    const auto maxRows = m_caps.maxDropsAtOnce;
-    const auto dropped = store.DropOldest(m_underWayUpTo, OldestAllowed(now), excess, maxRows);
+    const auto order = m_watch.Look(m_waitingBytes, WallNow(), now);
+    const auto dropped = store.DropOldest(m_underWayUpTo, order.before, order.excessBytes, order.maxEvents);
     Recount(store);
-    if (dropped.events < maxRows) // otherwise more may be due, and the next event goes on
-        m_nextAgeCheck = now + m_caps.ageCheckInterval;
+    m_watch.Dropped(dropped.events, now);
     CountDrops(dropped, now, news);
-}
-
-WallTime CapKeeper::OldestAllowed(SteadyTime now) {
-    const auto wall = WallNow();
-    m_clocks.watch = PruneRule::LookAgain(m_clocks.watch, wall, now);
-    if (!PruneRule::MayDropByAge(m_clocks.watch, m_caps))
-        return WallTime::min();
-    const auto elapsed = std::chrono::duration_cast<std::chrono::milliseconds>(now - m_clocks.openedSteady);
-    return PruneRule::OldestAllowed(wall, m_clocks.openedAt, elapsed, m_caps);
 }
 
 void CapKeeper::CountDrops(const OutboxStore::Dropped& dropped, SteadyTime now,

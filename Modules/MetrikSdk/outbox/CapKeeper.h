@@ -5,24 +5,23 @@
 #include <vector>
 
 #include "Modules/MetrikSdk/Settings.h"
+#include "Modules/MetrikSdk/outbox/CapWatch.h"
 #include "Modules/MetrikSdk/outbox/CountWaiter.h"
 #include "Modules/MetrikSdk/outbox/OutboxStore.h"
-#include "Modules/MetrikSdk/outbox/PruneRule.h"
 #include "Modules/MetrikSdk/report/LossRun.h"
 #include "Modules/MetrikSdk/report/News.h"
 
 namespace MetrikSdk::outbox {
 
-/// Keeps an outbox within its caps: counts what waits, looks for events that are too many or too old, and
-/// drops them. The rules are in PruneRule. This class decides when to look, and remembers what the clocks
-/// have shown since the file was opened.
+/// Keeps an outbox within its caps: knows how much waits, drops what is too much or too old, and tells.
+/// When to look, and what for, is CapWatch's.
 ///
 /// Threads: one at a time. Failure: throws StoreError.
 class CapKeeper {
 public:
     /// `waiting` gets the number of waiting events. It must outlive this object.
     CapKeeper(const CapSettings& caps, CountWaiter& waiting)
-        : m_caps(caps), m_waiting(waiting), m_drops(caps.dropRunEnds) {}
+        : m_caps(caps), m_waiting(waiting), m_watch(m_caps), m_drops(caps.dropRunEnds) {}
 
     /// Call this when another file was opened: what is known about the old file is no longer true.
     void FileOpened(OutboxStore& store, SteadyTime now);
@@ -52,14 +51,6 @@ public:
     void SetUnderWay(std::int64_t lastRow) { m_underWayUpTo = lastRow; }
 
 private:
-    /// What both clocks have shown since the file was opened.
-    struct Clocks {
-        SteadyTime openedSteady{};
-        WallTime openedAt{};
-        PruneRule::ClockWatch watch;
-    };
-
-    WallTime OldestAllowed(SteadyTime now);
     void CountDrops(const OutboxStore::Dropped& dropped, SteadyTime now, std::vector<report::News>& news);
     static void TellEndOfRun(const std::optional<std::string>& totals, std::vector<report::News>& news);
 
@@ -68,8 +59,7 @@ private:
     std::int64_t m_waitingEvents = 0;
     std::int64_t m_waitingBytes = 0;
     std::int64_t m_underWayUpTo = 0;
-    Clocks m_clocks;
-    SteadyTime m_nextAgeCheck{};
+    CapWatch m_watch;
     report::LossRun m_drops;
 };
 

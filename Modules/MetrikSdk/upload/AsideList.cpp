@@ -4,7 +4,7 @@
 
 namespace MetrikSdk::upload {
 
-void AsideList::Add(const StoredEvent& event, WallTime now) {
+void AsideList::Add(const EventKey& event, WallTime now) {
     m_keys[event.row] = event.uuid;
     m_entries[event.row] = {now + m_settings.firstPause, 0, false};
 }

@@ -35,7 +35,7 @@ public:
 
     bool IsFull() const { return m_keys.size() >= m_settings.maxEvents; }
 
-    void Add(const StoredEvent& event, WallTime now);
+    void Add(const EventKey& event, WallTime now);
     void Remove(std::int64_t row);
 
     /// Call this when an event was taken, whether it was in this list or not.

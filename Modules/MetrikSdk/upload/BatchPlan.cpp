@@ -1,31 +1,30 @@
 #include "Modules/MetrikSdk/upload/BatchPlan.h"
 
 namespace MetrikSdk::upload {
-namespace {
 
-std::size_t CountWithin(const Batch& oldest, std::size_t maxEvents, std::size_t maxBytes) {
-    std::size_t count = 0;
+QueueHead HeadOf(const Batch& oldest, std::size_t maxEvents, const BatchSettings& settings) {
+    QueueHead head{oldest.events.size(), 0, {}};
     std::size_t bytes = 0;
     for (const auto& event : oldest.events) {
         bytes += event.bytes;
-        if (count == maxEvents || (count > 0 && bytes > maxBytes))
+        if (head.fitting == maxEvents || (head.fitting > 0 && bytes > settings.maxBytes))
             break;
-        ++count;
+        ++head.fitting;
     }
-    return count;
+    if (head.count > 0)
+        head.oldest = oldest.events.front().storedAt;
+    return head;
 }
 
-} // namespace
-
-BatchPlan PlanBatch(const Batch& oldest, std::size_t maxEvents, WallTime now, const BatchSettings& settings) {
-    if (oldest.events.empty())
+BatchPlan PlanBatch(const QueueHead& head, std::size_t maxEvents, WallTime now,
+                    const BatchSettings& settings) {
+    if (head.count == 0)
         return {};
-    const auto count = CountWithin(oldest, maxEvents, settings.maxBytes);
-    const bool full = count == maxEvents || count < oldest.events.size();
-    const auto age = now - Computable(oldest.events.front().storedAt);
+    const bool full = head.fitting == maxEvents || head.fitting < head.count;
+    const auto age = now - Computable(head.oldest);
     if (full || age < -settings.linger || age >= settings.linger)
-        return {count, std::chrono::milliseconds(0)};
-    return {count, settings.linger - age};
+        return {head.fitting, std::chrono::milliseconds(0)};
+    return {head.fitting, settings.linger - age};
 }
 
 } // namespace MetrikSdk::upload

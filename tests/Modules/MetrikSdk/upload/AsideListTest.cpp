@@ -9,11 +9,8 @@ namespace {
 
 const WallTime NOW{1'700'000'000s};
 
-StoredEvent Event(std::int64_t row) {
-    StoredEvent event;
-    event.row = row;
-    event.uuid = "uuid-" + std::to_string(row);
-    return event;
+EventKey Event(std::int64_t row) {
+    return {row, "uuid-" + std::to_string(row)};
 }
 
 class TheAsideList : public testing::Test {

@@ -25,7 +25,8 @@ upload::BatchPlan Plan(const Batch& waiting) {
     settings.maxEvents = 10;
     settings.maxBytes = 1000;
     settings.linger = 1s;
-    return upload::PlanBatch(waiting, settings.maxEvents, NOW, settings);
+    const auto head = upload::HeadOf(waiting, settings.maxEvents, settings);
+    return upload::PlanBatch(head, settings.maxEvents, NOW, settings);
 }
 
 TEST(BatchPlan, HasNothingToSendFromAnEmptyOutbox) {
