@@ -50,11 +50,16 @@ struct BatchSettings {
 /// When to try again. The wait after n failures is random, uniform in [0, min(maxWait, firstWait * 2^(n-1))]:
 /// the machines of a fleet that lost its collector must not all come back at the same moment.
 struct RetrySettings {
+    /// The first request after a start waits for a random time up to this: thousands of machines may start
+    /// together, after a power cut or an update, and each has events waiting. docs/Fleet.md has the figures.
+    std::chrono::milliseconds startSpread = std::chrono::minutes(1);
     std::chrono::milliseconds firstWait = std::chrono::seconds(1);
     /// When a collector comes back, the uploader notices it within this time.
     std::chrono::milliseconds maxWait = std::chrono::minutes(5);
     /// A Retry-After beyond this is a mistake, or an attack.
     std::chrono::milliseconds maxRetryAfter = std::chrono::days(1);
+    /// A Retry-After is exceeded by a random time, up to as long again and up to this: see maxWait.
+    std::chrono::milliseconds maxRetryAfterSpread = std::chrono::minutes(5);
     /// After this many events that were refused for good, with no accepted one between them, the address or
     /// the credentials are at fault and not the events. From then on, the uploader waits after each refusal
     /// as after a network fault.

@@ -52,6 +52,7 @@ class Installation:
             **{key: value for key, value in os.environ.items() if not key.startswith("OTEL_")},
             "XDG_DATA_HOME": str(data),
             "OTEL_EXPORTER_OTLP_ENDPOINT": endpoint,
+            "METRIK_START_SPREAD": "0",
             "OTEL_RESOURCE_ATTRIBUTES": f"deployment.environment.name={name}",
         }
         self.reportctl("setup")

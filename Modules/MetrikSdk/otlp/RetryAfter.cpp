@@ -10,6 +10,8 @@
 namespace MetrikSdk::otlp {
 
 std::optional<std::chrono::milliseconds> ParseRetryAfter(const std::string& header, WallTime now) {
+    if (header.empty())
+        return std::nullopt;
     constexpr std::int64_t FAR = 1'000'000'000; // in seconds; keeps sums with a hostile number in range
     std::int64_t seconds = 0;
     const auto end = header.data() + header.size();

@@ -9,8 +9,9 @@
 
 namespace MetrikSdk::outbox {
 
-/// When an outbox looks for events that are too much or too old, and what it drops then. The rules are PruneRule's; here
-/// is what was seen of the clocks since the file was opened. Pure: the times are the caller's. Threads: one at a time.
+/// When an outbox looks for events that are too much or too old, and what it drops then. The rules are
+/// PruneRule's; here is what was seen of the clocks since the file was opened. Pure: the times are the
+/// caller's. Threads: one at a time.
 class CapWatch {
 public:
     /// The settings outlive this object.

@@ -6,6 +6,7 @@
 #include <sqlite3.h>
 
 #include "Modules/MetrikSdk/outbox/OutboxSchema.h"
+#include "Modules/MetrikSdk/outbox/PruneRule.h"
 #include "Modules/MetrikSdk/outbox/SqliteGuard.h"
 #include "Modules/MetrikSdk/outbox/Uuid.h"
 #include "Modules/Sqlite/DeletedLog.h"
@@ -13,10 +14,6 @@
 
 namespace MetrikSdk::outbox {
 namespace {
-
-/// What the row and the b-tree of an event take, roughly. Without it, a million empty events would count as
-/// nothing.
-constexpr std::size_t ROW_OVERHEAD_BYTES = 80;
 
 /// How many modules' keys are kept in memory. With more modules, the keys are forgotten and looked up again.
 constexpr std::size_t MAX_KNOWN_MODULES = 1000;
@@ -135,7 +132,7 @@ void OutboxStore::KeepLogOnClose(bool keep) {
 std::size_t OutboxStore::Store(const ModuleIdentity& module, const NewEvent& event) {
     return Guarded("Cannot store an event", [&] {
         const auto keys = KeysOf(module);
-        const auto bytes = event.payload.size() + event.eventId.size() + ROW_OVERHEAD_BYTES;
+        const auto bytes = PruneRule::BytesOf(event);
         const Use insert(*m_insert);
         insert->bindNoCopy(1, event.uuid);
         insert->bind(2, keys.module);

@@ -3,6 +3,16 @@
 #include <algorithm>
 
 namespace MetrikSdk::outbox::PruneRule {
+namespace {
+
+/// Row and b-tree overhead of an event, roughly, so that a million empty events do not count as nothing.
+constexpr std::size_t ROW_OVERHEAD_BYTES = 80;
+
+} // namespace
+
+std::size_t BytesOf(const NewEvent& event) {
+    return event.payload.size() + event.eventId.size() + ROW_OVERHEAD_BYTES;
+}
 
 std::int64_t ExcessBytes(std::int64_t waitingBytes, const CapSettings& caps) {
     const auto cap = static_cast<std::int64_t>(caps.maxWaitingBytes);

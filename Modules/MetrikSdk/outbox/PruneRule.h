@@ -2,12 +2,16 @@
 
 #include <cstdint>
 
+#include "Modules/MetrikSdk/Event.h"
 #include "Modules/MetrikSdk/Settings.h"
 #include "Modules/MetrikSdk/Time.h"
 
 /// The rules for what is too much and what is too old. Pure. The outbox decides when to look, and drops the
 /// events.
 namespace MetrikSdk::outbox::PruneRule {
+
+/// What an event counts for in every bound on bytes.
+std::size_t BytesOf(const NewEvent& event);
 
 /// How many bytes must go; 0 while the cap holds. It is a little more than the excess, so that the next event
 /// does not exceed the cap again.

@@ -4,6 +4,7 @@
 #include <new>
 #include <utility>
 
+#include "Modules/MetrikSdk/upload/StartSpread.h"
 #include "Modules/Sqlite/SafeDirectory.h"
 #include "SystemTool/CommonTool.h"
 #include "SystemTool/Text/Utf8.h"
@@ -50,8 +51,11 @@ std::shared_ptr<OutboxEngine> OutboxRegistry::Acquire(const std::string& directo
     if (!engine) {
         std::vector<std::string> complaints;
         const auto endpoint = otlp::ReadEndpoint(m_lookUp, complaints);
-        if (endpoint)
+        if (endpoint) {
             settings.resource = otlp::ReadResource(m_lookUp, complaints);
+            if (const auto spread = upload::ReadStartSpread(m_lookUp, complaints))
+                settings.retry.startSpread = *spread;
+        }
         engine =
             std::make_shared<OutboxEngine>(chosen, settings, endpoint, std::move(complaints), m_reporter);
         known = engine;

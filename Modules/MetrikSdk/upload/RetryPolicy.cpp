@@ -65,6 +65,10 @@ SystemTool::IO::JsonDocument ParseAnswer(const std::string& body) {
     return answer;
 }
 
+std::chrono::milliseconds Part(double part, std::chrono::milliseconds whole) {
+    return std::chrono::milliseconds(static_cast<std::int64_t>(part * static_cast<double>(whole.count())));
+}
+
 } // namespace
 
 Verdict Judge(const otlp::HttpResult& result) {
@@ -82,6 +86,8 @@ Verdict Judge(const otlp::HttpResult& result) {
 }
 
 PartialSuccess ReadPartialSuccess(const otlp::HttpResult& result, std::size_t sent) {
+    if (result.body.empty())
+        return {};
     const auto partial = ParseAnswer(result.body).GetKeyValue("partialSuccess");
     // By the protocol's rules, a 64-bit integer is a text. Some collectors write a number.
     const auto text = partial.GetKeyValue("rejectedLogRecords").ToString();
@@ -96,10 +102,15 @@ PartialSuccess ReadPartialSuccess(const otlp::HttpResult& result, std::size_t se
             text.empty() || (isNumber && rejected <= sent) ? std::string() : OneLine(text)};
 }
 
-std::chrono::milliseconds WishedWait(const otlp::HttpResult& result, WallTime now,
+std::chrono::milliseconds WishedWait(const otlp::HttpResult& result, double random, WallTime now,
                                      const RetrySettings& settings) {
-    const auto wished = otlp::ParseRetryAfter(result.retryAfter, now).value_or(std::chrono::milliseconds(0));
-    return std::min(wished, settings.maxRetryAfter);
+    const auto parsed = otlp::ParseRetryAfter(result.retryAfter, now).value_or(std::chrono::milliseconds(0));
+    const auto wished = std::min(parsed, settings.maxRetryAfter);
+    return wished + Part(random, std::min(wished, settings.maxRetryAfterSpread));
+}
+
+std::chrono::milliseconds WaitAtStart(double random, const RetrySettings& settings) {
+    return Part(random, settings.startSpread);
 }
 
 std::chrono::milliseconds WaitBefore(const otlp::HttpResult& result, int failures, double random,
@@ -107,7 +118,7 @@ std::chrono::milliseconds WaitBefore(const otlp::HttpResult& result, int failure
     const auto doubled = static_cast<double>(settings.firstWait.count()) * std::pow(2.0, failures - 1);
     const auto ceiling = std::min(doubled, static_cast<double>(settings.maxWait.count()));
     const std::chrono::milliseconds own(static_cast<std::int64_t>(random * ceiling));
-    return std::max(own, WishedWait(result, now, settings));
+    return std::max(own, WishedWait(result, random, now, settings));
 }
 
 std::string Describe(const otlp::HttpResult& result) {

@@ -35,15 +35,18 @@ Verdict Judge(const otlp::HttpResult& result);
 
 PartialSuccess ReadPartialSuccess(const otlp::HttpResult& result, std::size_t sent);
 
+/// How long to wait before the first request of a process. `random` is uniform in [0, 1).
+std::chrono::milliseconds WaitAtStart(double random, const RetrySettings& settings);
+
 /// How long to wait before the next attempt, after `failures` (at least 1) in a row. `random` is uniform in
 /// [0, 1). The collector's wish counts up to its limit, and never shortens our own wait: a collector that
 /// always answers "after 0 seconds" must not be asked in a loop.
 std::chrono::milliseconds WaitBefore(const otlp::HttpResult& result, int failures, double random,
                                      WallTime now, const RetrySettings& settings);
 
-/// How long the collector wishes us to wait, up to the limit; 0 when it says nothing. Any answer may carry
-/// this wish.
-std::chrono::milliseconds WishedWait(const otlp::HttpResult& result, WallTime now,
+/// How long the collector wishes us to wait, up to the bound, and a random time more: it tells all machines
+/// the same, and they must not come back together. 0 when it says nothing. It may say so in any answer.
+std::chrono::milliseconds WishedWait(const otlp::HttpResult& result, double random, WallTime now,
                                      const RetrySettings& settings);
 
 /// One line about what went wrong, for people.

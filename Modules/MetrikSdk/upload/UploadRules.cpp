@@ -52,7 +52,7 @@ std::size_t UploadRules::Fitting(const RequestSize& encoded) const {
 UploadRules::Decision UploadRules::Answered(const Sent& sent, const otlp::HttpResult& result, double random,
                                             WallTime now, EventQueue& queue) {
     auto decision = Decide(sent, result, random, now, queue);
-    const auto wished = RetryPolicy::WishedWait(result, now, m_settings.retry);
+    const auto wished = RetryPolicy::WishedWait(result, random, now, m_settings.retry);
     if (wished > decision.pause.duration)
         decision.pause = Pause{wished};
     return decision;

@@ -36,11 +36,12 @@ public:
     virtual bool HasOthersThan(const EventKeys& these) = 0;
 };
 
-/// What an uploader does next, and what an answer means for it: all of its decisions, none of its deeds. It neither reads
-/// a file, sends, nor sleeps. So the simulation of a fleet (bench/fleet) has the same rules as the service.
+/// What an uploader does next, and what an answer means for it: all of its decisions, none of its deeds. It
+/// neither reads a file, sends, nor sleeps. So the simulation of a fleet (bench/fleet) has the same rules as
+/// the service.
 ///
 ///     WhatNext ──► a pause       ──► WhatNext
-///              └─► a request     ──► Answered: what becomes of its events, and a pause ──► WhatNext
+///              └─► a request     ──► Answered: what becomes of it, and a pause ──► …
 ///
 /// Threads: one. Failure: passes on what the queue throws. Pure otherwise: time and chance are the caller's.
 class UploadRules {
@@ -56,7 +57,11 @@ public:
     };
     Next WhatNext(EventQueue& queue, WallTime now);
 
-    /// How many of the events to send, now that the length of the body is known. When there are fewer, ask again.
+    /// Events that others go past.
+    const EventKeys& Aside() const { return m_aside.Keys(); }
+
+    /// How many of the events to send, now that the length of the body is known. When there are fewer, ask
+    /// again.
     std::size_t Fitting(const RequestSize& encoded) const;
 
     /// A request, as far as the rules need it.

@@ -40,10 +40,24 @@ private:
     sigset_t m_before{};
 };
 
+/// Uniform in [0, 1).
+class Chance {
+public:
+    double operator()() { return m_uniform(m_generator); }
+
+private:
+    std::mt19937_64 m_generator{std::random_device{}()};
+    std::uniform_real_distribution<double> m_uniform{0.0, 1.0};
+};
+
+/// No event shortens it: what is reported at a start would be sent by all machines at once, too.
+void WaitForTheFirstRequest(process::OutboxCore& core) {
+    const auto wait = RetryPolicy::WaitAtStart(Chance()(), core.settings.retry);
+    core.outbox.WaitingCount().Await(outbox::CountWaiter::NEVER, std::chrono::steady_clock::now() + wait);
+}
+
 void RunUploads(process::OutboxCore& core, otlp::Sender& sender) {
-    std::mt19937_64 generator{std::random_device{}()};
-    std::uniform_real_distribution<double> uniform(0.0, 1.0);
-    UploadCycle cycle(core.outbox, sender, core.notifier, core.settings, [&] { return uniform(generator); });
+    UploadCycle cycle(core.outbox, sender, core.notifier, core.settings, Chance());
     auto& waiting = core.outbox.WaitingCount();
     while (!waiting.Stopped()) {
         const auto pause = cycle.Pass(WallNow());
@@ -63,8 +77,11 @@ void TellFailure(process::OutboxCore& core, const char* reason) noexcept {
 void RunUntilStopped(process::OutboxCore& core, otlp::Sender& sender) noexcept {
     constexpr std::chrono::seconds RECOVERY(10);
     auto& waiting = core.outbox.WaitingCount();
+    bool isFirst = true;
     while (!waiting.Stopped()) {
         try {
+            if (std::exchange(isFirst, false))
+                WaitForTheFirstRequest(core);
             RunUploads(core, sender);
         } catch (const std::exception& error) {
             TellFailure(core, error.what());

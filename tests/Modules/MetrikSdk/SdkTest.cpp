@@ -214,6 +214,18 @@ TEST_F(TheMetrikSdk, IsReleasedAtOnceWhileItWaitsForTheNextAttempt) {
     EXPECT_TRUE(CanEndWithin(1s, start, [&] { Stop(); }));
 }
 
+TEST_F(TheMetrikSdk, SendsNothingBeforeARandomTimeAfterTheStartHasPassed) {
+    LoopbackServer server([](const Request&) { return Reply(); });
+    Configure("ENDPOINT", server.Url());
+    SetVariable("METRIK_START_SPREAD", "3600000");
+    const auto start = [&] {
+        Start();
+        Report(600); // a full batch, which would be sent at once otherwise
+        EXPECT_FALSE(WaitUntil([&] { return server.RequestCount() > 0; }, 300ms));
+    };
+    EXPECT_TRUE(CanEndWithin(1s, start, [&] { Stop(); })) << "and is released at once meanwhile";
+}
+
 TEST_F(TheMetrikSdk, StoresEventsWhileItUploadsOthers) {
     LoopbackServer server([](const Request&) { return Reply(); });
     Configure("ENDPOINT", server.Url());

@@ -28,6 +28,7 @@ protected:
     PluginFixture() {
         Told::Forget();
         SetVariable("XDG_DATA_HOME", m_directory.Path()); // the plug-in may make missing directories below it
+        SetVariable("METRIK_START_SPREAD", "0");          // the first request at once
     }
 
     /// After every test, the counters must agree with the tables.

@@ -126,16 +126,32 @@ TEST(RetryPolicy, WaitsExponentiallyWithFullJitterUpToTheBound) {
     EXPECT_EQ(wait(1'000'000, 1.0), 5min);
 }
 
+std::chrono::milliseconds WaitAfter(const std::string& retryAfter, double random) {
+    auto result = Answer(503);
+    result.retryAfter = retryAfter;
+    return upload::RetryPolicy::WaitBefore(result, 1, random, NOW, RetrySettings());
+}
+
 TEST(RetryPolicy, HonoursRetryAfterUpToADayAndNeverWaitsLessForIt) {
-    const auto wait = [](const std::string& header, double random) {
-        auto result = Answer(503);
-        result.retryAfter = header;
-        return upload::RetryPolicy::WaitBefore(result, 1, random, NOW, RetrySettings());
-    };
-    EXPECT_EQ(wait("30", 0.9), 30s);
-    EXPECT_EQ(wait("Tue, 21 Nov 2023 08:00:40 GMT", 0.9), 40s);
-    EXPECT_EQ(wait("99999999", 0.9), 24h);
-    EXPECT_EQ(wait("0", 0.9), 900ms);
+    EXPECT_EQ(WaitAfter("30", 0.0), 30s);
+    EXPECT_EQ(WaitAfter("Tue, 21 Nov 2023 08:00:40 GMT", 0.0), 40s);
+    EXPECT_EQ(WaitAfter("99999999", 0.0), 24h);
+    EXPECT_EQ(WaitAfter("0", 0.9), 900ms);
+}
+
+TEST(RetryPolicy, SpreadsARetryAfterThatAllMachinesWereTold) {
+    EXPECT_EQ(WaitAfter("30", 0.5), 45s);
+    EXPECT_EQ(WaitAfter("Tue, 21 Nov 2023 08:00:40 GMT", 0.5), 1min);
+    EXPECT_EQ(WaitAfter("3600", 0.5), 1h + 150s) << "five minutes are enough";
+    EXPECT_EQ(WaitAfter("99999999", 0.5), 24h + 150s);
+}
+
+TEST(RetryPolicy, SpreadsTheFirstRequestsOfMachinesThatStartTogether) {
+    RetrySettings settings;
+    EXPECT_EQ(upload::RetryPolicy::WaitAtStart(0.0, settings), 0ms);
+    EXPECT_EQ(upload::RetryPolicy::WaitAtStart(0.5, settings), 30s);
+    settings.startSpread = 0ms;
+    EXPECT_EQ(upload::RetryPolicy::WaitAtStart(0.9, settings), 0ms);
 }
 
 TEST(RetryPolicy, DescribesAnAnswerInOneShortLine) {
