@@ -29,6 +29,12 @@ struct NewEvent {
     WallTime storedAt;
 };
 
+/// Where an event waits.
+enum class Source {
+    Outbox,
+    Store ///< It is a row of the local store, which `reportctl forward` sends.
+};
+
 /// An event that waits in the outbox.
 struct StoredEvent {
     std::int64_t row = 0;
@@ -39,6 +45,7 @@ struct StoredEvent {
     std::string payload;
     WallTime storedAt;
     std::size_t bytes = 0; ///< How many bytes the event counts in every limit on bytes.
+    Source source = Source::Outbox;
 };
 
 /// Identifies a stored event. The row alone is not enough: in a new file, another event may have the same

@@ -13,9 +13,20 @@
 namespace MetrikSdk::otlp {
 namespace {
 
-constexpr const char* SIGNAL_PREFIX = "OTEL_EXPORTER_OTLP_LOGS_";
 constexpr const char* COMMON_PREFIX = "OTEL_EXPORTER_OTLP_";
-constexpr const char* LOGS_PATH = "v1/logs";
+
+/// What differs between the signals.
+struct SignalNames {
+    std::string prefix; ///< Of its own variables.
+    std::string path;   ///< Behind the common endpoint.
+    std::string exporter;
+};
+
+SignalNames NamesOf(Signal signal) {
+    if (signal == Signal::Metrics)
+        return {"OTEL_EXPORTER_OTLP_METRICS_", "v1/metrics", "OTEL_METRICS_EXPORTER"};
+    return {"OTEL_EXPORTER_OTLP_LOGS_", "v1/logs", "OTEL_LOGS_EXPORTER"};
+}
 
 /// Variables of the same family that have no effect. Our own rules decide instead; docs/Outbox.md describes
 /// them.
@@ -67,8 +78,8 @@ bool IsReserved(const std::string& name) {
 
 class Reader {
 public:
-    Reader(const LookUp& lookUp, std::vector<std::string>& complaints)
-        : m_lookUp(lookUp), m_complaints(complaints) {}
+    Reader(const LookUp& lookUp, std::vector<std::string>& complaints, Signal signal)
+        : m_names(NamesOf(signal)), m_lookUp(lookUp), m_complaints(complaints) {}
 
     bool IsDisabled() {
         const auto disabled = LowerCase(Value("OTEL_SDK_DISABLED"));
@@ -105,7 +116,7 @@ private:
 
     /// Of each pair of variables, the one for this signal wins.
     Variable Pair(const std::string& name) const {
-        Variable variable{SIGNAL_PREFIX + name, Value(SIGNAL_PREFIX + name)};
+        Variable variable{m_names.prefix + name, Value(m_names.prefix + name)};
         if (variable.value.empty())
             variable = {COMMON_PREFIX + name, Value(COMMON_PREFIX + name)};
         return variable;
@@ -115,7 +126,7 @@ private:
     /// until it returns true.
     template <typename Accept>
     void OfferPair(const std::string& name, Accept accept) {
-        for (const char* prefix : {SIGNAL_PREFIX, COMMON_PREFIX}) {
+        for (const std::string& prefix : {m_names.prefix, std::string(COMMON_PREFIX)}) {
             const Variable variable{prefix + name, Value(prefix + name)};
             if (!variable.value.empty() && accept(variable))
                 return;
@@ -124,9 +135,9 @@ private:
 
     /// The variable is a list of exporters. The only exporter that we have is otlp.
     bool IsExporterNone() {
-        const auto exporters = LowerCase(Value("OTEL_LOGS_EXPORTER"));
+        const auto exporters = LowerCase(Value(m_names.exporter));
         if (!exporters.empty() && exporters != "none" && exporters != "otlp")
-            m_complaints.emplace_back("OTEL_LOGS_EXPORTER: only otlp and none are known, and otlp is used");
+            m_complaints.push_back(m_names.exporter + ": only otlp and none are known, and otlp is used");
         return exporters == "none";
     }
 
@@ -152,16 +163,16 @@ private:
         return result;
     }
 
-    /// The URL for logs; empty when the variable is no http or https URL.
-    static std::string UrlOf(const Variable& endpoint) {
+    /// The URL for the signal; empty when the variable is no http or https URL.
+    std::string UrlOf(const Variable& endpoint) const {
         const auto url = ParseUrl(endpoint.value);
         if (!url)
             return {};
-        if (endpoint.name.starts_with(SIGNAL_PREFIX))
+        if (endpoint.name.starts_with(m_names.prefix))
             return endpoint.value;
         auto path = Part(url, CURLUPART_PATH);
         path += (path.ends_with('/') ? "" : "/");
-        Curl().url_set(url.get(), CURLUPART_PATH, (path + LOGS_PATH).c_str(), 0);
+        Curl().url_set(url.get(), CURLUPART_PATH, (path + m_names.path).c_str(), 0);
         return Part(url, CURLUPART_URL);
     }
 
@@ -228,14 +239,16 @@ private:
         });
     }
 
+    const SignalNames m_names;
     const LookUp& m_lookUp;
     std::vector<std::string>& m_complaints;
 };
 
 } // namespace
 
-std::optional<EndpointConfig> ReadEndpoint(const LookUp& lookUp, std::vector<std::string>& complaints) {
-    Reader reader(lookUp, complaints);
+std::optional<EndpointConfig> ReadEndpoint(const LookUp& lookUp, std::vector<std::string>& complaints,
+                                           Signal signal) {
+    Reader reader(lookUp, complaints, signal);
     if (reader.IsDisabled())
         return std::nullopt;
     try {

@@ -22,15 +22,19 @@ struct EndpointConfig {
     std::string clientCertificate;
 };
 
-/// What the environment asks for. Nothing when events are to stay in the outbox: no endpoint is set,
-/// OTEL_SDK_DISABLED is true, or OTEL_LOGS_EXPORTER is none.
+/// What is sent. Each has variables of its own, which win over the common ones, and a path of its own.
+enum class Signal { Logs, Metrics };
+
+/// What the environment asks for. Nothing when nothing is to be sent: no endpoint is set, OTEL_SDK_DISABLED is
+/// true, or OTEL_LOGS_EXPORTER, for metrics OTEL_METRICS_EXPORTER, is none.
 ///
 /// A variable that makes no sense is described in `complaints` and counts as unset, so that the common
 /// variable of its pair is used. Of a list of headers, only the wrong header is left out. A variable that is
 /// set and has no effect is described, too. `lookUp` returns the value of a variable, or null; an empty value
 /// counts as unset.
 using LookUp = std::function<const char*(const char*)>;
-std::optional<EndpointConfig> ReadEndpoint(const LookUp& lookUp, std::vector<std::string>& complaints);
+std::optional<EndpointConfig> ReadEndpoint(const LookUp& lookUp, std::vector<std::string>& complaints,
+                                           Signal signal = Signal::Logs);
 
 /// The URL as people may see it: without user, password, query and fragment, which may be secrets.
 std::string WithoutSecrets(const std::string& url);

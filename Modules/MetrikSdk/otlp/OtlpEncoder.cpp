@@ -1,24 +1,18 @@
 #include "Modules/MetrikSdk/otlp/OtlpEncoder.h"
 
-#include <algorithm>
-#include <array>
 #include <map>
 #include <optional>
 #include <set>
 #include <string_view>
 #include <vector>
 
-#include "Modules/MetrikSdk/Version.h"
 #include "Modules/MetrikSdk/otlp/AnyValue.h"
-#include "Modules/MetrikSdk/otlp/InstanceId.h"
+#include "Modules/MetrikSdk/otlp/Parts.h"
 #include "Modules/MetrikSdk/otlp/Payload.h"
 #include "SystemTool/Text/Utf8.h"
 
 namespace MetrikSdk::otlp {
 namespace {
-
-/// The schema that defines the names of the attributes below, as far as they are common names.
-constexpr const char* SCHEMA_URL = "https://opentelemetry.io/schemas/1.30.0";
 
 /// The severity of all events: an event is neither a warning nor an error.
 constexpr int SEVERITY_INFO = 9;
@@ -50,69 +44,34 @@ private:
 
     void ResourceLogs(const std::string& outboxId, const ModuleIdentity& module, const Events& events) {
         m_writer.StartObject();
-        Resource(outboxId, module);
+        m_writer.Key("resource");
+        WriteResource(m_writer, m_config, outboxId, module);
         m_writer.Key("scopeLogs");
         m_writer.StartArray();
         m_writer.StartObject();
-        Scope();
+        m_writer.Key("scope");
+        WriteScope(m_writer);
         m_writer.Key("logRecords");
         m_writer.StartArray();
         for (const auto* event : events)
             LogRecord(*event, module);
         m_writer.EndArray();
-        TextMember("schemaUrl", SCHEMA_URL);
+        WriteTextMember(m_writer, "schemaUrl", SCHEMA_URL);
         m_writer.EndObject();
         m_writer.EndArray();
-        TextMember("schemaUrl", SCHEMA_URL);
-        m_writer.EndObject();
-    }
-
-    void Resource(const std::string& outboxId, const ModuleIdentity& module) {
-        m_writer.Key("resource");
-        m_writer.StartObject();
-        m_writer.Key("attributes");
-        m_writer.StartArray();
-        OwnResource(outboxId, module);
-        for (const auto& [name, value] : m_config.attributes)
-            if (std::find(OWN_NAMES.begin(), OWN_NAMES.end(), name) == OWN_NAMES.end())
-                TextAttribute(SystemTool::Text::ValidUtf8(name), value);
-        m_writer.EndArray();
-        m_writer.EndObject();
-    }
-
-    /// All names that OwnResource writes.
-    static constexpr std::array<std::string_view, 7> OWN_NAMES{
-        "service.name", "service.namespace", "service.version", "service.instance.id",
-        "os.type",      "os.description",    "metrik.outbox.id"};
-
-    void OwnResource(const std::string& outboxId, const ModuleIdentity& module) {
-        const auto& moduleName = module.name.empty() ? module.id : module.name;
-        TextAttribute("service.name", m_config.serviceName.empty() ? moduleName : m_config.serviceName);
-        TextAttribute("service.namespace", "hublink");
-        TextAttribute("service.version", module.version);
-        TextAttribute("service.instance.id", InstanceId(outboxId, module.id));
-        TextAttribute("os.type", m_config.osType);
-        TextAttribute("os.description", m_config.osDescription);
-        TextAttribute("metrik.outbox.id", outboxId);
-    }
-
-    void Scope() {
-        m_writer.Key("scope");
-        m_writer.StartObject();
-        TextMember("name", "MetrikSdk");
-        TextMember("version", SDK_VERSION);
+        WriteTextMember(m_writer, "schemaUrl", SCHEMA_URL);
         m_writer.EndObject();
     }
 
     void LogRecord(const StoredEvent& event, const ModuleIdentity& module) {
         const Payload payload(event.payload);
         m_writer.StartObject();
-        TextMember("timeUnixNano", Nanoseconds(payload.CreateTime().value_or(event.storedAt)));
-        TextMember("observedTimeUnixNano", Nanoseconds(event.storedAt));
+        WriteTextMember(m_writer, "timeUnixNano", Nanoseconds(payload.CreateTime().value_or(event.storedAt)));
+        WriteTextMember(m_writer, "observedTimeUnixNano", Nanoseconds(event.storedAt));
         m_writer.Key("severityNumber");
         m_writer.Int(SEVERITY_INFO);
-        TextMember("severityText", "INFO");
-        TextMember("eventName", SystemTool::Text::ValidUtf8(event.eventId));
+        WriteTextMember(m_writer, "severityText", "INFO");
+        WriteTextMember(m_writer, "eventName", SystemTool::Text::ValidUtf8(event.eventId));
         m_writer.Key("body");
         if (payload.Object() != nullptr)
             WriteAnyValue(m_writer, *payload.Object());
@@ -121,8 +80,10 @@ private:
         m_writer.Key("attributes");
         m_writer.StartArray();
         TextAttribute("log.record.uid", event.uuid);
-        Attribute("metrik.sequence", "intValue", std::to_string(event.sequence));
-        TextAttribute("metrik.module", module.id);
+        if (event.source == Source::Store)
+            StoreRow(event);
+        else
+            OutboxEvent(event, module);
         TextAttribute("metrik.event", event.eventId); // some collectors do not pass eventName on
         OptionalAttribute("user.id", payload.TextIn("eventData", "openid"));
         OptionalAttribute("hublink.version", payload.TextIn("extend", "hublinkVersion"));
@@ -130,6 +91,19 @@ private:
             DataAttributes(*data);
         m_writer.EndArray();
         m_writer.EndObject();
+    }
+
+    void OutboxEvent(const StoredEvent& event, const ModuleIdentity& module) {
+        IntegerAttribute("metrik.sequence", event.sequence);
+        TextAttribute("metrik.module", module.id);
+    }
+
+    /// No module announced it, and nothing counts it: its id begins with the module's by habit alone.
+    void StoreRow(const StoredEvent& event) {
+        TextAttribute("hublink.source", "store");
+        IntegerAttribute("hublink.row", event.row);
+        if (const auto bar = event.eventId.find('|'); bar != std::string::npos)
+            TextAttribute("metrik.module", event.eventId.substr(0, bar));
     }
 
     void OptionalAttribute(const char* key, const std::optional<std::string>& text) {
@@ -154,41 +128,24 @@ private:
 
     void DataAttribute(std::string_view name, const JsonValue& value) {
         m_writer.StartObject();
-        TextMember("key", "metrik.data." + std::string(name));
+        WriteTextMember(m_writer, "key", "metrik.data." + std::string(name));
         m_writer.Key("value");
         WriteAnyValue(m_writer, value);
         m_writer.EndObject();
     }
 
-    /// The protocol's JSON writes 64-bit integers as texts, because many readers keep numbers as doubles.
-    static std::string Nanoseconds(WallTime time) {
-        const std::chrono::nanoseconds nanoseconds = Computable(time).time_since_epoch();
-        return std::to_string(nanoseconds.count());
-    }
-
-    void TextMember(const char* name, const std::string& text) {
-        m_writer.Key(name);
-        m_writer.String(text.data(), static_cast<rapidjson::SizeType>(text.size()));
-    }
-
     void TextValue(const std::string& text) {
         m_writer.StartObject();
-        TextMember("stringValue", SystemTool::Text::ValidUtf8(text));
+        WriteTextMember(m_writer, "stringValue", SystemTool::Text::ValidUtf8(text));
         m_writer.EndObject();
     }
 
     void TextAttribute(const std::string& key, const std::string& text) {
-        Attribute(key, "stringValue", SystemTool::Text::ValidUtf8(text));
+        WriteTextAttribute(m_writer, key, text);
     }
 
-    void Attribute(const std::string& key, const char* type, const std::string& value) {
-        m_writer.StartObject();
-        TextMember("key", key);
-        m_writer.Key("value");
-        m_writer.StartObject();
-        TextMember(type, value);
-        m_writer.EndObject();
-        m_writer.EndObject();
+    void IntegerAttribute(const std::string& key, std::int64_t value) {
+        WriteAttribute(m_writer, key, "intValue", std::to_string(value));
     }
 
     const ResourceConfig& m_config;
