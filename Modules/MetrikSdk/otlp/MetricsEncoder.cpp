@@ -11,6 +11,9 @@ namespace {
 /// AGGREGATION_TEMPORALITY_CUMULATIVE. The protocol's JSON writes an enumerator as its number.
 constexpr int CUMULATIVE = 2;
 
+/// A start that is not known is left out.
+constexpr WallTime UNKNOWN{};
+
 class Encoder {
 public:
     Encoder(const MetricsSender& sender, const ResourceConfig& config) : m_sender(sender), m_config(config) {}
@@ -71,7 +74,7 @@ private:
 
     void Write(const MetricPoint& point, const std::optional<WallTime>& countsSince) {
         m_writer.StartObject();
-        if (countsSince)
+        if (countsSince.value_or(UNKNOWN) != UNKNOWN)
             WriteTextMember(m_writer, "startTimeUnixNano", Nanoseconds(*countsSince));
         WriteTextMember(m_writer, "timeUnixNano", Nanoseconds(m_sender.now));
         Value(point);

@@ -24,7 +24,8 @@ struct Metric {
     std::string name;
     std::string description; ///< For people.
     std::string unit;        ///< By UCUM, such as "By"; a count of things is in braces, such as "{report}".
-    /// Since when it counts: a sum that only grows, until a later start tells that it began again. Nothing: a gauge.
+    /// Since when it counts, 0 when that is not known: a sum that only grows, until a later start tells that
+    /// it began again. Nothing: a gauge.
     std::optional<WallTime> countsSince;
     std::vector<MetricPoint> points;
 };
@@ -36,8 +37,8 @@ struct MetricsSender {
     WallTime now;
 };
 
-/// The metrics as the body of an OTLP/HTTP JSON metrics request: one resource, cumulative sums and gauges. Pure.
-/// What is not UTF-8 is replaced by U+FFFD.
+/// The metrics as the body of an OTLP/HTTP JSON metrics request: one resource, cumulative sums and gauges.
+/// Pure. What is not UTF-8 is replaced by U+FFFD.
 std::string EncodeMetrics(const std::vector<Metric>& metrics, const MetricsSender& sender,
                           const ResourceConfig& config = {});
 

@@ -23,16 +23,17 @@ Add AddSend;  ///< `send` sends the running service a report or a control messag
 Add AddTail;  ///< `tail` follows the log.
 Add AddFind;  ///< `find` shows where a report is: in the log, the store or the outbox.
 Add AddStats; ///< `stats` counts reports.
-Add AddExport; ///< `export` writes the rows of the store as CSV or JSON Lines.
-Add AddBackup; ///< `backup` copies the databases.
-Add AddPrune;  ///< `prune` deletes old rows.
-Add AddOutbox; ///< `outbox` lists events, retries or purges dead letters, and tests the collector.
-Add AddBundle; ///< `bundle` writes a file for support.
-Add AddPage;   ///< `page` writes the status as a page for a browser.
+Add AddExport;  ///< `export` writes the rows of the store as CSV or JSON Lines.
+Add AddBackup;  ///< `backup` copies the databases.
+Add AddPrune;   ///< `prune` deletes old rows.
+Add AddOutbox;  ///< `outbox` lists events, retries or purges dead letters, and tests the collector.
+Add AddForward; ///< `forward` sends new rows of the store to a collector.
+Add AddBundle;  ///< `bundle` writes a file for support.
+Add AddPage;    ///< `page` writes the status as a page for a browser.
 
 /// All commands, in the order of the help.
 inline constexpr std::array ALL{&AddSetup, &AddRun,  &AddStatus, &AddMetrics, &AddSend,
                                 &AddTail,  &AddFind, &AddStats,  &AddExport,  &AddBackup,
-                                &AddPrune, &AddPage, &AddOutbox, &AddBundle};
+                                &AddPrune, &AddPage, &AddOutbox, &AddForward, &AddBundle};
 
 } // namespace reportctl::commands

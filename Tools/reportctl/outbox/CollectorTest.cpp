@@ -1,7 +1,6 @@
 #include "Tools/reportctl/outbox/CollectorTest.h"
 
 #include <array>
-#include <cstdlib>
 #include <memory>
 #include <vector>
 
@@ -25,21 +24,9 @@ using MetrikSdk::otlp::HttpResult;
 
 constexpr std::size_t BODY_BYTES = 500;
 
-/// libcurl reads these variables from the environment of this process.
-constexpr std::array PROXIES{"http_proxy", "https_proxy", "HTTPS_PROXY", "all_proxy",
-                             "ALL_PROXY",  "no_proxy",    "NO_PROXY"};
-
-void TakeOverProxies(const service::Environment& environment) {
-    for (const auto* name : PROXIES)
-        if (const auto* value = environment.Find(name))
-            ::setenv(name, value, 1); // NOLINT(concurrency-mt-unsafe): this program has one thread
-        else
-            ::unsetenv(name); // NOLINT(concurrency-mt-unsafe)
-}
-
 bool HasProxy(const service::Environment& environment) {
-    for (std::size_t i = 0; i < PROXIES.size() - 2; ++i)
-        if (environment.Find(PROXIES[i]) != nullptr)
+    for (std::size_t i = 0; i < service::PROXIES.size() - 2; ++i)
+        if (environment.Find(service::PROXIES[i]) != nullptr)
             return true;
     return false;
 }
@@ -143,7 +130,7 @@ bool TestCollector(const service::Environment& environment) {
         fmt::print("No collector is configured (OTEL_EXPORTER_OTLP_ENDPOINT): events stay in the outbox.\n");
         return false;
     }
-    TakeOverProxies(environment);
+    service::TakeOverProxies(environment);
     MetrikSdk::otlp::HttpSender sender(*config);
     fmt::print("collector: {}\n", terminal::Printable(sender.Destination()));
     return TellNameResolution(*config, environment) && TellAnswer(*config, sender.Post(TestEvent()));

@@ -1,5 +1,6 @@
 #include "Tools/reportctl/service/Environment.h"
 
+#include <cstdlib>
 #include <filesystem>
 #include <fstream>
 #include <optional>
@@ -18,7 +19,7 @@ void Add(std::map<std::string, std::string>& variables, const std::string& text)
         variables.emplace(text.substr(0, equals), text.substr(equals + 1));
 }
 
-std::map<std::string, std::string> Own() {
+std::map<std::string, std::string> OwnVariables() {
     std::map<std::string, std::string> variables;
     for (char** variable = environ; *variable != nullptr; ++variable)
         Add(variables, *variable);
@@ -52,8 +53,20 @@ const char* Environment::Find(const std::string& name) const {
     return found == variables.end() ? nullptr : found->second.c_str();
 }
 
+Environment Own() {
+    return {0, OwnVariables()};
+}
+
+void TakeOverProxies(const Environment& environment) {
+    for (const auto* name : PROXIES)
+        if (const auto* value = environment.Find(name))
+            ::setenv(name, value, 1); // NOLINT(concurrency-mt-unsafe): this program has one thread
+        else
+            ::unsetenv(name); // NOLINT(concurrency-mt-unsafe)
+}
+
 Environment OfTheService() {
-    auto own = Own();
+    auto own = OwnVariables();
     if (const auto process = LockHolder(); process && OwnerOf(*process) == ::geteuid())
         if (auto variables = Of("/proc/" + std::to_string(*process));
             variables && HasSameData(*variables, own))

@@ -1,4 +1,5 @@
 #include <algorithm>
+#include <charconv>
 #include <filesystem>
 
 #include <fmt/format.h>
@@ -19,6 +20,18 @@ constexpr std::int64_t MOST_TOLD_APART = 20'000;
 constexpr auto TAKEN_AGAIN = "events are taken again";
 constexpr auto STORED_AGAIN = "Events are stored again";
 
+/// A UUID of version 7 begins with the time at which it was made.
+std::optional<std::int64_t> TimeOf(const std::string& uuid) {
+    constexpr std::size_t VERSION_AT = 14;
+    if (uuid.size() <= VERSION_AT || uuid[VERSION_AT] != '7' || uuid[8] != '-')
+        return std::nullopt;
+    const auto digits = uuid.substr(0, 8) + uuid.substr(9, 4);
+    std::int64_t ms = 0;
+    const auto parsed = std::from_chars(digits.data(), digits.data() + digits.size(), ms, 16);
+    const bool isTime = parsed.ec == std::errc() && parsed.ptr == digits.data() + digits.size();
+    return isTime ? std::optional(ms) : std::nullopt;
+}
+
 void ReadTotals(SQLite::Database& database, Outbox& outbox) {
     // An outbox of version 1 never forgets a module, and does not record when it delivered last.
     const bool isOld = database.execAndGet("pragma user_version").getInt() < 2;
@@ -26,7 +39,7 @@ void ReadTotals(SQLite::Database& database, Outbox& outbox) {
         database,
         fmt::format("select delivered, refused, dead_lettered, dropped, dead_letters, removed_bytes, "
                     "(select coalesce(sum(last_sequence), 0) from module) + {}, "
-                    "(select coalesce(sum(stored_bytes), 0) from module) + {}, {} from totals",
+                    "(select coalesce(sum(stored_bytes), 0) from module) + {}, {}, outbox_id from totals",
                     isOld ? "0" : "forgotten_stored", isOld ? "0" : "forgotten_bytes",
                     isOld ? "null" : "last_delivered_ms"));
     if (!totals.executeStep())
@@ -40,6 +53,8 @@ void ReadTotals(SQLite::Database& database, Outbox& outbox) {
     outbox.waitingBytes = number(7) - number(5);
     if (!totals.getColumn(8).isNull())
         outbox.lastDeliveredAtMs = number(8);
+    outbox.id = totals.getColumn(9).getString();
+    outbox.begunAtMs = TimeOf(*outbox.id);
 }
 
 void ReadModules(SQLite::Database& database, Outbox& outbox) {

@@ -58,6 +58,8 @@ struct Outbox {
     };
     std::string path;
     bool isPresent = false;
+    std::optional<std::string> id;         ///< The UUID that was made with the file.
+    std::optional<std::int64_t> begunAtMs; ///< When that was.
     std::optional<std::int64_t> waiting;
     std::optional<std::int64_t> waitingBytes;
     std::optional<std::int64_t> delivered;

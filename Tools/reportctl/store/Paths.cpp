@@ -20,4 +20,8 @@ std::string LedgerPath() {
     return Paths::Run(SystemTool::CommonTool::GetUserDataDir()) + "/" + ReportLedger::FILE_NAME;
 }
 
+std::string ForwardPath() {
+    return Paths::Suite(SystemTool::CommonTool::GetUserDataDir()) + "/forward/Forward.db";
+}
+
 } // namespace reportctl::store

@@ -16,4 +16,7 @@ std::string OutboxPath();
 /// The path of the ledger of this user's service.
 std::string LedgerPath();
 
+/// How far `reportctl forward` has sent the store.
+std::string ForwardPath();
+
 } // namespace reportctl::store

@@ -34,6 +34,11 @@ void JsonObject::Add(const char* key, std::int64_t number) {
     m_writer.Int64(number);
 }
 
+void JsonObject::AddBool(const char* key, bool value) {
+    m_writer.Key(key);
+    m_writer.Bool(value);
+}
+
 void JsonObject::AddNull(const char* key) {
     m_writer.Key(key);
     m_writer.Null();

@@ -21,6 +21,7 @@ public:
 
     void Add(const char* key, std::string_view text);
     void Add(const char* key, std::int64_t number);
+    void AddBool(const char* key, bool value);
     void AddNull(const char* key);
 
     /// Adds the text, or null when the text is empty.

@@ -13,14 +13,15 @@ using Environment = std::map<std::string, std::string>;
 
 class TheEndpointConfig : public testing::Test {
 protected:
-    std::optional<otlp::EndpointConfig> Read(const Environment& environment) {
+    std::optional<otlp::EndpointConfig> Read(const Environment& environment,
+                                             otlp::Signal signal = otlp::Signal::Logs) {
         m_complaints.clear();
         return otlp::ReadEndpoint(
             [&](const char* name) -> const char* {
                 const auto found = environment.find(name);
                 return found == environment.end() ? nullptr : found->second.c_str();
             },
-            m_complaints);
+            m_complaints, signal);
     }
 
     std::vector<std::string> m_complaints;
@@ -43,6 +44,23 @@ TEST_F(TheEndpointConfig, TakesTheLogsEndpointAsItIsAndBeforeTheBase) {
                     {"OTEL_EXPORTER_OTLP_LOGS_ENDPOINT", "http://logs/x?y=1"}})
                   ->url,
               "http://logs/x?y=1");
+}
+
+TEST_F(TheEndpointConfig, ReadsTheVariablesOfMetricsForMetrics) {
+    const auto metrics = otlp::Signal::Metrics;
+    EXPECT_EQ(Read({{"OTEL_EXPORTER_OTLP_ENDPOINT", "http://c:4318"}}, metrics)->url,
+              "http://c:4318/v1/metrics");
+    const Environment own{{"OTEL_EXPORTER_OTLP_ENDPOINT", "http://c"},
+                          {"OTEL_EXPORTER_OTLP_METRICS_ENDPOINT", "http://m/x"},
+                          {"OTEL_EXPORTER_OTLP_METRICS_TIMEOUT", "7"},
+                          {"OTEL_EXPORTER_OTLP_LOGS_TIMEOUT", "8"}};
+    EXPECT_EQ(Read(own, metrics)->url, "http://m/x");
+    EXPECT_EQ(Read(own, metrics)->timeout, 7ms);
+    EXPECT_EQ(Read(own)->url, "http://c/v1/logs");
+    EXPECT_FALSE(Read({{"OTEL_EXPORTER_OTLP_LOGS_ENDPOINT", "http://l"}}, metrics));
+    const Environment none{{"OTEL_EXPORTER_OTLP_ENDPOINT", "http://c"}, {"OTEL_METRICS_EXPORTER", "none"}};
+    EXPECT_FALSE(Read(none, metrics));
+    EXPECT_TRUE(Read(none));
 }
 
 TEST_F(TheEndpointConfig, RefusesWhatIsNoHttpUrl) {

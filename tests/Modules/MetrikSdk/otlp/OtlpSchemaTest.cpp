@@ -1,9 +1,13 @@
 #include <cstdlib>
 #include <fstream>
 
+#include "Modules/MetrikSdk/otlp/MetricsEncoder.h"
+#include "Modules/MetrikSdk/otlp/OtlpEncoder.h"
 #include "tests/Modules/MetrikSdk/support/PluginFixture.h"
 
-// Checks request bodies of the plug-in against the protocol's own definition.
+// Checks request bodies of the plug-in and of reportctl against the protocol's own definition.
+
+using namespace MetrikSdk;
 
 namespace {
 
@@ -65,6 +69,33 @@ TEST_F(TheOtlpSchema, AcceptsThePluginsRequests) {
             ++events;
     }
     EXPECT_EQ(events, 9U);
+}
+
+TEST_F(TheOtlpSchema, AcceptsARowOfTheStore) {
+    const StoredEvent row{.row = -7,
+                          .uuid = "0190b6a2-6f1e-7c55-9a3e-5d1c1f0a7b42",
+                          .release = 1,
+                          .eventId = "B100|1",
+                          .payload = NumberedPayload(1),
+                          .storedAt = {},
+                          .source = Source::Store};
+    const Batch batch{.outboxId = "o", .events = {row}, .releases = {{1, {"store", "1", "Report"}}}};
+    EXPECT_TRUE(Passes(otlp::EncodeOtlp(batch)));
+}
+
+TEST_F(TheOtlpSchema, AcceptsMetricsAndNoticesWhatIsWrongInThem) {
+    const WallTime since{std::chrono::hours(1)};
+    const auto body = otlp::EncodeMetrics(
+        {{"a.sum", "what it is", "{report}", since, {{{{"reason", "x"}}, std::int64_t{1} << 62}}},
+         {"a.sum.since.ever", "", "By", WallTime(), {{{}, std::int64_t{0}}}},
+         {"a.gauge", "\xff", "s", std::nullopt, {{{}, 1.5}, {{{"k", "v"}}, std::int64_t{-1}}}}},
+        {"0190b6a2-6f1e-7c55-9a3e-5d1c1f0a7b42", {"store", "1", "Report"}, since + std::chrono::seconds(1)});
+    EXPECT_TRUE(Passes(body));
+    EXPECT_FALSE(Passes(Replaced(body, "isMonotonic", "isMonotone")));
+    EXPECT_FALSE(
+        Passes(Replaced(body, R"("aggregationTemporality":2)", R"("aggregationTemporality":"two")")));
+    EXPECT_FALSE(Passes(Replaced(body, R"("asInt":"0")", R"("asInt":0)"))) << "a number for a text";
+    EXPECT_FALSE(Passes(Replaced(body, R"("startTimeUnixNano")", R"("startTime")")));
 }
 
 TEST_F(TheOtlpSchema, NoticesABodyThatIsWrong) {

@@ -13,9 +13,12 @@ const assert = require('assert');
 const fs = require('fs');
 const root = require('@opentelemetry/otlp-transformer/build/src/generated/root');
 
-const Message = root.opentelemetry.proto.collector.logs.v1.ExportLogsServiceRequest;
+const collector = root.opentelemetry.proto.collector;
 
 function check(body) {
+  const Message = 'resourceMetrics' in body
+    ? collector.metrics.v1.ExportMetricsServiceRequest
+    : collector.logs.v1.ExportLogsServiceRequest;
   const message = Message.fromObject(body);
   const problem = Message.verify(message);
   if (problem) throw new Error(problem);
