@@ -16,20 +16,18 @@ Flusher::~Flusher() {
         m_thread.join();
 }
 
+void Flusher::Start() noexcept {
+    try {
+        m_thread = std::thread(&Flusher::Run, this);
+    } catch (const std::exception&) { // no thread, no memory: each line is written at once
+    }
+}
+
 bool Flusher::Notice() {
     if (m_isResting)
         m_wake.notify_one();
     m_isResting = false;
-    return m_thread.joinable() || Start();
-}
-
-bool Flusher::Start() {
-    try {
-        m_thread = std::thread(&Flusher::Run, this);
-        return true;
-    } catch (const std::exception&) {
-        return false;
-    }
+    return m_thread.joinable();
 }
 
 void Flusher::Run() {

@@ -12,9 +12,8 @@ namespace BoostLogger {
 
 /// The thread that writes waiting lines when no further line comes that would.
 ///
-/// It starts with the first burst. It sleeps without a deadline while nothing waits, and otherwise until the
-/// lines are due: in a burst it wakes a thousand times a second, and a record that comes alone does not wake
-/// it.
+/// It sleeps without a deadline while no line waits, and otherwise until the lines are due. In a burst it
+/// wakes a thousand times a second. A record that comes alone does not wake it.
 ///
 /// Threads: see each operation.
 class Flusher {
@@ -24,17 +23,21 @@ public:
     Flusher(std::mutex& mutex, const WaitingLines& lines, std::function<void()> write)
         : m_mutex(mutex), m_lines(lines), m_write(std::move(write)) {}
 
-    /// Waits for the thread. Not while the mutex is held.
+    /// Waits for the thread's end. The caller must not hold the mutex.
     ~Flusher();
     Flusher(const Flusher&) = delete;
     Flusher& operator=(const Flusher&) = delete;
 
-    /// Lines wait now. To be called with the mutex held. False when there is no thread to be had: they are to
-    /// be written by the caller.
+    /// Starts the thread, if the system has one to give. Call this before there are records: the C library
+    /// changes the signal mask while it starts a thread, so the thread that called may get a signal that was
+    /// meant for the process. A crash trace is lost when its signal comes to a thread that is in the log.
+    void Start() noexcept;
+
+    /// Call this with the mutex held, after a line was added. False when there is no thread: then the caller
+    /// must write the lines.
     bool Notice();
 
 private:
-    bool Start();
     void Run();
 
     std::mutex& m_mutex;

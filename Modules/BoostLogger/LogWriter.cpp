@@ -56,6 +56,7 @@ LogWriter::LogWriter(const LogSettings& settings)
       m_forks(g_forks) {}
 
 FileFailure LogWriter::Start() {
+    m_flusher.Start();
     const std::lock_guard lock(m_mutex);
     if (const FileFailure failure = Reopen())
         return failure;
