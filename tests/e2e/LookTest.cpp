@@ -9,6 +9,7 @@
 #include "tests/e2e/support/Service.h"
 #include "tests/support/WaitUntil.h"
 
+using ::testing::ContainsRegex;
 using ::testing::HasSubstr;
 using ::testing::Not;
 
@@ -76,7 +77,7 @@ TEST_F(Look, FindTellsOfEveryPlace) {
     const auto text = Reportctl({"find", "needle"});
     EXPECT_THAT(text, HasSubstr("needle in the store  -> stored\n"));
     EXPECT_THAT(text, HasSubstr("  -> toAnalytics\n"));
-    EXPECT_THAT(text, HasSubstr("Store (since 2023-11-14T22:13:20.000Z): 1 found\n"));
+    EXPECT_THAT(text, ContainsRegex("Store .since 2023-11-1[45] ..:13:20.000.: 1 found\n"));
     EXPECT_THAT(text, HasSubstr("Outbox: 1 found\n"));
     EXPECT_THAT(Reportctl({"find", "haystack"}, 1), HasSubstr("Outbox: 0 found\n"));
 }

@@ -1,3 +1,4 @@
+#include <algorithm>
 #include <deque>
 #include <filesystem>
 #include <functional>
@@ -18,9 +19,11 @@
 #include "Tools/reportctl/store/Paths.h"
 #include "Tools/reportctl/store/Search.h"
 #include "Tools/reportctl/store/Store.h"
+#include "Tools/reportctl/terminal/Columns.h"
 #include "Tools/reportctl/terminal/Json.h"
 #include "Tools/reportctl/terminal/Printable.h"
 #include "Tools/reportctl/terminal/Result.h"
+#include "Tools/reportctl/terminal/WrittenTime.h"
 
 namespace reportctl::commands {
 namespace {
@@ -110,9 +113,9 @@ private:
             m_outboxes.insert(file);
         const auto take = [&](const log::Entry& entry) {
             if (m_log.since.empty())
-                m_log.since = log::IsoTime(entry.line.time);
+                m_log.since = (m_options.isJson ? terminal::ZonedTime : terminal::LocalTime)(entry.line.time);
             if (left > 0 && IsHit(entry))
-                Add(m_log, m_options.isJson ? log::JsonOf(entry) : log::TextOf(entry));
+                Add(m_log, m_options.isJson ? log::JsonOf(entry) : log::TextOf(entry, m_columns));
             left -= left > 0 ? 1 : 0;
         };
         for (bool isFirst = true; left > 0 && !stream.IsAtEnd(); isFirst = false) {
@@ -125,7 +128,8 @@ private:
 
     void SearchStore() {
         auto database = store::OpenToRead(store::StorePath());
-        m_store.since = store::OldestTime(database);
+        if (const auto oldest = store::OldestRow(database))
+            m_store.since = m_options.isJson ? oldest->at : TimeOf(*oldest);
         std::deque<store::FoundRow> last; // a line is made of those alone that are shown
         store::Search(database, m_options.text, [&](const store::FoundRow& row) {
             ++m_store.found;
@@ -156,9 +160,16 @@ private:
         outbox::ForEach(database, outbox::Where::Dead, 0, take);
     }
 
+    /// In local time, as the datagrams above it have it.
+    static std::string TimeOf(const store::FoundRow& row) {
+        auto time = row.atLocal.empty() ? "(no time)" : row.atLocal;
+        std::replace(time.begin(), time.end(), 'T', ' ');
+        return time;
+    }
+
     static std::string TextOf(const store::FoundRow& row) {
-        return fmt::format("row {}  {}  {:<14} {}", row.id, row.at.empty() ? "(no time)" : row.at,
-                           terminal::Printable(row.event), terminal::Printable(row.value));
+        return fmt::format("row {}  {}  {:<14} {}", row.id, TimeOf(row), terminal::Printable(row.event),
+                           terminal::Printable(row.value));
     }
 
     static std::string TextOf(const outbox::Event& event) {
@@ -172,7 +183,7 @@ private:
     static std::string JsonOf(const store::FoundRow& row) {
         terminal::JsonObject json;
         json.Add("id", row.id);
-        json.Add("at", row.at);
+        json.AddOrNull("at", row.at);
         json.Add("eventID", row.event);
         json.Add("value", row.value);
         json.Add("openid", row.openid);
@@ -188,7 +199,7 @@ private:
         json.Add("sequence", event.sequence);
         json.Add("eventID", event.eventID);
         json.Add("state", event.isDead ? "dead" : "waiting");
-        json.Add("reason", event.reason);
+        json.AddOrNull("reason", event.reason);
         json.Add("payload", event.payload);
         return json.Take();
     }
@@ -232,6 +243,7 @@ private:
     }
 
     const FindOptions& m_options;
+    std::size_t m_columns = terminal::Columns();
     Place m_log;
     Place m_store;
     Place m_outbox;

@@ -6,7 +6,6 @@
 #include <fmt/format.h>
 
 #include "Tools/reportctl/commands/Commands.h"
-#include "Tools/reportctl/log/Show.h"
 #include "Tools/reportctl/outbox/CollectorTest.h"
 #include "Tools/reportctl/outbox/Database.h"
 #include "Tools/reportctl/outbox/DeadLetters.h"
@@ -16,7 +15,9 @@
 #include "Tools/reportctl/store/Store.h"
 #include "Tools/reportctl/terminal/Json.h"
 #include "Tools/reportctl/terminal/Printable.h"
+#include "Tools/reportctl/terminal/Quantity.h"
 #include "Tools/reportctl/terminal/Result.h"
+#include "Tools/reportctl/terminal/WrittenTime.h"
 
 namespace reportctl::commands {
 namespace {
@@ -46,17 +47,13 @@ struct OutboxOptions {
     std::vector<std::string> ids;
 };
 
-std::string StoredAt(const Event& event) {
-    return log::IsoTime(terminal::TimePoint(std::chrono::milliseconds(event.storedMs)));
-}
-
 std::string JsonOf(const Event& event) {
     terminal::JsonObject json;
     json.Add("id", event.uuid);
     json.Add("module", event.module);
     json.Add("sequence", event.sequence);
     json.Add("eventID", event.eventID);
-    json.Add("storedAt", StoredAt(event));
+    json.Add("storedAt", terminal::ZonedTime(terminal::At(event.storedMs)));
     json.Add("bytes", event.bytes);
     json.Add("state", event.isDead ? "dead" : "waiting");
     if (event.isDead) {
@@ -70,8 +67,10 @@ std::string JsonOf(const Event& event) {
 }
 
 std::string TextOf(const Event& event) {
-    auto text = fmt::format("{}  {:<7}  {}  {:>8} bytes  {}", event.uuid, event.isDead ? "dead" : "waiting",
-                            StoredAt(event), event.bytes, terminal::Printable(event.eventID));
+    auto text = fmt::format("{}  {:<7}  {}  {:>9}  {}", event.uuid, event.isDead ? "dead" : "waiting",
+                            terminal::LocalTime(terminal::At(event.storedMs)),
+                            terminal::Bytes(static_cast<std::uint64_t>(event.bytes)),
+                            terminal::Printable(event.eventID));
     if (event.isDead)
         text += fmt::format("  -> {}: {}", event.status, terminal::Printable(event.reason));
     return text;
@@ -120,12 +119,18 @@ int Purge(const OutboxOptions& options) {
     return 0;
 }
 
+void AddExamples(CLI::App& command, const std::string& examples) {
+    command.footer("Examples:\n" + examples + "\n" + command.get_footer());
+}
+
 void AddList(CLI::App& outbox, const std::shared_ptr<OutboxOptions>& options, int& exitCode) {
     auto* list =
         outbox.add_subcommand("list", "List the events that wait and the dead letters, oldest first")
             ->fallthrough();
     list->add_flag("--dead", options->onlyDead, "Only dead letters");
     list->add_flag("--json", options->isJson, "A JSON array");
+    AddExamples(*list, "  reportctl outbox list\n"
+                       "  reportctl outbox list --dead --json | jq -r '.[].reason'\n");
     list->callback([options, &exitCode] {
         store::Naming(options->path, [&] { List(*options); });
         exitCode = 0;
@@ -138,6 +143,8 @@ void AddRetry(CLI::App& outbox, const std::shared_ptr<OutboxOptions>& options, i
             ->fallthrough();
     auto* all = retry->add_flag("--all", options->all, "All of them");
     retry->add_option("ID", options->ids, "The ids, as `list` shows them")->excludes(all);
+    AddExamples(*retry, "  reportctl outbox retry --all\n"
+                        "  reportctl outbox retry 0190b6a3-02b4-7a10-8f64-31f6c0a5d9e7\n");
     retry->callback([options, &exitCode] {
         if (!options->all && options->ids.empty())
             throw CLI::RequiredError("Say which: --all, or ids", CLI::ExitCodes::RequiredError);
@@ -149,6 +156,7 @@ void AddTest(CLI::App& outbox, int& exitCode) {
     auto* test =
         outbox.add_subcommand("test", "Send one marked test event to the collector that the running service "
                                       "uses, and tell what it answers");
+    AddExamples(*test, "  reportctl outbox test\n");
     test->callback([&exitCode] { exitCode = outbox::TestCollector(service::OfTheService()) ? 0 : 1; });
 }
 
@@ -156,6 +164,7 @@ void AddPurge(CLI::App& outbox, const std::shared_ptr<OutboxOptions>& options, i
     auto* purge = outbox.add_subcommand("purge", "Delete dead letters")->fallthrough();
     purge->add_flag("--dead", options->onlyDead, "All dead letters; there is nothing else to delete")
         ->required();
+    AddExamples(*purge, "  reportctl outbox purge --dead\n");
     purge->callback(
         [options, &exitCode] { exitCode = store::Naming(options->path, [&] { return Purge(*options); }); });
 }

@@ -1,3 +1,4 @@
+#include <algorithm>
 #include <memory>
 #include <optional>
 #include <string>
@@ -57,7 +58,9 @@ void TellPlan(const store::PrunePlan& plan, const PruneOptions& options) {
 }
 
 void TellResult(const store::PruneResult& result, const store::PrunePlan& plan) {
-    fmt::print("Deleted {} of {} rows. {} went from {:.1f} to {:.1f} MiB.\n", result.removed, plan.rows,
+    fmt::print("Deleted {} of {} rows. Freed {:.1f} MiB: {} went from {:.1f} to {:.1f} MiB.\n",
+               result.removed, plan.rows,
+               double(std::max<std::int64_t>(result.bytesBefore - result.bytesAfter, 0)) / MIB,
                store::StorePath(), double(result.bytesBefore) / MIB, double(result.bytesAfter) / MIB);
     if (!result.canShrink && result.removed > 0)
         fmt::print("The file keeps its size, and the rows to come use the space: it was made by an older "

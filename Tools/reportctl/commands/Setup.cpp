@@ -33,6 +33,12 @@ void AddSetup(CLI::App& app, int& exitCode) {
                      "Another place for the pid file's directory. The service looks at " + MAC_REG_PATH +
                          " alone: this is for testing set-up itself")
         ->group("For tests");
+    setup->footer("Examples:\n"
+                  "  reportctl setup\n"
+                  "  reportctl setup --dry-run\n"
+                  "  reportctl setup --open-id u1 --suite-version 5.1.0.2\n"
+                  "\n" +
+                  app.get_footer());
     setup->callback([options, &exitCode] { exitCode = setup::RunSetup(*options); });
 }
 

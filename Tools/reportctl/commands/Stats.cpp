@@ -18,9 +18,12 @@
 #include "Tools/reportctl/store/Paths.h"
 #include "Tools/reportctl/store/Store.h"
 #include "Tools/reportctl/store/Tally.h"
+#include "Tools/reportctl/terminal/Columns.h"
 #include "Tools/reportctl/terminal/Json.h"
 #include "Tools/reportctl/terminal/Printable.h"
+#include "Tools/reportctl/terminal/Quantity.h"
 #include "Tools/reportctl/terminal/Result.h"
+#include "Tools/reportctl/terminal/WrittenTime.h"
 
 namespace reportctl::commands {
 namespace {
@@ -88,8 +91,9 @@ Stats CountReports(const StatsOptions& options) {
             store::CountEvents(outbox, grouping, filter, zone, tally);
         });
     return {store::Ranked(tally, grouping, options.top),
-            fmt::format("{} rows of the store, {} events of the outbox (waiting, or dead letters)", rows,
-                        Sum(tally) - rows)};
+            fmt::format("{} of the store, {} of the outbox (waiting, or dead letters)",
+                        terminal::Counted(static_cast<std::uint64_t>(rows), "row"),
+                        terminal::Counted(static_cast<std::uint64_t>(Sum(tally) - rows), "event"))};
 }
 
 constexpr auto OUTCOME = "outcome";
@@ -125,8 +129,9 @@ Stats CountOutcomes(const StatsOptions& options) {
     for (const auto& reason : status::REASONS)
         add(std::string("refused.") + reason.json, reason.place);
     return {store::Ranked(tally, Grouping::Event, options.top),
-            fmt::format("{} datagrams of the ledger since {}", look.total[ReportLedger::RECEIVED],
-                        status::IsoTime(look.begunAtMs))};
+            fmt::format("{} of the ledger since {}",
+                        terminal::Counted(look.total[ReportLedger::RECEIVED], "datagram"),
+                        terminal::LocalTime(terminal::At(look.begunAtMs)))};
 }
 
 void PrintJson(const Stats& stats, terminal::Result& output) {
@@ -168,7 +173,8 @@ void PrintTable(const Stats& stats, const StatsOptions& options, terminal::Resul
             "{:<{}}  {:>12}  {}\n", Label(count, options.by), width, count.count,
             std::string(BAR_WIDTH * static_cast<std::size_t>(count.count) / static_cast<std::size_t>(most),
                         '#')));
-    output.Write(fmt::format("{}Counted: {}.\n", stats.counts.empty() ? "" : "\n", stats.sources));
+    output.Write((stats.counts.empty() ? "" : "\n") +
+                 terminal::Broken(fmt::format("Counted: {}.", stats.sources), terminal::Columns()) + "\n");
 }
 
 void Print(const Stats& stats, const StatsOptions& options) {

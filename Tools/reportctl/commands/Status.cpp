@@ -9,6 +9,7 @@
 
 #include "Tools/reportctl/commands/Commands.h"
 #include "Tools/reportctl/status/Status.h"
+#include "Tools/reportctl/terminal/Columns.h"
 #include "Tools/reportctl/terminal/Result.h"
 #include "Tools/reportctl/terminal/Watch.h"
 
@@ -39,11 +40,14 @@ bool WantsColours() {
            terminal != nullptr && std::string_view(terminal) != "dumb";
 }
 
+status::View ViewHere() {
+    return {WantsColours(), terminal::Columns()};
+}
+
 int ShowOnce(const Options& options) {
     const auto status = status::Gather();
     const auto judgement = Judge(status);
-    fmt::print("{}",
-               options.isJson ? JsonOf(status, judgement) : ScreenOf(status, judgement, WantsColours()));
+    fmt::print("{}", options.isJson ? JsonOf(status, judgement) : ScreenOf(status, judgement, ViewHere()));
     return static_cast<int>(judgement.verdict);
 }
 
@@ -75,7 +79,7 @@ int Watch(const Options& options) {
         before = status.ledger;
         const auto judgement = Judge(status);
         const auto text =
-            options.isJson ? JsonOf(status, judgement) : ScreenOf(status, judgement, WantsColours());
+            options.isJson ? JsonOf(status, judgement) : ScreenOf(status, judgement, ViewHere());
         output.Write(isTerminal && !options.isJson ? InPlace(text) : text);
         output.Flush();
         if (!watch.Wait(pause))

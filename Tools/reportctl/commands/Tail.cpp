@@ -12,6 +12,7 @@
 #include "Tools/reportctl/log/Files.h"
 #include "Tools/reportctl/log/Show.h"
 #include "Tools/reportctl/log/Stream.h"
+#include "Tools/reportctl/terminal/Columns.h"
 #include "Tools/reportctl/terminal/Result.h"
 #include "Tools/reportctl/terminal/Watch.h"
 
@@ -79,7 +80,8 @@ public:
         const bool isBefore = m_before > 0;
         m_before -= isBefore ? 1 : 0;
         if (IsWanted(entry, m_options))
-            m_lines.push_back((m_options.isJson ? log::JsonOf(entry) : log::TextOf(entry)) + '\n');
+            m_lines.push_back(
+                (m_options.isJson ? log::JsonOf(entry) : log::TextOf(entry, terminal::Columns())) + '\n');
         if (isBefore && m_lines.size() > m_kept)
             m_lines.pop_front();
     }

@@ -1,7 +1,6 @@
 #include <algorithm>
 #include <array>
 #include <cmath>
-#include <ctime>
 
 #include <fmt/format.h>
 #include <rapidjson/prettywriter.h>
@@ -11,6 +10,7 @@
 #include "Tools/reportctl/status/Names.h"
 #include "Tools/reportctl/status/Status.h"
 #include "Tools/reportctl/terminal/Json.h"
+#include "Tools/reportctl/terminal/WrittenTime.h"
 
 namespace reportctl::status {
 namespace {
@@ -55,7 +55,9 @@ public:
     }
 
     /// Writes a time; 0 means never and is written as null.
-    void AddTime(const char* key, std::int64_t ms) { ms == 0 ? AddNull(key) : Add(key, IsoTime(ms)); }
+    void AddTime(const char* key, std::int64_t ms) {
+        ms == 0 ? AddNull(key) : Add(key, terminal::UtcTime(terminal::At(ms)));
+    }
 
     std::string Text() const { return terminal::ShownJson({m_text.GetString(), m_text.GetSize()}) + "\n"; }
 
@@ -185,7 +187,9 @@ void Add(Writer& json, const Outbox& outbox) {
     json.Add("endpoint", outbox.endpoint);
     json.Add("lastFailure", outbox.lastFailure);
     json.Add("lastDeliveredAt",
-             outbox.lastDeliveredAtMs ? std::optional(IsoTime(*outbox.lastDeliveredAtMs)) : std::nullopt);
+             outbox.lastDeliveredAtMs
+                 ? std::optional(terminal::UtcTime(terminal::At(*outbox.lastDeliveredAtMs)))
+                 : std::nullopt);
     json.End();
 }
 
@@ -198,7 +202,7 @@ void Add(Writer& json, const Log& log) {
     json.BeginList("last");
     for (const auto& line : log.last) {
         json.Begin();
-        json.Add("time", IsoTime(line.atMs));
+        json.Add("time", terminal::UtcTime(terminal::At(line.atMs)));
         json.Add("level", line.level);
         json.Add("site", line.site);
         json.Add("text", line.text);
@@ -209,14 +213,6 @@ void Add(Writer& json, const Log& log) {
 }
 
 } // namespace
-
-std::string IsoTime(std::int64_t ms) {
-    const std::time_t seconds = ms / 1000;
-    std::tm utc{};
-    ::gmtime_r(&seconds, &utc);
-    return fmt::format("{:04}-{:02}-{:02}T{:02}:{:02}:{:02}.{:03}Z", utc.tm_year + 1900, utc.tm_mon + 1,
-                       utc.tm_mday, utc.tm_hour, utc.tm_min, utc.tm_sec, ms % 1000);
-}
 
 std::string JsonOf(const Status& status, const Judgement& judgement) {
     Writer json;

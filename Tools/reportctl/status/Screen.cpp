@@ -6,7 +6,10 @@
 #include "SystemTool/Text/Utf8.h"
 #include "Tools/reportctl/status/Names.h"
 #include "Tools/reportctl/status/Status.h"
+#include "Tools/reportctl/terminal/Columns.h"
 #include "Tools/reportctl/terminal/Printable.h"
+#include "Tools/reportctl/terminal/Quantity.h"
+#include "Tools/reportctl/terminal/WrittenTime.h"
 
 namespace reportctl::status {
 namespace {
@@ -14,38 +17,22 @@ namespace {
 constexpr std::size_t NAME_WIDTH = 10;
 constexpr std::size_t TEXT_WIDTH = 100; // how much of a long text is shown, in bytes
 
-std::string Bytes(std::uint64_t bytes) {
-    if (bytes < 10'000)
-        return fmt::format("{} B", bytes);
-    if (bytes < 10'000'000)
-        return fmt::format("{:.1f} KB", static_cast<double>(bytes) / 1e3);
-    if (bytes < 10'000'000'000)
-        return fmt::format("{:.1f} MB", static_cast<double>(bytes) / 1e6);
-    return fmt::format("{:.1f} GB", static_cast<double>(bytes) / 1e9);
-}
-
-std::string Number(std::uint64_t number) {
-    auto text = std::to_string(number);
-    for (auto at = static_cast<std::ptrdiff_t>(text.size()) - 3; at > 0; at -= 3)
-        text.insert(static_cast<std::size_t>(at), ",");
-    return text;
-}
+using terminal::Bytes;
+using terminal::Counted;
+using terminal::Number;
 
 std::string Number(const std::optional<std::int64_t>& number) {
     return number ? Number(static_cast<std::uint64_t>(*number)) : "?";
 }
 
-constexpr std::int64_t MINUTE = 60;
-constexpr std::int64_t HOUR = 60 * MINUTE;
-constexpr std::int64_t DAY = 24 * HOUR;
+std::string Time(std::int64_t ms) {
+    constexpr std::size_t UP_TO_SECONDS = 19;
+    return terminal::LocalTime(terminal::At(ms)).substr(0, UP_TO_SECONDS);
+}
 
-std::string Duration(std::int64_t ms) {
-    const auto seconds = ms / 1000;
-    if (seconds < 2 * MINUTE)
-        return fmt::format("{} s", seconds);
-    if (seconds < 2 * HOUR)
-        return fmt::format("{} min", seconds / MINUTE);
-    return seconds < 2 * DAY ? fmt::format("{} h", seconds / HOUR) : fmt::format("{} days", seconds / DAY);
+std::string TimeOfDay(std::int64_t ms) {
+    constexpr std::size_t DATE = 11;
+    return Time(ms).substr(DATE);
 }
 
 /// The beginning of a text that another program wrote, as a terminal may show it.
@@ -56,7 +43,7 @@ std::string Shown(const std::string& text) {
 
 class Screen {
 public:
-    Screen(const Status& status, bool isColoured) : m_status(status), m_isColoured(isColoured) {}
+    Screen(const Status& status, const View& view) : m_status(status), m_view(view) {}
 
     std::string Text(const Judgement& judgement) {
         ShowVerdict(judgement);
@@ -72,11 +59,14 @@ public:
 
 private:
     std::string Coloured(const char* colour, const std::string& text) const {
-        return m_isColoured ? fmt::format("\x1b[1;{}m{}\x1b[0m", colour, text) : text;
+        return m_view.isColoured ? fmt::format("\x1b[1;{}m{}\x1b[0m", colour, text) : text;
     }
 
-    void Row(const char* name, const std::string& text) {
-        m_text += fmt::format("{:<{}} {}\n", name, NAME_WIDTH, text);
+    /// When the text takes more than one line, the others are indented, by `further` more than its begin.
+    void Row(const char* name, const std::string& text, std::size_t further = 0) {
+        m_text += terminal::Broken(fmt::format("{:<{}} {}", name, NAME_WIDTH, text), m_view.columns,
+                                   NAME_WIDTH + 1 + further) +
+                  "\n";
     }
 
     void ShowVerdict(const Judgement& judgement) {
@@ -92,7 +82,7 @@ private:
             break;
         }
         for (const auto& reason : judgement.reasons)
-            Row("", "- " + terminal::Printable(reason));
+            Row("", "- " + terminal::Printable(reason), 2);
     }
 
     void ShowService() {
@@ -102,10 +92,11 @@ private:
         else
             Row("service",
                 fmt::format("running as process {}{}, version {}, {}", *service.process,
-                            service.startedAtMs ? fmt::format(" for {} (since {})",
-                                                              Duration(m_status.atMs - *service.startedAtMs),
-                                                              IsoTime(*service.startedAtMs))
-                                                : "",
+                            service.startedAtMs
+                                ? fmt::format(" for {} (since {})",
+                                              terminal::Duration(m_status.atMs - *service.startedAtMs),
+                                              Time(*service.startedAtMs))
+                                : "",
                             service.version.value_or("unknown"),
                             service.isListening ? "listening" : "not listening"));
         if (service.buildId)
@@ -178,46 +169,48 @@ private:
         if (!outbox.isPresent)
             return Row("outbox", Missing(outbox.problem) + terminal::Printable(outbox.path));
         Row("outbox",
-            fmt::format("{} waiting ({}), {} delivered, {} refused, {} dead letters, {} dropped",
+            fmt::format("{} waiting ({}), {} delivered, {} refused, {} dead letter{}, {} dropped",
                         Number(outbox.waiting),
                         outbox.waitingBytes ? Bytes(static_cast<std::uint64_t>(*outbox.waitingBytes)) : "?",
                         Number(outbox.delivered), Number(outbox.refused), Number(outbox.deadLetters),
-                        Number(outbox.dropped)));
-        Row("",
-            fmt::format("{} {}; {}", outbox.modules.size(), outbox.modules.size() == 1 ? "module" : "modules",
-                        outbox.endpoint ? "sent to " + Shown(*outbox.endpoint)
-                                        : std::string("no collector is set: events stay here")));
+                        outbox.deadLetters == 1 ? "" : "s", Number(outbox.dropped)));
+        Row("", fmt::format("{}; {}", Counted(outbox.modules.size(), "module"),
+                            outbox.endpoint ? "sent to " + Shown(*outbox.endpoint)
+                                            : std::string("no collector is set: events stay here")));
         if (outbox.endpoint || outbox.lastDeliveredAtMs)
-            Row("", "last delivery " + (outbox.lastDeliveredAtMs ? IsoTime(*outbox.lastDeliveredAtMs) : "-") +
+            Row("", "last delivery " + (outbox.lastDeliveredAtMs ? Time(*outbox.lastDeliveredAtMs) : "-") +
                         ", last failure " + (outbox.lastFailure ? Shown(*outbox.lastFailure) : "-"));
     }
 
     /// Shows the last warnings and errors. Equal lines are shown once, with their number.
     void ShowLog() {
         const Log& log = m_status.log;
-        Row("log", fmt::format("{}; in the last ten minutes {} errors, {} warnings", Bytes(log.bytes),
-                               log.errors, log.warnings));
+        Row("log", fmt::format("{}; in the last ten minutes {}, {}", Bytes(log.bytes),
+                               Counted(static_cast<std::uint64_t>(log.errors), "error"),
+                               Counted(static_cast<std::uint64_t>(log.warnings), "warning")));
         std::map<std::string, int> times;
         for (const auto& line : log.last)
             ++times[line.level + line.site + line.text];
         for (auto line = log.last.rbegin(); line != log.last.rend(); ++line) {
             const int count = std::exchange(times[line->level + line->site + line->text], 0);
             if (count != 0)
-                Row("", fmt::format("{} {}{:<5} [{}] {}", IsoTime(line->atMs).substr(11, 8),
-                                    count > 1 ? fmt::format("{}x ", count) : "", line->level,
-                                    Shown(line->site), Shown(line->text)));
+                Row("",
+                    fmt::format("{} {}{:<5} [{}] {}", TimeOfDay(line->atMs),
+                                count > 1 ? fmt::format("{}x ", count) : "", line->level, Shown(line->site),
+                                Shown(line->text)),
+                    2);
         }
     }
 
     const Status& m_status;
-    bool m_isColoured;
+    View m_view;
     std::string m_text;
 };
 
 } // namespace
 
-std::string ScreenOf(const Status& status, const Judgement& judgement, bool isColoured) {
-    return Screen(status, isColoured).Text(judgement);
+std::string ScreenOf(const Status& status, const Judgement& judgement, const View& view) {
+    return Screen(status, view).Text(judgement);
 }
 
 } // namespace reportctl::status

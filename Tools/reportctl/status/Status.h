@@ -121,13 +121,16 @@ Judgement Judge(const Status& status);
 /// The status as one JSON object, with a line feed at its end. docs/Status.md names its members.
 std::string JsonOf(const Status& status, const Judgement& judgement);
 
-/// The status as one screen of text for a person.
-std::string ScreenOf(const Status& status, const Judgement& judgement, bool isColoured);
+/// What the terminal can show.
+struct View {
+    bool isColoured = false;
+    std::size_t columns = 0; ///< 0: long lines are not broken
+};
+
+/// The status as one screen of text for a person, with local times.
+std::string ScreenOf(const Status& status, const Judgement& judgement, const View& view);
 
 /// The status as metrics in the text format that Prometheus reads.
 std::string MetricsOf(const Status& status, const Judgement& judgement);
-
-/// Milliseconds since 1970 as "2026-11-21T14:05:06.789Z".
-std::string IsoTime(std::int64_t ms);
 
 } // namespace reportctl::status

@@ -4,6 +4,7 @@
 #include <fmt/format.h>
 
 #include "Tools/reportctl/status/Status.h"
+#include "Tools/reportctl/terminal/Quantity.h"
 
 namespace reportctl::status {
 namespace {
@@ -151,9 +152,10 @@ private:
                 fmt::format("The outbox {} cannot be read: {}.", outbox.path, outbox.problem));
         if (outbox.deadLetters.value_or(0) > 0)
             Add(Verdict::Degraded,
-                fmt::format("The collector refused {} events for good. docs/Outbox.md tells how to "
-                            "look at them, and how to send them again.",
-                            *outbox.deadLetters));
+                fmt::format(
+                    "The collector refused {} for good. docs/Outbox.md tells how to look at dead letters, "
+                    "and how to send them again.",
+                    terminal::Counted(static_cast<std::uint64_t>(*outbox.deadLetters), "event")));
         if (outbox.lastFailure)
             Add(Verdict::Degraded,
                 fmt::format("The outbox has a failure that lasts: {}", *outbox.lastFailure));

@@ -1,40 +1,53 @@
 #include "Tools/reportctl/store/Search.h"
 
 #include <SQLiteCpp/Statement.h>
+#include <fmt/format.h>
 
 #include "Tools/reportctl/store/Reports.h"
 #include "Tools/reportctl/store/Rows.h"
 
 namespace reportctl::store {
 
+namespace {
+
+constexpr auto COLUMNS =
+    "id, coalesce(at, ''), coalesce(at_local, ''), coalesce(event, ''), coalesce(value, ''), "
+    "coalesce(create_time, ''), coalesce(openid, '')";
+
+FoundRow RowOf(SQLite::Statement& rows) {
+    return {.id = rows.getColumn(0).getInt64(),
+            .at = rows.getColumn(1).getString(),
+            .atLocal = rows.getColumn(2).getString(),
+            .event = rows.getColumn(3).getString(),
+            .value = rows.getColumn(4).getString(),
+            .createTime = rows.getColumn(5).getString(),
+            .openid = rows.getColumn(6).getString()};
+}
+
+} // namespace
+
 void Search(SQLite::Database& database, const std::string& text,
             const std::function<void(const FoundRow&)>& visit) {
     SQLite::Statement rows(
         database,
-        "select id, coalesce(at, ''), coalesce(event, ''), coalesce(value, ''), coalesce(create_time, ''), "
-        "coalesce(openid, '') from (" +
-            ReportsSelect() +
-            ") where (instr(event, :text) or instr(value, :text) or instr(create_time, :text) or "
-            "instr(openid, :text)) and id >= :first and id < :end order by id");
+        fmt::format("select {} from ({}) where (instr(event, :text) or instr(value, :text) or "
+                    "instr(create_time, :text) or instr(openid, :text)) and id >= :first and id < :end "
+                    "order by id",
+                    COLUMNS, ReportsSelect()));
     rows.bind(":text", text);
     InPieces(AllIds(database), IDS_AT_ONCE, [&](IdRange piece) {
         rows.reset();
         rows.bind(":first", piece.first);
         rows.bind(":end", piece.end);
         while (rows.executeStep())
-            visit({.id = rows.getColumn(0).getInt64(),
-                   .at = rows.getColumn(1).getString(),
-                   .event = rows.getColumn(2).getString(),
-                   .value = rows.getColumn(3).getString(),
-                   .createTime = rows.getColumn(4).getString(),
-                   .openid = rows.getColumn(5).getString()});
+            visit(RowOf(rows));
     });
 }
 
-std::string OldestTime(SQLite::Database& database) {
+std::optional<FoundRow> OldestRow(SQLite::Database& database) {
     SQLite::Statement row(database,
-                          "select coalesce(at, '') from (" + ReportsSelect() + ") order by id limit 1");
-    return row.executeStep() ? row.getColumn(0).getString() : std::string();
+                          fmt::format("select {} from ({}) order by id limit 1", COLUMNS, ReportsSelect()));
+    return row.executeStep() ? std::optional(RowOf(row)) : std::nullopt;
 }
 
 } // namespace reportctl::store

@@ -2,6 +2,7 @@
 
 #include <cstdint>
 #include <functional>
+#include <optional>
 #include <string>
 
 #include <SQLiteCpp/Database.h>
@@ -11,7 +12,8 @@ namespace reportctl::store {
 /// A row that was found.
 struct FoundRow {
     std::int64_t id = 0;
-    std::string at; ///< in UTC; empty when createTime is not a time
+    std::string at;      ///< in UTC; empty when createTime is not a time
+    std::string atLocal; ///< the same in local time, without a zone
     std::string event;
     std::string value;
     std::string createTime;
@@ -23,8 +25,7 @@ struct FoundRow {
 void Search(SQLite::Database& database, const std::string& text,
             const std::function<void(const FoundRow&)>& visit);
 
-/// The time of the oldest row by its createTime, in UTC. Empty when the store has no row, or when the row's
-/// createTime is not a time.
-std::string OldestTime(SQLite::Database& database);
+/// The row with the lowest id. Nothing when the store has no row.
+std::optional<FoundRow> OldestRow(SQLite::Database& database);
 
 } // namespace reportctl::store

@@ -18,6 +18,11 @@ inline constexpr auto TIME_FORMS =
 /// Throws std::invalid_argument for any other text, with a message that names the right forms.
 TimePoint ReadTime(const std::string& text, TimePoint now);
 
+/// The time that is so many milliseconds since 1970.
+inline TimePoint At(std::int64_t milliseconds) {
+    return TimePoint(std::chrono::milliseconds(milliseconds));
+}
+
 /// The time in milliseconds since 1970, the unit of createTime.
 inline std::int64_t MillisecondsOf(TimePoint time) {
     return time.time_since_epoch().count();

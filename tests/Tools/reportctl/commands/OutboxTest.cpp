@@ -38,9 +38,9 @@ TEST_F(OutboxCommand, ListsWhatWaitsAndWhatWasRefused) {
     const auto outcome = Reportctl("outbox list", "TZ=UTC");
     EXPECT_EQ(outcome.exitCode, 0);
     EXPECT_EQ(outcome.output,
-              "u-3  waiting  2023-11-14T22:13:20.000+00:00       100 bytes  A100|3\n"
-              "u-1  dead     2023-11-14T22:13:20.000+00:00       100 bytes  A100|1  -> 400: too odd\n"
-              "u-2  dead     2023-11-14T22:13:20.000+00:00       100 bytes  A100|2  -> 413: \\x1b[31mred\n");
+              "u-3  waiting  2023-11-14 22:13:20.000      100 B  A100|3\n"
+              "u-1  dead     2023-11-14 22:13:20.000      100 B  A100|1  -> 400: too odd\n"
+              "u-2  dead     2023-11-14 22:13:20.000      100 B  A100|2  -> 413: \\x1b[31mred\n");
 }
 
 TEST_F(OutboxCommand, ListsAsJson) {

@@ -3,7 +3,7 @@
 #include <gtest/gtest.h>
 
 #include "SystemTool/Text/EscapedText.h"
-#include "Tools/reportctl/log/Show.h"
+#include "Tools/reportctl/terminal/WrittenTime.h"
 
 namespace {
 
@@ -20,7 +20,7 @@ TEST(LogLine, IsTakenApart) {
     EXPECT_EQ(line->site, "App/ReportServer");
     EXPECT_EQ(line->function, "Recv");
     EXPECT_EQ(line->message, "two\nlines [x] y");
-    EXPECT_EQ(reportctl::log::IsoTime(line->time).substr(0, 23), "2026-11-20T10:15:30.123");
+    EXPECT_EQ(reportctl::terminal::LocalTime(line->time), "2026-11-20 10:15:30.123");
 }
 
 TEST(LogLine, KnowsALevelThatIsANumber) {

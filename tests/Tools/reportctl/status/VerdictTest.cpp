@@ -119,7 +119,7 @@ TEST_F(StatusVerdict, IsDegradedByTooLittleRoom) {
 
 TEST_F(StatusVerdict, IsDegradedByDeadLettersAndByAFailureThatLasts) {
     m_status.outbox.deadLetters = 1;
-    ExpectDegraded("refused 1 events");
+    ExpectDegraded("refused 1 event for good");
     m_status.outbox.deadLetters = 0;
     m_status.outbox.lastFailure = "upload-https://collector: no connection";
     ExpectDegraded("no connection");

@@ -1,0 +1,18 @@
+#pragma once
+
+#include <cstddef>
+#include <string>
+#include <string_view>
+
+namespace reportctl::terminal {
+
+/// How many columns the terminal at standard output has. 0 when standard output is no terminal, so that a
+/// program that reads it gets each line as one line.
+std::size_t Columns();
+
+/// The line, broken at blanks so that each part has at most so many columns. The parts after the first begin
+/// with `indent` blanks. With 0 columns, or too few for the indent, the line stays as it is. So does a word
+/// that is longer than a line.
+std::string Broken(std::string_view line, std::size_t columns, std::size_t indent = 0);
+
+} // namespace reportctl::terminal
