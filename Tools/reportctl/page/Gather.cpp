@@ -17,16 +17,12 @@ namespace {
 constexpr std::int64_t SHOWN_MS = 90LL * 24 * 3600 * 1000;
 constexpr std::size_t SHOWN_KEYS = 15;
 
-/// How many reports were refused for each reason between one mark of the ledger and the next.
-std::vector<RefusedAt> RefusedByMark(const ReportLedger::Look& look) {
-    std::vector<RefusedAt> refused;
-    for (std::size_t i = 1; i < look.marks.size(); ++i) {
-        RefusedAt at{look.marks[i].atMs, {}};
-        for (const auto& reason : status::REASONS)
-            at.byReason.emplace_back(reason.json, look.marks[i].counts[reason.place] -
-                                                      look.marks[i - 1].counts[reason.place]);
-        refused.push_back(std::move(at));
-    }
+constexpr std::int64_t REFUSED_MS = 600'000;
+
+RefusedAt RefusedBetween(const ReportLedger::MarkAt& before, const ReportLedger::MarkAt& after) {
+    RefusedAt refused{after.atMs, {}};
+    for (const auto& reason : status::REASONS)
+        refused.byReason.emplace_back(reason.json, after.counts[reason.place] - before.counts[reason.place]);
     return refused;
 }
 
@@ -57,13 +53,24 @@ void CountStore(PageData& data, store::Tally& events, store::Tally& modules) {
 
 } // namespace
 
+std::vector<RefusedAt> RefusedOverTime(const ReportLedger::Look& look) {
+    auto marks = look.marks;
+    if (!marks.empty())
+        marks.push_back({look.atMs, look.total});
+    std::vector<RefusedAt> refused;
+    for (std::size_t i = 1; i < marks.size(); ++i)
+        if (look.atMs - marks[i].atMs < REFUSED_MS)
+            refused.push_back(RefusedBetween(marks[i - 1], marks[i]));
+    return refused;
+}
+
 PageData Gather(int reloadSeconds) {
     const auto status = status::Gather();
     PageData data;
     data.generatedAtMs = status.atMs;
     data.reloadSeconds = reloadSeconds;
     data.statusJson = status::JsonOf(status, status::Judge(status));
-    data.refused = RefusedByMark(status.ledger);
+    data.refused = RefusedOverTime(status.ledger);
     store::Tally events;
     store::Tally modules;
     CountStore(data, events, modules);

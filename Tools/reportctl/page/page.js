@@ -171,13 +171,16 @@ function showFlow() {
     numbers("flow", "The ledger since it was begun", ["what", "reports"], steps);
 }
 
-/** Sums the counts of quarter-hours by whole hours or days of the viewer's time zone. */
+/** Sums the counts of quarter-hours by whole hours or days of the viewer's time zone. From the first one until now, no
+ *  hour or day is left out, so that a time without reports can be seen. */
 function collect(quarterHours, keyOf) {
+    const key = (quarterHour) => keyOf(new Date(quarterHour * QUARTER_HOUR_MS));
     const sums = new Map();
-    for (const [quarterHour, count] of quarterHours) {
-        const key = keyOf(new Date(quarterHour * QUARTER_HOUR_MS));
-        sums.set(key, (sums.get(key) || 0) + count);
-    }
+    if (quarterHours.length > 0)
+        for (let at = quarterHours[0][0]; at * QUARTER_HOUR_MS <= data.generatedAt; ++at)
+            sums.set(key(at), 0);
+    for (const [quarterHour, count] of quarterHours)
+        sums.set(key(quarterHour), (sums.get(key(quarterHour)) || 0) + count);
     return [...sums.entries()];
 }
 
@@ -237,12 +240,21 @@ function showOutbox() {
         modules.map((module) => [module.id, module.waiting, module.lastSequence]));
 }
 
+/** The newest line first. A list, because a table has no room for long texts on a phone. */
 function showLog() {
-    const holder = element("div", undefined, "scroll");
-    const rows = status.log.last.map((line) => [time(line.time), line.level, line.site, line.text]);
-    holder.append(rows.length === 0 ? element("p", "No warnings and no errors.", "quiet")
-        : table(`Warnings and errors of the log, ${zone}`, ["time", "level", "from", "text"], rows));
-    byId("log").append(holder);
+    if (status.log.last.length === 0) {
+        byId("log").append(element("p", "No warnings and no errors.", "quiet"));
+        return;
+    }
+    const list = element("ol", undefined, "lines");
+    for (const line of [...status.log.last].reverse()) {
+        const item = element("li");
+        const head = element("p");
+        head.append(element("strong", line.level), element("span", ` ${time(line.time)}, ${line.site}`, "quiet"));
+        item.append(head, element("p", line.text));
+        list.append(item);
+    }
+    byId("log").append(list);
 }
 
 function keepFresh() {

@@ -74,8 +74,8 @@ class Page(unittest.TestCase):
     def test_has_the_numbers_of_each_chart_in_a_table(self):
         self.open()
         self.assertEqual([row[1] for row in self.rows("hours")], ["20", "7"])
-        self.assertEqual([row[1] for row in self.rows("days")], ["1,000", "27"])
-        self.assertEqual([row[1] for row in self.rows("growth")], ["1,500", "1,527"])
+        self.assertEqual([row[1] for row in self.rows("days")], ["1,000", *["0"] * 9, "27"])
+        self.assertEqual([row[1] for row in self.rows("growth")], [*["1,500"] * 10, "1,527"])
         self.assertEqual(self.rows("modules"), [["B100", "1,020"], ["(no bar in the event id)", "7"]])
         self.assertEqual(self.rows("refused")[0][1:3], ["4", "12"])
         self.assertEqual(self.rows("outbox"), [["A759<img src=x onerror=alert(1)>", "55", "3,000"]])
@@ -101,6 +101,11 @@ class Page(unittest.TestCase):
         self.assertEqual(page.value("document.querySelectorAll('img, b').length"), 0)
         self.assertIn("<script>document.title='forged'</script>", self.rows("events")[0][0])
         self.assertIn("<b>bold</b> & <!--", self.text("#log"))
+
+    def test_lists_the_last_warnings_and_errors_with_time_and_place(self):
+        self.open()
+        self.assertEqual(self.text("#log li").replace("\u202f", " ").split("\n")[0],
+                         "ERROR Nov 21, 2026, 3:05:06 PM, Frame/DBHelper:1 ExecSql")
 
     def test_can_be_used_with_a_keyboard_and_read_aloud(self):
         page = self.open()
