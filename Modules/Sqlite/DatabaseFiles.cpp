@@ -30,9 +30,9 @@ void RequireOurFile(int directory, const std::string& name, const std::string& s
 
 } // namespace
 
-std::optional<Identity> IdentityOf(const std::string& path) {
+std::optional<Identity> IdentityOf(const std::string& path, int directory) {
     struct stat status {};
-    if (::lstat(path.c_str(), &status) != 0)
+    if (::fstatat(directory, path.c_str(), &status, AT_SYMLINK_NOFOLLOW) != 0)
         return std::nullopt;
     return Identity{status.st_dev, status.st_ino};
 }
@@ -58,15 +58,15 @@ void RequireOurFiles(const std::string& path) {
     RequireOurFiles(directory.Number(), file.filename().string(), shown);
 }
 
-bool SideFileWatch::IsInPlace(const std::string& path, std::optional<Identity>& identity) {
-    const auto now = IdentityOf(path);
+bool SideFileWatch::IsInPlace(const std::string& path, std::optional<Identity>& identity) const {
+    const auto now = IdentityOf(path, m_directory);
     if (!identity)
         identity = now;
     return now == identity;
 }
 
-SideFileWatch::SideFileWatch(std::string path)
-    : m_log(path + "-wal"), m_index(std::move(path) + "-shm"), m_logIdentity(IdentityOf(m_log)),
-      m_indexIdentity(IdentityOf(m_index)) {}
+SideFileWatch::SideFileWatch(std::string path, int directory)
+    : m_directory(directory), m_log(path + "-wal"), m_index(std::move(path) + "-shm"),
+      m_logIdentity(IdentityOf(m_log, directory)), m_indexIdentity(IdentityOf(m_index, directory)) {}
 
 } // namespace Sqlite

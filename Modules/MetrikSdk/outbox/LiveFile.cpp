@@ -66,7 +66,7 @@ void LiveFile::OpenOrBegin(std::chrono::milliseconds patience, std::vector<repor
 void LiveFile::Open(std::chrono::milliseconds patience) {
     m_place = OutboxFiles::OpenDirectory(m_directory, m_settings.dataDirectory);
     m_identity = OutboxFiles::Prepare(*m_place, FILE_NAME);
-    m_store = std::make_unique<OutboxStore>(m_place->PathOf(FILE_NAME), patience);
+    m_store = std::make_unique<OutboxStore>(m_place->PathOf(FILE_NAME), patience, m_place->Number());
     ++m_generation;
 }
 

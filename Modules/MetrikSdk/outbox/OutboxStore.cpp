@@ -47,7 +47,7 @@ SQLite::Database OpenDatabase(const std::string& path) {
 
 } // namespace
 
-OutboxStore::OutboxStore(const std::string& path, std::chrono::milliseconds lockPatience)
+OutboxStore::OutboxStore(const std::string& path, std::chrono::milliseconds lockPatience, int directory)
     : m_database(OpenDatabase(path)), m_sideFiles(path) {
     SetLockPatience(lockPatience);
     KeepLogOnClose(true); // until the file is known to be sound
@@ -65,7 +65,8 @@ OutboxStore::OutboxStore(const std::string& path, std::chrono::milliseconds lock
             std::make_unique<SQLite::Statement>(m_database, "DELETE FROM event WHERE id = ?1 AND uuid = ?2");
     });
     KeepLogOnClose(false);
-    m_sideFiles = Sqlite::SideFileWatch(path);
+    const bool hasDirectory = directory != AT_FDCWD;
+    m_sideFiles = Sqlite::SideFileWatch(hasDirectory ? path.substr(path.rfind('/') + 1) : path, directory);
 }
 
 bool OutboxStore::InTransaction() {

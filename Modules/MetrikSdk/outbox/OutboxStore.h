@@ -58,7 +58,11 @@ struct Refusal {
 class OutboxStore {
 public:
     /// Opens the file, which must exist. An empty file becomes an outbox.
-    OutboxStore(const std::string& path, std::chrono::milliseconds lockPatience);
+    ///
+    /// `directory`: the descriptor of the directory in which `path` ends, if the caller keeps that directory
+    /// open for longer than this object. IsWhole then looks for the side files in this directory, which takes
+    /// less time than a look through `path`.
+    OutboxStore(const std::string& path, std::chrono::milliseconds lockPatience, int directory = AT_FDCWD);
 
     /// How long the operations wait for another process's lock.
     void SetLockPatience(std::chrono::milliseconds patience);
