@@ -10,31 +10,35 @@
 
 namespace BoostLogger {
 
-/// The thread that writes waiting lines when no further line comes that would.
+/// Owns the thread that writes waiting lines when no further record comes. Without this thread, the last
+/// lines of a burst would wait until the next record.
 ///
-/// It sleeps without a deadline while no line waits, and otherwise until the lines are due. In a burst it
-/// wakes a thousand times a second. A record that comes alone does not wake it.
+/// While no line waits, the thread sleeps without a deadline. While lines wait, it sleeps until they are due.
+/// So it wakes about a thousand times a second in a burst, and a record that comes alone does not wake it.
 ///
-/// Threads: see each operation.
+/// Threads: any thread may call Notice. One thread makes, starts and destroys the object.
 class Flusher {
 public:
-    /// `mutex` guards the lines and what is in here; all that is given outlives the flusher. `write` is
-    /// called with the mutex held and must not throw.
+    /// `mutex` guards `lines` and the members of this object. `mutex` and `lines` must outlive this object.
+    /// `write` writes the waiting lines. The thread calls it with the mutex held; it must not throw.
     Flusher(std::mutex& mutex, const WaitingLines& lines, std::function<void()> write)
         : m_mutex(mutex), m_lines(lines), m_write(std::move(write)) {}
 
-    /// Waits for the thread's end. The caller must not hold the mutex.
+    /// Ends the thread and waits for its end. The caller must not hold the mutex.
     ~Flusher();
     Flusher(const Flusher&) = delete;
     Flusher& operator=(const Flusher&) = delete;
 
-    /// Starts the thread, if the system has one to give. Call this before there are records: the C library
-    /// changes the signal mask while it starts a thread, so the thread that called may get a signal that was
-    /// meant for the process. A crash trace is lost when its signal comes to a thread that is in the log.
+    /// Starts the thread. Without memory, or when the system gives no thread, it starts none, and Notice
+    /// returns false.
+    ///
+    /// Call this before any record comes. While the C library starts a thread, it changes the signal mask of
+    /// the calling thread. The calling thread may then get a signal that was sent to the process. If the
+    /// calling thread is inside the log at that moment, the log loses the crash trace of this signal.
     void Start() noexcept;
 
-    /// Call this with the mutex held, after a line was added. False when there is no thread: then the caller
-    /// must write the lines.
+    /// Call this with the mutex held, after a line began to wait. Returns false when there is no thread. Then
+    /// the caller must write the lines.
     bool Notice();
 
 private:

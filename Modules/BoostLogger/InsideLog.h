@@ -2,8 +2,10 @@
 
 namespace BoostLogger {
 
-/// Held while a thread waits for the log's lock or has it. The crash handler logs on the thread that crashed:
-/// should that ever be in here, its records must be lost and not wait for ever.
+/// Marks the thread that makes this object as being inside the log, until the object is destroyed. A thread
+/// is inside the log while it waits for the log's lock or holds it. The crash handler logs on the thread that
+/// crashed. If that thread crashed inside the log, it would wait for the lock for ever. So its records are
+/// counted as lost.
 class InsideLog {
 public:
     InsideLog() { t_isInside = true; }
@@ -11,7 +13,7 @@ public:
     InsideLog(const InsideLog&) = delete;
     InsideLog& operator=(const InsideLog&) = delete;
 
-    /// Whether this thread is.
+    /// Whether the calling thread is inside the log.
     static bool IsThisThread() { return t_isInside; }
 
 private:

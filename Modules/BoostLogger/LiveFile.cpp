@@ -101,14 +101,16 @@ FileFailure LiveFile::AppendLines(std::string_view& lines) {
         return {errno, "write to the file"};
     KeepSize(written, lines.find('\n') + 1 == lines.size());
     const auto done = lines.substr(0, static_cast<std::size_t>(mends && written > 0 ? written - 1 : written));
-    // Cutting half a line off again could cut off what another process appended after it.
+    // We do not cut a half line off. Another process may have appended a line after it, and that line would
+    // be cut off, too.
     m_endsInHalfLine = written == 0 ? mends : !done.empty() && done.back() != '\n';
     lines.remove_prefix(done.rfind('\n') + 1); // without one, npos + 1 is 0
     return lines.empty() ? FileFailure{} : FileFailure{ENOSPC, "write a whole line to the file"};
 }
 
-/// The offset after an append is the end of the file, with what other processes appended. Asking for it after
-/// each line was a sixth of the line's cost.
+/// After an append, the file offset is the end of the file, so it counts what other processes appended.
+/// Asking for the offset after each line took a sixth of the line's time, so we ask once in LINES_PER_LOOK
+/// lines, and after each write of several lines.
 void LiveFile::KeepSize(ssize_t written, bool isOneLine) {
     const bool looks = !isOneLine || ++m_lines % LINES_PER_LOOK == 0;
     m_sizeBytes = looks ? lseek(m_descriptor, 0, SEEK_CUR) : m_sizeBytes + written;

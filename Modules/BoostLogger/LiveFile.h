@@ -34,8 +34,8 @@ public:
     /// deleted our file. Also updates SizeBytes when there is a file at `path`.
     bool IsGoneFrom(const std::string& path);
 
-    /// How many lines are appended between two looks at the size, at most. So many may each writer go beyond
-    /// a limit where several write at once.
+    /// How many lines are appended between two looks at the size, at most. When several processes write at
+    /// once, each of them may exceed a size limit by as many lines.
     static constexpr unsigned LINES_PER_LOOK = 16;
 
     /// The size of the file. It counts the bytes of other processes as of the last look.
@@ -44,12 +44,14 @@ public:
     /// Updates SizeBytes now.
     void LookAtSize();
 
-    /// Appends the lines, each of which ends in a newline, with one system call: they are in the file, each
-    /// as a whole and not torn by other writers, when this returns. Where only a part of them could be
-    /// written, those that are not whole in the file stay in `lines`; after half a line, the next one starts
-    /// with a newline, so that the two are not glued together.
+    /// Appends the lines, each of which ends in a newline, with one system call. When this returns without a
+    /// failure, all lines are in the file, and no other process's text is in the middle of them. After a
+    /// failure, `lines` holds the lines that are not in the file as a whole. When the file ends in half a
+    /// line, the next call writes a newline first, so that the half line and the next line do not become one
+    /// line.
     FileFailure AppendLines(std::string_view& lines);
 
+    /// Appends one line, as AppendLines does.
     FileFailure Append(std::string_view line) { return AppendLines(line); }
 
     /// Takes the exclusive lock for a rotation. It is held until Unlock or Close. Waits 20 ms at most.

@@ -19,8 +19,9 @@ struct LogSettings {
     std::int64_t maxFileBytes = std::int64_t{10} * 1024 * 1024;
     std::int64_t maxTotalBytes = std::int64_t{100} * 1024 * 1024; ///< Live and rotated files together.
 
-    /// False allows the logger to keep records back. It keeps them as with true: in a burst, for a
-    /// millisecond at most (WaitingLines.h). To keep them longer would save next to nothing.
+    /// False allows the logger to keep records back. The logger does the same with true and with false: in a
+    /// burst, it keeps a record for a millisecond at most (see WaitingLines). Keeping records for longer
+    /// would save hardly any time.
     bool flushEach = true;
     bool console = false;
 

@@ -31,7 +31,8 @@ const char* const PAYLOAD_NAME = "BoostLoggerRecord";
 
 constexpr int INFORMATION = 2;
 
-/// Warnings, failures and a crash trace are the last words of many a process, and take with them what waits.
+/// Warnings, failures and crash traces are written at once, together with the lines that wait. They explain
+/// the end of a process, which often follows them.
 LogWriter::Haste HasteOf(const LogRecord& record) {
     return record.level <= INFORMATION ? LogWriter::Haste::MayWait : LogWriter::Haste::AtOnce;
 }

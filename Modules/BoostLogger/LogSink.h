@@ -34,7 +34,7 @@ public:
 
     void Write(const LogRecord& record) noexcept;
 
-    /// The process ends: see LogWriter.
+    /// Call this when the process ends; see LogWriter::Finish.
     void Finish() noexcept;
 
 private:

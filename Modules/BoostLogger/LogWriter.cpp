@@ -27,16 +27,18 @@ const char* const NO_LINE = "out of memory, or logged by a signal handler inside
 
 constexpr int WARNING = 3;
 
-/// How long the end of the process waits for a thread that writes.
+/// How long Finish waits for a thread that holds the lock. At the end of the process, that thread may never
+/// run again.
 constexpr std::chrono::milliseconds FINISH_PATIENCE{200};
 
-/// How often a process forked before it became this one. A child has the lines that waited, which are its
-/// parent's to write, and lacks the thread that writes them.
+/// How many forks lie between the first process and this one. A forked child has a copy of the waiting lines,
+/// but the parent writes these lines. The child also has no Flusher thread, because fork copies only the
+/// thread that calls it. A higher number than before tells a writer that it is in a child.
 std::atomic<unsigned> g_forks = 0;
 
 [[maybe_unused]] const int g_forkHandler = pthread_atfork(nullptr, nullptr, [] { ++g_forks; });
 
-/// Behind the last newline within `maxBytes`; 0 when there is none.
+/// How many bytes the whole lines have that fit into `maxBytes`; 0 when no whole line fits.
 std::size_t WholeLines(std::string_view lines, std::int64_t maxBytes) {
     if (maxBytes <= 0)
         return 0;
@@ -70,7 +72,8 @@ FileFailure LogWriter::Start() {
 void LogWriter::Append(std::string_view line, TimePoint now, Haste haste) noexcept {
     if (InsideLog::IsThisThread())
         return CountLost();
-    const InsideLog inside; // before the lock: a signal between the two would wait for the lock for ever
+    // Set before the lock is taken: a signal handler that logs in between would otherwise wait for ever.
+    const InsideLog inside;
     const std::lock_guard lock(m_mutex);
     if (m_forks != g_forks.load(std::memory_order_relaxed)) {
         m_mayWait = false;
@@ -82,7 +85,8 @@ void LogWriter::Append(std::string_view line, TimePoint now, Haste haste) noexce
     Write(line, now);
 }
 
-/// Whether the line needs no write of its own.
+/// Returns true when the line waits or was written together with waiting lines. Otherwise the caller must
+/// write the line.
 bool LogWriter::LetWait(std::string_view line, TimePoint now) {
     if (!m_mayWait || !m_waiting.Take(line, now))
         return false;
@@ -93,7 +97,7 @@ bool LogWriter::LetWait(std::string_view line, TimePoint now) {
 
 void LogWriter::Finish() noexcept {
     if (InsideLog::IsThisThread())
-        return; // the thread that crashed in here is not coming back
+        return; // this thread crashed in here, and perhaps with the lock
     const InsideLog inside;
     const auto deadline = std::chrono::steady_clock::now() + FINISH_PATIENCE;
     while (!m_mutex.try_lock()) {
@@ -131,7 +135,7 @@ void LogWriter::Write(std::string_view lines, TimePoint now) noexcept {
     m_nextAttempt = now + RETRY_INTERVAL;
 }
 
-/// Takes away of `lines` what is in the file.
+/// Removes from `lines` those that are in the file. After a failure, `lines` holds those that are lost.
 FileFailure LogWriter::Deliver(std::string_view& lines, TimePoint now) {
     if (const FileFailure failure = FollowPath(now))
         return failure;
@@ -189,7 +193,7 @@ FileFailure LogWriter::Put(std::string_view& lines) {
                 return failure;
             part = Fitting(lines);
         }
-        if (part.empty()) // one that is too large for any file gets one of its own
+        if (part.empty()) // a line that is too large for any file gets a file of its own
             part = lines.substr(0, lines.find('\n') + 1);
         if (static_cast<std::int64_t>(part.size()) > m_systemLimit)
             return {EFBIG, "write to the file"};
@@ -202,10 +206,10 @@ FileFailure LogWriter::Put(std::string_view& lines) {
     return {};
 }
 
-/// The lines that the live file has room for.
+/// Those of `lines`, from the first on, that fit into the live file. Empty when the first line does not fit.
 std::string_view LogWriter::Fitting(std::string_view lines) {
     if (m_systemLimit != NO_LIMIT)
-        m_live.LookAtSize(); // before each write: what another process appended counts, too
+        m_live.LookAtSize(); // before each write, because what another process appended counts, too
     const std::int64_t limit = std::min(m_settings.maxFileBytes, m_systemLimit);
     return lines.substr(0, WholeLines(lines, limit - m_live.SizeBytes()));
 }

@@ -23,8 +23,8 @@ namespace BoostLogger {
 ///
 /// In a burst, lines share a write: see WaitingLines and Flusher.
 ///
-/// Threads: all from any. Append blocks for no longer than the file system does, and 20 ms where another
-/// process rotates at the same moment.
+/// Threads: any may call Append, Finish and CountLost. Append blocks for as long as the file system does, and
+/// for up to 20 ms when another process rotates at the same moment.
 class LogWriter {
 public:
     using TimePoint = std::chrono::steady_clock::time_point;
@@ -36,15 +36,16 @@ public:
     /// file as soon as that works.
     FileFailure Start();
 
+    /// Whether a line may wait for the other lines of its burst.
     enum class Haste { MayWait, AtOnce };
 
-    /// Appends one line, its newline included. When this returns the line is in the file and survives the end
-    /// of this process, with all lines before it, or it is counted as lost. One that may wait is there a
-    /// millisecond later at most if it comes in a burst.
+    /// Appends one line, its newline included. When this returns, the line and all lines before it are in the
+    /// file and survive the end of this process, or are counted as lost. The exception is a line of a burst
+    /// that may wait: it is written a millisecond later at most, if the Flusher's thread gets a processor.
     void Append(std::string_view line, TimePoint now, Haste haste = Haste::AtOnce) noexcept;
 
-    /// The process ends: writes the lines that wait, and lets none wait from now on. Gives up when another
-    /// thread keeps the lock for a fifth of a second.
+    /// Call this when the process ends. Writes the waiting lines; later lines do not wait any more. Waits up
+    /// to 200 ms for another thread that holds the lock, and then returns without a write.
     void Finish() noexcept;
 
     /// Counts a record that was lost before it became a line.
@@ -80,8 +81,8 @@ private:
     TimePoint m_nextAttempt; ///< When to try again after a failure; lines that come before are dropped.
     FileFailure m_failure;   ///< The last failure. The record that reports the loss names it.
     bool m_losing = false;
-    bool m_mayWait = true; ///< Until the process ends.
-    unsigned m_forks = 0;  ///< See Forks, when a line waited last.
+    bool m_mayWait = true; ///< False from Finish on, and in a forked child.
+    unsigned m_forks = 0;  ///< g_forks when this object was made. In a forked child, g_forks is higher.
     WaitingLines m_waiting;
     Flusher m_flusher{m_mutex, m_waiting, [this] { WriteWaiting(std::chrono::steady_clock::now()); }};
 };

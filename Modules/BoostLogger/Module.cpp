@@ -46,7 +46,7 @@ void CheckSettings(const LogSettings& settings) {
                "");
 }
 
-/// The end of the process by exit, which a crash handler calls, too.
+/// Runs in exit, and so also when a crash handler calls exit.
 void FinishSink() {
     if (LogSink* sink = g_sink.load(std::memory_order_acquire))
         sink->Finish();

@@ -9,25 +9,27 @@
 
 namespace BoostLogger {
 
-/// The lines of a burst that wait for their common write, and the decisions about them as functions of the
-/// time:
+/// The lines of a burst that wait for a common write, and the rules for waiting. The rules are functions of
+/// the time:
 ///
-///   the first 16 lines of a millisecond   do not wait, so that a lone record never does
-///   those that follow in it               wait until there are 16 of them, for a millisecond at most
+///   the first 16 lines of a millisecond        do not wait, so a record that comes alone never waits
+///   the further lines of that millisecond      wait until 16 lines wait, but no longer than a millisecond
 ///
-/// Threads: one at a time. Never fails: its room is its own.
+/// Threads: one at a time. Failure: none. The buffer is a member, so no memory is allocated.
 class WaitingLines {
 public:
     using TimePoint = std::chrono::steady_clock::time_point;
 
-    /// As many lines as the file may pass its limit by where two processes write it
-    /// (LiveFile::LINES_PER_LOOK). To share a write among more of them would save little.
+    /// How many lines share a write. When two processes write to one file, each of them may exceed the file's
+    /// size limit by as many lines; LiveFile::LINES_PER_LOOK is the same number. More lines for each write
+    /// would save little.
     static constexpr unsigned LINES = 16;
 
-    /// How long a line waits at most, and the time in which more than LINES are a burst.
+    /// How long a line may wait. More than LINES lines within this time are a burst.
     static constexpr std::chrono::milliseconds SPAN{1};
 
-    /// Takes a line over that comes now. False when it is not to wait, or has no room here.
+    /// Copies the line, which then waits. Returns false, and does not copy the line, when the line must not
+    /// wait or when there is no room for it.
     bool Take(std::string_view line, TimePoint now) {
         if (!IsBurst(now) || line.size() > m_room.size() - m_bytes)
             return false;
@@ -38,10 +40,10 @@ public:
         return true;
     }
 
-    /// Whether they are to be written now.
+    /// Whether the waiting lines must be written now.
     bool AreDue(TimePoint now) const { return m_lines >= LINES || (m_lines > 0 && now >= m_due); }
 
-    /// When they are to be written at the latest; nothing when none waits.
+    /// When the waiting lines must be written at the latest. Nothing when no line waits.
     std::optional<TimePoint> Due() const { return m_lines > 0 ? std::optional(m_due) : std::nullopt; }
 
     std::string_view Text() const { return {m_room.data(), m_bytes}; }
@@ -60,12 +62,12 @@ private:
         return ++m_inMillisecond > LINES;
     }
 
-    TimePoint m_millisecondEnds; ///< Of the one that is counted.
-    unsigned m_inMillisecond = 0;
-    TimePoint m_due; ///< While a line waits.
+    TimePoint m_millisecondEnds;  ///< The end of the millisecond whose lines m_inMillisecond counts.
+    unsigned m_inMillisecond = 0; ///< How many lines came in this millisecond.
+    TimePoint m_due;              ///< When the waiting lines are due. Has no meaning while no line waits.
     unsigned m_lines = 0;
     std::size_t m_bytes = 0;
-    std::array<char, 16384> m_room; ///< 16 lines of the usual 250 bytes, and of four times as many.
+    std::array<char, 16384> m_room; ///< Holds 16 lines of 1,024 bytes; a usual line has 250 bytes.
 };
 
 } // namespace BoostLogger

@@ -15,11 +15,13 @@ constexpr auto FILE_NAME = "libcurl.so.4";
 #endif
 
 [[noreturn]] void Fail() {
-    const char* const reason = ::dlerror(); // NOLINT(concurrency-mt-unsafe): the C library keeps one a thread
+    const char* const reason =
+        ::dlerror(); // NOLINT(concurrency-mt-unsafe): the C library keeps a text for each thread
     throw std::runtime_error(std::string("cannot use libcurl: ") + (reason != nullptr ? reason : FILE_NAME));
 }
 
-/// Never closed: the libraries that come with it register what they do at the process's end.
+/// The library is never closed, because libraries that it loads have registered functions that run at the end
+/// of the process.
 void* Opened() {
     void* const library = ::dlopen(FILE_NAME, RTLD_NOW | RTLD_LOCAL | RTLD_NODELETE);
     if (library == nullptr)

@@ -41,7 +41,8 @@ std::optional<Literal> TakeInteger(std::string_view& rest) {
     return literal;
 }
 
-/// Takes the literals up to the parenthesis that ends `rest`; false when there is anything else.
+/// Appends the literals up to the parenthesis that ends `rest`. Returns false when `rest` holds anything
+/// else.
 bool TakeLiterals(std::string_view rest, LiteralInsert& insert) {
     while (insert.literals.size() < LiteralInsert::MAX_LITERALS) {
         while (rest.starts_with(' '))
@@ -59,7 +60,7 @@ bool TakeLiterals(std::string_view rest, LiteralInsert& insert) {
     return false;
 }
 
-/// What stands before the literals; empty when it is not what it has to be.
+/// The text before the literals. Empty when it is not the start of an INSERT that we accept.
 std::string_view HeadOf(std::string_view sql) {
     const std::size_t values = sql.find(VALUES);
     if (!sql.starts_with(BEGIN) || values == std::string_view::npos)

@@ -23,15 +23,15 @@ struct LiteralInsert {
     /// More than the store's statement needs.
     static constexpr std::size_t MAX_LITERALS = 32;
 
-    std::string_view head; ///< up to and with the parenthesis behind "values"
+    std::string_view head; ///< everything up to the parenthesis after "values", with that parenthesis
     boost::container::static_vector<Literal, MAX_LITERALS> literals;
 
-    /// `knownHead`: the head of another text for which there was a result, or empty. The next text mostly has
-    /// the same, and to read it again was half of the work.
+    /// Returns nothing for any other text, and in doubtful cases: an expression, a comment, a sign, a zero
+    /// byte, upper-case keywords, anything after the closing parenthesis. Such a text is no error; SQLite
+    /// decides about it.
     ///
-    /// Nothing for any other text, and when in doubt: an expression, a comment, a sign, a zero byte,
-    /// upper-case keywords, anything behind the closing parenthesis. Such a text is no error, it is SQLite's
-    /// to judge.
+    /// `knownHead`: the head of an earlier result, or empty. When `sql` starts with `knownHead`, the head is
+    /// not examined again. That halves the time, because most texts have the same head as the text before.
     static std::optional<LiteralInsert> Of(std::string_view sql, std::string_view knownHead = {});
 };
 

@@ -39,8 +39,8 @@ private:
     sqlite3* m_connection;
     StatementGuard& m_guard;
     sqlite3_stmt* m_statement = nullptr;
-    std::string m_head;       ///< Of the text of m_statement; empty without one.
-    std::size_t m_places = 0; ///< Parameters, in the literals' places.
+    std::string m_head;       ///< The head of m_statement's text; empty while there is no statement.
+    std::size_t m_places = 0; ///< How many parameters m_statement has. Each takes the place of a literal.
 };
 
 } // namespace OrvekSqlite::guard
