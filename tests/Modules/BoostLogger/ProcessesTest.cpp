@@ -40,8 +40,23 @@ protected:
             Log(logger, name + " " + std::to_string(i));
     }
 
-    /// By exit, as a program ends: what waits is written then.
+    /// Ends a child by exit, as a program ends. The lines that wait are written then.
     [[noreturn]] static bool Ended() { std::exit(0); }
+
+    /// Logs a thousand records in a burst and one of `level` after them, in a process that is killed then. So
+    /// no end of a process writes the lines that wait. Expects all records in the log.
+    void ExpectAllAfterAKillBehind(int level) {
+        ChildProcess child([&] {
+            LoggerLoader loader(BOOST_LOGGER_PATH);
+            Init(loader, {m_temporary.Path()});
+            LogNumbers(loader.GetModule(), "t", 1000);
+            Log(loader, "t 1000", level);
+            raise(SIGKILL);
+            return true;
+        });
+        ASSERT_EQ(child.Wait(), 128 + SIGKILL);
+        ExpectNumbers({"t"}, 1001);
+    }
 
     /// Expects that the log has, for each name, exactly the numbers from 0 to `count` - 1, in order.
     void ExpectNumbers(const std::vector<std::string>& names, int count) {
@@ -190,6 +205,14 @@ TEST_F(BoostLoggerProcesses, AKillInABurstCostsSixteenRecordsAtMost) {
         ASSERT_EQ(MessageOf(lines[i]), "t " + std::to_string(i));
 }
 
+TEST_F(BoostLoggerProcesses, AWarningIsInTheFileAtOnceWithAllRecordsBeforeIt) {
+    ExpectAllAfterAKillBehind(3);
+}
+
+TEST_F(BoostLoggerProcesses, AnErrorAsInACrashTraceIsInTheFileAtOnceWithAllRecordsBeforeIt) {
+    ExpectAllAfterAKillBehind(4);
+}
+
 TEST_F(BoostLoggerProcesses, ExitEndsWhileOtherThreadsAreLogging) {
     for (int round = 0; round < EXITS; ++round) {
         const TemporaryDirectory directory;
@@ -235,22 +258,6 @@ void LogAndExit(int signal) {
 }
 
 } // namespace
-
-TEST_F(BoostLoggerProcesses, AllRecordsBeforeACrashAreInTheFileBeforeItsTrace) {
-    ChildProcess child([&]() -> bool {
-        LoggerLoader loader(BOOST_LOGGER_PATH);
-        Init(loader, {m_temporary.Path()});
-        LogNumbers(loader.GetModule(), "t", 1000);
-        Log(loader, "Signal[11]", 4);
-        raise(SIGKILL); // so that it is the trace that wrote them, and not the end
-        return false;
-    });
-    EXPECT_EQ(child.Wait(), 128 + SIGKILL);
-    const auto lines = ReadLog(m_temporary.Path());
-    ASSERT_EQ(lines.size(), 1001U);
-    EXPECT_EQ(MessageOf(lines[999]), "t 999");
-    EXPECT_EQ(MessageOf(lines[1000]), "Signal[11]");
-}
 
 TEST_F(BoostLoggerProcesses, ACrashHandlerCanLogAndExitWhileOtherThreadsAreLogging) {
     ChildProcess child([&]() -> bool {
