@@ -61,17 +61,18 @@ void PrintCaughtException() noexcept {
 /// text ends there also when a datagram fills the buffer.
 class UDPServer::Buffer {
 public:
-    /// All bytes are zero afterwards. Only what the datagram before has left is written: zeroing all of the
-    /// buffer, in which a usual report fills a fiftieth, was a tenth of what the program itself does for a
-    /// datagram.
+    /// Makes all bytes zero. It writes only to those bytes that the last datagram filled; the others are zero
+    /// already. A usual report fills a fiftieth of the buffer. To zero the whole buffer took a tenth of the
+    /// program's own time for a datagram.
     void Clear() {
         std::fill_n(m_bytes.begin(), m_used, '\0');
         m_used = 0;
     }
 
-    /// As the socket's receiveFrom, into the cleared buffer.
+    /// Receives a datagram into the buffer, which must be clear. Result and failure are those of the socket's
+    /// receiveFrom.
     int Receive(Poco::Net::DatagramSocket& socket) {
-        m_used = Wire::MAX_BYTES; // until the call has told
+        m_used = Wire::MAX_BYTES; // if the call throws, any byte may have been written
         sockaddr* sender = reinterpret_cast<sockaddr*>(&m_sender);
         poco_socklen_t senderBytes = sizeof m_sender;
         poco_socklen_t* senderLength = &senderBytes;
@@ -80,16 +81,16 @@ public:
         return bytes;
     }
 
-    /// The bytes up to the first zero byte, until the next call.
+    /// The bytes up to the first zero byte. The reference is valid until the next call.
     const std::string& Text() { return m_text.assign(m_bytes.data()); }
 
 private:
     std::array<char, Wire::MAX_BYTES + 1> m_bytes{};
-    std::size_t m_used = 0; ///< How many of them may be other than zero.
-    std::string m_text;     ///< Kept, with its room.
+    std::size_t m_used = 0; ///< How many of the first bytes may be other than zero.
+    std::string m_text;     ///< A member, so that its memory is allocated once and not for each datagram.
 
-    /// Not checked: every program of this machine may send. As the system has it: an address of the library's
-    /// takes an allocation for each datagram.
+    /// The sender is not checked: every program on this machine may send. This is the system's type, because
+    /// Poco::Net::SocketAddress allocates memory for each datagram.
     sockaddr_storage m_sender{};
 };
 

@@ -55,7 +55,7 @@ int main() {
     Poco::SharedPtr<ReportServer> server(new ReportServer);
     OpenLedger(server->Ledger());
     server->Start(); // a failed start has been logged, and the parts that run are kept
-    // What only the start needed is not held by a service that mostly waits.
+    // The service mostly waits from here on. It need not keep the code in memory that only the start needed.
     SystemTool::Platform::LetGoOfCode();
     stopEvent.wait(); // for ever: the service ends by a signal
     return 0;

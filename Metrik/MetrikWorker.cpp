@@ -80,7 +80,7 @@ bool MetrikWorker::Send(const ST_OptLog& log) {
         JsonDocument eventData;
         if (!log.value.empty()) {
             std::string error;
-            eventData.FromJson(log.value, error); // no other document shares its tree, so that none is copied
+            eventData.FromJson(log.value, error);
             if (!error.empty()) {
                 // The parser's error text is the format string, deliberately.
                 WriteLog({LogLevel::Error, "Send", 107}, error);

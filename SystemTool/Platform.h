@@ -51,9 +51,9 @@ bool IsFileLocked(int file);
 /// buffer was full. The count wraps around at 2^32. Nothing when the system does not give it.
 std::optional<std::uint32_t> DatagramsDropped(int socket);
 
-/// Takes the pages of program code that were used until now out of this process's memory. Those that it goes
-/// on to use come back one by one, from the system's cache. For a program that has started and mostly waits:
-/// what it needed for that only, it does not hold for ever. Does nothing where the system gives no way.
+/// Removes the pages of program code from this process's memory. A page that the process uses again comes
+/// back from the system's cache. A program that mostly waits calls this after its start, so that code that
+/// only the start needed takes no memory. On a system that has no call for it, this does nothing.
 void LetGoOfCode();
 
 } // namespace SystemTool::Platform

@@ -150,7 +150,8 @@ std::optional<std::uint32_t> DatagramsDropped(int socket) {
     return figures[SK_MEMINFO_DROPS];
 }
 
-/// Only segments that no relocation writes to, so that each page is the file's.
+/// Only segments that cannot be written to. Their pages are the same as in the file, so the system can read
+/// them again.
 void LetGoOfCode() {
     const auto letGo = [](dl_phdr_info* library, std::size_t, void*) {
         const auto page = static_cast<ElfW(Addr)>(::sysconf(_SC_PAGESIZE));

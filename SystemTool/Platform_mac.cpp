@@ -96,6 +96,6 @@ std::optional<std::uint32_t> DatagramsDropped(int) {
     return std::nullopt;
 }
 
-void LetGoOfCode() {} // the system compresses and drops what is not used by itself
+void LetGoOfCode() {} // macOS itself compresses and drops unused pages
 
 } // namespace SystemTool::Platform

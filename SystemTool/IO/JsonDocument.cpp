@@ -31,7 +31,7 @@ Value::ConstMemberIterator Find(const Value& object, const std::string& key) {
 // NOLINTNEXTLINE(cppcoreguidelines-pro-type-member-init): the room is written before it is read
 struct JsonDocument::Tree {
     static constexpr std::size_t ROOM_BYTES = 768;
-    static constexpr std::size_t CHUNK_BYTES = 4096; ///< What the allocator takes when the room is used up.
+    static constexpr std::size_t CHUNK_BYTES = 4096; ///< How much is allocated at once when `room` is full.
 
     alignas(std::max_align_t) char room[ROOM_BYTES];
     JsonPool allocator{room, sizeof room, CHUNK_BYTES};

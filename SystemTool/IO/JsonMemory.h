@@ -40,8 +40,8 @@ using JsonTree = rapidjson::GenericDocument<rapidjson::UTF8<>, JsonPool, JsonAll
 using JsonReader = rapidjson::GenericReader<rapidjson::UTF8<>, rapidjson::UTF8<>, JsonAllocator>;
 using JsonBuffer = rapidjson::GenericStringBuffer<rapidjson::UTF8<>, JsonAllocator>;
 
-/// Copies a text without escapes as a whole. The library's own writer goes byte by byte, which was half of
-/// what it costs to write an event.
+/// Copies a text that needs no escapes as a whole. The library's own writer copies byte by byte, which took
+/// half of the time for writing an event.
 class JsonWriter : public rapidjson::Writer<JsonBuffer, rapidjson::UTF8<>, rapidjson::UTF8<>, JsonAllocator> {
 public:
     explicit JsonWriter(JsonBuffer& buffer) : Writer(buffer) {}
@@ -60,8 +60,7 @@ private:
 
     static bool IsPlain(std::string_view text) {
         for (; text.size() >= BLOCK; text.remove_prefix(BLOCK))
-            if (!IsPlain(text.data(),
-                         BLOCK)) // a fixed length, of which the compiler makes vector instructions
+            if (!IsPlain(text.data(), BLOCK)) // a constant length, so the compiler uses vector instructions
                 return false;
         return IsPlain(text.data(), text.size());
     }

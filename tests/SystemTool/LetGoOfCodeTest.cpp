@@ -8,7 +8,7 @@
 #ifdef __linux__
 namespace {
 
-/// Of the files that are mapped, what is in this process's memory.
+/// How much of the mapped files is in this process's memory.
 long ResidentFileKb() {
     std::ifstream status("/proc/self/status");
     for (std::string line; std::getline(status, line);)
@@ -22,7 +22,7 @@ long ResidentFileKb() {
 TEST(LetGoOfCode, TakesCodeOutOfMemoryAndTheProgramGoesOn) {
     const long before = ResidentFileKb();
     SystemTool::Platform::LetGoOfCode();
-    const long after = ResidentFileKb(); // which needs some of it again
+    const long after = ResidentFileKb(); // this call itself brings some pages back
     EXPECT_GT(after, 0);
     EXPECT_LT(after, before);
     EXPECT_THROW(static_cast<void>(std::stol("no number")), std::invalid_argument);

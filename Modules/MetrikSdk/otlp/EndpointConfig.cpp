@@ -253,7 +253,7 @@ std::optional<EndpointConfig> ReadEndpoint(const LookUp& lookUp, std::vector<std
         return std::nullopt;
     try {
         return reader.Read();
-    } catch (const std::runtime_error& error) { // of the library: the events wait in the outbox
+    } catch (const std::runtime_error& error) { // libcurl cannot be opened; the events wait in the outbox
         complaints.push_back(std::string("No event is sent: ") + error.what());
         return std::nullopt;
     }
