@@ -28,6 +28,13 @@ double ChildrensSeconds() {
     return seconds(usage.ru_utime) + seconds(usage.ru_stime);
 }
 
+/// Of the largest child of this process, in MiB.
+long PeakMemory() {
+    struct rusage usage {};
+    ::getrusage(RUSAGE_CHILDREN, &usage);
+    return usage.ru_maxrss / 1024;
+}
+
 class LargeStore : public testing::Test {
 protected:
     void SetUp() override {
@@ -70,6 +77,9 @@ TEST_F(LargeStore, IsReadInTimeAndReadAndPrunedBesideTheServiceWithoutAReportLos
     std::filesystem::remove(Path("rows.jsonl"));
     ExpectWithin(5, {"stats", "--by", "event", "--json"});
     ExpectWithin(10, {"stats", "--by", "hour", "--since", "2023-11-15", "--top", "3"});
+    ExpectWithin(15, {"page", Path("page.html")});
+    EXPECT_LT(PeakMemory(), 64) << "a command keeps the rows that it reads";
+    RecordProperty("mebibytes_of_the_largest", std::to_string(PeakMemory()));
 
     m_service.Start();
     SteadyReports reports([](int) {

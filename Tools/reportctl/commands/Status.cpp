@@ -53,7 +53,8 @@ int ShowOnce(const Options& options) {
 
 /// The text with the control sequences that draw it over the last screen. It starts at the top left, clears
 /// the rest of each line and everything below. Clearing the whole screen first would make it flicker.
-std::string InPlace(std::string screen) {
+std::string InPlace(const std::string& text) {
+    auto screen = terminal::FirstRows(text, terminal::Rows(), terminal::Columns());
     for (std::size_t at = 0; (at = screen.find('\n', at)) != std::string::npos; at += 4)
         screen.insert(at, "\x1b[K");
     return "\x1b[H" + screen + "\x1b[J";

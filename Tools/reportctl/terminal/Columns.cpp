@@ -26,11 +26,25 @@ std::string_view TakeWord(std::string_view& line) {
     return word;
 }
 
+winsize SizeOfTerminal() {
+    winsize size{};
+    return ::ioctl(STDOUT_FILENO, TIOCGWINSZ, &size) == 0 ? size : winsize{};
+}
+
+/// A line without blanks can be longer than the terminal is wide.
+std::size_t RowsOf(std::string_view line, std::size_t columns) {
+    const auto width = WidthOf(line);
+    return columns == 0 || width == 0 ? 1 : (width + columns - 1) / columns;
+}
+
 } // namespace
 
 std::size_t Columns() {
-    winsize size{};
-    return ::ioctl(STDOUT_FILENO, TIOCGWINSZ, &size) == 0 ? size.ws_col : 0;
+    return SizeOfTerminal().ws_col;
+}
+
+std::size_t Rows() {
+    return SizeOfTerminal().ws_row;
 }
 
 std::string Broken(std::string_view line, std::size_t columns, std::size_t indent) {
@@ -50,6 +64,18 @@ std::string Broken(std::string_view line, std::size_t columns, std::size_t inden
         used += WidthOf(word);
     }
     return text;
+}
+
+std::string FirstRows(std::string_view text, std::size_t rows, std::size_t columns) {
+    std::size_t used = 1; // the cursor's
+    for (std::size_t begin = 0; rows != 0 && begin < text.size();) {
+        const auto end = std::min(text.find('\n', begin), text.size());
+        used += RowsOf(text.substr(begin, end - begin), columns);
+        if (used > rows)
+            return std::string(text.substr(0, begin));
+        begin = end + 1;
+    }
+    return std::string(text);
 }
 
 } // namespace reportctl::terminal

@@ -31,4 +31,12 @@ TEST(LineForTheTerminal, IsNotBrokenWithoutATerminalOrOnANarrowOne) {
     EXPECT_EQ(Broken(text, 25, 11), text);
 }
 
+TEST(TextForTheTerminal, IsCutWhereItWouldScroll) {
+    using reportctl::terminal::FirstRows;
+    EXPECT_EQ(FirstRows("1\n2\n3\n", 4, 80), "1\n2\n3\n");
+    EXPECT_EQ(FirstRows("1\n2\n3\n", 3, 80), "1\n2\n");
+    EXPECT_EQ(FirstRows("1\n" + std::string(81, 'x') + "\n3\n", 4, 80), "1\n" + std::string(81, 'x') + "\n");
+    EXPECT_EQ(FirstRows("1\n2\n3\n", 0, 0), "1\n2\n3\n") << "there is no terminal";
+}
+
 } // namespace
