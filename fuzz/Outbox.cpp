@@ -213,7 +213,7 @@ private:
         m_collector.answer = std::move(answer);
         const auto pause = m_cycle->Pass(WallNow() + std::chrono::hours(1));
         Require(pause.duration >= std::chrono::milliseconds(0) &&
-                    pause.duration <= RetrySettings().maxRetryAfter,
+                    pause.duration <= RetrySettings().maxRetryAfter + RetrySettings().maxRetryAfterSpread,
                 "the uploader comes back", std::to_string(pause.duration.count()));
     }
 
