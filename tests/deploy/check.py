@@ -34,8 +34,8 @@ def distinct(collector, name):
 
 
 def run_installation(name, use, programs, directory, collector, now_ms):
-    """Lets an installation send what `use` says, until the collector has it; returns what was sent, and the
-    rows of its store."""
+    """Lets an installation send what `use` says, until the collector has it, and then the rows of its store.
+    Returns the events that were sent, the rows, and an export of the rows."""
     collector.loses_next_answer = True
     before = collector.rejected
     installation = fleet.Installation(
@@ -49,7 +49,9 @@ def run_installation(name, use, programs, directory, collector, now_ms):
         fleet.until(f"the rejected events of {name}", lambda: collector.rejected - before == bad)
         installation.reportctl("outbox", "test")
         fleet.until("the last row", lambda: fleet.LAST_ROW in installation.reportctl("export"))
-        return installation.sent, installation.reportctl("export", "--format", "jsonl")
+        collector.loses_next_answer = True
+        installation.reportctl("forward", "--once")
+        return installation.sent, installation.stored, installation.reportctl("export", "--format", "jsonl")
     finally:
         installation.stop()
 
@@ -72,15 +74,18 @@ def main():
     now_ms = time.time_ns() // 1_000_000
     configs.check(tables.DEPLOY, expect)
     collector = Collector(COLLECTOR_PORT)
-    sent, exports = [], {}
+    sent, stored, exports = [], [], {}
     with tempfile.TemporaryDirectory() as name:
         directory = pathlib.Path(name)
         for source, use in (("office", fleet.use_office), ("home", fleet.use_home)):
-            events, exports[source] = run_installation(source, use, programs, directory, collector, now_ms)
+            events, lines, exports[source] = run_installation(
+                source, use, programs, directory, collector, now_ms
+            )
             sent += events
+            stored += lines
         expect("what the collector complains of", collector.complaints, [])
         made = check_script(collector)
-        truth = Expected(sent, now_ms)
+        truth = Expected(sent, stored, now_ms)
         tables.check(engines.Current(modules), collector, truth, exports, made)
         tables.check(engines.Old(server, directory), collector, truth, exports, made)
     print(f"{expect.passed} passed, {expect.failed} failed")

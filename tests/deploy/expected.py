@@ -45,16 +45,36 @@ def number(value):
     return rows.json_text(int(value) if float(value).is_integer() else value)
 
 
+def scalars_of(event):
+    """The members of the data that become attributes, as texts."""
+    return {
+        name: value if isinstance(value, str) else rows.json_text(value)
+        for name, value in event.data.items()
+        if not isinstance(value, (dict, list))
+    }
+
+
 class Expected:
-    def __init__(self, sent, now_ms):
+    def __init__(self, sent, stored, now_ms):
         self.sequences = {}
         for lines in grouped(sent, lambda event: (event.installation, event.module)).values():
             self.sequences.update({event.mark: place for place, event in enumerate(lines, 1)})
         self.arrived = [event for event in sent if event.event != REJECTED_EVENT]
         self.recent = [event for event in self.arrived if event.time_ms > now_ms - 30 * DAY_MS]
+        self.stored = stored
+        self.recent_and_stored = self.recent + stored
 
     def count_of(self, installation):
-        return sum(event.installation == installation for event in self.arrived)
+        return sum(event.installation == installation for event in self.arrived + self.stored)
+
+    def store_lines(self):
+        """The rows of all stores, numbered from 1 in each."""
+        lines = []
+        for _, each in sorted(grouped(self.stored, lambda event: event.installation).items()):
+            for row, event in enumerate(each, 1):
+                columns = (event.installation, row, event.module, event.event, event.user, event.suite_version)
+                lines.append([*map(str, columns), str(event.time_ms), "0", scalars_of(event)])
+        return lines
 
     def wide_table(self):
         """Each event by its mark."""
@@ -67,11 +87,7 @@ class Expected:
                 "milliseconds": str(event.time_ms),
                 "sequence": str(self.sequences[event.mark]),
                 "os": "linux",
-                "data": {
-                    name: value if isinstance(value, str) else rows.json_text(value)
-                    for name, value in event.data.items()
-                    if not isinstance(value, (dict, list))
-                },
+                "data": scalars_of(event),
                 "body": event.data,
             }
             for event in self.arrived
@@ -81,19 +97,19 @@ class Expected:
         return [self.days(), self.events(engine), self.versions(engine), self.clicks(), self.gaps()]
 
     def days(self):
-        groups = grouped(self.recent, lambda event: (day(event), event.module))
+        groups = grouped(self.recent_and_stored, lambda event: (day(event), event.module))
         lines = [[*key, len(each), users(each), installations(each)] for key, each in groups.items()]
         return texts(sorted(lines))
 
     def events(self, engine):
-        groups = grouped(self.recent, lambda event: event.event).items()
+        groups = grouped(self.recent_and_stored, lambda event: event.event).items()
         by_count = sorted(groups, key=lambda group: (-len(group[1]), group[0]))
         return texts([key, len(each), users(each), last(each, engine)] for key, each in by_count)
 
     def versions(self, engine):
         newest = [
             max(each, key=lambda event: event.time_ms)
-            for each in grouped(self.recent, lambda event: event.installation).values()
+            for each in grouped(self.recent_and_stored, lambda event: event.installation).values()
         ]
         groups = grouped(newest, lambda event: event.suite_version).items()
         by_count = sorted(groups, key=lambda group: (-len(group[1]), group[0]))

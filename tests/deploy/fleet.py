@@ -28,7 +28,12 @@ class Event:
     suite_version: str
     time_ms: int
     data: dict
-    mark: int
+    mark: int = 0
+
+
+def store_row_data(value):
+    """The members that a row's value becomes: those of an object, or the value itself under `value`."""
+    return value if isinstance(value, dict) else {"value": value}
 
 
 def until(what, condition, seconds=DEADLINE_SECONDS):
@@ -59,6 +64,7 @@ class Installation:
         self.process = subprocess.Popen([programs / "SyncServiceReport"], env=self.environment)
         until("the service's start", lambda: is_bound() or self.process.poll() is not None)
         self.sent = []
+        self.stored = []  # rows of the local store, in their order
         self.user, self.suite_version = NO_USER, NO_VERSION
 
     def reportctl(self, *arguments):
@@ -88,6 +94,11 @@ class Installation:
     def store(self, reporter, event, value, time_ms):
         """A row for the local store."""
         self.must_be_sent(reporter.event(event, value, time_ms=time_ms))
+        module = event.split("|")[0] if "|" in event else ""
+        data = store_row_data(value)
+        self.stored.append(
+            Event(self.name, module, event, self.user, self.suite_version, time_ms, data)
+        )
 
     @staticmethod
     def must_be_sent(result):

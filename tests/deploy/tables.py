@@ -80,6 +80,22 @@ def check_rows(engine, collector, truth):
     expect(f"{engine.name}: the row of a store", stored, [["store", "17", "started", "", "0"]])
 
 
+def check_store_rows(engine, truth):
+    """The rows that `reportctl forward` sent are lines of `events`, each once."""
+    lines = engine.rows(
+        f"""SELECT if(has(resource.values, 'home'), 'home', 'office') AS installation, row, module, event,
+            user, suite_version, {engine.milliseconds}, sequence,
+            arrayStringConcat(data.keys, '~'), arrayStringConcat(data.values, '~')
+            FROM hublink.events WHERE source = 'store' AND uid != '{STORE_UID}' ORDER BY installation, row"""
+    )
+    found = []
+    for *columns, names, values in lines:
+        data = dict(zip(names.split("~"), values.split("~")))
+        expect(f"{engine.name}: the user in the data of a row", data.pop("openid", ""), columns[4])
+        found.append([*columns, data])
+    expect(f"{engine.name}: the rows of the stores", found, truth.store_lines())
+
+
 def check_columns(engine, truth):
     """What an event has from its resource."""
     count = engine.number("SELECT uniqExact(outbox) FROM hublink.events")
@@ -176,6 +192,7 @@ def check(engine, collector, truth, exports, made):
     try:
         load(engine, collector)
         check_rows(engine, collector, truth)
+        check_store_rows(engine, truth)
         check_columns(engine, truth)
         check_queries(engine, truth)
         check_merged(engine, truth)
