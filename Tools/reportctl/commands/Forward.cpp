@@ -61,22 +61,24 @@ std::string Rows(std::int64_t count) {
 /// What is asked for and has nowhere to go; empty when all is well.
 std::string MissingIn(const Collector& collector, const ForwardOptions& options) {
     if (!collector.logs)
-        return "no collector is configured: set OTEL_EXPORTER_OTLP_ENDPOINT; nothing was sent";
+        return "no collector is configured: set OTEL_EXPORTER_OTLP_ENDPOINT";
     if (options.withMetrics && !collector.metrics)
         return "no collector for metrics is configured (OTEL_METRICS_EXPORTER is none, or only "
-               "OTEL_EXPORTER_OTLP_LOGS_ENDPOINT is set); nothing was sent";
+               "OTEL_EXPORTER_OTLP_LOGS_ENDPOINT is set)";
     return {};
 }
 
+std::string RowsAhead(const forward::Extent& ahead) {
+    return ahead.rows == 1 ? fmt::format("1 row (id {})", ahead.first)
+                           : fmt::format("{} rows (ids {} to {})", ahead.rows, ahead.first, ahead.last);
+}
+
 void TellPlan(const forward::Plan& plan, const Collector& collector, const ForwardOptions& options) {
-    const auto& ahead = plan.ahead;
-    const auto destination =
-        collector.logs ? DestinationOf(collector.logs) : "no collector: none is configured";
-    if (ahead.rows == 0)
-        fmt::print("There is nothing to send to {}.\n", destination);
+    const auto to = collector.logs ? " to " + DestinationOf(collector.logs) : "";
+    if (plan.ahead.rows == 0)
+        fmt::print("There is nothing to send{}.\n", to);
     else
-        fmt::print("Would send {} (ids {} to {}) of {} to {}.\n", Rows(ahead.rows), ahead.first, ahead.last,
-                   store::StorePath(), destination);
+        fmt::print("Would send {} of {}{}.\n", RowsAhead(plan.ahead), store::StorePath(), to);
     if (options.withMetrics && collector.metrics)
         fmt::print("Would send the service's figures to {}.\n", DestinationOf(collector.metrics));
     fmt::print("Nothing was sent.\n");
@@ -98,15 +100,21 @@ int Plan(const Collector& collector, const ForwardOptions& options) {
         PrintPlan(plan, collector);
     else
         TellPlan(plan, collector, options);
-    return MissingIn(collector, options).empty() ? 0 : 1;
+    std::fflush(stdout); // before a line on standard error
+    const auto missing = MissingIn(collector, options);
+    if (!missing.empty())
+        terminal::TellLastError(missing);
+    return missing.empty() ? 0 : 1;
 }
 
 /// What went wrong was told when it did.
-void TellResult(const forward::Result& result, const Collector& collector) {
+void TellResult(const forward::Result& result, const Collector& collector, bool isWithMetrics) {
     fmt::print("{} sent to {}.\n", Rows(result.rows.sent), DestinationOf(collector.logs));
     if (result.rows.refused > 0)
         fmt::print("{} will not be sent; why: sqlite3 {} 'select * from refused'\n",
                    Rows(result.rows.refused), store::ForwardPath());
+    if (isWithMetrics && result.metricsFailure.empty())
+        fmt::print("The service's figures were sent to {}.\n", DestinationOf(collector.metrics));
     if (result.totals.held > 0)
         fmt::print(
             "{} held, which the collector does not take while it takes others. Each run tries again.\n",
@@ -148,7 +156,7 @@ int Send(const Collector& collector, const ForwardOptions& options) {
     if (options.isJson)
         PrintResult(result, collector);
     else
-        TellResult(result, collector);
+        TellResult(result, collector, options.withMetrics);
     return !options.isOnce || IsAllWell(result) ? 0 : 1;
 }
 
@@ -160,7 +168,7 @@ int RunForward(const ForwardOptions& options) {
     if (options.isDryRun)
         return Plan(collector, options);
     if (const auto missing = MissingIn(collector, options); !missing.empty())
-        throw std::runtime_error(missing);
+        throw std::runtime_error(missing + "; nothing was sent");
     service::TakeOverProxies(environment);
     return Send(collector, options);
 }
@@ -175,7 +183,8 @@ void AddForward(CLI::App& app, int& exitCode) {
         "OpenTelemetry's protocol, until Ctrl-C. It remembers how far it got.");
     command->add_flag("--dry-run", options->isDryRun, "Say what would be sent, and send nothing");
     command->add_flag("--once", options->isOnce,
-                      "Send what is new and end; with 1 when the collector does not take it now");
+                      "Send what is new, and end. While the collector does not take it, try for up to a "
+                      "minute; then end with exit code 1");
     command->add_flag("--metrics", options->withMetrics,
                       "Send the service's figures as metrics, too: at the start, and each minute");
     command->add_flag("--json", options->isJson, "Tell the result as a JSON object");

@@ -187,6 +187,11 @@ TEST_F(ForwardCommand, NeedsACollector) {
     EXPECT_TRUE(noMetrics.Says("no collector for metrics is configured")) << noMetrics.output;
     EXPECT_EQ(collector.RequestCount(), 0U);
     EXPECT_FALSE(std::filesystem::exists(StateFile()));
+    const auto dry = Reportctl("forward --dry-run", "env -u OTEL_EXPORTER_OTLP_ENDPOINT");
+    EXPECT_EQ(dry.exitCode, 1);
+    EXPECT_EQ(dry.output, "Would send 1 row (id 1) of " + Store() +
+                              ".\nNothing was sent.\n"
+                              "error: no collector is configured: set OTEL_EXPORTER_OTLP_ENDPOINT\n");
 }
 
 TEST_F(ForwardCommand, SendsTheFiguresToTheirOwnEndpoint) {
@@ -196,6 +201,7 @@ TEST_F(ForwardCommand, SendsTheFiguresToTheirOwnEndpoint) {
     const auto outcome = Forward("--once --metrics", collector,
                                  "OTEL_EXPORTER_OTLP_METRICS_ENDPOINT=" + metrics.Url() + "/here");
     EXPECT_EQ(outcome.exitCode, 0) << outcome.output;
+    EXPECT_TRUE(outcome.Says("The service's figures were sent to " + metrics.Url() + "/here.\n"));
     EXPECT_EQ(collector.RequestCount(), 1U);
     ASSERT_EQ(metrics.RequestCount(), 1U);
     const auto request = metrics.Requests()[0];
