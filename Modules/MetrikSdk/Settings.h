@@ -68,13 +68,16 @@ struct RetrySettings {
 
 /// What happens to an event that a collector does not take alone, while it takes others.
 struct AsideSettings {
-    /// The pause before the second try. It doubles with each further strike (see AsideList).
+    /// The pause before the second try. It doubles with each further try that counts (see AsideList).
     std::chrono::milliseconds firstPause = std::chrono::minutes(1);
     /// The longest pause. A collector that was repaired gets the event within this time.
     std::chrono::milliseconds maxPause = std::chrono::hours(1);
-    /// How many strikes an event may have. A strike is a failed try, with other events taken since the try
-    /// before. Ten of them take some four hours. An event that fails for so long fails for ever.
+    /// How many strikes an event may have. A strike is a failed try between requests of others that were
+    /// taken. Ten of them take some four hours. An event that fails for so long fails for ever.
     int strikes = 10;
+    /// How many failed tries an event may have with others taken before each, whatever happens to the request
+    /// after it. They take some two days. A collector that has too much to do takes the event before.
+    int tries = 48;
     /// How many events may be aside at once. Each of them takes memory, and a look at each batch. A further
     /// event that would go aside is sent again and again until there is room.
     std::size_t maxEvents = 512;

@@ -19,7 +19,7 @@ std::string Uuid(Random& random) {
                        (a >> 32U) & 0xfffU, b & 0xffffffffffffU);
 }
 
-/// As MetrikWorker writes it; the values differ, the names do not.
+/// A payload as MetrikWorker writes it. Payloads differ in their values, and have the same names.
 std::string Payload(Random& random, std::int64_t time) {
     return fmt::format(R"({{"extend":{{"hublinkVersion":"5.1.0.2","createTime":"{}"}},)"
                        R"("eventData":{{"clicks":{},"page":"page-{}","duration":{},"ok":{},)"

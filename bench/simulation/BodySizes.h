@@ -6,8 +6,8 @@
 
 namespace Fleet {
 
-/// How long requests are: measured with the encoder and the compression that the service uses, on events like
-/// those of docs/Events.md, each with other values.
+/// The lengths of request bodies. They are measured with the encoder and the compression of the service, on
+/// events like those of docs/Events.md. Each event has values of its own.
 class BodySizes {
 public:
     BodySizes(std::uint64_t seed, std::size_t maxEvents);
@@ -18,11 +18,11 @@ public:
     };
     const Size& Of(std::size_t events) const { return m_sizes[events]; }
 
-    /// Of one event, as the outbox counts it.
+    /// The bytes that the outbox counts for one event.
     std::size_t EventBytes() const { return m_eventBytes; }
 
 private:
-    std::vector<Size> m_sizes; ///< By the number of events; between those measured, along a straight line.
+    std::vector<Size> m_sizes; ///< By the number of events; interpolated between measured ones.
     std::size_t m_eventBytes = 0;
 };
 

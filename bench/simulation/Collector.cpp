@@ -2,7 +2,17 @@
 
 #include <algorithm>
 
+#include <fmt/chrono.h>
+
 namespace Fleet {
+namespace {
+
+std::string HttpDate(MetrikSdk::WallTime time) {
+    const auto seconds = std::chrono::floor<std::chrono::seconds>(time);
+    return fmt::format("{:%a, %d %b %Y %H:%M:%S} GMT", fmt::gmtime(seconds.time_since_epoch().count()));
+}
+
+} // namespace
 
 Collector::Collector(const Config& config) : m_config(config) {
     m_taken.status = 200;
@@ -11,6 +21,8 @@ Collector::Collector(const Config& config) : m_config(config) {
         m_later.retryAfter = std::to_string(config.retryAfter);
     m_noConnection.fault = "Connection refused";
     m_away503.status = 503;
+    if (config.isAnnounced)
+        m_away503.retryAfter = HttpDate(WallAt(config.outageTo));
     m_noAnswer.fault = "Timeout was reached";
     m_noAnswer.began = true;
 }
@@ -58,7 +70,7 @@ Collector::Answer Collector::WhileAway(Tick sent) const {
     return {sent + m_config.timeout, Kind::NoAnswer, false};
 }
 
-/// What was accepted is stored once it is worked off, unless the collector goes away before.
+/// The events of an accepted request are stored at `done`, unless the collector goes away before.
 Collector::Answer Collector::Accepted(Tick sent, double done) const {
     const double gaveUp = sent + m_config.timeout;
     const auto answered = done + m_config.roundTrip / 2.0;

@@ -7,9 +7,9 @@
 
 namespace Fleet {
 
-/// One collector behind the balancer. It works off what it accepted at its rate, accepts so much ahead, and
-/// answers "later" to the rest. It goes away and returns as configured; what it had accepted and not answered
-/// then stays without an answer.
+/// One collector behind the balancer. It takes events at a constant rate. Requests wait in its queue, and
+/// when the queue is full, it answers 503. It goes away and returns at the configured times. Requests that it
+/// has accepted and not answered when it goes away get no answer.
 class Collector {
 public:
     explicit Collector(const Config& config);
@@ -18,13 +18,13 @@ public:
     struct Answer {
         Tick at = 0; ///< When the desktop has it, or gives up.
         Kind kind = Kind::NoConnection;
-        bool isTaken = false; ///< The events are stored behind the collector, whatever the desktop learns.
+        bool isTaken = false; ///< The events are stored behind the collector, also when the answer gets lost.
     };
 
-    /// A request that leaves a desktop at this time. To be called in the order of time.
+    /// A desktop sends a request at this time. The times of the calls must not decrease.
     Answer Post(Tick sent, std::size_t events);
 
-    /// The answer, as the rules take it.
+    /// The answer in the form that the rules read.
     const MetrikSdk::otlp::HttpResult& ResultOf(Kind kind) const;
 
 private:

@@ -18,7 +18,7 @@ constexpr Tick MINUTE = 60 * SECOND;
 constexpr Tick HOUR = 60 * MINUTE;
 constexpr Tick DAY = 24 * HOUR;
 
-/// The same as the rules take it. The first day is one like any other.
+/// The same time in the forms that the rules read. The date of the first midnight has no meaning.
 inline MetrikSdk::WallTime WallAt(Tick tick) {
     return MetrikSdk::WallTime(std::chrono::days(20'780)) + std::chrono::milliseconds(tick);
 }
@@ -33,7 +33,7 @@ enum class Away {
     Silent      ///< The request goes out, and nothing comes back.
 };
 
-/// What is simulated. The command line's options, with their defaults.
+/// What is simulated: the options of the command line, with their defaults.
 struct Config {
     std::uint64_t seed = 1;
     unsigned desktops = 100'000;
@@ -41,21 +41,22 @@ struct Config {
     double eventsPerDay = 200; ///< Of one desktop.
 
     /// Collectors behind a balancer. A desktop's connection stays with one, so they have nothing in common.
-    unsigned collectors = 16;
+    unsigned collectors = 0;   ///< 0: one for each 50,000 desktops.
     double capacity = 0;       ///< Events a second of all collectors; 0: no bound.
     double returnCapacity = 0; ///< The same after the outage.
-    Tick queue = 2 * SECOND;   ///< Work that a collector accepts ahead; beyond it answers 503.
-    unsigned retryAfter = 0;   ///< Seconds that its 503 asks for; 0: it has no such header.
+    Tick queue = 2 * SECOND;   ///< The work that fits a collector's queue; it answers 503 to more.
+    unsigned retryAfter = 0;   ///< The Retry-After of these 503, in seconds; 0: they have none.
 
     Tick outageFrom = NEVER;
     Tick outageTo = NEVER;
     Away away = Away::Refused;
-    Tick restartAt = NEVER; ///< All services that run start anew.
+    bool isAnnounced = false; ///< The 503 of a collector that is away says by a Retry-After when it returns.
+    Tick restartAt = NEVER;   ///< When all services that run are restarted.
 
     Tick roundTrip = 100;
     Tick timeout = 10 * SECOND; ///< OTEL_EXPORTER_OTLP_TIMEOUT
 
-    std::size_t eventBytes = 0; ///< As the outbox counts; measured.
+    std::size_t eventBytes = 0; ///< What the outbox counts for one event; measured at the start.
     MetrikSdk::OutboxSettings settings;
 
     Tick End() const { return days * DAY; }
@@ -80,7 +81,7 @@ private:
     std::uint64_t m_state;
 };
 
-/// For one purpose of one desktop.
+/// The generator of one desktop for one purpose, so that its numbers do not depend on other desktops.
 inline Random RandomFor(std::uint64_t seed, std::uint32_t desktop, std::uint32_t purpose) {
     Random mixed(seed ^ (std::uint64_t{desktop} << 32U) ^ purpose);
     return Random(mixed.Next());

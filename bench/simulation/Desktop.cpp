@@ -23,8 +23,9 @@ MetrikSdk::upload::QueueHead Queue::TakeOldest(std::size_t maxEvents, const Even
     m_fromEarly = 0;
     m_firstRow = m_outbox.headRow;
     auto oldest = m_outbox.head.Current();
+    const bool areAllAside = m_outbox.early.size() == without.size(); // each event aside is an early one
     for (const auto& early : m_outbox.early) {
-        if (m_fromEarly == maxEvents)
+        if (areAllAside || m_fromEarly == maxEvents)
             break;
         if (without.contains(early.row))
             continue;

@@ -20,33 +20,35 @@ struct Flight {
     Tick sentAt = NEVER;
     Tick answerAt = NEVER; ///< NEVER: none is under way.
     Collector::Answer answer;
-    std::uint32_t fromRange = 0; ///< Events of the range.
+    std::uint32_t fromRange = 0; ///< How many of its events are from the outbox's range.
     std::uint32_t firstRow = 0;
     std::uint32_t count = 0;
     bool isAside = false;
 };
 
-/// What waits on one desktop: nearly always the newest events without a gap, of which only the first one's
-/// time is kept. An event before them is one that others went past.
+/// The events that wait on one desktop. The newest ones are a range without a gap, of which only the first
+/// event's time is kept. Events before the range are kept one by one: they stepped aside, and later events
+/// were sent before them.
 struct Outbox {
     struct Early {
         std::uint32_t row;
         Tick storedAt;
-        bool isTaken; ///< A collector has it, and the desktop does not know.
-        bool isSent;  ///< Part of the last request.
+        bool isTaken; ///< A collector has stored it, and the desktop got no answer.
+        bool isSent;  ///< It is part of the last request.
     };
 
     std::size_t Waiting() const { return early.size() + count; }
 
-    EventTimes head; ///< Of the first event of the range; of the next one to come, when it is empty.
+    EventTimes head; ///< At the first event of the range; at the next event to come when the range is empty.
     std::uint32_t headRow = 1;
     std::uint32_t count = 0; ///< Events of the range.
-    std::uint32_t takenBelow =
-        0;                    ///< A collector has the rows of the range below, and the desktop does not know.
-    std::vector<Early> early; ///< Oldest first.
+    /// A collector has stored the rows of the range below this one, and the desktop got no answer.
+    std::uint32_t takenBelow = 0;
+    std::vector<Early> early; ///< The events before the range, oldest first.
 };
 
-/// One desktop: its outbox, and the rules by which it is emptied. Some 500 bytes, however many events wait.
+/// One desktop: its outbox, and the rules by which the outbox is emptied. It has some 500 bytes, and more
+/// for each event that stepped aside. Other events that wait take no memory.
 struct Desktop {
     Desktop(const Config& config, std::uint32_t id)
         : coming(config, id), outbox{coming, 1, 0, 0, {}}, random(RandomFor(config.seed, id, 2)),
@@ -55,18 +57,18 @@ struct Desktop {
     EventTimes coming; ///< Of the next event.
     Outbox outbox;
     Random random;
-    std::optional<MetrikSdk::upload::UploadRules> rules; ///< While its service runs.
+    std::optional<MetrikSdk::upload::UploadRules> rules; ///< Empty while its service does not run.
     MetrikSdk::outbox::CapWatch caps;
-    std::unique_ptr<MetrikSdk::report::LossRun> drops; ///< Made with the first.
+    std::unique_ptr<MetrikSdk::report::LossRun> drops; ///< Null until the first event is dropped.
     Flight flight;
     Tick wakeAt = NEVER;
     std::int64_t untilWaiting = 0;
 };
 
-/// A desktop's outbox, as the rules look at it.
+/// Shows a desktop's outbox to the rules.
 class Queue : public MetrikSdk::upload::EventQueue {
 public:
-    /// `mostFitting`: so many events of the common size fill a request by its bytes.
+    /// `mostFitting` is how many events of the common size fit a request by its bytes.
     Queue(const Config& config, std::uint32_t id, Outbox& outbox, std::size_t mostFitting)
         : m_config(config), m_id(id), m_outbox(outbox), m_mostFitting(mostFitting) {}
 
@@ -75,7 +77,7 @@ public:
     bool TakeOne(const MetrikSdk::EventKey& key) override;
     bool HasOthersThan(const MetrikSdk::EventKeys& these) override;
 
-    /// What was looked at last: so many events of Outbox::early, and the row of the first event.
+    /// How many events of Outbox::early are among the events of the last look, and the row of their first.
     std::uint32_t FromEarly() const { return m_fromEarly; }
     std::uint32_t FirstRow() const { return m_firstRow; }
 

@@ -1,4 +1,5 @@
-// A fleet of desktops and its collectors, simulated: docs/Fleet.md says what it is for, --help what it takes.
+// Simulates a fleet of desktops and its collectors. docs/Fleet.md says what for, and --help lists the
+// options.
 #include <atomic>
 #include <chrono>
 #include <cmath>
@@ -17,7 +18,7 @@ namespace {
 
 using namespace Fleet;
 
-/// As a person says it.
+/// Options in a person's units. Complete turns them into a Config.
 struct Options {
     double outageHours = 0;
     double outageAt = 10;
@@ -60,9 +61,9 @@ void AddFleet(CLI::App& app, Config& config, Options& options) {
 void AddCollectors(CLI::App& app, Config& config, Options& options) {
     static const std::map<std::string, Away> WAYS{
         {"refused", Away::Refused}, {"503", Away::Answers503}, {"silent", Away::Silent}};
-    app.add_option("--collectors", config.collectors, "Collectors behind the balancer")
-        ->check(CLI::Range(1, 1000))
-        ->capture_default_str();
+    app.add_option("--collectors", config.collectors,
+                   "Collectors behind the balancer; by default one for each 50,000 desktops")
+        ->check(CLI::Range(1, 1000));
     app.add_option("--capacity", options.capacity,
                    "What they take, as a multiple of the working day's mean rate of events; 0: everything")
         ->check(CLI::NonNegativeNumber);
@@ -73,6 +74,9 @@ void AddCollectors(CLI::App& app, Config& config, Options& options) {
         ->capture_default_str();
     app.add_option("--away", config.away, "What a desktop sees then: refused, 503 or silent")
         ->transform(CLI::CheckedTransformer(WAYS));
+    app.add_flag("--announced", config.isAnnounced,
+                 "Their 503 has a Retry-After with the time of their return")
+        ->needs("--away");
     app.add_option("--return-capacity", options.returnCapacity, "--capacity after the outage")
         ->check(CLI::NonNegativeNumber);
     app.add_option("--queue", options.queueSeconds,
@@ -83,7 +87,7 @@ void AddCollectors(CLI::App& app, Config& config, Options& options) {
         ->check(CLI::Range(0, 86'400));
 }
 
-/// The rules' own settings, to see what they are good for.
+/// The settings of the rules, so that one can see what each of them does.
 void AddRules(CLI::App& app, MetrikSdk::OutboxSettings& settings) {
     const auto add = [&](const char* name, std::chrono::milliseconds& value, const char* text) {
         const auto set = [&value](double seconds) {
@@ -107,6 +111,8 @@ void Complete(Config& config, const Options& options, bool hasDays) {
     config.returnCapacity =
         options.returnCapacity < 0 ? config.capacity : options.returnCapacity * BusyRate(config);
     config.queue = static_cast<Tick>(options.queueSeconds * SECOND);
+    if (config.collectors == 0)
+        config.collectors = (config.desktops + 49'999) / 50'000;
     config.collectors = std::min(config.collectors, config.desktops);
     if (options.restartAt >= 0)
         config.restartAt = Hours(options.restartAt);
@@ -131,6 +137,7 @@ Tally Simulate(const Config& config, const BodySizes& sizes, unsigned threads) {
         }
     };
     std::vector<std::thread> workers;
+    workers.reserve(tallies.size());
     for (auto& tally : tallies)
         workers.emplace_back(work, std::ref(tally));
     for (auto& worker : workers)

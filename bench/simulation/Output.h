@@ -9,7 +9,7 @@
 
 namespace Fleet {
 
-/// Everything that there is to say about a run.
+/// The input and the outcome of a run.
 struct Result {
     const Config& config;
     const BodySizes& sizes;
@@ -18,10 +18,10 @@ struct Result {
     double took = 0; ///< Seconds.
 };
 
-/// For people; with `hours`, a line for each.
+/// A table for people; with `hours`, it has a line for each hour, too.
 std::string AsTable(const Result& result, bool hours);
 
-/// For programs. The same for the same seed, so without the time that the run took.
+/// JSON for programs. It leaves out the time that the run took, so that the same seed gives the same text.
 std::string AsJson(const Result& result);
 
 } // namespace Fleet

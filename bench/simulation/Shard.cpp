@@ -8,7 +8,7 @@ using MetrikSdk::upload::UploadRules;
 
 namespace {
 
-/// So many events of the common size fill a request by its bytes: the service's own rule says.
+/// How many events of the common size fit a request by its bytes, computed with the service's own rule.
 std::size_t MostFitting(const Config& config) {
     const auto& settings = config.settings.batch;
     MetrikSdk::Batch full;
@@ -86,7 +86,7 @@ void Shard::StartService(const Scene& scene) {
     PauseFor(scene, {wait});
 }
 
-/// The request under way gets no answer any more. What waits is in the file.
+/// The request under way gets no answer any more. The waiting events stay in the outbox file.
 void Shard::StopService(const Scene& scene) {
     auto& desktop = scene.desktop;
     desktop.rules.reset();
@@ -109,7 +109,8 @@ void Shard::Store(const Scene& scene) {
         Pass(scene);
 }
 
-/// Not while a request is under way, whose events must not be dropped: the next event comes soon.
+/// Does nothing while a request is under way, because its events must not be dropped. The next event that is
+/// stored calls this again.
 void Shard::KeepWithinCaps(const Scene& scene) {
     auto& desktop = scene.desktop;
     const auto steady = SteadyAt(scene.now);
@@ -153,7 +154,8 @@ void Shard::Pass(const Scene& scene) {
         Send(scene, queue, next);
 }
 
-/// Without anything that waits, the service looks in vain: those looks are left out.
+/// The service looks for events from time to time also when nothing waits. The simulation leaves these looks
+/// out, because they change nothing.
 void Shard::PauseFor(const Scene& scene, const MetrikSdk::upload::Pause& pause) {
     auto& desktop = scene.desktop;
     const auto duration = std::max<std::int64_t>(1, pause.duration.count());
@@ -166,10 +168,10 @@ void Shard::PauseFor(const Scene& scene, const MetrikSdk::upload::Pause& pause) 
 void Shard::Send(const Scene& scene, const Queue& queue, const UploadRules::Next& next) {
     auto& desktop = scene.desktop;
     auto count = next.count;
-    for (auto fitting = count;; count = fitting) {
-        fitting = desktop.rules->Fitting({count, m_sizes.Of(count).plain});
+    while (const auto fitting = desktop.rules->Fitting({count, m_sizes.Of(count).plain})) {
         if (fitting == count)
             break;
+        count = fitting;
     }
     const auto fromEarly = std::min<std::uint32_t>(queue.FromEarly(), static_cast<std::uint32_t>(count));
     desktop.wakeAt = NEVER;
@@ -199,7 +201,7 @@ void Shard::MarkSent(const Scene& scene, std::uint32_t fromEarly) {
     }
 }
 
-/// What a collector has taken, before the desktop learns of it.
+/// Counts what the collector stores of the request. The desktop gets the answer later, or never.
 void Shard::NoteTaken(const Scene& scene) {
     auto& outbox = scene.desktop.outbox;
     const auto& flight = scene.desktop.flight;

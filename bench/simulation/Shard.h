@@ -12,11 +12,11 @@
 
 namespace Fleet {
 
-/// One collector with its desktops, through the whole simulated time. Nothing in it depends on another one,
-/// or on when and where it runs. Threads: one.
+/// One collector with its desktops, through the whole simulated time. Shards are independent of each other,
+/// so they can run on any thread and in any order. Threads: one.
 class Shard {
 public:
-    /// The desktops from `first` on, `count` of them. Adds to `tally`.
+    /// Has the `count` desktops from number `first` on. Run adds to `tally`.
     Shard(const Config& config, const BodySizes& sizes, std::uint32_t first, std::uint32_t count,
           Tally& tally);
 

@@ -28,7 +28,7 @@ Rates Between(const Tally& tally, Tick from, Tick to) {
     return rates;
 }
 
-/// When this part of the backlog had left, since the end of the outage.
+/// How long after the end of the outage this part of the backlog had left the outboxes.
 std::optional<Tick> Drained(const Config& config, const Tally& tally, double part) {
     const auto wanted = static_cast<std::uint64_t>(std::ceil(static_cast<double>(tally.backlog) * part));
     std::uint64_t left = 0;
@@ -61,7 +61,8 @@ Summary::Summary(const Config& config, const Tally& tally) : day(Between(tally, 
         for (auto i = from / SECOND; i < (from + HOUR) / SECOND; ++i)
             waiting += tally.seconds[i].stored - std::uint64_t{tally.seconds[i].left};
         hour.waitingAtEnd = waiting;
-        const bool isTouched = hasOutage && from + HOUR > config.outageFrom && from < drained;
+        const bool isTouched = (hasOutage && from + HOUR > config.outageFrom && from < drained) ||
+                               (config.restartAt >= from && config.restartAt < from + HOUR);
         if (!isTouched && hour.requests > normal.requests)
             normal = hour;
         hours.push_back(hour);

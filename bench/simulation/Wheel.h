@@ -17,16 +17,16 @@ struct Happening {
     std::uint32_t kind;
 };
 
-/// Happenings in the order of their time, and for one time in the order in which they were added. Adding and
-/// taking take the same time for any number of them, which no heap does: a day of a million desktops has some
-/// 600 million.
+/// Gives out happenings in the order of their times. Those of one time come in the order in which they were
+/// added. To add and to take one takes the same time for any number of them. A heap takes longer the more it
+/// has, and a day of a million desktops has some 600 million.
 ///
-/// The next 8 seconds have a list for each millisecond; what is later waits in a list for each 8 seconds.
+/// The next 8 seconds have a list for each millisecond. Later happenings wait in a list for each 8 seconds.
 class Wheel {
 public:
     explicit Wheel(Tick end) : m_end(end), m_later(end / SPAN + 1) {}
 
-    /// What is beyond the end never happens.
+    /// Ignores what is beyond the end.
     void Add(const Happening& happening) {
         if (happening.at >= m_end)
             return;
@@ -48,7 +48,7 @@ public:
             m_soonCount -= now.size();
             now.clear();
             if (m_soonCount == 0)
-                m_now |= SPAN - 1; // nothing more before the next list
+                m_now |= SPAN - 1; // skip to the next list of 8 seconds
         }
     }
 

@@ -6,7 +6,7 @@ namespace Fleet {
 namespace {
 
 constexpr std::uint32_t PURPOSE_EVENTS = 1;
-constexpr std::uint32_t PURPOSE_DAYS = 1000; ///< And one more for each day.
+constexpr std::uint32_t PURPOSE_DAYS = 1000; ///< Plus the number of the day.
 
 Tick Part(double of, double random) {
     return static_cast<Tick>(of * random);

@@ -8,22 +8,22 @@ namespace Fleet {
 
 /// When a desktop is used. It is switched off in the night.
 struct WorkingDay {
-    Tick start; ///< The service starts, and the suite reports it: the day's first event.
+    Tick start; ///< The service starts, and the suite reports this as the day's first event.
     Tick breakFrom;
     Tick breakTo;
     Tick end;
 };
 
-/// A pure function: each day of each desktop is another one. Starts lie between 7:30 and 10:00, most at 8:45;
-/// a day has 8.5 hours more or less, of which 45 minutes at noon are a break.
+/// Each day of each desktop has its own times. Starts are between 7:30 and 10:00, most often at 8:45. A day
+/// has 8.5 hours on average, of which 45 minutes at noon are a break. Pure.
 WorkingDay DayOf(std::uint64_t seed, std::uint32_t desktop, unsigned day);
 
-/// The mean time in which a desktop is used on a day.
+/// How long a desktop is used on a day, on average.
 constexpr Tick USED = 8 * HOUR + 30 * MINUTE - 45 * MINUTE;
 
-/// The times at which a desktop's events are stored, one after another: at random, at the same rate through
-/// the day but for the break. A pure function of seed and desktop, so that a copy made earlier tells the same
-/// times again. This is how a desktop with any number of waiting events takes the same memory.
+/// The times at which a desktop's events are stored, one after another. They are random, with the same rate
+/// throughout the day and none in the break. They depend only on the seed and the desktop, so a copy gives
+/// the same times again. An outbox keeps such a copy at its oldest event, and needs no list of times.
 class EventTimes {
 public:
     EventTimes(const Config& config, std::uint32_t desktop);

@@ -1,25 +1,40 @@
 #include "Modules/MetrikSdk/upload/AsideList.h"
 
 #include <algorithm>
+#include <utility>
 
 namespace MetrikSdk::upload {
 
 void AsideList::Add(const EventKey& event, WallTime now) {
     m_keys[event.row] = event.uuid;
-    m_entries[event.row] = {now + m_settings.firstPause, 0, false};
+    m_entries[event.row] = {now + m_settings.firstPause};
 }
 
 void AsideList::Remove(std::int64_t row) {
     m_keys.erase(row);
     m_entries.erase(row);
+    m_uncertain.erase(row);
 }
 
 void AsideList::OtherWasTaken() {
     for (auto& [row, entry] : m_entries) {
-        if (entry.strikes == 0 && !entry.othersWereTaken)
+        if (entry.tries == 0 && !entry.othersWereTaken)
             entry.notBefore = {};
         entry.othersWereTaken = true;
     }
+    m_uncertain.clear();
+}
+
+void AsideList::OtherFailed() {
+    for (const auto row : std::exchange(m_uncertain, {}))
+        m_entries[row].strikes = 0;
+}
+
+void AsideList::Taken(std::int64_t row) {
+    Remove(row);
+    std::erase_if(m_keys, [this](const auto& key) { return m_entries.at(key.first).tries == 0; });
+    std::erase_if(m_entries, [](const auto& entry) { return entry.second.tries == 0; });
+    OtherWasTaken();
 }
 
 /// Whether the event may be tried. A clock that was set back must not hold it for longer than the longest
@@ -46,16 +61,18 @@ std::optional<std::chrono::milliseconds> AsideList::UntilDue(WallTime now) const
 
 AsideList::Strikes AsideList::Failed(std::int64_t row, WallTime now) {
     auto& entry = m_entries[row];
-    const bool isStrike = entry.othersWereTaken;
-    entry.othersWereTaken = false;
-    entry.strikes += isStrike ? 1 : 0;
-    entry.notBefore = now + PauseAfter(entry.strikes);
-    return {entry.strikes, isStrike, entry.strikes >= m_settings.strikes};
+    const bool counts = std::exchange(entry.othersWereTaken, false);
+    if (counts)
+        m_uncertain.insert(row);
+    entry.tries += counts ? 1 : 0;
+    entry.strikes += counts ? 1 : 0;
+    entry.notBefore = now + PauseAfter(entry.tries);
+    return {entry.tries, counts, entry.strikes >= m_settings.strikes || entry.tries >= m_settings.tries};
 }
 
-std::chrono::milliseconds AsideList::PauseAfter(int strikes) const {
+std::chrono::milliseconds AsideList::PauseAfter(int tries) const {
     auto pause = m_settings.firstPause;
-    for (int i = 1; i < strikes && pause < m_settings.maxPause; ++i)
+    for (int i = 1; i < tries && pause < m_settings.maxPause; ++i)
         pause *= 2;
     return std::min(pause, m_settings.maxPause);
 }

@@ -96,7 +96,7 @@ void UploadCycle::Act(Exchange exchange, const UploadRules::Decision& decision) 
         return TellFirstStrike(exchange, decision.strikes);
     case Outcome::OutOfStrikes:
         return MoveToDeadLetters(exchange,
-                                 "not taken at " + std::to_string(decision.strikes.count) +
+                                 "not taken at " + std::to_string(decision.strikes.tries) +
                                      " tries, while others were: " + RetryPolicy::Describe(exchange.result));
     case Outcome::Refused:
         return MoveToDeadLetters(exchange, RetryPolicy::Describe(exchange.result));
@@ -117,7 +117,7 @@ std::string UploadCycle::Describe(const otlp::HttpResult& result) const {
 }
 
 void UploadCycle::TellFirstStrike(const Exchange& exchange, const AsideList::Strikes& strikes) {
-    if (strikes.isNew && strikes.count == 1)
+    if (strikes.isNew && strikes.tries == 1)
         m_notifier.TellFailure({report::Cause::Refusal, "An event is not taken while others are, and will be "
                                                         "tried again from time to time: " +
                                                             RetryPolicy::Describe(exchange.result)});

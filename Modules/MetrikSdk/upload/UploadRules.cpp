@@ -73,47 +73,46 @@ UploadRules::Decision UploadRules::Decide(const Sent& sent, const otlp::HttpResu
             decision.pause = WaitAfterRefusals(result, random, now);
         return decision;
     case Verdict::Wait:
-        break;
     case Verdict::WaitAndHalve:
     case Verdict::WaitThenHalve:
         if (result.abandoned)
-            break;
-        if (sent.isAside)
+            decision.outcome = Outcome::Abandoned;
+        else if (!sent.isAside)
+            NotTaken(sent, verdict, now, queue);
+        else if (verdict != Verdict::Wait)
             decision = AsideFailed(sent, now);
-        else
-            NotTaken(sent, verdict == Verdict::WaitAndHalve ? Blame::NoAnswer : Blame::Later, now, queue);
+        decision.pause = WaitAfter(result, random, now);
         break;
     }
-    if (result.abandoned)
-        decision.outcome = Outcome::Abandoned;
-    decision.pause = WaitAfter(result, random, now);
     return decision;
 }
 
 void UploadRules::Taken(const Sent& sent) {
     m_failures = 0;
     m_refusalsInARow = 0;
-    m_aside.OtherWasTaken();
-    if (sent.isAside)
-        m_aside.Remove(sent.first.row);
-    else
-        m_sizer.Taken(sent.size);
     m_isAsidesTurn = !sent.isAside;
+    if (sent.isAside)
+        return m_aside.Taken(sent.first.row);
+    m_aside.OtherWasTaken();
+    m_sizer.Taken(sent.size);
 }
 
-void UploadRules::NotTaken(const Sent& sent, Blame blame, WallTime now, EventQueue& queue) {
-    if (m_sizer.Failed(sent.size, blame))
+void UploadRules::NotTaken(const Sent& sent, Verdict verdict, WallTime now, EventQueue& queue) {
+    m_aside.OtherFailed();
+    const auto blame = verdict == Verdict::WaitAndHalve ? Blame::NoAnswer : Blame::Later;
+    if (verdict != Verdict::Wait && m_sizer.Failed(sent.size, blame))
         StepAside(sent.first, now, queue);
 }
 
 /// Lets the others go past an event that failed alone, if there are others.
 void UploadRules::StepAside(const EventKey& event, WallTime now, EventQueue& queue) {
-    auto these = m_aside.Keys();
-    these[event.row] = event.uuid;
-    if (m_aside.IsFull() || !queue.HasOthersThan(these))
+    if (m_aside.IsFull())
         return;
     m_aside.Add(event, now);
-    m_sizer.SteppedAside();
+    if (queue.HasOthersThan(m_aside.Keys()))
+        m_sizer.SteppedAside();
+    else
+        m_aside.Remove(event.row);
 }
 
 UploadRules::Decision UploadRules::AsideFailed(const Sent& sent, WallTime now) {

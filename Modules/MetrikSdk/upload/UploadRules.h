@@ -18,7 +18,7 @@ struct Pause {
     std::int64_t untilWaiting = outbox::CountWaiter::NEVER; ///< Or until so many events wait.
 };
 
-/// Where events wait, as far as the rules ask.
+/// Where events wait, as far as the rules need it.
 class EventQueue {
 public:
     EventQueue() = default;
@@ -26,24 +26,25 @@ public:
     EventQueue(const EventQueue&) = delete;
     EventQueue& operator=(const EventQueue&) = delete;
 
-    /// Looks at the oldest events but those of `without`: they are the next request, if there is one.
+    /// Looks at the oldest events that are not in `without`. If the rules decide to send, the request
+    /// consists of the first of these events.
     virtual QueueHead TakeOldest(std::size_t maxEvents, const EventKeys& without) = 0;
 
-    /// Looks at this event, which is the next request. Whether it still waits.
+    /// Looks at this event, which becomes the next request. Returns whether it still waits.
     virtual bool TakeOne(const EventKey& key) = 0;
 
     /// Whether an event waits that is not among `these`.
     virtual bool HasOthersThan(const EventKeys& these) = 0;
 };
 
-/// What an uploader does next, and what an answer means for it: all of its decisions, none of its deeds. It
-/// neither reads a file, sends, nor sleeps. So the simulation of a fleet (bench/fleet) has the same rules as
-/// the service.
+/// Decides what an uploader does next, and what an answer means. It reads no file, sends nothing and does not
+/// sleep; its callers do. So the simulation of a fleet (bench/fleet) can run the same rules as the service.
 ///
 ///     WhatNext ──► a pause       ──► WhatNext
 ///              └─► a request     ──► Answered: what becomes of it, and a pause ──► …
 ///
-/// Threads: one. Failure: passes on what the queue throws. Pure otherwise: time and chance are the caller's.
+/// Threads: one. Failure: passes on what the queue throws. Pure otherwise: the caller passes time and random
+/// numbers.
 class UploadRules {
 public:
     /// The settings outlive this object.
@@ -51,13 +52,13 @@ public:
         : m_settings(settings), m_sizer(settings.batch.maxEvents), m_aside(settings.aside) {}
 
     struct Next {
-        std::size_t count = 0; ///< So many of the events that were looked at last are to be sent; 0: pause.
-        bool isAside = false;  ///< It is one that had stepped aside.
+        std::size_t count = 0; ///< How many of the events of the queue's last look to send; 0: pause.
+        bool isAside = false;  ///< The request is one event that had stepped aside.
         Pause pause;
     };
     Next WhatNext(EventQueue& queue, WallTime now);
 
-    /// Events that others go past.
+    /// The events that stepped aside.
     const EventKeys& Aside() const { return m_aside.Keys(); }
 
     /// How many of the events to send, now that the length of the body is known. When there are fewer, ask
@@ -75,10 +76,10 @@ public:
         Taken,        ///< Delete the events.
         NotNow,       ///< Keep them.
         Halved,       ///< Keep them; the next request has half as many.
-        StaysAside,   ///< Keep the one event: others go past it.
+        StaysAside,   ///< Keep the one event; others are sent before it.
         OutOfStrikes, ///< Move the one event to the dead letters: it was tried often enough.
         Refused,      ///< Move the one event to the dead letters: it will never be taken.
-        Abandoned     ///< Keep them; we are to stop.
+        Abandoned     ///< Keep them; the process ends the uploads.
     };
     struct Decision {
         Outcome outcome = Outcome::NotNow;
@@ -102,7 +103,7 @@ private:
     Decision Decide(const Sent& sent, const otlp::HttpResult& result, double random, WallTime now,
                     EventQueue& queue);
     void Taken(const Sent& sent);
-    void NotTaken(const Sent& sent, Blame blame, WallTime now, EventQueue& queue);
+    void NotTaken(const Sent& sent, Verdict verdict, WallTime now, EventQueue& queue);
     void StepAside(const EventKey& event, WallTime now, EventQueue& queue);
     Decision AsideFailed(const Sent& sent, WallTime now);
     Outcome Refused(const Sent& sent, Blame blame);

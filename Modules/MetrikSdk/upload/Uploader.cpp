@@ -50,7 +50,8 @@ private:
     std::uniform_real_distribution<double> m_uniform{0.0, 1.0};
 };
 
-/// No event shortens it: what is reported at a start would be sent by all machines at once, too.
+/// New events do not shorten this wait: every start is reported as an event, and machines that start together
+/// would send these events together.
 void WaitForTheFirstRequest(process::OutboxCore& core) {
     const auto wait = RetryPolicy::WaitAtStart(Chance()(), core.settings.retry);
     core.outbox.WaitingCount().Await(outbox::CountWaiter::NEVER, std::chrono::steady_clock::now() + wait);

@@ -77,10 +77,8 @@ Step::Kind Forwarder::Act(const Batch& batch, const Rules::Sent& sent, const Htt
         Refuse(batch, sent, result.status, upload::RetryPolicy::Describe(result));
         return Step::Kind::Refused;
     case Outcome::OutOfStrikes:
-        StaysAside(batch, sent, result, true);
-        return Step::Kind::Searching;
     case Outcome::StaysAside:
-        StaysAside(batch, sent, result, decision.strikes.isNew);
+        StaysAside(batch, sent, result, decision);
         return Step::Kind::Searching;
     case Outcome::NotNow:
         NotTaken(batch, result, now);
@@ -125,13 +123,13 @@ void Forwarder::NotTaken(const Batch& batch, const HttpResult& result, WallTime 
 }
 
 void Forwarder::StaysAside(const Batch& batch, const Rules::Sent& sent, const HttpResult& result,
-                           bool isStrike) {
+                           const Rules::Decision& decision) {
     const auto why = upload::RetryPolicy::Describe(result);
-    const auto tries = m_queue.Failed(batch, isStrike, why);
-    if (tries >= m_settings.aside.strikes)
+    const auto tries = m_queue.Failed(batch, decision.strikes.isNew, why);
+    if (decision.strikes.areOut || tries >= m_settings.aside.tries)
         Refuse(batch, sent, result.status,
                fmt::format("not taken at {} tries, while others were: {}", tries, why));
-    else if (isStrike && tries == 1)
+    else if (decision.strikes.isNew && tries == 1)
         m_teller.Note(
             fmt::format("{} is not taken while others are, and will be tried again from time to time: {}",
                         NameOf(batch.events.front()), why));
@@ -139,7 +137,7 @@ void Forwarder::StaysAside(const Batch& batch, const Rules::Sent& sent, const Ht
 
 void Forwarder::EndRun() {
     if (m_done.sent > 0)
-        m_queue.EndRun(m_settings.aside.strikes);
+        m_queue.EndRun(m_settings.aside.tries);
     TellWhatTheQueueFound();
 }
 

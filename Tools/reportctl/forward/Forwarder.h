@@ -67,7 +67,7 @@ private:
     void NotTaken(const MetrikSdk::Batch& batch, const MetrikSdk::otlp::HttpResult& result,
                   MetrikSdk::WallTime now);
     void StaysAside(const MetrikSdk::Batch& batch, const Rules::Sent& sent,
-                    const MetrikSdk::otlp::HttpResult& result, bool isStrike);
+                    const MetrikSdk::otlp::HttpResult& result, const Rules::Decision& decision);
     void TellWhatTheQueueFound();
     std::string Describe(const MetrikSdk::otlp::HttpResult& result) const;
 

@@ -31,13 +31,13 @@ TEST_F(TheAsideList, TriesAnEventAtOnceWhenOthersWereTakenForTheFirstTime) {
     EXPECT_EQ(m_list.Due(NOW)->uuid, "uuid-7");
 }
 
-TEST_F(TheAsideList, CountsNoStrikeWhileNothingIsTaken) {
+TEST_F(TheAsideList, CountsNoTryWhileNothingIsTaken) {
     m_list.Add(Event(7), NOW);
     for (int i = 0; i < 1000; ++i)
-        EXPECT_EQ(m_list.Failed(7, NOW).count, 0);
+        EXPECT_EQ(m_list.Failed(7, NOW).tries, 0);
     m_list.OtherWasTaken();
-    EXPECT_EQ(m_list.Failed(7, NOW).count, 1);
-    EXPECT_EQ(m_list.Failed(7, NOW).count, 1) << "nothing was taken since the try before";
+    EXPECT_EQ(m_list.Failed(7, NOW).tries, 1);
+    EXPECT_FALSE(m_list.Failed(7, NOW).isNew) << "nothing was taken since the try before";
 }
 
 TEST_F(TheAsideList, DoublesThePauseUpToTheLongestAndIsOutAfterAllStrikes) {
@@ -50,6 +50,46 @@ TEST_F(TheAsideList, DoublesThePauseUpToTheLongestAndIsOutAfterAllStrikes) {
     }
     EXPECT_EQ(pauses,
               (std::vector<std::chrono::milliseconds>{1min, 2min, 4min, 8min, 16min, 32min, 1h, 1h, 1h, 1h}));
+}
+
+TEST_F(TheAsideList, LetsTheRestWaitAgainWhenOneIsTaken) {
+    for (const int row : {6, 7, 8, 9})
+        m_list.Add(Event(row), NOW);
+    m_list.OtherWasTaken();
+    m_list.Failed(6, NOW);
+    m_list.Taken(7);
+    ASSERT_EQ(m_list.Keys().size(), 1U) << "the collector was away when the others stepped aside";
+    EXPECT_EQ(m_list.Keys().begin()->first, 6) << "it was not taken while others were";
+    EXPECT_EQ(Due(NOW), 0);
+    EXPECT_EQ(m_list.UntilDue(NOW), 1min);
+    m_list.Add(Event(8), NOW);
+    EXPECT_EQ(m_list.Failed(6, NOW).tries, 2) << "the one that was taken counts as another event";
+}
+
+TEST_F(TheAsideList, VoidsAllStrikesWhenTheCollectorDoesNotTakeOthersEither) {
+    m_settings.strikes = 2;
+    upload::AsideList list(m_settings);
+    list.Add(Event(7), NOW);
+    const auto isOut = [&] {
+        list.OtherWasTaken();
+        return list.Failed(7, NOW).areOut;
+    };
+    EXPECT_FALSE(isOut());
+    list.OtherFailed();
+    EXPECT_FALSE(isOut()) << "it has too much to do, and the event may be a good one";
+    list.OtherWasTaken();
+    list.OtherFailed();
+    EXPECT_TRUE(isOut()) << "the first request after the try was taken";
+}
+
+TEST_F(TheAsideList, GivesUpAfterManyTriesAlsoWhenManyOthersAreBad) {
+    m_list.Add(Event(7), NOW);
+    for (int tries = 1; tries <= m_settings.tries; ++tries) {
+        m_list.OtherWasTaken();
+        EXPECT_EQ(m_list.Failed(7, NOW).areOut, tries == m_settings.tries);
+        m_list.OtherFailed();
+    }
+    EXPECT_EQ(m_list.UntilDue(NOW), 1h);
 }
 
 TEST_F(TheAsideList, DoesNotHoldAnEventWhenTheClockIsSetBack) {

@@ -248,6 +248,17 @@ TEST_F(TheUploadCycle, DeliversAnEventThatSteppedAsideOnceTheCollectorTakesIt) {
     EXPECT_EQ(m_outbox.Status().delivered, 20);
 }
 
+TEST_F(TheUploadCycle, SendsFewRequestsOnceACollectorThatAnswered503ForADayIsBack) {
+    Append(200);
+    AnswerAlways(Status(503));
+    RunFor(24h);
+    m_sender.bodies.clear();
+    AnswerAlways(Status(200));
+    RunFor(10min);
+    EXPECT_EQ(m_outbox.Status().delivered, 200);
+    EXPECT_LE(m_sender.bodies.size(), 4U) << "one event, the oldest alone, and all others together";
+}
+
 TEST_F(TheUploadCycle, BlamesNoEventWhileACollectorIsAwayForADay) {
     Append(600);
     for (const auto& away : {Status(503), TimedOut()}) {

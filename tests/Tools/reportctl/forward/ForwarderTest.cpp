@@ -101,6 +101,7 @@ TEST_F(Forwarder, SendsAHeldRowWhenTheCollectorIsMended) {
 }
 
 TEST_F(Forwarder, RefusesAHeldRowAtLastAndSaysWhy) {
+    m_settings.aside.tries = 10;
     AnswerEvents({"B100|7"}, 503);
     Insert(1, 20);
     for (int run = 1; run <= 10; ++run) {
