@@ -41,7 +41,7 @@ struct Config {
     double eventsPerDay = 200; ///< Of one desktop.
 
     /// Collectors behind a balancer. A desktop's connection stays with one, so they have nothing in common.
-    unsigned collectors = 0;   ///< 0: one for each 50,000 desktops.
+    unsigned collectors = 0;   ///< 0: as many as suit the desktops.
     double capacity = 0;       ///< Events a second of all collectors; 0: no bound.
     double returnCapacity = 0; ///< The same after the outage.
     Tick queue = 2 * SECOND;   ///< The work that fits a collector's queue; it answers 503 to more.
