@@ -1,7 +1,10 @@
 #include "Tools/reportctl/commands/FilterOptions.h"
 
+#include <charconv>
 #include <optional>
 #include <stdexcept>
+
+#include <fmt/format.h>
 
 #include "Tools/reportctl/terminal/TimeArgument.h"
 
@@ -29,6 +32,17 @@ std::optional<std::int64_t> Bound(const std::string& time) {
 
 CLI::Validator IsTime() {
     return {ReasonAgainst, "TIME"};
+}
+
+CLI::Validator IsWholeNumber(std::int64_t least) {
+    const auto reasonAgainst = [least](const std::string& text) {
+        std::int64_t number = 0;
+        const auto* const textEnd = text.data() + text.size();
+        const auto [end, error] = std::from_chars(text.data(), textEnd, number);
+        const bool isRight = error == std::errc() && end == textEnd && number >= least;
+        return isRight ? "" : fmt::format("\"{}\" is no whole number from {} on", text, least);
+    };
+    return {reasonAgainst, least == 0 ? "NONNEGATIVE" : "POSITIVE"};
 }
 
 std::int64_t MillisecondsOf(const std::string& time) {

@@ -11,6 +11,7 @@
 #include <fmt/format.h>
 
 #include "Tools/reportctl/commands/Commands.h"
+#include "Tools/reportctl/commands/FilterOptions.h"
 #include "Tools/reportctl/log/Files.h"
 #include "Tools/reportctl/log/Show.h"
 #include "Tools/reportctl/log/Stream.h"
@@ -269,6 +270,7 @@ void AddFind(CLI::App& app, int& exitCode) {
         ->required()
         ->check(notEmpty);
     command->add_option("--limit", options->limit, "Show so many of each place, the last ones")
+        ->check(IsWholeNumber(0))
         ->capture_default_str();
     command->add_flag(
         "--json", options->isJson,

@@ -110,7 +110,7 @@ void AddPrune(CLI::App& app, int& exitCode) {
     age->check(IsTime());
     auto* rows =
         command->add_option("--keep-rows", options->keepRows, "Delete all rows but the newest so many");
-    rows->check(CLI::NonNegativeNumber)->excludes(age);
+    rows->check(IsWholeNumber(0))->excludes(age);
     command
         ->add_option("--keep-mib", options->keepMib,
                      "Delete the oldest rows, until the others fit into so many MiB")

@@ -205,7 +205,7 @@ void AddStats(CLI::App& app, int& exitCode) {
         ->capture_default_str();
     options->filter.AddTo(*command);
     command->add_option("--top", options->top, "Only so many, the most frequent ones")
-        ->check(CLI::PositiveNumber);
+        ->check(IsWholeNumber(1));
     command->add_flag("--utc", options->isUtc, "Hours and days of UTC, not of local time");
     auto* json = command->add_flag("--json", options->isJson, "A JSON array of {\"key\", \"count\"}");
     command->add_flag("--csv", options->isCsv, "CSV with a header")->excludes(json);

@@ -163,8 +163,10 @@ void AddTail(CLI::App& app, int& exitCode) {
         ->add_option("--since", options->since,
                      std::string("Begin with the lines of this time: ") + terminal::TIME_FORMS)
         ->check(IsTime());
-    command->add_option("--lines", options->lines,
-                        "Begin with so many lines of before. Without it, 10, or all since --since");
+    command
+        ->add_option("--lines", options->lines,
+                     "Begin with so many lines of before. Without it, 10, or all since --since")
+        ->check(IsWholeNumber(0));
     command->add_flag("--json", options->isJson, "One JSON object a line");
     command->add_flag("--no-follow", options->noFollow, "End after the lines that are there");
     command->footer(HELP + app.get_footer());

@@ -79,6 +79,16 @@ TEST_F(Stats, AreATableWithBarsAndSayWhatWasCounted) {
               "Counted: 7 rows of the store, 0 events of the outbox (waiting, or dead letters).\n");
 }
 
+TEST_F(Stats, SayThatTopIsAWholeNumber) {
+    for (const std::string top : {"0", "-1", "x", "1.5", "99999999999999999999"}) {
+        const auto outcome = Reportctl("stats --top " + top);
+        EXPECT_GE(outcome.exitCode, 100);
+        EXPECT_EQ(outcome.output,
+                  "--top: \"" + top +
+                      "\" is no whole number from 1 on\nRun with --help for more information.\n");
+    }
+}
+
 TEST_F(Stats, ShowNoEscapeSequenceOfAnEventId) {
     Insert("char(27) || '[2J'", "''", "'0'");
     EXPECT_EQ(OutputOf("stats").substr(0, 7), "\\x1b[2J");

@@ -42,6 +42,10 @@ protected:
     }
 };
 
+TEST(Tail, TakesNoNegativeNumberOfLines) {
+    EXPECT_EQ(std::system(REPORTCTL " tail --no-follow --lines -1 2>/dev/null >&2") >> 8, 105);
+}
+
 TEST_F(LongLog, IsShownAndSearchedWithoutBeingKept) {
     const auto shown = OutputOf("tail --no-follow --since 2020-01-01");
     EXPECT_EQ(std::count(shown.begin(), shown.end(), '\n'), REPORTS + 1);
