@@ -3,13 +3,13 @@
 #include <algorithm>
 #include <cerrno>
 #include <string>
-#include <thread>
 
 #include <pthread.h>
 #include <sys/resource.h>
 
 #include "Modules/BoostLogger/InsideLog.h"
 #include "Modules/BoostLogger/RecordLine.h"
+#include "SystemTool/Clock/LockBefore.h"
 
 namespace BoostLogger {
 
@@ -99,13 +99,10 @@ void LogWriter::Finish() noexcept {
     if (InsideLog::IsThisThread())
         return; // this thread crashed in here, and perhaps with the lock
     const InsideLog inside;
-    const auto deadline = std::chrono::steady_clock::now() + FINISH_PATIENCE;
-    while (!m_mutex.try_lock()) {
-        if (std::chrono::steady_clock::now() > deadline)
-            return;
-        std::this_thread::sleep_for(std::chrono::milliseconds(1));
-    }
-    const std::lock_guard lock(m_mutex, std::adopt_lock);
+    const auto lock =
+        SystemTool::Clock::LockBefore(m_mutex, std::chrono::steady_clock::now() + FINISH_PATIENCE);
+    if (!lock)
+        return;
     m_mayWait = false;
     if (m_forks == g_forks)
         WriteWaiting(std::chrono::steady_clock::now());

@@ -5,6 +5,8 @@
 
 #include <SQLiteCpp/Exception.h>
 
+#include "SystemTool/Clock/LockBefore.h"
+
 namespace OrvekSqlite {
 namespace {
 
@@ -122,11 +124,12 @@ bool Database::Finish() {
         return false; // this thread crashed in here, so its operation never ends
     const bool isOwnersThread =
         m_lastInside == std::thread::id() || m_lastInside == std::this_thread::get_id();
-    if (!LockBefore(group::Clock::now() + m_settings.group.exitWait))
+    auto lock = SystemTool::Clock::LockBefore(m_mutex, group::Clock::now() + m_settings.group.exitWait);
+    if (!lock)
         return false;
     m_group.CommitWithoutWaiting();
     m_file.Close();
-    m_mutex.unlock();
+    lock.unlock();
     m_committer.Stop();
     return isOwnersThread;
 }
@@ -165,17 +168,6 @@ void Database::Tell(const std::exception& error) noexcept {
 
 void Database::TellNoMemory() noexcept {
     m_lastError = "out of memory"; // so short that it needs no memory itself
-}
-
-/// Tries to lock again and again. A mutex that can be waited for with a deadline is slower, and this runs
-/// only once in an object's life.
-bool Database::LockBefore(group::Clock::time_point deadline) {
-    while (!m_mutex.try_lock()) {
-        if (group::Clock::now() > deadline)
-            return false;
-        std::this_thread::sleep_for(std::chrono::milliseconds(1));
-    }
-    return true;
 }
 
 } // namespace OrvekSqlite

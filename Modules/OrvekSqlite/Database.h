@@ -100,7 +100,6 @@ private:
     bool KeepError(Action action);
     void Tell(const std::exception& error) noexcept;
     void TellNoMemory() noexcept;
-    bool LockBefore(group::Clock::time_point deadline);
 
     const Settings m_settings;
     std::atomic<bool> m_isFinished = false; ///< set by Finish; every operation that begins later fails

@@ -5,6 +5,7 @@
 #include <utility>
 
 #include "Modules/MetrikSdk/outbox/Uuid.h"
+#include "SystemTool/Clock/LockBefore.h"
 
 namespace MetrikSdk::outbox {
 
@@ -175,7 +176,9 @@ void Outbox::TellDeadLetters(const std::optional<std::string>& totals, std::vect
 void Outbox::EndRuns() {
     std::vector<report::News> news;
     {
-        const std::unique_lock lock(m_mutex, std::try_to_lock);
+        const auto patience = m_isHeldUp ? std::chrono::milliseconds(0) : m_settings.file.shortLockPatience;
+        const auto lock = SystemTool::Clock::LockBefore(m_mutex, std::chrono::steady_clock::now() + patience);
+        m_isHeldUp = !lock;
         if (!lock)
             return;
         m_caps.EndRun(news);

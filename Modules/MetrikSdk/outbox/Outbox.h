@@ -47,8 +47,9 @@ public:
     void MoveToDeadLetters(const StoredEvent& event, const Refusal& refusal);
 
     /// Reports the totals of what is being lost, because a callback is about to be removed. Does nothing when
-    /// another thread holds the lock: that thread may hang in the file system, and the removal must not wait
-    /// for it.
+    /// another thread keeps the lock for longer than shortLockPatience: that thread may hang in the file
+    /// system, and the removal must not wait for it. Hundreds of modules may leave in a row, so only the
+    /// first of them waits.
     void EndRuns();
 
     OutboxStatus Status();
@@ -88,6 +89,7 @@ private:
     /// The last event or opening failed, perhaps after the full wait for a lock. So the next one waits less.
     std::atomic<bool> m_patienceUsedUp = false;
     std::atomic<bool> m_isUnsafe = false;
+    std::atomic<bool> m_isHeldUp = false; ///< The last EndRuns did not get the lock.
     /// Events that were refused since the last one that was stored.
     std::atomic<unsigned long> m_refused = 0;
 
