@@ -72,12 +72,15 @@ public:
     /// Receives a datagram into the buffer, which must be clear. Result and failure are those of the socket's
     /// receiveFrom.
     int Receive(Poco::Net::DatagramSocket& socket) {
-        m_used = Wire::MAX_BYTES; // if the call throws, any byte may have been written
+        // The call may fail or throw after bytes were written: the system copies a datagram with a wrong
+        // checksum here, too, before it drops it.
+        m_used = Wire::MAX_BYTES;
         sockaddr* sender = reinterpret_cast<sockaddr*>(&m_sender);
         poco_socklen_t senderBytes = sizeof m_sender;
         poco_socklen_t* senderLength = &senderBytes;
         const int bytes = socket.receiveFrom(m_bytes.data(), Wire::MAX_BYTES, &sender, &senderLength);
-        m_used = static_cast<std::size_t>(std::max(bytes, 0));
+        if (bytes >= 0)
+            m_used = static_cast<std::size_t>(bytes);
         return bytes;
     }
 

@@ -54,8 +54,8 @@ std::uint64_t LinesIn(std::string_view lines) {
 } // namespace
 
 LogWriter::LogWriter(const LogSettings& settings)
-    : m_settings(settings), m_path(settings.LivePath()), m_rotated(settings.directory, settings.fileName),
-      m_forks(g_forks) {}
+    : m_settings(settings), m_path(settings.LivePath()), m_forks(g_forks),
+      m_rotated(settings.directory, settings.fileName) {}
 
 FileFailure LogWriter::Start() {
     m_flusher.Start();
@@ -69,13 +69,27 @@ FileFailure LogWriter::Start() {
     return {};
 }
 
+bool LogWriter::IsForked() const {
+    return m_forks != g_forks.load(std::memory_order_relaxed);
+}
+
+/// In a forked child, the mutex may be locked for ever: by a thread of the parent that was at work when the
+/// child began. So a child waits for a short time only.
+std::unique_lock<std::mutex> LogWriter::Lock() {
+    if (IsForked())
+        return SystemTool::Clock::LockBefore(m_mutex, std::chrono::steady_clock::now() + FINISH_PATIENCE);
+    return std::unique_lock(m_mutex);
+}
+
 void LogWriter::Append(std::string_view line, TimePoint now, Haste haste) noexcept {
     if (InsideLog::IsThisThread())
         return CountLost();
     // Set before the lock is taken: a signal handler that logs in between would otherwise wait for ever.
     const InsideLog inside;
-    const std::lock_guard lock(m_mutex);
-    if (m_forks != g_forks.load(std::memory_order_relaxed)) {
+    const auto lock = Lock();
+    if (!lock)
+        return CountLost();
+    if (IsForked()) {
         m_mayWait = false;
         m_waiting.Clear();
     }
@@ -104,7 +118,7 @@ void LogWriter::Finish() noexcept {
     if (!lock)
         return;
     m_mayWait = false;
-    if (m_forks == g_forks)
+    if (!IsForked())
         WriteWaiting(std::chrono::steady_clock::now());
 }
 

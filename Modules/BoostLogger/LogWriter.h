@@ -57,6 +57,8 @@ private:
     static constexpr std::int64_t NO_LIMIT = std::numeric_limits<std::int64_t>::max();
 
     static std::int64_t FileSizeLimit();
+    bool IsForked() const;
+    std::unique_lock<std::mutex> Lock();
     bool LetWait(std::string_view line, TimePoint now);
     void WriteWaiting(TimePoint now) noexcept;
     void Write(std::string_view lines, TimePoint now) noexcept;
@@ -71,6 +73,7 @@ private:
 
     const LogSettings m_settings;
     const std::string m_path;
+    const unsigned m_forks; ///< g_forks when this object was made. In a forked child, g_forks is higher.
     std::atomic<std::uint64_t> m_lost = 0;
 
     std::mutex m_mutex; ///< Guards everything below, and the order of lines in the file.
@@ -82,7 +85,6 @@ private:
     FileFailure m_failure;   ///< The last failure. The record that reports the loss names it.
     bool m_losing = false;
     bool m_mayWait = true; ///< False from Finish on, and in a forked child.
-    unsigned m_forks = 0;  ///< g_forks when this object was made. In a forked child, g_forks is higher.
     WaitingLines m_waiting;
     Flusher m_flusher{m_mutex, m_waiting, [this] { WriteWaiting(std::chrono::steady_clock::now()); }};
 };

@@ -123,8 +123,9 @@ public:
           m_start(text.starts_with(BYTE_ORDER_MARK) ? BYTE_ORDER_MARK.size() : 0) {}
 
     bool operator()(JsonTree& document) {
-        auto* const copy = static_cast<char*>(document.GetAllocator().Malloc(m_text.size() + 1));
-        std::memcpy(copy, m_text.c_str(), m_text.size() + 1);
+        auto* const copy = static_cast<char*>(document.GetAllocator().Malloc(m_text.size() + END_BYTES));
+        std::memcpy(copy, m_text.data(), m_text.size());
+        std::memset(copy + m_text.size(), '\0', END_BYTES);
         rapidjson::InsituStringStream bytes(copy + m_start);
         JsonGuard guard(document, m_maxDepth, m_text.find('\\') != std::string::npos);
         JsonReader reader;
@@ -154,6 +155,10 @@ public:
 
 private:
     static constexpr std::string_view BYTE_ORDER_MARK = "\xef\xbb\xbf";
+
+    /// How many zero bytes follow the text. When the text ends in the lead byte of a character, the parser
+    /// goes on to that character's end before it notices: up to three bytes behind the text.
+    static constexpr std::size_t END_BYTES = 4;
 
     const std::string& m_text;
     const int m_maxDepth;

@@ -38,8 +38,12 @@ private:
     void Tell(const JsonValue& value) {
         if (value.IsObject() ? m_handler.StartObject() : value.IsArray() && m_handler.StartArray())
             m_open.push_back({&value, 0});
+        else if (value.IsString())
+            // Of a string that was read in place, Accept would say that the handler need not copy it. Then a
+            // copy of the value would point into the tree that it was copied from.
+            m_handler.String(value.GetString(), value.GetStringLength(), true);
         else
-            value.Accept(m_handler); // a scalar: one event
+            value.Accept(m_handler); // another scalar: one event
     }
 
     void TellNextChild(Level& level) {

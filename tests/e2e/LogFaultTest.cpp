@@ -180,10 +180,11 @@ TEST_F(LogFault, AFileSizeLimitDoesNotEndTheService) {
         const FileSizeLimit limit(LIMIT); // the service inherits it
         m_service.Start();
     }
-    for (int i = 0; i < 300; ++i)
-        Service::Send(std::string(10'000, 'x'));
     const auto rotated = m_service.DataDirectory() + "/hublink/log/metrik/Report_2.log";
-    EXPECT_TRUE(WaitUntil([&] { return std::filesystem::exists(rotated) || !m_service.IsRunning(); }));
+    ASSERT_TRUE(WaitUntil([&] {
+        Service::Send(std::string(10'000, 'x'));
+        return std::filesystem::exists(rotated) || !m_service.IsRunning();
+    }));
     EXPECT_TRUE(m_service.IsRunning());
     EXPECT_LE(std::filesystem::file_size(rotated), LIMIT);
     EXPECT_GE(std::filesystem::file_size(rotated), LIMIT - 11'000);

@@ -1,6 +1,8 @@
 #include "Modules/BoostLogger/LogWriter.h"
 
+#include <atomic>
 #include <csignal>
+#include <future>
 
 #include <gtest/gtest.h>
 #include <sys/resource.h>
@@ -425,6 +427,24 @@ TEST_F(TheLogWriter, LeavesWaitingLinesToTheParentOfAFork) {
     EXPECT_EQ(std::filesystem::file_size(m_path), 1900U) << "the child's own lines, and at once";
     writer.Finish();
     EXPECT_EQ(std::filesystem::file_size(m_path), 2400U);
+}
+
+TEST_F(TheLogWriter, DoesNotHoldUpAChildThatBeganWhileAnotherThreadWrote) {
+    LogWriter writer(Settings(100'000, 1'000'000));
+    ASSERT_FALSE(writer.Start());
+    std::atomic<bool> isToEnd = false;
+    auto busy = std::async(std::launch::async, [&] {
+        while (!isToEnd)
+            writer.Append(Line(100), std::chrono::steady_clock::now());
+    });
+    for (int fork = 0; fork < 20; ++fork) {
+        ChildProcess child([&] {
+            AppendBurst(writer, 1, std::chrono::steady_clock::now());
+            return true;
+        });
+        EXPECT_EQ(child.WaitFor(10s), 0);
+    }
+    isToEnd = true;
 }
 
 TEST_F(TheLogWriter, RotatesInABurstWhereItRotatesOtherwise) {

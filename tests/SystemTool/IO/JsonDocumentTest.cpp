@@ -120,6 +120,30 @@ TEST(JsonDocument, InvalidUtf8IsAnErrorWhereverItStands) {
         }
 }
 
+TEST(JsonDocument, ATextThatEndsWithinACharacterIsAnErrorOfAnyLength) {
+    for (const std::size_t length : {1, 6, 7, 8, 4093, 4094, 4095, 4096, 5095, 10'239})
+        for (const char lead : {'\xc3', '\xe2', '\xf1'}) {
+            const std::string text = '"' + std::string(length - 1, 'a');
+            EXPECT_EQ(ErrorOf(text + lead),
+                      "Invalid encoding in string. At byte " + std::to_string(length) + ".");
+        }
+}
+
+TEST(JsonDocument, ACopyOutlivesWhatItWasCopiedFrom) {
+    JsonDocument changed;
+    JsonDocument holder;
+    {
+        const JsonDocument source = Parsed(R"({"key":"a text of more than a few bytes"})");
+        changed = source;
+        changed.SetKeyValue("other", "text");
+        holder.SetKeyValue("held", source);
+        holder.SetKeyValue("string", source.GetKeyValue("key"));
+    }
+    EXPECT_EQ(changed.ToJson(), R"({"key":"a text of more than a few bytes","other":"text"})");
+    EXPECT_EQ(holder.ToJson(), R"({"held":{"key":"a text of more than a few bytes"},)"
+                               R"("string":"a text of more than a few bytes"})");
+}
+
 TEST(JsonDocument, HalfASurrogatePairIsAnError) {
     for (const std::string text : {R"("\ud800")", R"("\ud800x")", R"({"\udfff":1})", R"("a\udc00b")"})
         EXPECT_NE(ErrorOf(text), "") << text;
