@@ -18,7 +18,7 @@ public:
     /// that the code asks for.
     ///
     /// The lock is a POSIX record lock: nothing else in the process may open and close the pid file, because
-    /// closing it would release the lock. Call this once, before any thread is started.
+    /// closing it would release the lock. Call this once, before the service starts a thread.
     static bool IsAlreadyRun();
 
     /// The signal handler: logs the signal and the frames, and ends the process with exit(0). It calls

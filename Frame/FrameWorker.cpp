@@ -3,7 +3,6 @@
 #include <map>
 #include <vector>
 
-#include <Poco/Format.h>
 #include <fmt/format.h>
 
 #include "App/ReportServer.h"

@@ -1,7 +1,5 @@
 #include "Metrik/MetrikWorker.h"
 
-#include <Poco/Format.h>
-
 #include "App/ReportServer.h"
 #include "Common/Common.h"
 #include "Ledger/Outcome.h"
