@@ -16,6 +16,7 @@ namespace BoostLogger {
 ///   the further lines of that millisecond      wait until 16 lines wait, but no longer than a millisecond
 ///
 /// Threads: one at a time. Failure: none. The buffer is a member, so no memory is allocated.
+// NOLINTNEXTLINE(cppcoreguidelines-pro-type-member-init): the bytes are written before they are read
 class WaitingLines {
 public:
     using TimePoint = std::chrono::steady_clock::time_point;
