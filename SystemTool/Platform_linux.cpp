@@ -161,6 +161,7 @@ void LetGoOfCode() {
                 continue;
             const ElfW(Addr) begin = (library->dlpi_addr + segment.p_vaddr) / page * page;
             const ElfW(Addr) end = library->dlpi_addr + segment.p_vaddr + segment.p_memsz;
+            // NOLINTNEXTLINE(performance-no-int-to-ptr): the system tells addresses as numbers
             static_cast<void>(::madvise(reinterpret_cast<void*>(begin), end - begin, MADV_DONTNEED));
         }
         return 0;
