@@ -20,10 +20,12 @@ void RequireOurFile(int directory, const std::string& name, const std::string& s
             return;
         throw UnsafePath(shown + " cannot be looked at");
     }
+    if (status.st_nlink == 0) // another process deleted it during the call, as SQLite does at its last close
+        return;
     if (!S_ISREG(status.st_mode))
         throw UnsafePath(shown + " is not a regular file");
     // A write to this file would change it under its other name, too, which may be anywhere.
-    if (status.st_nlink != 1)
+    if (status.st_nlink > 1)
         throw UnsafePath(shown + " has more than one name");
     RequireOursAlone(status, shown);
 }

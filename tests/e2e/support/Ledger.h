@@ -1,6 +1,7 @@
 #pragma once
 
 #include <chrono>
+#include <ostream>
 #include <set>
 #include <string>
 #include <vector>
@@ -39,6 +40,10 @@ public:
         int number;
         std::string error;
         std::string statement;
+
+        friend void PrintTo(const LostOne& lost, std::ostream* out) {
+            *out << lost.number << ": " << lost.error << '-' << lost.statement;
+        }
     };
     std::vector<LostOne> Lost() const;
     Numbers LostNumbers() const;
