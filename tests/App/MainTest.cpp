@@ -1,5 +1,6 @@
 #include <csignal>
 #include <cstdlib>
+#include <filesystem>
 #include <string>
 
 #include <fcntl.h>
@@ -14,6 +15,8 @@
 #include "tests/support/TemporaryDirectory.h"
 #include "tests/support/WaitUntil.h"
 
+using SystemTool::IO::Directory::GetExcutableDirectory;
+using ::testing::ContainsRegex;
 using ::testing::HasSubstr;
 using ::testing::MatchesRegex;
 using ::testing::StartsWith;
@@ -24,7 +27,9 @@ namespace {
 
 class Program {
 public:
-    explicit Program(const char* environment, rlim_t stackBytes = RLIM_INFINITY) {
+    /// `folder` holds the program and its plug-ins.
+    explicit Program(const char* environment, rlim_t stackBytes = RLIM_INFINITY,
+                     const std::string& folder = GetExcutableDirectory()) {
         if (::pipe(m_output) != 0)
             throw std::runtime_error("no pipe");
         ::setenv("XDG_DATA_HOME", m_data.Path().c_str(), 1); // where the program keeps its ledger
@@ -37,7 +42,7 @@ public:
                 const rlimit limit{stackBytes, stackBytes};
                 ::setrlimit(RLIMIT_STACK, &limit);
             }
-            const std::string path = SystemTool::IO::Directory::GetExcutableDirectory() + "main_beside_fakes";
+            const std::string path = folder + "main_beside_fakes";
             ::execl(path.c_str(), path.c_str(), nullptr);
             ::_exit(127);
         }
@@ -119,4 +124,17 @@ TEST(Main, StaysWhenTheServerCannotStart) {
     EXPECT_THAT(output, HasSubstr("Poco exception: ")) << "the receiving thread's, printed";
     EXPECT_THAT(output, HasSubstr("3 [App/ReportServer:35 Start] tag= Poco exception :"));
     EXPECT_TRUE(program.IsRunning());
+}
+
+TEST(Main, TakesThePathOfAMissingStorePluginForAFormat) {
+    const TemporaryDirectory directory;
+    const std::string folder = directory.Path() + "/100%s/";
+    std::filesystem::create_directory(folder);
+    for (const std::string file : {"main_beside_fakes", "libBoostLogger.dylib"})
+        std::filesystem::copy_file(GetExcutableDirectory() + file, folder + file);
+    Program program("FAKE_LOGGER_ECHOES", RLIM_INFINITY, folder);
+    const std::string reason = "format-string referred to more arguments than were passed";
+    EXPECT_THAT(program.OutputUpTo(reason), ContainsRegex("\n4 \\[Frame/FrameWorker:[0-9]+ Init\\] tag= "
+                                                          "\\[BoostLogError\\]boost::too_few_args: " +
+                                                          reason));
 }
