@@ -246,6 +246,18 @@ TEST(LogCaughtException, NamesEachKindOfExceptionInItsOwnWords) {
     EXPECT_THAT(logged(42), ElementsAre(warning("Unknown exception :2-No such file or directory")));
 }
 
+TEST(LogCaughtException, ReportsAnExceptionWhoseTextIsTooLong) {
+    try {
+        throw std::runtime_error(std::string(1048576, 'x'));
+    } catch (...) {
+        EXPECT_FALSE(LogCaughtException({LogLevel::Warning, "Consume", 76}));
+    }
+    EXPECT_THAT(FakeLogger().Records(),
+                ElementsAre(LogRecord{4, "Common/LoggerTest", "Consume", 76,
+                                      "[BoostLogError]the text would have 1048592 bytes, more than the "
+                                      "1048576 of a log record"}));
+}
+
 TEST(PerFileLogger, IsAnInstanceOfItsOwnInEachSourceFile) {
     EXPECT_NE(pSysLog, nullptr);
     EXPECT_EQ(pSysLog, g_LoggerLoader.GetModule());

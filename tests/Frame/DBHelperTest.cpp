@@ -1,5 +1,8 @@
 #include "Frame/DBHelper.h"
 
+#include <latch>
+#include <set>
+#include <thread>
 #include <vector>
 
 #include <gmock/gmock.h>
@@ -48,6 +51,21 @@ protected:
 
 TEST(DBHelper, IsOneInstance) {
     EXPECT_EQ(&DBHelper::instance(), &DBHelper::instance());
+}
+
+TEST(DBHelper, IsOneInstanceAlsoWhenThreadsAskForItFirstAtTheSameTime) {
+    constexpr std::size_t THREADS = 8;
+    std::latch start(THREADS);
+    std::vector<DBHelper*> seen(THREADS);
+    {
+        std::vector<std::jthread> threads;
+        for (DBHelper*& instance : seen)
+            threads.emplace_back([&start, &instance] {
+                start.arrive_and_wait();
+                instance = &DBHelper::instance();
+            });
+    }
+    EXPECT_EQ(std::set<DBHelper*>(seen.begin(), seen.end()).size(), 1U);
 }
 
 TEST_F(DBHelperWithoutPlugin, OperationsFailSilently) {

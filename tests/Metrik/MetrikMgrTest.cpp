@@ -203,6 +203,32 @@ TEST_F(TheMetrikMgr, UpdateLogsEachKindOfExceptionAndTheMapIsAsItWas) {
     EXPECT_EQ(Info().openID, "visitor") << "the exception came before";
 }
 
+TEST_F(TheMetrikMgr, AModuleIsRegisteredThoughTheLineAboutItCannotBeWritten) {
+    FakeLogger().onWrite = [](const LogRecord& record) {
+        if (record.level == 2)
+            throw std::runtime_error("disk full");
+    };
+    EXPECT_TRUE(m_mgr.Update(InitMessage("A100")));
+    FakeLogger().onWrite = nullptr;
+    EXPECT_THAT(FakeLogger().RecordsOf("AddWorker"),
+                ElementsAre(Record(4, "AddWorker", 41, "[BoostLogError]disk full")));
+    EXPECT_EQ(Info().openID, "u5");
+    EXPECT_TRUE(Send("A100|1"));
+}
+
+TEST_F(TheMetrikMgr, ResultsAreTheSameWhenTheLoggerKeepsThrowing) {
+    for (const Throws kind : {Throws::Poco, Throws::Std, Throws::Other}) {
+        FakeLogger().throws = kind;
+        const std::string module = "A10" + std::to_string(static_cast<int>(kind));
+        EXPECT_TRUE(m_mgr.Update(InitMessage(module)));
+        EXPECT_TRUE(Send(module + "|1"));
+        EXPECT_FALSE(Send("A999|1"));
+        EXPECT_FALSE(m_mgr.Update("no JSON"));
+    }
+    EXPECT_EQ(Info().openID, "u5");
+    EXPECT_EQ(Info().suiteVersion, "5.5");
+}
+
 TEST_F(TheMetrikMgr, AnExceptionLeavesAddWorker) {
     m_sdk.initThrows = Throws::Std;
     ST_InitMsg msg;
