@@ -17,7 +17,9 @@
 #include "tests/fakes/FakeSdk.h"
 #include "tests/fakes/FakeSqlite.h"
 #include "tests/support/CapturedOutput.h"
+#include "tests/support/CaughtExceptions.h"
 #include "tests/support/OtherThread.h"
+#include "tests/support/ScriptedManager.h"
 #include "tests/support/WaitUntil.h"
 
 using namespace SyncServiceReport;
@@ -135,6 +137,11 @@ TEST_F(TheReportServer, AnExceptionInStartIsLogged) {
     ASSERT_EQ(records.size(), 1U);
     EXPECT_EQ(records[0], Record(3, "Start", 35, records[0].message));
     EXPECT_THAT(records[0].message, ::testing::MatchesRegex("Poco exception :.*thread already running.* "));
+}
+
+TEST_F(TheReportServer, StartLogsEachKindOfException) {
+    ExpectEachKindOfExceptionToBeLogged(g_managerThrows, "App/ReportServer", "Start", 35,
+                                        [this] { return m_server.Start(); });
 }
 
 TEST_F(TheReportServer, AfterAnExceptionInStartReportsAreStillStored) {
@@ -349,6 +356,14 @@ TEST_F(TheReportServer, AMissingDestinationIsLogged) {
                 ElementsAre(Record(3, "Consume", 76, "Poco exception :Null pointer "),
                             Record(3, "Consume", 76, "Poco exception :Null pointer "),
                             Record(3, "Consume", 76, "Poco exception :Null pointer ")));
+}
+
+TEST_F(TheReportServer, ConsumeLogsEachKindOfExceptionAndTakesTheNextText) {
+    Start();
+    ExpectEachKindOfExceptionToBeLogged(g_managerThrows, "App/ReportServer", "Consume", 76,
+                                        [this] { return m_server.Consume("control"); });
+    EXPECT_TRUE(m_server.Consume(R"({"eventID":"B1"})"));
+    EXPECT_EQ(RowCount(), 1U);
 }
 
 // --- base information

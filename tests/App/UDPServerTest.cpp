@@ -12,6 +12,7 @@
 #include <sys/syscall.h>
 #include <unistd.h>
 
+#include <Poco/Net/DatagramSocketImpl.h>
 #include <Poco/Net/SocketAddress.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -30,6 +31,27 @@ namespace {
 
 const std::string LOOPBACK = "127.0.0.1";
 constexpr int PORT = 9997;
+
+/// A socket that cannot be bound.
+class FailingSocket final : public Poco::Net::DatagramSocket {
+public:
+    explicit FailingSocket(Throws kind) : DatagramSocket(new Impl(kind)) {}
+
+private:
+    class Impl final : public Poco::Net::DatagramSocketImpl {
+    public:
+        explicit Impl(Throws kind) : m_throws(kind) {}
+
+        using DatagramSocketImpl::bind;
+        void bind(const SocketAddress&, bool, bool) override {
+            errno = ENOENT;
+            ThrowIf(m_throws);
+        }
+
+    private:
+        const Throws m_throws;
+    };
+};
 
 class Receiver final : public UDPServer {
 public:
@@ -70,6 +92,12 @@ public:
     /// Whether the receiving thread sleeps. The thread must have received something before.
     bool WaitsForMore() {
         return FallsAsleep(m_threadId, [] { return false; });
+    }
+
+    /// The next Start fails with this kind of exception.
+    void LetBindThrow(Throws kind) {
+        const FailingSocket socket(kind);
+        m_socket = static_cast<const Poco::Net::Socket&>(socket);
     }
 
     /// For a test that runs the loop on its own thread.
@@ -277,6 +305,18 @@ TEST_F(TheUDPServer, AnAddressThatIsNoneIsPrintedAndStartsNothing) {
     EXPECT_FALSE(m_receiver.Start("not an address", PORT));
     EXPECT_FALSE(m_receiver.IsRunning());
     EXPECT_THAT(m_output.Text(), ::testing::StartsWith("Poco exception: "));
+}
+
+TEST_F(TheUDPServer, EachKindOfExceptionInStartIsPrintedAndStartsNothing) {
+    for (const Throws kind : {Throws::Poco, Throws::Std, Throws::Other}) {
+        m_receiver.LetBindThrow(kind);
+        EXPECT_FALSE(m_receiver.Start(LOOPBACK, PORT));
+        EXPECT_FALSE(m_receiver.IsRunning());
+    }
+    EXPECT_EQ(m_output.Text(), "Poco exception: I/O error: scripted\n"
+                               "Std exception: scripted\n"
+                               "Unknown exception,eCode:2,desc:No such file or directory\n");
+    EXPECT_EQ(m_output.Flushes(), 3);
 }
 
 TEST_F(TheUDPServer, BindsAPortThatAnotherReceiverHolds) {
