@@ -30,7 +30,8 @@ std::size_t SkipString(std::string_view json, std::size_t at) {
 /// The place after the number that begins at `at`. Characters that JSON does not allow in a number are left
 /// to the parser.
 std::size_t SkipNumber(std::string_view json, std::size_t at) {
-    at = SkipDigits(json, at + (json[at] == '-' ? 1 : 0));
+    at += json[at] == '-' ? 1 : 0;
+    at = json.substr(at, 1) == "0" ? at + 1 : SkipDigits(json, at); // no digit may follow a leading zero
     if (json.substr(at, 1) == "." && IsDigit(json, at + 1))
         at = SkipDigits(json, at + 1);
     if (json.substr(at, 1) != "e" && json.substr(at, 1) != "E")

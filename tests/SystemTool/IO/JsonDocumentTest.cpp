@@ -229,6 +229,8 @@ TEST(JsonDocument, AnErrorBehindANumberThatTheParserRefusesIsToldWithItsByte) {
     EXPECT_EQ(ErrorOf("\xef\xbb\xbf[0e309,nul]"), "Invalid value. At byte 13.");
     EXPECT_EQ(ErrorOf("[0e309.5]"), ErrorOf("[0e300.5]"));
     EXPECT_NE(ErrorOf("[0e309e5]"), "");
+    EXPECT_EQ(ErrorOf("[0e309,-00000000000000000000555111512312578276]"),
+              "Missing a comma or ']' after an array element. At byte 9.");
     EXPECT_EQ(ErrorOf("[0e309,-0e0e309]"), ErrorOf("[0e300,-0e0e309]"));
     EXPECT_NE(ErrorOf("[0e309,\"0e309"), "");
     EXPECT_NE(ErrorOf("[0e309,-"), "");
