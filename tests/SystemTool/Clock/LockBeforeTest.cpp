@@ -4,6 +4,8 @@
 
 #include <gtest/gtest.h>
 
+#include "tests/support/OtherThread.h"
+
 namespace {
 
 using std::chrono::steady_clock;
@@ -17,14 +19,14 @@ TEST(LockBefore, TakesAFreeMutexAlsoWhenTheDeadlineIsOver) {
 
 TEST(LockBefore, TakesAMutexThatIsReleasedInTime) {
     std::mutex mutex;
-    std::promise<void> locked;
-    const auto owner = std::async(std::launch::async, [&] {
-        const std::lock_guard lock(mutex);
-        locked.set_value();
-        std::this_thread::sleep_for(5ms);
-    });
-    locked.get_future().wait();
-    EXPECT_TRUE(LockBefore(mutex, steady_clock::now() + 60s).owns_lock());
+    bool isLocked = false;
+    {
+        std::unique_lock kept(mutex);
+        OtherThread other([&] { isLocked = LockBefore(mutex, steady_clock::now() + 60s).owns_lock(); });
+        EXPECT_TRUE(other.Waits());
+        kept.unlock();
+    }
+    EXPECT_TRUE(isLocked);
 }
 
 TEST(LockBefore, GivesUpAtTheDeadlineWhileAnotherThreadKeepsTheMutex) {

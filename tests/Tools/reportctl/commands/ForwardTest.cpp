@@ -6,6 +6,7 @@
 #include "tests/Modules/MetrikSdk/support/LoopbackServer.h"
 #include "tests/Tools/reportctl/support/ForwardFixture.h"
 #include "tests/Tools/reportctl/support/RowsFixture.h"
+#include "tests/support/WaitUntil.h"
 
 using ::testing::EndsWith;
 using ::testing::HasSubstr;
@@ -27,6 +28,17 @@ protected:
     }
 
     void Signal(int signal) const { ::kill(std::stoi(ContentOf(Data() + "/process")), signal); }
+
+    /// Whether the process of ForwardAs has the store open.
+    bool HasStoreOpen() const {
+        std::error_code error;
+        const auto process = std::atoi(ContentOf(Data() + "/process").c_str());
+        for (const auto& file :
+             std::filesystem::directory_iterator("/proc/" + std::to_string(process) + "/fd", error))
+            if (std::filesystem::read_symlink(file, error) == Store())
+                return true;
+        return false;
+    }
 
     std::string StateFile() const { return Data() + "/hublink/forward/Forward.db"; }
 
@@ -151,13 +163,17 @@ TEST_F(ForwardCommand, WaitsForALockOnTheStore) {
     std::optional<SQLite::Database> locker(std::in_place, Store(), SQLite::OPEN_READWRITE);
     locker->exec("pragma locking_mode = exclusive");
     locker->exec("begin exclusive");
-    std::thread releases([&] { // half a second of another program's lock
-        std::this_thread::sleep_for(std::chrono::milliseconds(500));
+    bool isWaitedFor = false;
+    std::thread releases([&] {
+        constexpr int LOOKS = 20; // without the wait, the store would be closed again at once
+        int looks = 0;
+        isWaitedFor = WaitUntil([&] { return (looks = HasStoreOpen() ? looks + 1 : 0) == LOOKS; });
         locker->exec("commit");
         locker.reset();
     });
-    const auto outcome = Forward("--once", collector);
+    const auto outcome = ForwardAs("--once", collector);
     releases.join();
+    EXPECT_TRUE(isWaitedFor);
     EXPECT_EQ(outcome.exitCode, 0) << outcome.output;
     EXPECT_EQ(ArrivedAt(collector).size(), 3U);
 }
