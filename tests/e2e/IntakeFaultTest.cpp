@@ -20,8 +20,7 @@ TEST(IntakeFault, AStoppedServiceLosesWhatDoesNotFitTheSocketAndStoresTheRest) {
     }
     service.Signal(SIGCONT);
     EXPECT_TRUE(WaitUntil([&] { return service.RowCount() == sent - Service::DroppedByKernel(); }));
-    EXPECT_EQ(service.LogLines("App/ReportServer:42 Recv").size(),
-              static_cast<std::size_t>(service.RowCount()));
+    EXPECT_TRUE(service.AwaitLines("App/ReportServer:42 Recv", static_cast<std::size_t>(service.RowCount())));
     const int rows = static_cast<int>(service.RowCount());
     EXPECT_EQ(
         service.Count(service.DatabaseFile(), "select max(cast(substr(eventID, 4) as integer)) from OperLog"),

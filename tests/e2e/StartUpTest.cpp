@@ -52,8 +52,7 @@ protected:
     void ExpectAReportIsTaken() {
         const auto before = m_service.LogLines("App/ReportServer:42 Recv").size();
         Service::Send(REPORT);
-        EXPECT_TRUE(
-            WaitUntil([&] { return m_service.LogLines("App/ReportServer:42 Recv").size() > before; }));
+        EXPECT_TRUE(m_service.AwaitLines("App/ReportServer:42 Recv", before + 1));
     }
 
     Service m_service;

@@ -97,8 +97,7 @@ TEST_F(StoreFault, ALockHeldForTenSecondsCostsNothing) {
     while (std::chrono::steady_clock::now() < end) {
         const auto before = m_service.LogLines("App/ReportServer:42 Recv").size();
         m_ledger.Report(10);
-        EXPECT_TRUE(
-            WaitUntil([&] { return m_service.LogLines("App/ReportServer:42 Recv").size() == before + 10; }));
+        EXPECT_TRUE(m_service.AwaitLines("App/ReportServer:42 Recv", before + 10));
         WaitUntil([&] { return std::chrono::steady_clock::now() > end; }, 200ms); // keeps the pace
     }
     EXPECT_EQ(m_ledger.Stored(), Ledger::Range(0, 20));

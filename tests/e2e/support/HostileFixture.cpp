@@ -140,6 +140,7 @@ void HostileFixture::ExpectTheNextReportIsStored() {
                std::vector<std::string>{R"({"a":1}|1700000000000|0)"};
     };
     EXPECT_TRUE(WaitUntil(stored, STORED_WITHIN)) << m_service.RowCount() << " rows";
+    EXPECT_TRUE(WaitUntil([this] { return ReportLedger::EndedIn(m_service.Books().total) == m_sent; }));
 }
 
 void HostileFixture::ExpectSoundDatabases(std::int64_t rows, std::int64_t events) {
@@ -154,15 +155,13 @@ void HostileFixture::ExpectSoundDatabases(std::int64_t rows, std::int64_t events
 
 void HostileFixture::ExpectOneLineForEachRecord() {
     EXPECT_EQ(Service::DroppedByKernel(), 0);
-    std::size_t received = 0;
+    EXPECT_TRUE(m_service.AwaitLines("App/ReportServer:42 Recv", m_sent));
     const auto threads = WhatIsThere().threads;
     for (const auto& line : m_service.LogLines()) { // LogLines throws for a line that is no record
         ASSERT_TRUE(SITE.match(line.site)) << line.site;
         ASSERT_EQ(line.process, m_service.Process());
         ASSERT_TRUE(std::find(threads.begin(), threads.end(), line.thread) != threads.end()) << line.thread;
-        received += line.site == "App/ReportServer:42 Recv" ? 1 : 0;
     }
-    EXPECT_EQ(received, m_sent);
     std::ifstream log(m_service.LogFile(), std::ios::binary);
     for (std::string line; std::getline(log, line);)
         ASSERT_EQ(DANGEROUS.match(line, 0), false) << line;

@@ -192,7 +192,9 @@ void Service::AwaitQuiet() {
     const auto stored = [&] {
         return Count(DatabaseFile(), "select count(*) from OperLog where eventID='" + marker + "'") == 1;
     };
-    if (!WaitUntil(stored, std::chrono::seconds(60)))
+    // A report is counted a moment after its row can be seen. Without a ledger, there is nothing to wait for.
+    const auto counted = [&] { return ReportLedger::WaitingIn(Books().total) == 0; };
+    if (!WaitUntil([&] { return stored() && counted(); }, std::chrono::seconds(60)))
         throw std::runtime_error("a report was not stored in time; the log: " + Log().substr(0, 4000));
     SQLite::Database database(DatabaseFile(), SQLite::OPEN_READWRITE, 10'000);
     database.exec("delete from OperLog where eventID='" + marker + "'");
@@ -227,6 +229,13 @@ std::vector<Service::Line> Service::LogLines(const std::string& site) const {
     auto lines = LogLines();
     std::erase_if(lines, [&site](const Line& line) { return line.site != site; });
     return lines;
+}
+
+::testing::AssertionResult Service::AwaitLines(const std::string& site, std::size_t count) const {
+    if (WaitUntil([&] { return LogLines(site).size() == count; }))
+        return ::testing::AssertionSuccess();
+    return ::testing::AssertionFailure()
+           << LogLines(site).size() << " lines of " << site << " instead of " << count;
 }
 
 std::vector<std::string> Service::Query(const std::string& file, const std::string& sql) const {

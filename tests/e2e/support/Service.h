@@ -8,6 +8,8 @@
 
 #include <sys/types.h>
 
+#include <gtest/gtest.h>
+
 #include "Ledger/Reader.h"
 #include "tests/support/TemporaryDirectory.h"
 
@@ -81,7 +83,8 @@ public:
     /// suite.
     static void Send(const std::string& text);
 
-    /// Sends a report and waits until it is stored. Everything that was sent before has then been handled.
+    /// Sends a report and waits until it is stored. Everything that was sent before has then been handled and
+    /// counted.
     void AwaitQuiet();
 
     const std::string& DataDirectory() const { return m_data.Path(); }
@@ -99,6 +102,10 @@ public:
 
     /// The lines of one site, such as "App/ReportServer:42 Recv".
     std::vector<Line> LogLines(const std::string& site) const;
+
+    /// Waits until the log has exactly this many lines of one site. In a burst, a line may be written a
+    /// little later than what it tells happens, so that a test that counts them right away may see too few.
+    ::testing::AssertionResult AwaitLines(const std::string& site, std::size_t count) const;
 
     /// The rows of a query, columns joined by a bar; empty when there is no such file or table yet.
     std::vector<std::string> Query(const std::string& file, const std::string& sql) const;
