@@ -33,16 +33,25 @@ struct JsonDocument::Tree {
     static constexpr std::size_t ROOM_BYTES = 768;
     static constexpr std::size_t CHUNK_BYTES = 4096; ///< How much is allocated at once when `room` is full.
 
+    std::size_t documents = 0; ///< How many share this tree.
     alignas(std::max_align_t) char room[ROOM_BYTES];
     JsonPool allocator{room, sizeof room, CHUNK_BYTES};
     JsonTree document{&allocator};
 };
 
-JsonDocument::JsonDocument(std::shared_ptr<Tree> tree, const Value* value)
-    : m_tree(std::move(tree)), m_value(value) {}
+void intrusive_ptr_add_ref(JsonDocument::Tree* tree) noexcept {
+    ++tree->documents;
+}
+
+void intrusive_ptr_release(JsonDocument::Tree* tree) noexcept {
+    if (--tree->documents == 0)
+        delete tree;
+}
+
+JsonDocument::JsonDocument(TreePointer tree, const Value* value) : m_tree(std::move(tree)), m_value(value) {}
 
 JsonDocument JsonDocument::FromJson(const std::string& text, std::string& error) {
-    auto tree = std::make_shared<Tree>();
+    const TreePointer tree(new Tree);
     error = ReadJson(text, tree->document);
     *this = error.empty() ? JsonDocument(tree, &tree->document) : JsonDocument();
     return *this;
@@ -61,9 +70,9 @@ JsonDocument::Value& JsonDocument::Editable() {
     if (m_value != nullptr && !m_value->IsNull() && !m_value->IsObject())
         throw std::logic_error("A member cannot be set in a JSON value that is no object: " +
                                ToJson().substr(0, 100));
-    const bool alone = m_tree.use_count() == 1 && m_value == &m_tree->document;
+    const bool alone = m_tree && m_tree->documents == 1 && m_value == &m_tree->document;
     if (!alone) {
-        auto own = std::make_shared<Tree>();
+        TreePointer own(new Tree);
         if (m_value != nullptr) {
             JsonCopy copy{*m_value};
             own->document.Populate(copy);
