@@ -12,6 +12,7 @@ import output
 import plan
 import progress
 import subjects
+from subject import Subject
 
 
 def arguments():
@@ -28,6 +29,7 @@ def arguments():
 
 def measured(options):
     chosen = plan.QUICK if options.quick else plan.FULL
+    Subject.syncs_disk = chosen.syncs_disk
     steps = list(measures.steps(chosen, options.only, options.of))
     if not subjects.Daemon.is_installed():
         print("syslog-ng is left out; bench/run --install installs it.\n")

@@ -22,6 +22,7 @@ class Plan:
     rest_seconds: float = 10
     repetitions: int = 5         # of the benchmarks of single parts; the smallest result counts
     repetition_seconds: float = 0.5
+    syncs_disk: bool = True      # before each run; it takes long while other programs write
 
 
 FULL = Plan()
@@ -30,4 +31,4 @@ QUICK = Plan(flood_reports=50_000, probe_seconds=0.5, probes=3, tries=1, confirm
              searched=("service", "daemon"), latency_seconds=1, latency_rates=(10, 20_000),
              baselines=(("1", 2_000), ("1000", 50_000), ("1000 prepared", 50_000)), rows_before=(0, 50_000),
              growth_reports=50_000, growth_rounds=1, queued_reports=30_000, rest_seconds=1, repetitions=1,
-             repetition_seconds=0.02)
+             repetition_seconds=0.02, syncs_disk=False)

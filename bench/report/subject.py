@@ -20,6 +20,7 @@ class Subject:
     title = ""
     event = "B100|10001"
     process = None       # until it is started
+    syncs_disk = True    # before each run: writes what this and earlier runs left, so that the measured run does not
     longest_pause = 1.0  # in seconds: the longest time without progress while there is work
     watch = "select id, createTime from OperLog where id > ?1 order by id"  # the new rows, for the watcher
 
@@ -27,7 +28,8 @@ class Subject:
         self.directory = pathlib.Path(tempfile.mkdtemp(prefix="bench.", dir=ROOT / "build"))
         try:
             self.prepare()
-            os.sync()  # writes what this and earlier runs left, so that the measured run does not
+            if self.syncs_disk:
+                os.sync()
             self.start()
         except BaseException:
             if self.process:
