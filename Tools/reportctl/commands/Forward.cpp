@@ -100,7 +100,7 @@ int Plan(const Collector& collector, const ForwardOptions& options) {
         PrintPlan(plan, collector);
     else
         TellPlan(plan, collector, options);
-    std::fflush(stdout); // before a line on standard error
+    terminal::FlushOutput();
     const auto missing = MissingIn(collector, options);
     if (!missing.empty())
         terminal::TellLastError(missing);
@@ -119,7 +119,7 @@ void TellResult(const forward::Result& result, const Collector& collector, bool 
         fmt::print(
             "{} held, which the collector does not take while it takes others. Each run tries again.\n",
             Rows(result.totals.held));
-    std::fflush(stdout); // before a line on standard error
+    terminal::FlushOutput();
     if (!result.isComplete)
         terminal::TellLastError("not everything was sent; the next run goes on where this one ended");
     if (!result.metricsFailure.empty())

@@ -9,6 +9,7 @@
 #include "Tools/reportctl/forward/Metrics.h"
 #include "Tools/reportctl/forward/StopSignals.h"
 #include "Tools/reportctl/status/Status.h"
+#include "Tools/reportctl/store/Store.h"
 
 namespace reportctl::forward {
 namespace {
@@ -144,6 +145,8 @@ MetrikSdk::OutboxSettings SettingsFor(const Task& task, const Collector& collect
 }
 
 Plan PlanRun(const Task& task) {
+    store::RequireStore(
+        task.store); // what it says is more use than what the state says of the same directory
     const auto place = State::LookAt(task.state);
     const StoreReader reader(task.store, MetrikSdk::CapSettings().maxEventBytes);
     return {reader.Ahead(place), place.position != Place::BEGINNING};

@@ -113,8 +113,12 @@ void State::Open(const std::string& path, const std::string& outbox) {
 }
 
 Place State::LookAt(const std::string& path) {
-    if (!std::filesystem::exists(path) || std::filesystem::file_size(path) == 0)
+    std::error_code error;
+    const auto size = std::filesystem::file_size(path, error);
+    if (error == std::errc::no_such_file_or_directory || (!error && size == 0))
         return {};
+    if (error)
+        throw std::system_error(error, "cannot look at " + path);
     return store::Naming(path, [&] {
         auto database = store::OpenUnchanged(path);
         RequireOurs(database, path);

@@ -15,6 +15,7 @@
 #include "Tools/reportctl/send/Judgement.h"
 #include "Tools/reportctl/send/LineReader.h"
 #include "Tools/reportctl/send/Sender.h"
+#include "Tools/reportctl/terminal/Output.h"
 #include "Tools/reportctl/terminal/ShellQuoted.h"
 
 namespace reportctl::send {
@@ -26,7 +27,7 @@ constexpr auto BLANK = " \t\r\n";
 using Origin = std::string;
 
 void TellError(const Origin& origin, const std::string& text) {
-    std::fflush(stdout); // keeps the order when standard output and standard error go to the same place
+    terminal::FlushOutput();
     fmt::print(stderr, "error: {}{}\n", origin, text);
 }
 
@@ -35,7 +36,7 @@ void TellNobodyListens(const Origin& origin) {
 }
 
 void TellWarning(const Origin& origin, const std::string& text) {
-    std::fflush(stdout);
+    terminal::FlushOutput();
     fmt::print(stderr, "warning: {}{}\n", origin, text);
 }
 
@@ -135,7 +136,7 @@ public:
 
     /// Prints the summary and returns the exit code.
     int Close() const {
-        std::fflush(stdout);
+        terminal::FlushOutput();
         fmt::print(m_settings.dryRun ? stderr : stdout, "{} {} ({}){}{}\n",
                    m_settings.dryRun ? "dry run: would send" : "sent", Count(m_sent, "message"),
                    Count(m_bytes, "byte"),
@@ -187,7 +188,7 @@ int DeliverOne(const std::string& text, const DeliverySettings& settings) {
     }
     if (settings.dryRun) {
         PrintText(text);
-        std::fflush(stdout);
+        terminal::FlushOutput();
         fmt::print(stderr, "dry run: would send {} ({})\n", judgement.what, Count(text.size(), "byte"));
         return 0;
     }

@@ -6,17 +6,26 @@
 #include "SystemTool/Errno.h"
 
 namespace reportctl::terminal {
+namespace {
+
+int g_flushError = 0; ///< The errno of the first flush that failed, which the stream itself does not keep.
+
+} // namespace
+
+void FlushOutput() {
+    if (std::fflush(stdout) != 0 && g_flushError == 0)
+        g_flushError = errno;
+}
 
 int FinishOutput(int exitCode) {
     const bool wasWritten = std::ferror(stdout) == 0;
-    errno = 0;
-    // This also writes what was printed with std::cout (the help), which has no buffer of its own.
-    if (std::fflush(stdout) == 0 && wasWritten)
+    FlushOutput(); // also writes what was printed with std::cout (the help), which has no buffer of its own
+    if (wasWritten && g_flushError == 0)
         return exitCode;
-    if (errno == EPIPE)
+    if (g_flushError == EPIPE)
         return exitCode; // the reader closed the pipe because it has read enough
     TellLastError("cannot write to standard output" +
-                  (errno == 0 ? std::string() : ": " + SystemTool::ErrnoText(errno)));
+                  (g_flushError == 0 ? std::string() : ": " + SystemTool::ErrnoText(g_flushError)));
     return exitCode == 0 ? 1 : exitCode;
 }
 

@@ -4,6 +4,10 @@
 
 namespace reportctl::terminal {
 
+/// Writes out what standard output has in its buffer. Call it before a line on standard error, so that the
+/// two keep their order when they go to the same place. A failure is told by FinishOutput.
+void FlushOutput();
+
 /// Writes out what standard output still has in its buffer. Call it at the program's end. Returns `exitCode`.
 /// When some of the output could not be written, it prints a line on standard error and returns 1 in place of
 /// 0: with a full disk, a script must not take half of an output for the whole. When the reader closed the

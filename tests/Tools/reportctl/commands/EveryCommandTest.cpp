@@ -41,6 +41,8 @@ const std::vector<Command> LOOK{
     {"prune --keep-rows 1", Needs::Store},
     {"outbox list", Needs::Outbox},
     {"outbox list --json", Needs::Outbox},
+    {"forward --dry-run", Needs::Store},
+    {"forward --dry-run --json", Needs::Store},
     {"status", Needs::Nothing, 2},
     {"status --json", Needs::Nothing, 2},
     {"metrics"},
@@ -89,6 +91,10 @@ bool HasControlCharacter(const std::string& text) {
 
 class EveryCommand : public ServiceFilesFixture {
 protected:
+    /// A collector, for the commands that need one. Nobody listens there.
+    EveryCommand() { ::setenv("OTEL_EXPORTER_OTLP_ENDPOINT", "http://127.0.0.1:1", 1); }
+    ~EveryCommand() override { ::unsetenv("OTEL_EXPORTER_OTLP_ENDPOINT"); }
+
     std::string File() const { return Data() + "/written"; }
 
     /// The path of what the command needs; empty for a command that needs nothing.

@@ -4,6 +4,7 @@
 #include <gmock/gmock.h>
 
 #include "tests/Modules/MetrikSdk/support/LoopbackServer.h"
+#include "tests/Modules/MetrikSdk/support/SmallDisk.h"
 #include "tests/Tools/reportctl/support/ForwardFixture.h"
 #include "tests/Tools/reportctl/support/RowsFixture.h"
 #include "tests/support/WaitUntil.h"
@@ -175,6 +176,45 @@ TEST_F(ForwardCommand, WaitsForALockOnTheStore) {
     releases.join();
     EXPECT_TRUE(isWaitedFor);
     EXPECT_EQ(outcome.exitCode, 0) << outcome.output;
+    EXPECT_EQ(ArrivedAt(collector).size(), 3U);
+}
+
+TEST_F(ForwardCommand, LosesNothingWhileTheDiskIsFullForItsOwnFile) {
+    InsertMany(700);
+    const auto directory = Data() + "/hublink/forward";
+    std::filesystem::create_directory(directory);
+    const LoopbackServer collector(Take);
+    const auto result = RunOnSmallDisk(directory, 1 << 20, [&] {
+        const auto filler = directory + "/filler";
+        const auto forwardOnAFullDisk = [&] {
+            std::ofstream(filler) << std::string(2 << 20, 'x');
+            const auto outcome = Forward("--once", collector);
+            EXPECT_EQ(outcome.exitCode, 1);
+            EXPECT_THAT(outcome.output, EndsWith("error: " + StateFile() + ": database or disk is full\n"));
+            std::filesystem::remove(filler);
+        };
+        forwardOnAFullDisk();
+        EXPECT_TRUE(Forward("--once", collector).Says("700 rows sent"));
+        Insert("'B1|new'", "'x'", "'1700000000123'");
+        forwardOnAFullDisk();
+        EXPECT_TRUE(Forward("--once", collector).Says("1 row sent")) << "what was not noted is sent again";
+        EXPECT_TRUE(Forward("--once", collector).Says("0 rows sent"));
+    });
+    if (result == SmallDiskResult::Unavailable)
+        GTEST_SKIP() << "this machine does not allow mounting";
+    EXPECT_EQ(result, SmallDiskResult::Passed);
+    EXPECT_EQ(collector.RequestCount(), 4U) << "700 rows are two; the new one was sent twice";
+    const auto arrived = ArrivedAt(collector);
+    EXPECT_EQ(arrived.size(), 701U);
+    for (const auto& [row, uids] : arrived)
+        EXPECT_EQ(uids.size(), 1U) << "a repetition has its old uid: row " << row;
+}
+
+TEST_F(ForwardCommand, NotesWhatWasTakenThoughNobodyReadsItsResult) {
+    InsertMany(3);
+    const LoopbackServer collector(Take);
+    EXPECT_NE(Forward("--once >/dev/full", collector).exitCode, 0);
+    EXPECT_TRUE(Forward("--once", collector).Says("0 rows sent"));
     EXPECT_EQ(ArrivedAt(collector).size(), 3U);
 }
 
