@@ -92,8 +92,8 @@ std::vector<Kind> Kinds() {
     const auto nothing = [](const ReportServer&) { return std::size_t{0}; };
     return {
         {"Row",
-         always(
-             R"({"eventID":"B100|10001","value":"a text of more than sixteen bytes","createTime":1700000000})"),
+         always(R"({"eventID":"B100|10001","value":"a text of more than sixteen bytes",)"
+                R"("createTime":1700000000})"),
          rows},
         {"RowWithAnObject", always(R"({"eventID":"B1","value":{"a":[1,2.5,null,{"b":"c"}],"t":"ü"}})"), rows},
         {"RowWithAnArrayOfTwoThousand", always(R"({"eventID":"B1","value":)" + ArrayOfTwoThousand() + "}"),

@@ -81,8 +81,8 @@ private:
     using Value =
         rapidjson::GenericValue<rapidjson::UTF8<char>, rapidjson::MemoryPoolAllocator<JsonAllocator>>;
     struct Tree;
-    /// Counts the documents that share a tree, without atomic operations: these took a ninth of the time for a
-    /// usual report, and only one thread at a time may use the documents anyway.
+    /// Counts the documents that share a tree, without atomic operations: these took a ninth of the time for
+    /// a usual report, and only one thread at a time may use the documents anyway.
     using TreePointer = boost::intrusive_ptr<Tree>;
     friend void intrusive_ptr_add_ref(Tree* tree) noexcept;
     friend void intrusive_ptr_release(Tree* tree) noexcept;

@@ -107,8 +107,8 @@ void AddRules(CLI::App& app, MetrikSdk::OutboxSettings& settings) {
         ->group("Rules");
 }
 
-/// Without a capacity, desktops are independent of each other. Fewer of them at once fit the processor's cache,
-/// and then the simulation is faster.
+/// Without a capacity, desktops are independent of each other. Fewer of them at once fit the processor's
+/// cache, and then the simulation is faster.
 unsigned DesktopsOfACollector(const Config& config) {
     return config.capacity > 0 || config.returnCapacity > 0 ? 50'000 : 5'000;
 }

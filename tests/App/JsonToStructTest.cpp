@@ -41,8 +41,8 @@ protected:
 } // namespace
 
 TEST_F(TheJsonToStruct, ConvertsAReport) {
-    const ST_OptLog log = Converted(
-        R"({"eventID":"A100|10001","value":{"k": "v"},"createTime":1700000000,"isDayReport":0,"other":"ignored"})");
+    const ST_OptLog log = Converted(R"({"eventID":"A100|10001","value":{"k": "v"},"createTime":1700000000,)"
+                                    R"("isDayReport":0,"other":"ignored"})");
     EXPECT_EQ(log.nReserved, 0);
     EXPECT_EQ(log.eventID, "A100|10001");
     EXPECT_EQ(log.value, R"({"k":"v"})");

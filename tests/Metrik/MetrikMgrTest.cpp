@@ -113,8 +113,8 @@ TEST_F(TheMetrikMgr, ARepeatedInitChangesNoWorkerButUserAndVersion) {
     Init();
     EXPECT_TRUE(m_mgr.Update(InitMessage("A100")));
     FakeLogger().Clear();
-    EXPECT_TRUE(m_mgr.Update(
-        R"({"msgType":"init","exdata":{"moduleID":"A100","moduleName":"Other","openID":"u6","hublinkVersion":"6"}})"));
+    EXPECT_TRUE(m_mgr.Update(R"({"msgType":"init","exdata":{"moduleID":"A100","moduleName":"Other",)"
+                             R"("openID":"u6","hublinkVersion":"6"}})"));
     EXPECT_THAT(Started(), ElementsAre("A759", "A100"));
     EXPECT_THAT(FakeLogger().RecordsOf("AddWorker"), IsEmpty());
     EXPECT_EQ(Info().openID, "u6");

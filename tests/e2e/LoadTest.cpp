@@ -48,7 +48,8 @@ std::string Report(int i) {
     if (IsBroken(i))
         return R"({"eventID":)" + number + "|";
     return R"({"eventID":")" + std::string(IsEvent(i) ? "A759|" : "B1|") + number +
-           R"(","value":{"button":"save","page":"editor","count":3,"text":"as people write it"},"createTime":1700000000})";
+           R"(","value":{"button":"save","page":"editor","count":3,"text":"as people write it"},)"
+           R"("createTime":1700000000})";
 }
 
 /// Sends the reports at RATE, and calls `look` after every thousand.

@@ -62,8 +62,8 @@ protected:
     /// Expects that the log says once how many records are missing, that this number is right, and that no
     /// more are missing.
     void ExpectOneGap(const std::string& reason) {
-        const Poco::RegularExpression form(
-            R"(WARN  \[\d+:\d+\] \[Modules/BoostLogger:\d+ ReportLoss\] (\d+) records could not be written: (.*))");
+        const Poco::RegularExpression form(R"(WARN  \[\d+:\d+\] \[Modules/BoostLogger:\d+ ReportLoss\] )"
+                                           R"((\d+) records could not be written: (.*))");
         std::vector<std::string> gap;
         ASSERT_EQ(form.split(m_service.Log(), gap), 3);
         EXPECT_THAT(gap[2], MatchesRegex(reason));

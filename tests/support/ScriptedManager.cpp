@@ -7,7 +7,8 @@ using SyncServiceReport::MetrikMgr;
 Throws g_managerThrows = Throws::Nothing;
 
 // The linker redirects the calls of MetrikMgr::Init and MetrikMgr::Update to the functions below (its option
-// --wrap). The real ones catch nearly all exceptions, so a test could not see what their caller does with one.
+// --wrap). The real ones catch nearly all exceptions, so a test could not see what their caller does with
+// one.
 #define INIT "_ZN17SyncServiceReport9MetrikMgr4InitEv"
 #define UPDATE                                                                                               \
     "_ZN17SyncServiceReport9MetrikMgr6UpdateERKNSt7__cxx1112basic_stringIcSt11char_traitsIcESaIcEEE"

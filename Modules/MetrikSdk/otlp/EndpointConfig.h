@@ -25,8 +25,8 @@ struct EndpointConfig {
 /// What is sent. Each has variables of its own, which win over the common ones, and a path of its own.
 enum class Signal { Logs, Metrics };
 
-/// What the environment asks for. Nothing when nothing is to be sent: no endpoint is set, OTEL_SDK_DISABLED is
-/// true, or OTEL_LOGS_EXPORTER, for metrics OTEL_METRICS_EXPORTER, is none.
+/// What the environment asks for. Nothing when nothing is to be sent: no endpoint is set, OTEL_SDK_DISABLED
+/// is true, or OTEL_LOGS_EXPORTER, for metrics OTEL_METRICS_EXPORTER, is none.
 ///
 /// A variable that makes no sense is described in `complaints` and counts as unset, so that the common
 /// variable of its pair is used. Of a list of headers, only the wrong header is left out. A variable that is

@@ -34,8 +34,8 @@ namespace fs = std::filesystem;
 constexpr std::size_t LOG_LINES = 2000;
 
 /// Runs another command of this program and returns what it prints. The command has a process of its own, so
-/// that its failure affects only its own part of the bundle. It prints into a pipe, so it breaks no line, and the
-/// redaction finds a statement on the line where it begins.
+/// that its failure affects only its own part of the bundle. It prints into a pipe, so it breaks no line, and
+/// the redaction finds a statement on the line where it begins.
 std::string OutputOf(const std::string& command) {
     const auto program = SystemTool::IO::Directory::GetExcutableDirectory() + "reportctl";
     const auto line = fmt::format("{} {} 2>&1", terminal::ShellQuoted(program), command);

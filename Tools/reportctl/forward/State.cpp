@@ -28,7 +28,8 @@ namespace {
 constexpr int APPLICATION_ID = 0x4d465744;
 constexpr int SCHEMA_VERSION = 1;
 
-/// Only this process writes; a person may look with sqlite3 meanwhile. What could not be written is kept in mind.
+/// Only this process writes; a person may look with sqlite3 meanwhile. What could not be written is kept in
+/// memory.
 constexpr int BUSY_TIMEOUT_MS = 1000;
 
 /// Of the rows that were sent last. More of them find a place in an older copy of the store.

@@ -20,8 +20,9 @@ constexpr auto WITH_UUID = "select id from dead_letter where uuid = ?1";
 /// of storing are new, because the event is stored again.
 constexpr auto PUT_BACK = R"sql(
 insert into event(uuid, module, release, sequence, event_id, payload, stored_ms, bytes)
-    select d.uuid, d.module, d.release, m.last_sequence + row_number() over (partition by d.module order by d.id),
-           d.event_id, d.payload, cast((julianday('now') - 2440587.5) * 86400000 as integer), d.bytes
+    select d.uuid, d.module, d.release,
+           m.last_sequence + row_number() over (partition by d.module order by d.id), d.event_id,
+           d.payload, cast((julianday('now') - 2440587.5) * 86400000 as integer), d.bytes
     from dead_letter as d join module as m on m.id = d.module where d.id in ({}) order by d.id)sql";
 
 template <typename Argument>

@@ -17,10 +17,10 @@ std::string Redacted(const std::string& siteAndMessage) {
 }
 
 TEST(BundleRedaction, LeavesOfAReportWhatTellsNothingOfAPerson) {
-    EXPECT_EQ(
-        Redacted(
-            R"([App/ReportServer:42 Recv] {"eventID":"B1|1","value":"secret","createTime":1700000000,"x":"secret"})"),
-        R"([App/ReportServer:42 Recv] {"eventID":"B1|1","value":"[value, 6 bytes]","createTime":"1700000000000"})");
+    EXPECT_EQ(Redacted(R"([App/ReportServer:42 Recv] {"eventID":"B1|1","value":"secret",)"
+                       R"("createTime":1700000000,"x":"secret"})"),
+              R"([App/ReportServer:42 Recv] {"eventID":"B1|1","value":"[value, 6 bytes]",)"
+              R"("createTime":"1700000000000"})");
 }
 
 TEST(BundleRedaction, LeavesOfAControlMessageTheModule) {

@@ -44,14 +44,15 @@ TEST_F(OutboxCommand, ListsWhatWaitsAndWhatWasRefused) {
 }
 
 TEST_F(OutboxCommand, ListsAsJson) {
-    EXPECT_EQ(
-        Reportctl("outbox list --dead --json", "TZ=UTC").output,
-        R"([{"id":"u-1","module":"A100","sequence":1,"eventID":"A100|1","storedAt":"2023-11-14T22:13:20.000+00:00",)"
-        R"("bytes":100,"state":"dead","status":400,"reason":"too odd"},)"
-        "\n"
-        R"({"id":"u-2","module":"A100","sequence":2,"eventID":"A100|2","storedAt":"2023-11-14T22:13:20.000+00:00",)"
-        R"("bytes":100,"state":"dead","status":413,"reason":"\u001B[31mred"}])"
-        "\n");
+    EXPECT_EQ(Reportctl("outbox list --dead --json", "TZ=UTC").output,
+              R"([{"id":"u-1","module":"A100","sequence":1,"eventID":"A100|1",)"
+              R"("storedAt":"2023-11-14T22:13:20.000+00:00","bytes":100,)"
+              R"("state":"dead","status":400,"reason":"too odd"},)"
+              "\n"
+              R"({"id":"u-2","module":"A100","sequence":2,"eventID":"A100|2",)"
+              R"("storedAt":"2023-11-14T22:13:20.000+00:00","bytes":100,)"
+              R"("state":"dead","status":413,"reason":"\u001B[31mred"}])"
+              "\n");
     Reportctl("outbox purge --dead");
     EXPECT_EQ(Reportctl("outbox list --dead --json").output, "[]\n");
 }

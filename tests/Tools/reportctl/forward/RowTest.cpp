@@ -112,25 +112,25 @@ TEST(StoreRow, WithHostileContentsIsStillARecord) {
 }
 
 TEST(StoreRow, BecomesTheRecordThatTheDocumentShows) {
-    EXPECT_EQ(
-        RecordOf(Sample()),
-        R"({"timeUnixNano":"1700000000123000000","observedTimeUnixNano":"1800000000007000000",)"
-        R"("severityNumber":9,"severityText":"INFO","eventName":"B100|10001",)"
-        R"("body":{"kvlistValue":{"values":[{"key":"extend","value":{"kvlistValue":{"values":[)"
-        R"({"key":"hublinkVersion","value":{"stringValue":"5.1.0.2"}},)"
-        R"({"key":"createTime","value":{"stringValue":"1700000000123"}}]}}},)"
-        R"({"key":"eventData","value":{"kvlistValue":{"values":[)"
-        R"({"key":"value","value":{"stringValue":"opened the door"}},)"
-        R"({"key":"openid","value":{"stringValue":"u1"}}]}}}]}},)"
-        R"("attributes":[{"key":"log.record.uid","value":{"stringValue":"74f5d7b0-ca28-5749-a90b-f0c1fbc5f2a1"}},)"
-        R"({"key":"hublink.source","value":{"stringValue":"store"}},)"
-        R"({"key":"hublink.row","value":{"intValue":"7"}},)"
-        R"({"key":"metrik.module","value":{"stringValue":"B100"}},)"
-        R"({"key":"metrik.event","value":{"stringValue":"B100|10001"}},)"
-        R"({"key":"user.id","value":{"stringValue":"u1"}},)"
-        R"({"key":"hublink.version","value":{"stringValue":"5.1.0.2"}},)"
-        R"({"key":"metrik.data.value","value":{"stringValue":"opened the door"}},)"
-        R"({"key":"metrik.data.openid","value":{"stringValue":"u1"}}]})");
+    EXPECT_EQ(RecordOf(Sample()),
+              R"({"timeUnixNano":"1700000000123000000","observedTimeUnixNano":"1800000000007000000",)"
+              R"("severityNumber":9,"severityText":"INFO","eventName":"B100|10001",)"
+              R"("body":{"kvlistValue":{"values":[{"key":"extend","value":{"kvlistValue":{"values":[)"
+              R"({"key":"hublinkVersion","value":{"stringValue":"5.1.0.2"}},)"
+              R"({"key":"createTime","value":{"stringValue":"1700000000123"}}]}}},)"
+              R"({"key":"eventData","value":{"kvlistValue":{"values":[)"
+              R"({"key":"value","value":{"stringValue":"opened the door"}},)"
+              R"({"key":"openid","value":{"stringValue":"u1"}}]}}}]}},)"
+              R"("attributes":[{"key":"log.record.uid",)"
+              R"("value":{"stringValue":"74f5d7b0-ca28-5749-a90b-f0c1fbc5f2a1"}},)"
+              R"({"key":"hublink.source","value":{"stringValue":"store"}},)"
+              R"({"key":"hublink.row","value":{"intValue":"7"}},)"
+              R"({"key":"metrik.module","value":{"stringValue":"B100"}},)"
+              R"({"key":"metrik.event","value":{"stringValue":"B100|10001"}},)"
+              R"({"key":"user.id","value":{"stringValue":"u1"}},)"
+              R"({"key":"hublink.version","value":{"stringValue":"5.1.0.2"}},)"
+              R"({"key":"metrik.data.value","value":{"stringValue":"opened the door"}},)"
+              R"({"key":"metrik.data.openid","value":{"stringValue":"u1"}}]})");
 }
 
 TEST(StoreRow, WithoutATimeHasTheTimeAtWhichItWasObserved) {

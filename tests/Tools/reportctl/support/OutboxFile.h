@@ -22,9 +22,10 @@ inline void MakeOutbox(const std::string& path) {
         update module set last_sequence = 2, stored_bytes = 200;
         insert into event(uuid, module, release, sequence, event_id, payload, stored_ms, bytes)
             values('u-3', 1, 1, 3, 'A100|3', '{}', 1700000000000, 100);
-        insert into dead_letter(uuid, module, release, sequence, event_id, payload, stored_ms, bytes, refused_ms,
-                status, reason)
+        insert into dead_letter(uuid, module, release, sequence, event_id, payload, stored_ms, bytes,
+                refused_ms, status, reason)
             values('u-1', 1, 1, 1, 'A100|1', '{"a":1}', 1700000000000, 100, 1700000001000, 400, 'too odd'),
-                  ('u-2', 1, 1, 2, 'A100|2', '{}', 1700000000000, 100, 1700000001000, 413, char(27) || '[31mred');
+                  ('u-2', 1, 1, 2, 'A100|2', '{}', 1700000000000, 100, 1700000001000, 413,
+                   char(27) || '[31mred');
     )sql");
 }
