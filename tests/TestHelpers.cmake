@@ -21,14 +21,15 @@ function(ssr_precompile_test_headers program)
     if(count LESS 3)
         return()
     endif()
-    target_precompile_headers(${program} PRIVATE <chrono> <filesystem> <fstream> <functional> <map> <optional> <string>
-        <thread> <vector> <gmock/gmock.h> <gtest/gtest.h>)
+    target_precompile_headers(${program} PRIVATE
+        <chrono> <filesystem> <fstream> <functional> <map> <optional> <string> <thread> <vector>
+        <gmock/gmock.h> <gtest/gtest.h>)
     if(CMAKE_CXX_COMPILER_ID STREQUAL "GNU")
         # Without -fpch-preprocess, ccache does not cache such a file. With a precompiled header, GCC 12
         # wrongly reports some inlined copies of std::string as reads and writes out of bounds. The sources
         # that ship keep these warnings.
-        target_compile_options(${program} PRIVATE -fpch-preprocess -Wno-array-bounds -Wno-restrict -Wno-stringop-overflow
-            -Wno-stringop-overread)
+        target_compile_options(${program} PRIVATE
+            -fpch-preprocess -Wno-array-bounds -Wno-restrict -Wno-stringop-overflow -Wno-stringop-overread)
     endif()
 endfunction()
 
