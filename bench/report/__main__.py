@@ -1,5 +1,5 @@
-"""Measures the service from end to end beside its bounds and another daemon. Prints the report as Markdown, and leaves
-it as JSON, with a chart, in build/bench/."""
+"""Measures the service from end to end beside its bounds and another daemon. Prints the report as Markdown,
+and leaves it as JSON, with a chart, in build/bench/."""
 import argparse
 import json
 import pathlib
@@ -18,11 +18,16 @@ from subject import Subject
 def arguments():
     parser = argparse.ArgumentParser(prog="bench/run", description=__doc__)
     parser.add_argument("--quick", action="store_true", help="in about a minute, for a look")
-    parser.add_argument("--only", action="append", choices=measures.MEASURES, help="this measure; may be repeated")
-    parser.add_argument("--of", action="append", choices=[*measures.SUBJECTS, "sqlite"], help="of this one only")
-    parser.add_argument("--update-docs", action="store_true", help="write the figures into docs/Performance.md")
-    parser.add_argument("--from", dest="file", type=pathlib.Path, help="measure nothing: the report of this JSON file")
-    parser.add_argument("--install", action="store_true", help="first install the packages of the other daemon, which "
+    parser.add_argument("--only", action="append", choices=measures.MEASURES,
+                        help="this measure; may be repeated")
+    parser.add_argument("--of", action="append", choices=[*measures.SUBJECTS, "sqlite"],
+                        help="of this one only")
+    parser.add_argument("--update-docs", action="store_true",
+                        help="write the figures into docs/Performance.md")
+    parser.add_argument("--from", dest="file", type=pathlib.Path,
+                        help="measure nothing: the report of this JSON file")
+    parser.add_argument("--install", action="store_true",
+                        help="first install the packages of the other daemon, which "
                         "Debian then also runs as the system's log daemon; bench/run leaves that one alone")
     return parser.parse_args()
 

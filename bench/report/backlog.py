@@ -1,5 +1,6 @@
-"""Reports that wait in the queue while another program holds the store's write lock, and what happens when it lets go:
-the one way to fill the queue of the real program, and to see its consuming thread work without sender and receiver."""
+"""Reports that wait in the queue while another program holds the store's write lock, and what happens when it
+lets go: the one way to fill the queue of the real program, and to see its consuming thread work without
+sender and receiver."""
 import sqlite3
 import time
 
@@ -28,8 +29,9 @@ def measure(subject_class, reports):
         held = procfs.memory_bytes(pid, "VmRSS") - before
         received = procfs.udp_counters()["InDatagrams"] - udp["InDatagrams"]
         stored, seconds = subject.stored(), (subject.last_write_ns() - begin) / 1e9
-        return {"sent": sender["sent"], "queued": received, "stored": stored, "bytes_per_item": memory / received,
-                "held_bytes": held, "rows_per_second": stored / seconds, "storing_cpu_ns": _busiest(pid, cpu) / stored}
+        return {"sent": sender["sent"], "queued": received, "stored": stored,
+                "bytes_per_item": memory / received, "held_bytes": held, "rows_per_second": stored / seconds,
+                "storing_cpu_ns": _busiest(pid, cpu) / stored}
 
 
 def _first_write_after(subject, last_write):

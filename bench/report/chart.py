@@ -1,4 +1,5 @@
-"""Rate against loss as SVG: a line for each subject, from all runs of the search for the highest rate and its flood."""
+"""Rate against loss as SVG: a line for each subject, from all runs of the search for the highest rate and its
+flood."""
 import math
 import statistics
 
@@ -54,7 +55,8 @@ def _rate_axis(end, step):
         yield f'<line class="grid" x1="{x:.1f}" y1="{_y(0):.1f}" x2="{x:.1f}" y2="{_y(1):.1f}"/>'
         yield f'<text x="{x:.1f}" y="{_y(0) + 20:.1f}" text-anchor="middle">{number * step:,.0f}</text>'
     yield f'<line class="axis" x1="{LEFT}" y1="{_y(0):.1f}" x2="{WIDTH - RIGHT}" y2="{_y(0):.1f}"/>'
-    yield f'<text x="{(LEFT + WIDTH - RIGHT) / 2}" y="{HEIGHT - 14}" text-anchor="middle">reports sent a second</text>'
+    middle = (LEFT + WIDTH - RIGHT) / 2
+    yield f'<text x="{middle}" y="{HEIGHT - 14}" text-anchor="middle">reports sent a second</text>'
 
 
 def _loss_axis():
@@ -63,7 +65,8 @@ def _loss_axis():
         yield f'<line class="grid" x1="{LEFT}" y1="{y:.1f}" x2="{WIDTH - RIGHT}" y2="{y:.1f}"/>'
         yield f'<text x="{LEFT - 8}" y="{y + 4:.1f}" text-anchor="end">{tenth * 10} %</text>'
     yield f'<line class="axis" x1="{LEFT}" y1="{_y(0):.1f}" x2="{LEFT}" y2="{_y(1):.1f}"/>'
-    yield f'<text transform="translate(16 {(_y(0) + _y(1)) / 2}) rotate(-90)" text-anchor="middle">lost</text>'
+    middle = (_y(0) + _y(1)) / 2
+    yield f'<text transform="translate(16 {middle}) rotate(-90)" text-anchor="middle">lost</text>'
 
 
 def _line(name, line, end):
@@ -77,5 +80,6 @@ def _line(name, line, end):
 def _legend(name, number):
     x, y = LEFT + 340 * (number % 2), 16 + 18 * (number // 2)
     text = tables.TITLES[name].replace("`", "")
-    return [f'<line stroke="{COLOURS[name]}" stroke-width="3" x1="{x}" y1="{y - 4}" x2="{x + 22}" y2="{y - 4}"/>',
+    return [f'<line stroke="{COLOURS[name]}" stroke-width="3"'
+            f' x1="{x}" y1="{y - 4}" x2="{x + 22}" y2="{y - 4}"/>',
             f'<text x="{x + 30}" y="{y}">{text}</text>']

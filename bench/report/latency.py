@@ -13,7 +13,8 @@ def measure(subject_class, rate, seconds):
     with subject_class() as subject:
         sent, seen = subject.directory / "sent", subject.directory / "seen"
         watcher = subprocess.Popen([PROGRAMS / "bench_watcher", subject.database(), "--query", subject.watch,
-                                    "--stamps", seen, "--count", str(count)], stdout=subprocess.PIPE, text=True)
+                                    "--stamps", seen, "--count", str(count)], stdout=subprocess.PIPE,
+                                   text=True)
         try:
             watcher.stdout.readline()  # its first line says that it watches
             sender = runs.send(subject, count, rate, sent)
@@ -34,7 +35,8 @@ def _stamps(file):
 
 def _figures(sent, seen):
     waits = sorted((end - begin) / 1e6 for begin, end in zip(sent, seen) if end)
-    return {"p50_ms": quantile(waits, 0.5), "p99_ms": quantile(waits, 0.99), "max_ms": waits[-1] if waits else None}
+    return {"p50_ms": quantile(waits, 0.5), "p99_ms": quantile(waits, 0.99),
+            "max_ms": waits[-1] if waits else None}
 
 
 def quantile(ordered, part):

@@ -35,7 +35,8 @@ def _receive_buffer_limit():
 
 
 def _disk():
-    """The file system that the measured stores are on, and the kind of its disk, which the device's name tells."""
+    """The file system that the measured stores are on, and the kind of its disk, which the device's name
+    tells."""
     device = os.stat(ROOT).st_dev
     kinds = {"vd": "a virtual disk", "nvme": "an NVMe disk", "sd": "a disk", "xvd": "a virtual disk"}
     for line in pathlib.Path("/proc/self/mountinfo").read_text().splitlines():
@@ -49,4 +50,5 @@ def _disk():
 
 def _commit():
     """Of the tree that was built; a tree with changes in it says so."""
-    return _line("git", "-c", "safe.directory=*", "-C", str(ROOT), "describe", "--always", "--dirty", "--abbrev=12")
+    return _line("git", "-c", "safe.directory=*", "-C", str(ROOT), "describe", "--always", "--dirty",
+                 "--abbrev=12")

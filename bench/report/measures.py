@@ -42,13 +42,14 @@ def bare_sqlite(_, plan, tell):
         rows_per_commit, _, prepared = kind.partition(" ")
         with subjects.EmptyStore() as store:
             run = _inserted(store, rows, rows_per_commit, prepared)
-        result[kind] = {"rows_per_second": run["rows"] / run["seconds"], "cpu_ns": run["cpu_ns"] / run["rows"]}
+        result[kind] = {"rows_per_second": run["rows"] / run["seconds"],
+                        "cpu_ns": run["cpu_ns"] / run["rows"]}
     return result
 
 
 def _inserted(store, rows, rows_per_commit, prepared):
-    command = [PROGRAMS / "bench_inserter", store.database(), "--rows", str(rows), "--rows-per-commit", rows_per_commit,
-               *(["--prepared"] if prepared else [])]
+    command = [PROGRAMS / "bench_inserter", store.database(), "--rows", str(rows), "--rows-per-commit",
+               rows_per_commit, *(["--prepared"] if prepared else [])]
     return json.loads(subprocess.run(command, capture_output=True, text=True, check=True).stdout)
 
 
@@ -71,16 +72,18 @@ def queue(_, plan, tell):
     """In the real program; then the queue's own part, in a program without sockets and database."""
     full = backlog.measure(subjects.Service, plan.queued_reports)
     tell("the queue alone")
-    full["item_ns"] = {name.split("/")[1]: ns for name, ns in _item_ns(plan, "poco_tasker_bench", "^Item/").items()}
+    full["item_ns"] = {name.split("/")[1]: ns
+                       for name, ns in _item_ns(plan, "poco_tasker_bench", "^Item/").items()}
     return full
 
 
 def floor(_, plan, tell):
-    """The processor time that each part of a report's way needs at least, in nanoseconds. Each part is measured here,
-    in the same run. A receive takes longer when it has to wait for the next datagram, so the shortest time of three
-    floods counts."""
+    """The processor time that each part of a report's way needs at least, in nanoseconds. Each part is
+    measured here, in the same run. A receive takes longer when it has to wait for the next datagram, so the
+    shortest time of three floods counts."""
     tell("a bare receive")
-    received = min(runs.measure(subjects.BareReceiver, plan.flood_reports)["cpu"]["receiving"] for _ in range(3))
+    received = min(runs.measure(subjects.BareReceiver, plan.flood_reports)["cpu"]["receiving"]
+                   for _ in range(3))
     tell("bare inserts")
     with subjects.EmptyStore() as store:
         rows = plan.baselines[-1][1]
@@ -96,9 +99,11 @@ def ledger(_, plan, __):
 
 
 def _item_ns(plan, program, names):
-    """Processor time for an item of each benchmark of these names: the least of all tries; a disturbance makes it longer."""
+    """Processor time for an item of each benchmark of these names: the least of all tries; a disturbance
+    makes it longer."""
     command = [PROGRAMS / program, f"--benchmark_filter={names}", "--benchmark_format=json",
-               f"--benchmark_repetitions={plan.repetitions}", f"--benchmark_min_time={plan.repetition_seconds}"]
+               f"--benchmark_repetitions={plan.repetitions}",
+               f"--benchmark_min_time={plan.repetition_seconds}"]
     report = json.loads(subprocess.run(command, capture_output=True, text=True, check=True).stdout)
     times = {}
     for run in report["benchmarks"]:
@@ -121,7 +126,8 @@ MEASURES = {  # name: the subjects, the seconds for one subject, the function
     "rest": (("service",), lambda plan: plan.rest_seconds, rest),
     "baselines": (("sqlite",), lambda plan: sum(rows for _, rows in plan.baselines) / 1e5, bare_sqlite),
     "floods": (tuple(SUBJECTS), lambda plan: plan.flood_reports / 60_000 + 2, flood),
-    "rates": (tuple(SUBJECTS), lambda plan: plan.probes * (plan.probe_seconds + 2) + plan.confirm_seconds + 2, rate),
+    "rates": (tuple(SUBJECTS), lambda plan: plan.probes * (plan.probe_seconds + 2) + plan.confirm_seconds + 2,
+              rate),
     "latencies": (STORES, lambda plan: len(plan.latency_rates) * (plan.latency_seconds + 1), latencies),
     "queue": (("service",), lambda plan: plan.queued_reports / 40_000 + 5, queue),
     "ledger": (("service",), lambda plan: 20, ledger),

@@ -29,7 +29,8 @@ def is_full(report):
     """Every measure, of every subject."""
     results = report["results"]
     return not report["quick"] and all(subject in results.get(name, {})
-                                       for name, (subjects, *_) in measures.MEASURES.items() for subject in subjects)
+                                       for name, (subjects, *_) in measures.MEASURES.items()
+                                       for subject in subjects)
 
 
 def update_page(report):

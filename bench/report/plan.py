@@ -14,7 +14,8 @@ class Plan:
     searched: tuple = ("service", "analytics", "daemon", "bare")
     latency_seconds: float = 20
     latency_rates: tuple = (10, 100, 1_000, 20_000)
-    baselines: tuple = (("1", 100_000), ("1000", 1_000_000), ("1000 prepared", 1_000_000))  # commit after, rows
+    baselines: tuple = (  # commit after, rows
+        ("1", 100_000), ("1000", 1_000_000), ("1000 prepared", 1_000_000))
     rows_before: tuple = (0, 1_000_000, 5_000_000)
     growth_reports: int = 500_000
     growth_rounds: int = 3       # all sizes in turn, so that a disturbance affects each; the median counts

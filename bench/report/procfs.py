@@ -35,7 +35,8 @@ def waiting_bytes():
 
 def socket_buffer_bytes():
     """What the kernel granted, its own bookkeeping included: twice what may be asked for."""
-    listing = subprocess.run(["ss", "-uamn", "sport", "=", ":9997"], capture_output=True, text=True, check=True)
+    listing = subprocess.run(["ss", "-uamn", "sport", "=", ":9997"], capture_output=True, text=True,
+                             check=True)
     return int(re.search(r"skmem:\(r\d+,rb(\d+)", listing.stdout)[1])
 
 
@@ -63,7 +64,8 @@ _SOCKET_WAITS = {"x86_64": {"7", "23", "45", "47", "232", "270", "271", "281", "
 
 
 def receiving_thread(pid):
-    """The one that waits for a socket while nothing comes. It may be between two waits, or just be starting."""
+    """The one that waits for a socket while nothing comes. It may be between two waits, or just be
+    starting."""
     deadline = time.monotonic() + 10
     while time.monotonic() < deadline:
         for task in pathlib.Path(f"/proc/{pid}/task").iterdir():

@@ -12,15 +12,15 @@ SECONDS = 5
 LEAST_PART = 0.03     # of a thread's samples; functions with fewer are left out
 LEAST_SAMPLES = 100   # a thread with fewer did almost nothing
 # The functions that our code calls. Functions inside the libraries and the kernel are left out.
-TOLD = re.compile(r"(UDPServer|SyncServiceReport|BoostLogger|OrvekSqlite|Metrik|SystemTool|Poco|fmt::v\d+::vformat"
-                  r"|boost::(log|basic_format)|sqlite3_(step|exec|prepare|bind|wal)|rapidjson::GenericReader"
-                  r"|do_syscall_64|__x64_sys_)")
+TOLD = re.compile(r"(UDPServer|SyncServiceReport|BoostLogger|OrvekSqlite|Metrik|SystemTool|Poco"
+                  r"|fmt::v\d+::vformat|boost::(log|basic_format)|sqlite3_(step|exec|prepare|bind|wal)"
+                  r"|rapidjson::GenericReader|do_syscall_64|__x64_sys_)")
 
 
 def samples(record):
     """The thread and the functions of each sample, innermost first."""
-    script = subprocess.run(["perf", "script", "-i", record, "-F", "tid,ip,sym"], capture_output=True, text=True,
-                            check=True).stdout
+    script = subprocess.run(["perf", "script", "-i", record, "-F", "tid,ip,sym"], capture_output=True,
+                            text=True, check=True).stdout
     for sample in script.split("\n\n"):
         thread, *frames = sample.strip().split("\n")
         if frames:
@@ -28,7 +28,8 @@ def samples(record):
 
 
 def recorded(subject, record, rate):
-    """Call stacks of 4 KiB, unwound by the debug information: the frame pointers are left out in what ships."""
+    """Call stacks of 4 KiB, unwound by the debug information: the frame pointers are left out in what
+    ships."""
     with subprocess.Popen(["perf", "record", "--call-graph", "dwarf,4096", "-F", "997", "-o", record,
                            "-p", str(subject.process.pid)], stderr=subprocess.DEVNULL) as perf:
         try:

@@ -1,4 +1,5 @@
-"""One run: a number of reports at one rate into a subject that was just started, and where each of them ended."""
+"""One run: a number of reports at one rate into a subject that was just started, and where each of them
+ended."""
 import json
 import subprocess
 import time
@@ -11,7 +12,8 @@ LONGEST_SETTLING = 600.0   # seconds: enough for a million rows at 2,000 a secon
 
 def send(subject, count, rate=0, stamps=None):
     """Returns what the sender says of itself. Rate 0 is as fast as it goes."""
-    command = [PROGRAMS / "bench_sender", "--count", str(count), "--rate", str(rate), "--event", subject.event]
+    command = [PROGRAMS / "bench_sender", "--count", str(count), "--rate", str(rate), "--event",
+               subject.event]
     if stamps:
         command += ["--stamps", stamps]
     return json.loads(subprocess.run(command, capture_output=True, text=True, check=True).stdout)
@@ -66,8 +68,9 @@ def _per_thread(used, receiver, received):
 
 
 def _losses(run):
-    """Each report that is no row was lost at one of three places; the namespace has no other datagrams. The first,
-    between the sender and what the kernel counts, should lose none."""
+    """Each report that is no row was lost at one of three places; the namespace has no other datagrams. The
+    first, between the sender and what the kernel counts, should lose none."""
     kept = run["received"] if run["stored"] is None else run["stored"]
-    return {"lost_before": run["sent"] - run["received"] - run["kernel_lost"], "lost_after": run["received"] - kept,
+    return {"lost_before": run["sent"] - run["received"] - run["kernel_lost"],
+            "lost_after": run["received"] - kept,
             "lost": run["sent"] - kept, "rows_per_second": kept / (run["last_row"] or run["seconds"])}

@@ -1,18 +1,19 @@
 """The highest rate at which everything is stored, and as fast as it comes.
 
-A queue in memory hides for a while that the store does not keep up. Without a bound on how late the last row may be, the
-search would find how much memory a subject takes.
+A queue in memory hides for a while that the store does not keep up. Without a bound on how late the last row
+may be, the search would find how much memory a subject takes.
 """
 import runs
 
 FIRST_RATE = 50_000
 LEAST_RATE = 1_000   # no lower rate is tried
 STEP_DOWN = 1.05     # the smallest step down when the long run fails at a rate at which short runs succeeded
-WORTH_IT = 1.1       # the sender is the limit when its doubled rate makes it less than this many times as fast
+WORTH_IT = 1.1       # the sender is the limit when a doubled rate makes it less than this many times as fast
 
 
 def highest_rate(subject_class, plan, tell):
-    """Searches with short runs, then confirms with a long one. Every run is part of the result, lossy ones included."""
+    """Searches with short runs, then confirms with a long one. Every run is part of the result, lossy ones
+    included."""
     probes = []
 
     def keeps_up(rate, seconds):
@@ -36,7 +37,8 @@ def highest_rate(subject_class, plan, tell):
 
 
 def _bracket(keeps_up, probes):
-    """A rate that is kept up with (0 when there is none) and one that is not (None when the sender could go no faster)."""
+    """A rate that is kept up with (0 when there is none) and one that is not (None when the sender could go
+    no faster)."""
     rate = FIRST_RATE
     if not keeps_up(rate):
         while rate > LEAST_RATE:

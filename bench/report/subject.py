@@ -20,7 +20,7 @@ class Subject:
     title = ""
     event = "B100|10001"
     process = None       # until it is started
-    syncs_disk = True    # before each run: writes what this and earlier runs left, so that the measured run does not
+    syncs_disk = True    # before each run, so that the measured run does not write what earlier ones left
     longest_pause = 1.0  # in seconds: the longest time without progress while there is work
     watch = "select id, createTime from OperLog where id > ?1 order by id"  # the new rows, for the watcher
 
@@ -64,7 +64,8 @@ class Subject:
         self.process.wait()
 
     def environment(self):
-        """Without a collector that the caller's shell may name: it would take events away from what is counted."""
+        """Without a collector that the caller's shell may name: it would take events away from what is
+        counted."""
         return {name: value for name, value in os.environ.items() if not name.startswith("OTEL_")}
 
     def database(self):
@@ -72,9 +73,10 @@ class Subject:
         return None
 
     def last_write_ns(self):
-        """When the database last changed on the system's clock, seen without opening it: an open database slows the
-        service down (docs/Database.md, "Other programs and the write lock")."""
-        files = [pathlib.Path(f"{self.database()}{suffix}") for suffix in ("", "-wal")] if self.database() else []
+        """When the database last changed on the system's clock, seen without opening it: an open database
+        slows the service down (docs/Database.md, "Other programs and the write lock")."""
+        files = [pathlib.Path(f"{self.database()}{suffix}")
+                 for suffix in ("", "-wal")] if self.database() else []
         return max((file.stat().st_mtime_ns for file in files if file.exists()), default=0)
 
     def query(self, statement):

@@ -93,7 +93,8 @@ class Daemon(Subject):
 
     def command(self):
         own = {"-R": "persist", "-p": "pid", "-c": "control"}
-        return ["syslog-ng", "--foreground", "--no-caps", "--stderr", "-f", ROOT / "bench/load/syslog-ng.conf",
+        return ["syslog-ng", "--foreground", "--no-caps", "--stderr", "-f",
+                ROOT / "bench/load/syslog-ng.conf",
                 *(word for option, file in own.items() for word in (option, self.directory / file))]
 
     def environment(self):

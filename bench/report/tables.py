@@ -51,8 +51,8 @@ def _flood(name, run):
     nothing = run["stored"] is None
     return (TITLES[name], f"{run['sent']:,}", f"{run['offered']:,.0f}",
             f"{run['received']:,} received" if nothing else f"{run['stored']:,}",
-            "-" if nothing else f"{run['last_row']:.1f} s", "-" if nothing else f"{run['rows_per_second']:,.0f}",
-            f"{run['peak_bytes'] / 2**20:,.0f} MiB")
+            "-" if nothing else f"{run['last_row']:.1f} s",
+            "-" if nothing else f"{run['rows_per_second']:,.0f}", f"{run['peak_bytes'] / 2**20:,.0f} MiB")
 
 
 def _lost(runs):
@@ -62,7 +62,8 @@ def _lost(runs):
         later = "-" if run["stored"] is None else f"{run['lost_after']:,}"
         refused = "-" if run["refused"] is None else f"{run['refused']:,}"
         rows.append((TITLES[name], f"{run['kernel_lost']:,}", f"{run['lost_before']:,}", later, refused))
-    return table(["reports lost", "socket's buffer", "sent, never counted", "queue or store", "of these, store"], rows)
+    return table(["reports lost", "socket's buffer", "sent, never counted", "queue or store",
+                  "of these, store"], rows)
 
 
 def _processor_time(runs):
@@ -89,19 +90,23 @@ def rates(found):
             rows.append((TITLES[name], "none", "-", "-", "-", "-"))
             continue
         limit = " (the sender's limit)" if result["limited_by_sender"] else ""
-        rows.append((TITLES[name], f"{run['offered']:,.0f}{limit}", f"{run['seconds']:.0f} s", f"{run['sent']:,}",
-                     "-" if name == "bare" else f"{run['lag']:.1f} s", f"{run['peak_bytes'] / 2**20:,.0f} MiB"))
+        rows.append((TITLES[name], f"{run['offered']:,.0f}{limit}", f"{run['seconds']:.0f} s",
+                     f"{run['sent']:,}", "-" if name == "bare" else f"{run['lag']:.1f} s",
+                     f"{run['peak_bytes'] / 2**20:,.0f} MiB"))
     confirmed = {name: result["confirmed"] for name, result in found.items() if result["confirmed"]}
-    head = ["highest rate without loss", "reports/s", "for", "reports", "last row after the last report", "peak memory"]
+    head = ["highest rate without loss", "reports/s", "for", "reports", "last row after the last report",
+            "peak memory"]
     return table(head, rows) + "\n\n" + _processor_time(confirmed)
 
 
 def latencies(found):
-    rows = [(f"{TITLES[name]}, {run['rate']:,}/s", *(_ms(run[part]) for part in ("p50_ms", "p99_ms", "max_ms")),
+    rows = [(f"{TITLES[name]}, {run['rate']:,}/s",
+             *(_ms(run[part]) for part in ("p50_ms", "p99_ms", "max_ms")),
              f"{run['seen']:,} of {run['sent']:,}",
-             f"{run['look_ms_p50']:.2f}, {run['look_ms_p99']:.2f} ms") for name, runs in found.items() for run in runs]
-    return table(["from sending to a row that others see", "half within", "99 of 100 within", "longest", "seen",
-                  "time between looks (half, 99 of 100)"], rows)
+             f"{run['look_ms_p50']:.2f}, {run['look_ms_p99']:.2f} ms") for name, runs in found.items()
+            for run in runs]
+    return table(["from sending to a row that others see", "half within", "99 of 100 within", "longest",
+                  "seen", "time between looks (half, 99 of 100)"], rows)
 
 
 def _ms(milliseconds):
@@ -116,7 +121,8 @@ def baselines(found):
 
 def baseline(kind):
     rows, _, prepared = kind.partition(" ")
-    return f"{int(rows):,} row{'s' if int(rows) > 1 else ''} to a commit{', prepared once' if prepared else ''}"
+    plural = "s" if int(rows) > 1 else ""
+    return f"{int(rows):,} row{plural} to a commit{', prepared once' if prepared else ''}"
 
 
 def growth(found):
@@ -131,7 +137,8 @@ def queue(found):
             ("memory of each", f"{full['bytes_per_item']:,.0f} bytes"),
             ("memory still held after they were stored", f"{full['held_bytes'] / 2**20:,.0f} MiB"),
             ("storing thread's processor time for each, all told", _us(full["storing_cpu_ns"]))]
-    rows += [(f"queue alone, in and out, {int(size):,} waiting", _us(ns)) for size, ns in full["item_ns"].items()]
+    rows += [(f"queue alone, in and out, {int(size):,} waiting", _us(ns))
+             for size, ns in full["item_ns"].items()]
     return table(["the queue", ""], rows)
 
 
@@ -141,13 +148,15 @@ def ledger(found):
     return table(["processor time for a report", ""],
                  [("what both threads count of it, alone", f"{times['CountedReport']:.1f} ns"),
                   ("into the queue and out of it, without the ledger", f"{without:.1f} ns"),
-                  ("the same with the ledger", f"{with_it:.1f} ns"), ("difference", f"{with_it - without:.1f} ns")])
+                  ("the same with the ledger", f"{with_it:.1f} ns"),
+                  ("difference", f"{with_it - without:.1f} ns")])
 
 
 def floor(results):
     """The service's own figure is that of the flood, in which it has the least reason to wait."""
     parts = results["floor"]["service"]
-    names = {"receive": "receive of a datagram", "write": "write of its log line", "parse": "parse of its JSON",
+    names = {"receive": "receive of a datagram", "write": "write of its log line",
+             "parse": "parse of its JSON",
              "queue": "way through a queue", "insert": "insert, prepared once, 1,000 rows to a commit"}
     least = sum(parts.values())
     rows = [(f"a bare {name}", _us(parts[part])) for part, name in names.items()]
@@ -165,5 +174,5 @@ def rest(found):
                                               ("memory", f"{run['resident_bytes'] / 2**20:.1f} MiB")])
 
 
-SECTIONS = {"rates": rates, "floods": floods, "latencies": latencies, "baselines": baselines, "growth": growth,
-            "queue": queue, "ledger": ledger, "rest": rest}
+SECTIONS = {"rates": rates, "floods": floods, "latencies": latencies, "baselines": baselines,
+            "growth": growth, "queue": queue, "ledger": ledger, "rest": rest}

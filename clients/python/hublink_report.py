@@ -6,20 +6,21 @@
     reporter.event("A100|10001", {"page": "start"})  # the id begins with A: goes to analytics
     reporter.event("B100|10001", "it's open")        # any other id: goes to the local store
 
-Purpose: a text arrives exactly as it was given, or the result says why it was not sent. A reporter doubles quotes for
-the store and escapes JSON. It announces its own module and tells the service who is signed in, and it does both again
-after the service was restarted.
+Purpose: a text arrives exactly as it was given, or the result says why it was not sent. A reporter doubles
+quotes for the store and escapes JSON. It announces its own module and tells the service who is signed in, and
+it does both again after the service was restarted.
 
-Threads: every operation may be called from any thread, and in the child of a fork, where the reporter opens a socket of
-its own. This library starts no thread.
+Threads: every operation may be called from any thread, and in the child of a fork, where the reporter opens a
+socket of its own. This library starts no thread.
 
-Failure: `event` and `set_user` never raise, with any arguments. They never wait, and they write nothing to the
-terminal. An argument of a wrong type gives a result that says that it cannot be sent. Only exceptions such as
-KeyboardInterrupt, which are not errors, pass through.
+Failure: `event` and `set_user` never raise, with any arguments. They never wait, and they write nothing to
+the terminal. An argument of a wrong type gives a result that says that it cannot be sent. Only exceptions
+such as KeyboardInterrupt, which are not errors, pass through.
 
-What `Result.SENT` promises: the system took the datagram, and a program listens. Linux drops a datagram without an
-error when the listener's buffer is full. So events of a long burst that come faster than the service reads them can be
-lost. A busy system can report a moment late that no program listens; then only the next event gets that result.
+What `Result.SENT` promises: the system took the datagram, and a program listens. Linux drops a datagram
+without an error when the listener's buffer is full. So events of a long burst that come faster than the
+service reads them can be lost. A busy system can report a moment late that no program listens; then only the
+next event gets that result.
 
 Uses the standard library only. Needs Python 3.9 or later.
 """
@@ -46,7 +47,7 @@ __all__ = ["Json", "Module", "ReportHandler", "Reporter", "Result", "Value"]
 
 _HOST, _PORT = "127.0.0.1", 9997
 _MAX_BYTES = 10240  # the service cuts off what is longer
-_MAX_DEPTH = 127  # levels of a value: the service reads 128, and the report's object around the value is one of them
+_MAX_DEPTH = 127  # levels of a value: the service reads 128, and the report's object around it is one of them
 _SEND_BUFFER_BYTES = 65536  # the default of macOS is 9216, and a report may be longer
 _LOOK_SECONDS = 1.0  # between two looks at the system's table of sockets; a look takes about 50 microseconds
 _REPEAT_SECONDS = 180.0  # between two announcements on a system without such a table
@@ -59,26 +60,28 @@ class Result(enum.Enum):
     SENT = 0  #: the system took the datagram, and a program listens; see the top of the file
     NOBODY_LISTENS = 1  #: no service runs; the event is lost, and the next event tries again
     TOO_LONG = 2  #: the datagram would have more than 10240 bytes
-    #: A text has half a surrogate pair, which UTF-8 cannot hold, or a zero character. Or an open id is empty, or a part
-    #: of a user is not a str.
+    #: A text has half a surrogate pair, which UTF-8 cannot hold, or a zero character. Or an open id is empty,
+    #: or a part of a user is not a str.
     INVALID_TEXT = 3
-    #: The value is not JSON, or the time is not an int of 64 bits. Or the value of an event for analytics is given, but
-    #: is not an object that the service can read: at most 127 levels, integers of at most 64 bits, other numbers within
-    #: the range of a double.
+    #: The value is not JSON, or the time is not an int of 64 bits. Or the value of an event for analytics is
+    #: given, but is not an object that the service can read: at most 127 levels, integers of at most 64 bits,
+    #: other numbers within the range of a double.
     INVALID_JSON = 4
-    #: The event id is empty, or is not a valid text (see INVALID_TEXT). Or it is for analytics, and has no bar, or the
-    #: module before the bar is neither the reporter's nor A759.
+    #: The event id is empty, or is not a valid text (see INVALID_TEXT). Or it is for analytics, and has no
+    #: bar, or the module before the bar is neither the reporter's nor A759.
     INVALID_EVENT_ID = 5
-    #: An open id or a suite version has a single quote in it. The store needs a quote written twice, and analytics
-    #: needs it written once, so no text would be right for both.
+    #: An open id or a suite version has a single quote in it. The store needs a quote written twice, and
+    #: analytics needs it written once, so no text would be right for both.
     QUOTE_IN_USER = 6
-    OTHER_USERS_SERVICE = 7  #: the service runs for another user and would put the report into that user's store
+    #: The service runs for another user and would put the report into that user's store.
+    OTHER_USERS_SERVICE = 7
     WOULD_BLOCK = 8  #: the send buffer of the reporter's socket is full
     SYSTEM_ERROR = 9  #: any other reason
 
 
 class Module(NamedTuple):
-    """The module of the suite that reports. Its event ids begin with its id and a bar, and its id begins with A."""
+    """The module of the suite that reports. Its event ids begin with its id and a bar, and its id begins with
+    A."""
 
     id: str
     version: str = ""
@@ -102,7 +105,7 @@ class _Refusal(Exception):
         self.result = result
 
 
-# --- Writing messages -----------------------------------------------------------------------------------------------
+# --- Writing messages ---------------------------------------------------------------------------------------
 
 _ENCODER = json.JSONEncoder(ensure_ascii=False, allow_nan=False, separators=(",", ":"))
 
@@ -143,8 +146,8 @@ def _no_number(text: str) -> None:
     raise ValueError(text + " is no JSON")
 
 
-#: Three readers, each stricter than the one before. _JSON reads all JSON, _KEPT_JSON what the service can read, and
-#: _EXACT_JSON what the service also prints again as the same value.
+#: Three readers, each stricter than the one before. _JSON reads all JSON, _KEPT_JSON what the service can
+#: read, and _EXACT_JSON what the service also prints again as the same value.
 _JSON = json.JSONDecoder(parse_int=_any_number, parse_float=_any_number, parse_constant=_no_number)
 _KEPT_JSON = json.JSONDecoder(parse_int=_kept_integer, parse_float=_kept_real, parse_constant=_no_number)
 _EXACT_JSON = json.JSONDecoder(parse_int=_exact_integer, parse_float=_exact_real, parse_constant=_no_number)
@@ -176,8 +179,8 @@ def _is_flat(text: str) -> bool:
 
 
 def _has_lone_surrogate(text: str) -> bool:
-    """Whether one half of a surrogate pair, such as \\udc00, stands alone as an escape. A "u" after an escaped
-    backslash is not an escape."""
+    """Whether one half of a surrogate pair, such as \\udc00, stands alone as an escape. A "u" after an
+    escaped backslash is not an escape."""
     return "\\u" in text and _SURROGATE.search(_PAIR.sub("", text.replace("\\\\", "--"))) is not None
 
 
@@ -195,13 +198,14 @@ def _checked_text(text: str) -> str:
 
 
 def _doubled(text: str) -> str:
-    """Doubles the quotes of a text for the store, because the service puts it unchanged into an SQL statement."""
+    """Doubles the quotes of a text for the store, because the service puts it unchanged into an SQL
+    statement."""
     return text.replace("'", "''")
 
 
 def _doubled_in_json(text: str) -> str:
-    """Doubles the quotes in the strings of an object or array. The service reads it and prints it again, so a quote
-    that is written as an escape becomes a quote there, too."""
+    """Doubles the quotes in the strings of an object or array. The service reads it and prints it again, so a
+    quote that is written as an escape becomes a quote there, too."""
     if "'" not in text and "\\u0027" not in text:
         return text
     return _QUOTE.sub(lambda found: found[0] if found[0] == "\\\\" else "''", text)
@@ -223,7 +227,8 @@ def _json_text(value: Union[Json, Dict[str, Any], List[Any]]) -> str:
 def _encoded(value: Union[Dict[str, Any], List[Any]]) -> str:
     try:
         return _ENCODER.encode(value)
-    except (TypeError, ValueError, RecursionError, RuntimeError):  # RuntimeError: another thread changes the value
+    # RuntimeError: another thread changes the value
+    except (TypeError, ValueError, RecursionError, RuntimeError):
         raise _Refusal(Result.INVALID_JSON) from None
 
 
@@ -236,8 +241,8 @@ def _value_for_store(value: Value) -> Optional[str]:
     text = _json_text(value)
     if text[0] in "{[" and _is_flat(text) and _is_read(text, _EXACT_JSON):
         return _doubled_in_json(text)
-    # As JSON, the service would print this as another value: a string without its quotation marks, null as nothing. It
-    # does not change a text, so the JSON goes as a text.
+    # As JSON, the service would print this as another value: a string without its quotation marks, null as
+    # nothing. It does not change a text, so the JSON goes as a text.
     return _ENCODER.encode(_doubled(text))
 
 
@@ -253,8 +258,8 @@ def _value_for_analytics(value: Value) -> Optional[str]:
 
 
 def _time(time_ms: Optional[int]) -> str:
-    """The time as JSON, in milliseconds. The service takes a time of ten characters for seconds. So a number of ten
-    characters is written as a string with a leading zero."""
+    """The time as JSON, in milliseconds. The service takes a time of ten characters for seconds. So a number
+    of ten characters is written as a string with a leading zero."""
     if time_ms is None:
         return str(time.time_ns() // 1_000_000)
     if not isinstance(time_ms, int) or not -(2**63) <= time_ms < 2**63:
@@ -287,8 +292,8 @@ def _report(event_id: str, value: Value, time_ms: Optional[int], day_report: boo
 
 
 def _control(kind: str, **exdata: str) -> bytes:
-    """Writes a control message. The service takes every datagram with the letters eventID in it for a report. So one of
-    the letters is written as an escape, which a JSON reader turns back into the letter."""
+    """Writes a control message. The service takes every datagram with the letters eventID in it for a report.
+    So one of the letters is written as an escape, which a JSON reader turns back into the letter."""
     for text in exdata.values():
         _checked_text(text)
     message = _ENCODER.encode({"msgType": kind, "exdata": exdata})
@@ -320,7 +325,7 @@ def _user(open_id: str, suite_version: str) -> bytes:
     return _control("updateOpenID", openID=open_id, hublinkVersion=suite_version)
 
 
-# --- Looking for the service ----------------------------------------------------------------------------------------
+# --- Looking for the service --------------------------------------------------------------------------------
 
 
 class _Listener(NamedTuple):
@@ -345,36 +350,37 @@ def _listeners(table: str, user: int) -> List[_Listener]:
     found = []
     for fields in (line.split() for line in table.splitlines() if f":{_PORT:04X} " in line):
         address, _, port = fields[1].partition(":")
-        if port == f"{_PORT:04X}" and fields[2].endswith(":0000") and address in _EXACT_ADDRESSES | _WILDCARDS:
+        is_ours = port == f"{_PORT:04X}" and address in _EXACT_ADDRESSES | _WILDCARDS
+        if is_ours and fields[2].endswith(":0000"):
             found.append(_Listener(address in _WILDCARDS, int(fields[7]) == user, fields[9]))
     return found
 
 
 def _listener() -> Optional[_Listener]:
-    """The socket that receives a datagram to the service; None when there is none. Raises OSError when the system has
-    no table of its sockets.
+    """The socket that receives a datagram to the service; None when there is none. Raises OSError when the
+    system has no table of its sockets.
 
-    A socket that is bound to 127.0.0.1 itself comes before one that is bound to all addresses. Of several such sockets,
-    one of another user is returned.
+    A socket that is bound to 127.0.0.1 itself comes before one that is bound to all addresses. Of several
+    such sockets, one of another user is returned.
     """
-    # We read bytes, not text: Python imports a text's codec at its first use. A fork during an import would leave the
-    # child a lock that no thread releases.
+    # We read bytes, not text: Python imports a text's codec at its first use. A fork during an import would
+    # leave the child a lock that no thread releases.
     table = _TABLES[0].read_bytes()
     if _TABLES[1].exists():  # the file is missing when IPv6 is switched off
         table += _TABLES[1].read_bytes()
     return min(_listeners(table.decode(), os.geteuid()), default=None)
 
 
-#: Errors that an open, connected socket never returns. Then the program has closed our descriptor, and its number may
-#: belong to another file now.
+#: Errors that an open, connected socket never returns. Then the program has closed our descriptor, and its
+#: number may belong to another file now.
 _NOT_OURS = {errno.EBADF, errno.ENOTSOCK, errno.EDESTADDRREQ, errno.ENOTCONN}
 
-# --- Sending --------------------------------------------------------------------------------------------------------
+# --- Sending ------------------------------------------------------------------------------------------------
 
 
 def _connected() -> socket.socket:
-    """A new socket that is connected to the service's port. The system would not report to an unconnected socket that
-    no program listens."""
+    """A new socket that is connected to the service's port. The system would not report to an unconnected
+    socket that no program listens."""
     made = socket.socket(socket.AF_INET, socket.SOCK_DGRAM)
     try:
         made.setblocking(False)
@@ -390,8 +396,8 @@ def _connected() -> socket.socket:
 class Reporter:
     """Sends events and tells the service who is signed in. See the top of the file for threads and failure.
 
-    Without a module of its own, a reporter sends events for the local store and for the default module A759 only. It
-    sends nothing to a service that runs for another user, unless `allow_other_users_service` is set.
+    Without a module of its own, a reporter sends events for the local store and for the default module A759
+    only. It sends nothing to a service that runs for another user, unless `allow_other_users_service` is set.
     """
 
     def __init__(self, module: Optional[Module] = None, *, allow_other_users_service: bool = False) -> None:
@@ -419,21 +425,22 @@ class Reporter:
     ) -> Result:
         """Sends an event that happened now, or `time_ms` milliseconds after the beginning of 1970.
 
-        For an event id that begins with A, the value must be None or an object; the service itself sets the members
-        "openid" and "sys_version" in it.
+        For an event id that begins with A, the value must be None or an object; the service itself sets the
+        members "openid" and "sys_version" in it.
         """
         return self._counted(lambda: self._event(event_id, value, time_ms, day_report))
 
     def set_user(self, open_id: str, suite_version: str = "") -> Result:
-        """Tells the service who is signed in: now, and again whenever the service was restarted. The service adds the
-        user to every later report, also to those of other programs, because it knows one user only. With an empty
-        `suite_version`, it keeps the version that it knows. When a text cannot be sent (INVALID_TEXT, QUOTE_IN_USER,
-        TOO_LONG), nothing changes. When the system does not take the message now, it is sent before the next event."""
+        """Tells the service who is signed in: now, and again whenever the service was restarted. The service
+        adds the user to every later report, also to those of other programs, because it knows one user only.
+        With an empty `suite_version`, it keeps the version that it knows. When a text cannot be sent
+        (INVALID_TEXT, QUOTE_IN_USER, TOO_LONG), nothing changes. When the system does not take the message
+        now, it is sent before the next event."""
         return self._counted(lambda: self._set_user(open_id, suite_version))
 
     def count(self, result: Result) -> int:
-        """How many calls of event and set_user returned this result. The child of a fork starts with its parent's
-        counts."""
+        """How many calls of event and set_user returned this result. The child of a fork starts with its
+        parent's counts."""
         with self._lock:
             return self._counts[result]
 
@@ -446,7 +453,8 @@ class Reporter:
         return self
 
     def __exit__(
-        self, kind: Optional[Type[BaseException]], error: Optional[BaseException], trace: Optional[TracebackType]
+        self, kind: Optional[Type[BaseException]], error: Optional[BaseException],
+        trace: Optional[TracebackType]
     ) -> None:
         self.close()
 
@@ -480,7 +488,8 @@ class Reporter:
             return self._deliver(None, None)
 
     def _announcement_for(self, event_id: str) -> Optional[bytes]:
-        """The announcement that must be sent before the event; None for the store and for the default module."""
+        """The announcement that must be sent before the event; None for the store and for the default
+        module."""
         if not isinstance(event_id, str) or not event_id or not _is_text(event_id):
             raise _Refusal(Result.INVALID_EVENT_ID)
         if not _is_for_analytics(event_id):
@@ -502,8 +511,8 @@ class Reporter:
             try:
                 return self._try_to_deliver(message, announcement)
             except ConnectionRefusedError:
-                # The system reports late that an earlier datagram was refused. The service may run again by now, so we
-                # try once more.
+                # The system reports late that an earlier datagram was refused. The service may run again by
+                # now, so we try once more.
                 self._forget_service()
                 result = Result.NOBODY_LISTENS
             except OSError as error:
@@ -530,7 +539,8 @@ class Reporter:
             self._module_is_told = self._is_taken(self._socket, announcement)
             if not self._module_is_told:
                 return Result.NOBODY_LISTENS
-        return Result.SENT if message is None or self._is_taken(self._socket, message) else Result.NOBODY_LISTENS
+        is_taken = message is None or self._is_taken(self._socket, message)
+        return Result.SENT if is_taken else Result.NOBODY_LISTENS
 
     def _is_taken(self, to: socket.socket, message: bytes) -> bool:
         to.send(message)
@@ -555,12 +565,13 @@ class Reporter:
             return
         self._service = listener.inode
         self._is_others = not listener.is_own and not self._allow_others
-        # While another user's service has the port, we look before each event: this user's service may take its place
-        # at any time.
+        # While another user's service has the port, we look before each event: this user's service may take
+        # its place at any time.
         self._next_look = now if self._is_others else now + _LOOK_SECONDS
 
     def _forget_service(self) -> None:
-        """Makes the announcements due again: a service that was restarted knows neither the module nor the user."""
+        """Makes the announcements due again: a service that was restarted knows neither the module nor the
+        user."""
         self._service = None
         self._user_is_told = False
         self._module_is_told = False
@@ -597,7 +608,7 @@ if hasattr(os, "register_at_fork"):
     os.register_at_fork(after_in_child=_begin_in_child)
 
 
-# --- The program's log ----------------------------------------------------------------------------------------------
+# --- The program's log --------------------------------------------------------------------------------------
 
 _EventIdOf = Union[str, Callable[[logging.LogRecord], str]]
 
@@ -607,17 +618,19 @@ class ReportHandler(logging.Handler):
 
         logging.getLogger().addHandler(ReportHandler(reporter, "B100|%(name)s", level=logging.WARNING))
 
-    `event_id` is a text in which "%(name)s" and the record's other attributes are filled in, or a function that gets
-    the record and returns the event id. The value is an object with "level", "logger", "message", "file" and "line".
-    The message is what the handler's formatter makes of the record: by default the message and the exception's trace.
-    A message that is too long for a datagram is cut at its end; the object then has "cut": true.
+    `event_id` is a text in which "%(name)s" and the record's other attributes are filled in, or a function
+    that gets the record and returns the event id. The value is an object with "level", "logger", "message",
+    "file" and "line". The message is what the handler's formatter makes of the record: by default the message
+    and the exception's trace. A message that is too long for a datagram is cut at its end; the object then
+    has "cut": true.
 
-    Failure: the handler raises and prints nothing. `failed` counts the records that could not be formatted, and those
-    that were logged while the handler was sending another record of the same thread. The reporter counts the results of
-    all other records.
+    Failure: the handler raises and prints nothing. `failed` counts the records that could not be formatted,
+    and those that were logged while the handler was sending another record of the same thread. The reporter
+    counts the results of all other records.
     """
 
-    def __init__(self, reporter: Reporter, event_id: _EventIdOf = "Log|%(name)s", level: int = logging.NOTSET) -> None:
+    def __init__(self, reporter: Reporter, event_id: _EventIdOf = "Log|%(name)s",
+                 level: int = logging.NOTSET) -> None:
         super().__init__(level)
         self.failed = 0
         self._reporter = reporter
@@ -625,7 +638,8 @@ class ReportHandler(logging.Handler):
         self._thread = threading.local()
 
     def emit(self, record: logging.LogRecord) -> None:
-        if getattr(self._thread, "is_busy", False):  # sending a record has logged this record in the same thread
+        # Sending a record may log this record in the same thread.
+        if getattr(self._thread, "is_busy", False):
             self.failed += 1
             return
         self._thread.is_busy = True
@@ -654,8 +668,8 @@ class ReportHandler(logging.Handler):
 
 
 def _readable(text: str) -> str:
-    """The text with each lone surrogate written as an escape. Python reads a file name that is not UTF-8 with lone
-    surrogates; without the escapes, such a record could not be sent."""
+    """The text with each lone surrogate written as an escape. Python reads a file name that is not UTF-8 with
+    lone surrogates; without the escapes, such a record could not be sent."""
     return text.encode("utf-8", "backslashreplace").decode()
 
 

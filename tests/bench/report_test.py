@@ -25,8 +25,8 @@ import targets
 
 def run(rate, lost=0, **more):
     return {"rate": rate, "sent": 1000, "offered": rate, "seconds": 1.0, "lost": lost, "stored": 1000 - lost,
-            "received": 1000 - lost, "lost_after": 0, "rows_per_second": more.get("offered", rate), "lag": 0.0,
-            "cpu": {"receiving": 2000, "storing": 6000, "others": 0}, **more}
+            "received": 1000 - lost, "lost_after": 0, "rows_per_second": more.get("offered", rate),
+            "lag": 0.0, "cpu": {"receiving": 2000, "storing": 6000, "others": 0}, **more}
 
 
 def losing_above(limit, sender_limit=float("inf")):
@@ -62,7 +62,8 @@ class HighestRate(unittest.TestCase):
     def test_is_not_the_senders_when_the_sender_was_held_up_once(self):
         slow = iter([0.5])
         def measure(_, count, rate):
-            return run(rate, int(rate > 200_000), offered=rate * next(slow, 1), sent=count, seconds=count / rate)
+            return run(rate, int(rate > 200_000), offered=rate * next(slow, 1), sent=count,
+                       seconds=count / rate)
         with mock.patch.object(runs, "measure", measure):
             found = searched()
         self.assertFalse(found["limited_by_sender"])
@@ -74,7 +75,8 @@ class HighestRate(unittest.TestCase):
 
     def test_steps_down_when_the_long_run_loses_what_short_ones_did_not(self):
         def measure(_, count, rate):
-            return run(rate, int(rate > (80_000 if count / rate > 5 else 100_000)), sent=count, seconds=count / rate)
+            return run(rate, int(rate > (80_000 if count / rate > 5 else 100_000)), sent=count,
+                       seconds=count / rate)
         with mock.patch.object(runs, "measure", measure):
             found = searched()["confirmed"]
         self.assertEqual((found["lost"], round(found["seconds"])), (0, 20))
@@ -106,7 +108,8 @@ class Verdict(unittest.TestCase):
                "baselines": {"sqlite": {"1000": {"cpu_ns": 3000}}}}
 
     def verdict(self, start, results=None):
-        found = [verdict for verdict in targets.verdicts(results or self.RESULTS) if verdict.text.startswith(start)]
+        found = [verdict for verdict in targets.verdicts(results or self.RESULTS)
+                 if verdict.text.startswith(start)]
         self.assertEqual(len(found), 1)
         return found[0]
 
@@ -175,7 +178,8 @@ class Losses(unittest.TestCase):
 class Baseline(unittest.TestCase):
     def test_says_how_its_rows_are_committed_and_made(self):
         self.assertEqual([tables.baseline(kind) for kind, _ in plan.FULL.baselines],
-                         ["1 row to a commit", "1,000 rows to a commit", "1,000 rows to a commit, prepared once"])
+                         ["1 row to a commit", "1,000 rows to a commit",
+                          "1,000 rows to a commit, prepared once"])
 
 
 class Floor(unittest.TestCase):
@@ -242,8 +246,9 @@ class Page(unittest.TestCase):
     def test_gets_the_figures_between_its_marks_and_keeps_its_text(self):
         page = ("before\n<!-- figures: rest -->\nold\n<!-- end -->\nbetween\n"
                 "<!-- figures: floods -->\n<!-- end -->\nafter\n")
-        self.assertEqual(self.updated(page), "before\n<!-- figures: rest -->\n\nnew\n\n<!-- end -->\nbetween\n"
-                                             "<!-- figures: floods -->\n\nnew\n\n<!-- end -->\nafter\n")
+        self.assertEqual(self.updated(page),
+                         "before\n<!-- figures: rest -->\n\nnew\n\n<!-- end -->\nbetween\n"
+                         "<!-- figures: floods -->\n\nnew\n\n<!-- end -->\nafter\n")
 
     def test_takes_the_figures_of_a_full_run_only(self):
         for change in ({"quick": True}, {"results": {"rest": {}}}, {"results": {}}):

@@ -72,7 +72,8 @@ class Expected:
         lines = []
         for _, each in sorted(grouped(self.stored, lambda event: event.installation).items()):
             for row, event in enumerate(each, 1):
-                columns = (event.installation, row, event.module, event.event, event.user, event.suite_version)
+                columns = (event.installation, row, event.module, event.event, event.user,
+                           event.suite_version)
                 lines.append([*map(str, columns), str(event.time_ms), "0", scalars_of(event)])
         return lines
 

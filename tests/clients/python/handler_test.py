@@ -38,8 +38,9 @@ class ARecord(Handler):
         event = self.one()
         self.assertEqual(event["eventID"], "Log|painter.canvas")
         line = event["value"].pop("line")
-        self.assertEqual(event["value"], {"level": "WARNING", "logger": "painter.canvas", "message": "it's 5%",
-                                          "file": __file__})
+        self.assertEqual(event["value"],
+                         {"level": "WARNING", "logger": "painter.canvas", "message": "it's 5%",
+                          "file": __file__})
         self.assertIn("it's %d%%", pathlib.Path(__file__).read_text().splitlines()[line - 1])
 
     def test_has_the_time_of_its_making(self):
@@ -111,7 +112,8 @@ class ARecordThatFails(Handler):
         self.logger.error("x")
         self.use(ReportHandler(self.reporter, "%(name)s"))
         logging.Logger.handle(self.logger, self.logger.makeRecord("App", 40, "f", 1, "m", (), None))
-        self.assertEqual((self.reporter.count(Result.NOBODY_LISTENS), self.reporter.count(Result.INVALID_EVENT_ID)),
+        self.assertEqual((self.reporter.count(Result.NOBODY_LISTENS),
+                          self.reporter.count(Result.INVALID_EVENT_ID)),
                          (1, 1))
 
     def test_because_it_logs_itself_does_so_once(self):

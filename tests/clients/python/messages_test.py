@@ -1,4 +1,5 @@
-"""What the module makes of an event, a module and a user: the datagrams, byte for byte, and what it refuses."""
+"""What the module makes of an event, a module and a user: the datagrams, byte for byte, and what it
+refuses."""
 import ast
 import decimal
 import json
@@ -36,14 +37,17 @@ class Sending(unittest.TestCase):
 class AnEvent(Sending):
     def test_is_one_json_object(self):
         self.assertEqual(self.sent(STORE, "hello", time_ms=1700000000123, day_report=True),
-                         '{"eventID":"B100|10001","value":"hello","createTime":1700000000123,"isDayReport":1}')
+                         '{"eventID":"B100|10001","value":"hello",'
+                         '"createTime":1700000000123,"isDayReport":1}')
 
     def test_has_no_value_where_none_is_given(self):
-        self.assertEqual(self.sent(STORE, time_ms=0), '{"eventID":"B100|10001","createTime":0,"isDayReport":0}')
+        self.assertEqual(self.sent(STORE, time_ms=0),
+                         '{"eventID":"B100|10001","createTime":0,"isDayReport":0}')
 
     def test_is_of_now_in_milliseconds(self):
         before = time.time_ns() // 1_000_000
-        self.assertIn(json.loads(self.sent(STORE))["createTime"], range(before, time.time_ns() // 1_000_000 + 1))
+        self.assertIn(json.loads(self.sent(STORE))["createTime"],
+                      range(before, time.time_ns() // 1_000_000 + 1))
 
     def test_gives_a_time_of_ten_characters_an_eleventh(self):
         for time_ms, text in ((1234567890, "01234567890"), (-123456789, "-0123456789")):
@@ -79,7 +83,8 @@ class AText(Sending):
         self.assertEqual(json.loads(self.sent("A759|'1"))["eventID"], "A759|'1")
 
     def test_is_utf8_and_has_no_zero(self):
-        self.assertEqual(self.value(STORE, "\u00fc\U0001f600\x01\x7f\"\\%s"), "\u00fc\U0001f600\x01\x7f\"\\%s")
+        self.assertEqual(self.value(STORE, "\u00fc\U0001f600\x01\x7f\"\\%s"),
+                         "\u00fc\U0001f600\x01\x7f\"\\%s")
         self.refused(Result.INVALID_TEXT, STORE, "a\0b")
         self.refused(Result.INVALID_TEXT, STORE, "a\ud800b")
 
@@ -98,7 +103,8 @@ class AnObject(Sending):
         self.assertEqual(self.value(ANALYTICS, {"a'": ["it's"]}), {"a'": ["it's"]})
 
     def test_has_quotes_doubled_that_are_escaped(self):
-        self.assertIn(r"""{"a":"\\u0027 '' \\''"}""", self.sent(STORE, Json(r"""{"a":"\\u0027 \u0027 \\'"}""")))
+        self.assertIn(r"""{"a":"\\u0027 '' \\''"}""",
+                      self.sent(STORE, Json(r"""{"a":"\\u0027 \u0027 \\'"}""")))
         self.assertIn(r'{"a":"\u0027"}', self.sent(ANALYTICS, Json(r'{"a":"\u0027"}')))
 
     def test_keeps_the_text_that_was_given_but_for_white_space(self):
@@ -116,14 +122,16 @@ class AnObject(Sending):
         self.refused(Result.INVALID_JSON, STORE, circle)
 
     def test_goes_as_a_text_to_the_store_where_the_service_would_print_it_as_another(self):
-        for number in (str(2**64), str(-(2**63) - 1), "1" * 5000, "1e400", "-0", "0.12345678901234567", "1e-400"):
+        for number in (str(2**64), str(-(2**63) - 1), "1" * 5000, "1e400", "-0", "0.12345678901234567",
+                       "1e-400"):
             text = '{"a":%s,"b":"\'"}' % number
             self.assertEqual(self.value(STORE, Json(text)), text.replace("'", "''"))
         for number in (2**64 - 1, -(2**63), 1.7976931348623157e308, 5e-324, -0.0, 0.1 + 0.2, 1e22 * 10):
             self.assertEqual(self.value(STORE, {"a": number}), {"a": number})
 
     def test_is_refused_for_analytics_where_the_service_cannot_read_it(self):
-        for value in ({"a": 2**64}, {"a": -(2**63) - 1}, Json('{"a":1e400}'), Json('{"a":%s}' % ("1" * 5000))):
+        for value in ({"a": 2**64}, {"a": -(2**63) - 1}, Json('{"a":1e400}'),
+                      Json('{"a":%s}' % ("1" * 5000))):
             self.refused(Result.INVALID_JSON, ANALYTICS, value)
 
     def test_with_a_lone_surrogate_is_no_text(self):
@@ -134,15 +142,15 @@ class AnObject(Sending):
 
 class Jsons(Sending):
     def test_are_checked(self):
-        for text in ("", " ", "{", "{'a':1}", '{"a":1}}', "[1,]", "NaN", "-Infinity", "01", "1.", "\ufeff{}", '"\n"',
-                     "tru", '"\\x"', '"\\u12"', "\u0661", "1.\u0661"):
+        for text in ("", " ", "{", "{'a':1}", '{"a":1}}', "[1,]", "NaN", "-Infinity", "01", "1.", "\ufeff{}",
+                     '"\n"', "tru", '"\\x"', '"\\u12"', "\u0661", "1.\u0661"):
             self.refused(Result.INVALID_JSON, STORE, Json(text))
 
     def test_may_hold_whole_surrogate_pairs_in_escapes(self):
         for text in (r'["\ud83d\ude00"]', r'["\\ud800"]', r'["\uD83D\uDE00\ud83d\ude00"]'):
             self.assertIn(text, self.sent(STORE, Json(text)))
-        for text in (r'["\ud83d"]', r'["\ude00\ud83d"]', r'["\ud83d\\\ude00"]', r'["\ud83d\ud83d\ude00\ude00"]',
-                     r'{"\udc00":1}', r'"\\\ud800"'):
+        for text in (r'["\ud83d"]', r'["\ude00\ud83d"]', r'["\ud83d\\\ude00"]',
+                     r'["\ud83d\ud83d\ude00\ude00"]', r'{"\udc00":1}', r'"\\\ud800"'):
             self.refused(Result.INVALID_JSON, STORE, Json(text))
 
     def test_may_nest_127_levels_for_analytics_and_more_for_the_store(self):
@@ -153,7 +161,8 @@ class Jsons(Sending):
         self.sent(ANALYTICS, Json(nested(127)))
         self.refused(Result.INVALID_JSON, ANALYTICS, Json(nested(128)))
         self.refused(Result.INVALID_JSON, STORE, Json("[" * 10000))
-        self.assertEqual(self.value(STORE, Json('[%s"%s"]' % ("[]," * 200, "[" * 200))), [[]] * 200 + ["[" * 200])
+        self.assertEqual(self.value(STORE, Json('[%s"%s"]' % ("[]," * 200, "[" * 200))),
+                         [[]] * 200 + ["[" * 200])
 
     def test_that_are_no_object_are_refused_for_analytics(self):
         for text in ("null", "1", '"a"', "[]", "true"):
@@ -178,8 +187,8 @@ class AModule(Sending):
         self.reporter.event("A100|1")
         self.reporter.event("A100|2")
         self.assertEqual(self.listener.datagrams()[0],
-                         '{"msgType":"init","exdata":{"moduleID":"A100","moduleVersion":"2.1","moduleName":"Painter",'
-                         '"logPath":"","dbPath":"","openID":"","hublinkVersion":""}}')
+                         '{"msgType":"init","exdata":{"moduleID":"A100","moduleVersion":"2.1",'
+                         '"moduleName":"Painter","logPath":"","dbPath":"","openID":"","hublinkVersion":""}}')
         self.reporter.event("A100|3")
         self.assertEqual(self.listener.kinds(), ["A100|3"])
 
@@ -206,7 +215,8 @@ class AUser(Sending):
     def test_is_told_at_once(self):
         self.assertIs(self.reporter.set_user("u1 eventID", "5.1"), Result.SENT)
         self.assertEqual(self.listener.datagrams(),
-                         ['{"msgType":"updateOpenID","exdata":{"openID":"u1 event\\u0049D","hublinkVersion":"5.1"}}'])
+                         ['{"msgType":"updateOpenID",'
+                          '"exdata":{"openID":"u1 event\\u0049D","hublinkVersion":"5.1"}}'])
 
     def test_is_refused_with_a_quote_or_without_a_text(self):
         for user, result in ((("u'1",), Result.QUOTE_IN_USER), (("u", "5'"), Result.QUOTE_IN_USER),
@@ -235,7 +245,8 @@ class TheModule(unittest.TestCase):
         ast.parse(self.FILE.read_text(), feature_version=(3, 9))
 
     def test_has_the_version_of_the_library_for_cpp(self):
-        library = re.search(r"VERSION ([0-9.]+)", (ROOT / "Client/CMakeLists.txt").read_text().split("project(")[1])[1]
+        library = re.search(r"VERSION ([0-9.]+)",
+                            (ROOT / "Client/CMakeLists.txt").read_text().split("project(")[1])[1]
         self.assertIn(f'\nversion = "{library}"\n', (self.FILE.parent / "pyproject.toml").read_text())
 
 

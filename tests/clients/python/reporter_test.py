@@ -1,4 +1,5 @@
-"""A reporter and its surroundings: a service that stops and starts, other users, a full buffer, threads, forks."""
+"""A reporter and its surroundings: a service that stops and starts, other users, a full buffer, threads,
+forks."""
 import errno
 import gc
 import os
@@ -97,7 +98,8 @@ class ARestart(Reporting):
                     self.expect(Result.SENT)
         told = ["updateOpenID", "init"]
         # This is the first time that the reporter finds no table, so it announces both first.
-        self.assertEqual(self.listener.kinds(), told + ["A100|1"] * 3 + told + ["A100|1"] * 2 + told + ["A100|1"])
+        self.assertEqual(self.listener.kinds(),
+                         told + ["A100|1"] * 3 + told + ["A100|1"] * 2 + told + ["A100|1"])
 
     def test_that_the_system_tells_late_costs_no_event(self):
         """As a busy system does: the error of an earlier datagram comes up at the next."""
@@ -152,7 +154,8 @@ class AServiceOfAnotherUser(Reporting):
 
 
 class TheTableOfSockets(unittest.TestCase):
-    LINE = "  696: {}:270D {}:{} 07 00000000:00000000 00:00000000 00000000 {:5}        0 {} 2 00000000370a03e8 0\n"
+    LINE = ("  696: {}:270D {}:{} 07 00000000:00000000 00:00000000 00000000 {:5}        0 {} 2 "
+            "00000000370a03e8 0\n")
     LOCAL, ANY, MAPPED = "0100007F", "00000000", "0000000000000000FFFF00000100007F"
 
     def found(self, *lines):
@@ -161,20 +164,23 @@ class TheTableOfSockets(unittest.TestCase):
         return [listener[1:] for listener in sorted(hublink_report._listeners(table, 1000))]
 
     def test_has_the_service_first_at_its_very_address(self):
-        self.assertEqual(self.found((self.ANY, self.ANY, "0000", 0, 1), (self.LOCAL, self.ANY, "0000", 1000, 2)),
+        self.assertEqual(self.found((self.ANY, self.ANY, "0000", 0, 1),
+                                    (self.LOCAL, self.ANY, "0000", 1000, 2)),
                          [(True, "2"), (False, "1")])
 
     def test_has_another_users_before_ones_own(self):
-        self.assertEqual(self.found((self.LOCAL, self.ANY, "0000", 1000, 1), (self.LOCAL, self.ANY, "0000", 7, 2),
+        self.assertEqual(self.found((self.LOCAL, self.ANY, "0000", 1000, 1),
+                                    (self.LOCAL, self.ANY, "0000", 7, 2),
                                     (self.MAPPED, "0" * 32, "0000", 1000, 3)),
                          [(False, "2"), (True, "1"), (True, "3")])
 
     def test_has_no_service_in_senders_and_other_addresses(self):
-        self.assertEqual(self.found((self.LOCAL, self.LOCAL, "270D", 0, 1), ("0200007F", self.ANY, "0000", 0, 2)), [])
+        self.assertEqual(self.found((self.LOCAL, self.LOCAL, "270D", 0, 1),
+                                    ("0200007F", self.ANY, "0000", 0, 2)), [])
 
     def test_is_read_as_this_machine_writes_it(self):
-        for family, address in ((socket.AF_INET, "127.0.0.1"), (socket.AF_INET, "0.0.0.0"), (socket.AF_INET6, "::"),
-                                (socket.AF_INET6, "::ffff:127.0.0.1")):
+        for family, address in ((socket.AF_INET, "127.0.0.1"), (socket.AF_INET, "0.0.0.0"),
+                                (socket.AF_INET6, "::"), (socket.AF_INET6, "::ffff:127.0.0.1")):
             with self.subTest(address), socket.socket(family, socket.SOCK_DGRAM) as bound:
                 bound.bind((address, ADDRESS[1]))
                 found = hublink_report._listener()
@@ -188,7 +194,8 @@ class AFullBuffer(Reporting):
         if not shutil.which("tc"):
             self.skipTest("needs tc")
         # A network that passes a byte a second, so that sent datagrams stay in the sender's buffer.
-        tc = ["tc", "qdisc", "add", "dev", "lo", "root", "tbf", "rate", "8bit", "burst", "4000", "limit", "10000000"]
+        tc = ["tc", "qdisc", "add", "dev", "lo", "root", "tbf", "rate", "8bit", "burst", "4000", "limit",
+              "10000000"]
         with Listener():
             self.expect(Result.SENT)
             if subprocess.run(tc, capture_output=True).returncode != 0:
@@ -237,7 +244,8 @@ class AnErrorOfTheSystem(Reporting):
         with tempfile.NamedTemporaryFile() as table, Listener():
             table.write(b"  1: 0100007F:270D 00000000:0000 07\n")
             table.flush()
-            with mock.patch.object(hublink_report, "_TABLES", (pathlib.Path(table.name), pathlib.Path("/nowhere"))):
+            with mock.patch.object(hublink_report, "_TABLES",
+                                   (pathlib.Path(table.name), pathlib.Path("/nowhere"))):
                 self.expect(Result.SENT)
 
 
@@ -271,14 +279,16 @@ class AFork(Reporting):
 
     def test_never_meets_a_thread_that_imports_for_the_module(self):
         """The child would wait for ever for the import's lock."""
-        script = ("import sys; from hublink_report import Json, Module, Reporter, Result; before = set(sys.modules);"
+        script = ("import sys; from hublink_report import Json, Module, Reporter, Result;"
+                  "before = set(sys.modules);"
                   "reporter = Reporter(Module('A100', '1', 'n'));"
                   "results = {reporter.set_user('u'), reporter.event('A100|1', Json('{\"a\":[1.5,1]}')),"
                   "reporter.event('B100|1', '\\u00fc'), reporter.event('B100|1', '\\ud800')};"
-                  "assert results == {Result.SENT, Result.INVALID_TEXT}, results; print(*set(sys.modules) - before)")
+                  "assert results == {Result.SENT, Result.INVALID_TEXT}, results;"
+                  "print(*set(sys.modules) - before)")
         with Listener():
-            outcome = subprocess.run([sys.executable, "-B", "-c", script], cwd=ROOT / "clients/python", text=True,
-                                     check=True, stdout=subprocess.PIPE)
+            outcome = subprocess.run([sys.executable, "-B", "-c", script], cwd=ROOT / "clients/python",
+                                     text=True, check=True, stdout=subprocess.PIPE)
         self.assertEqual(outcome.stdout.strip(), "")
 
     def test_in_the_midst_of_many_threads_costs_no_event(self):

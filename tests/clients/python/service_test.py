@@ -1,5 +1,6 @@
-"""Through the real service: service_test.py PROGRAMS CASES. Whatever the module calls sent is in the store as it was
-given, or in the outbox as the same JSON; whatever it refuses, it refuses for a reason that is there."""
+"""Through the real service: service_test.py PROGRAMS CASES. Whatever the module calls sent is in the store as
+it was given, or in the outbox as the same JSON; whatever it refuses, it refuses for a reason that is
+there."""
 import json
 import random
 import sys
@@ -14,7 +15,8 @@ SEED = random.randrange(2**32)
 AT_ONCE_BYTES = 100_000  # the service's buffer holds this much in any case, with what the system adds
 
 PIECES = ["'", "''", "\"", "\\", "%", "%s", "%1%", "\\u0027", "\\'", "eventID", '"eventID":"A1|1"', "|", "\n",
-          "\r\n", "\t", "\x01", "\x1f", "\x7f", "\u00e4", "\u2028", "\ufeff", "\uffff", "\U0001f600", "\U0010ffff",
+          "\r\n", "\t", "\x01", "\x1f", "\x7f", "\u00e4", "\u2028", "\ufeff", "\uffff", "\U0001f600",
+          "\U0010ffff",
           "');--", "values(", "{}", "[", "null", "true", "1.5", " ", "a", "B100", "A759", "openid.", "x" * 40]
 BROKEN = ["\0", "\ud800", "\udfff", "\udc00\ud800"]
 NUMBERS = [0, 1, -1, 2**31, 2**53 + 1, 2**63 - 1, -(2**63), 2**64 - 1, 0.0, -0.0, 1.5, -2.5e-7, 5e-324,
@@ -76,8 +78,8 @@ class Cases:
             except (TypeError, ValueError):
                 return None
         return Json(self.random.choice(['{"a":1,"a":{"a":2},"a":"\'"}', '{"a\\u0027":"\\u0000\\/\\b"}',
-                                        "[1e2,-0,-0.0,1E-5]", " [ ] ", "{", "1 1", '"\\ud800"', "[" * 127 + "]" * 127,
-                                        "[" * 128 + "]" * 128,
+                                        "[1e2,-0,-0.0,1E-5]", " [ ] ", "{", "1 1", '"\\ud800"',
+                                        "[" * 127 + "]" * 127, "[" * 128 + "]" * 128,
                                         self.text()]))
 
     def event_id(self):
@@ -90,7 +92,8 @@ def broken(text):
 
 
 def parsed(text):
-    """JSON with all members of an object in their order, also of one name, and 1 apart from 1.0 and from true."""
+    """JSON with all members of an object in their order, also of one name, and 1 apart from 1.0 and from
+    true."""
     return repr(json.loads(text, object_pairs_hook=lambda members: ("object", members)))
 
 
@@ -121,8 +124,8 @@ class Sent(unittest.TestCase):
         service.drain()
         reporter.event("B100|last")
         reporter.event("A759|last")
-        wait_until(lambda: service.rows("select 1 from event where event_id = 'A759|last'", "MetrikOutbox.db") and
-                   service.rows("select 1 from OperLog where eventID = 'B100|last'"), 60)
+        wait_until(lambda: service.rows("select 1 from event where event_id = 'A759|last'", "MetrikOutbox.db")
+                   and service.rows("select 1 from OperLog where eventID = 'B100|last'"), 60)
         return service.stored()[:-1], service.kept()[:-1]
 
     @classmethod
@@ -172,7 +175,8 @@ class Sent(unittest.TestCase):
             self.assertEqual(kept_id, event_id, about)
             root = json.loads(payload)
             self.assertEqual(int(root["extend"]["createTime"]), time_ms, about)
-            self.assertEqual((root["eventData"]["openid"], root["extend"]["hublinkVersion"]), (open_id, version), about)
+            self.assertEqual((root["eventData"]["openid"], root["extend"]["hublinkVersion"]),
+                             (open_id, version), about)
             data = dict(members(payload)[1])["eventData"][1]
             given = members(as_json(value))[1] if value else []
             self.assertEqual(repr(data[:-2]), repr(given), about)
@@ -182,8 +186,9 @@ class Sent(unittest.TestCase):
         counts = {result: len(cases) for result, cases in self.results.items()}
         self.assertGreater(len(self.stored), CASES / 3, counts)
         self.assertGreater(len(self.kept), CASES / 20, counts)
-        self.assertEqual([result for result in (Result.NOBODY_LISTENS, Result.OTHER_USERS_SERVICE, Result.WOULD_BLOCK,
-                                                Result.SYSTEM_ERROR) if counts[result]], [])
+        failures = (Result.NOBODY_LISTENS, Result.OTHER_USERS_SERVICE, Result.WOULD_BLOCK,
+                    Result.SYSTEM_ERROR)
+        self.assertEqual([result for result in failures if counts[result]], [])
         if CASES >= 10_000:  # fewer cases may miss one by chance
             self.assertEqual([result for result in (Result.TOO_LONG, Result.INVALID_TEXT, Result.INVALID_JSON,
                                                     Result.INVALID_EVENT_ID) if not counts[result]], [])
@@ -199,7 +204,8 @@ class Sent(unittest.TestCase):
             self.assertTrue(not event_id or broken(event_id) or
                             event_id.startswith("A") and not (bar and module in ("A759", "A100")), event_id)
         for event_id, value, _ in self.results[Result.INVALID_JSON]:
-            self.assertTrue(no_json(value) or event_id.startswith("A") and no_object(value), (event_id, value))
+            self.assertTrue(no_json(value) or event_id.startswith("A") and no_object(value),
+                            (event_id, value))
         for open_id, version in self.users[Result.QUOTE_IN_USER]:
             self.assertIn("'", open_id + version)
         for open_id, version in self.users[Result.INVALID_TEXT]:

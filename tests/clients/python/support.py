@@ -1,5 +1,5 @@
-"""What the tests of the Python module share: a listener in the service's place, the service itself, and a child of
-another user. All of them run in tests/in-sandbox."""
+"""What the tests of the Python module share: a listener in the service's place, the service itself, and a
+child of another user. All of them run in tests/in-sandbox."""
 import contextlib
 import json
 import os
@@ -70,7 +70,8 @@ def listener_of_another_user():
               "s.bind(%r); print(flush=True); sys.stdin.read(); s.setblocking(False)\n"
               "try: print(s.recv(65536).decode())\n"
               "except BlockingIOError: print('nothing')" % (NOBODY, ADDRESS))
-    child = subprocess.Popen([sys.executable, "-c", script], stdin=subprocess.PIPE, stdout=subprocess.PIPE, text=True)
+    child = subprocess.Popen([sys.executable, "-c", script], stdin=subprocess.PIPE, stdout=subprocess.PIPE,
+                             text=True)
     child.stdout.readline()
     try:
         yield lambda: child.communicate()[0].strip()  # ends the child, and returns what it got
@@ -89,9 +90,10 @@ class Service:
 
     def __enter__(self):
         self.directory = pathlib.Path(tempfile.mkdtemp(prefix="hublink."))
-        self.environment = {"XDG_DATA_HOME": str(self.directory), "HOME": str(self.directory), "PATH": "/usr/bin:/bin",
-                            "ASAN_OPTIONS": "detect_leaks=0"}
-        subprocess.run([self.programs / "reportctl", "setup"], env=self.environment, check=True, capture_output=True)
+        self.environment = {"XDG_DATA_HOME": str(self.directory), "HOME": str(self.directory),
+                            "PATH": "/usr/bin:/bin", "ASAN_OPTIONS": "detect_leaks=0"}
+        subprocess.run([self.programs / "reportctl", "setup"], env=self.environment, check=True,
+                       capture_output=True)
         self.start()
         return self
 
@@ -104,8 +106,8 @@ class Service:
 
     def start(self):
         with (self.directory / "output").open("a") as output:
-            self.process = subprocess.Popen([self.programs / "SyncServiceReport"], env=self.environment, stdout=output,
-                                            stderr=output)
+            self.process = subprocess.Popen([self.programs / "SyncServiceReport"], env=self.environment,
+                                            stdout=output, stderr=output)
         wait_until(self.line_of_its_socket)
 
     def stop(self):
@@ -122,7 +124,8 @@ class Service:
         wait_until(lambda: self.line_of_its_socket()[4].endswith(":00000000"))
 
     def rows(self, query, file="Report.db"):
-        connection = sqlite3.connect(f"file:{self.directory}/hublink/database/{file}?mode=ro", uri=True, timeout=30)
+        connection = sqlite3.connect(f"file:{self.directory}/hublink/database/{file}?mode=ro", uri=True,
+                                     timeout=30)
         try:
             return connection.execute(query).fetchall()
         finally:
@@ -130,7 +133,8 @@ class Service:
 
     def stored(self):
         """Event id, value, time, kind, suite version and open id of each report in the local store."""
-        return self.rows("select eventID, value, createTime, pType, extData3, extData4 from OperLog order by id")
+        return self.rows("select eventID, value, createTime, pType, extData3, extData4 from OperLog"
+                         " order by id")
 
     def kept(self):
         """Event id and payload of each event in the outbox."""

@@ -9,9 +9,9 @@ import subprocess
 import tempfile
 import time
 
-FLAGS = ["--headless=new", "--no-sandbox", "--disable-gpu", "--disable-quic", "--no-first-run", "--disable-dev-shm-usage",
-         "--disable-background-networking", "--disable-component-update", "--disable-sync", "--disable-extensions",
-         "--remote-debugging-pipe"]
+FLAGS = ["--headless=new", "--no-sandbox", "--disable-gpu", "--disable-quic", "--no-first-run",
+         "--disable-dev-shm-usage", "--disable-background-networking", "--disable-component-update",
+         "--disable-sync", "--disable-extensions", "--remote-debugging-pipe"]
 DEADLINE_S = 60
 
 
@@ -31,7 +31,8 @@ class Browser:
             os.dup2(high_read, 3)
             os.dup2(high_write, 4)
 
-        self.process = subprocess.Popen(["chromium", *FLAGS, "--user-data-dir=" + self.profile], preexec_fn=in_child,
+        self.process = subprocess.Popen(["chromium", *FLAGS, "--user-data-dir=" + self.profile],
+                                        preexec_fn=in_child,
                                         close_fds=False, stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL)
         os.close(to_browser)
         os.close(from_browser)
@@ -41,7 +42,8 @@ class Browser:
         self.complaints = []
         self.requests = []
         target = self.command("Target.createTarget", {"url": "about:blank"})["targetId"]
-        self.session = self.command("Target.attachToTarget", {"targetId": target, "flatten": True})["sessionId"]
+        self.session = self.command("Target.attachToTarget",
+                                    {"targetId": target, "flatten": True})["sessionId"]
         for domain in ("Page", "Runtime", "Log", "Network"):
             self.command(domain + ".enable")
 
@@ -96,7 +98,8 @@ class Browser:
         self._go("about:blank", "location.href === 'about:blank'")
         self.command("Emulation.setDeviceMetricsOverride",
                      {"width": width, "height": height, "deviceScaleFactor": 1, "mobile": width < 600})
-        self.command("Emulation.setEmulatedMedia", {"features": [{"name": "prefers-color-scheme", "value": scheme}]})
+        self.command("Emulation.setEmulatedMedia",
+                     {"features": [{"name": "prefers-color-scheme", "value": scheme}]})
 
     def zone(self, name):
         self.command("Emulation.setTimezoneOverride", {"timezoneId": name})

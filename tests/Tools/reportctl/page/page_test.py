@@ -46,7 +46,8 @@ class Page(unittest.TestCase):
             with self.subTest(look):
                 page = self.open(look)
                 self.assertEqual(page.complaints, [])
-                self.assertEqual([url for url in page.requests if not url.startswith("data:")], ["file://" + self.path])
+                self.assertEqual([url for url in page.requests if not url.startswith("data:")],
+                                 ["file://" + self.path])
                 if SCREENSHOTS:
                     page.screenshot(os.path.join(SCREENSHOTS, f"page-{look}.png"))
 
@@ -55,7 +56,8 @@ class Page(unittest.TestCase):
         self.assertLessEqual(page.value("document.documentElement.scrollWidth"), 360)
 
     def test_has_other_colours_in_the_dark(self):
-        grounds = [self.open(look).value("getComputedStyle(document.body).backgroundColor") for look in ("light", "dark")]
+        grounds = [self.open(look).value("getComputedStyle(document.body).backgroundColor")
+                   for look in ("light", "dark")]
         self.assertEqual(grounds, ["rgb(255, 255, 255)", "rgb(13, 17, 23)"])
 
     def test_tells_the_verdict_with_its_reasons(self):
@@ -65,11 +67,13 @@ class Page(unittest.TestCase):
 
     def test_shows_where_reports_ended(self):
         self.open()
-        flow = self.browser.value("[...document.querySelectorAll('#flow .flow li')].map(item => item.innerText.replace(/\\s+/g, ' '))")
-        self.assertEqual(flow, ["received 123,456", "→ in the store 120,000", "→ to analytics 3,000", "→ control messages 40",
-                                "→ other control messages 2", "→ empty datagrams 1", "→ waiting now 3",
-                                "→ dropped by the system before the service saw them 77", "→ refused: no JSON 398",
-                                "→ refused: by the store 12"])
+        flow = self.browser.value("[...document.querySelectorAll('#flow .flow li')]"
+                                  ".map(item => item.innerText.replace(/\\s+/g, ' '))")
+        self.assertEqual(flow, ["received 123,456", "→ in the store 120,000", "→ to analytics 3,000",
+                                "→ control messages 40", "→ other control messages 2",
+                                "→ empty datagrams 1", "→ waiting now 3",
+                                "→ dropped by the system before the service saw them 77",
+                                "→ refused: no JSON 398", "→ refused: by the store 12"])
 
     def test_has_the_numbers_of_each_chart_in_a_table(self):
         self.open()
@@ -110,10 +114,12 @@ class Page(unittest.TestCase):
     def test_can_be_used_with_a_keyboard_and_read_aloud(self):
         page = self.open()
         self.assertEqual(page.value("document.documentElement.lang"), "en")
-        self.assertTrue(page.value("[...document.querySelectorAll('canvas')].every(canvas => canvas.getAttribute('aria-label'))"))
+        self.assertTrue(page.value("[...document.querySelectorAll('canvas')]"
+                                   ".every(canvas => canvas.getAttribute('aria-label'))"))
         self.assertTrue(page.value("[...document.querySelectorAll('section')].every(section =>"
                                    " document.getElementById(section.getAttribute('aria-labelledby')))"))
-        page.command("Input.dispatchKeyEvent", {"type": "rawKeyDown", "key": "Tab", "code": "Tab", "windowsVirtualKeyCode": 9})
+        page.command("Input.dispatchKeyEvent",
+                     {"type": "rawKeyDown", "key": "Tab", "code": "Tab", "windowsVirtualKeyCode": 9})
         page.command("Input.dispatchKeyEvent", {"type": "keyDown", "key": "Enter", "code": "Enter",
                                                 "windowsVirtualKeyCode": 13, "text": "\r"})
         self.assertEqual(page.value("document.activeElement.tagName"), "SUMMARY")
