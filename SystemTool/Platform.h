@@ -39,8 +39,8 @@ std::int64_t CoarseTimeMs();
 /// before.
 bool AllocateFile(int file, std::int64_t bytes);
 
-/// Locks an open file for writing. The lock lasts until this process closes the file or ends, in whatever
-/// way. Never waits. False when the lock is already held, or when the file system has no locks.
+/// Locks an open file for writing. The lock lasts until this process closes the file or ends, also by a
+/// signal. Never waits. False when the lock is already held, or when the file system has no locks.
 bool TryLockFile(int file);
 
 /// Whether the file is locked through another open() of it. Takes no lock itself, so it disturbs no other

@@ -1,5 +1,5 @@
-// Datagrams through the server into the real store. Whatever text of a report is in the statement, the table
-// must get one row at most, and nothing else in the database must change.
+// Datagrams through the server into the real store. With every text of a report in the statement, the
+// table must get one row at most, and nothing else in the database must change.
 
 #include <filesystem>
 

@@ -113,7 +113,7 @@ def _item_ns(plan, program, names):
 
 
 def rest(_, plan, __):
-    """While nobody sends anything."""
+    """While no program sends anything."""
     with subjects.Service() as service:
         before = sum(procfs.thread_ns(service.process.pid).values())
         time.sleep(plan.rest_seconds)

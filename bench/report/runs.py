@@ -37,7 +37,7 @@ def settle(subject):
 
 
 def measure(subject_class, count, rate=0):
-    """A dictionary of plain numbers. `subject_class` is whatever makes a subject."""
+    """A dictionary of plain numbers. `subject_class` is a class or a function that makes a subject."""
     with subject_class() as subject:
         pid = subject.process.pid
         udp, cpu = procfs.udp_counters(), procfs.thread_ns(pid)

@@ -169,7 +169,7 @@ def floor(results):
 
 def rest(found):
     run = found["service"]
-    return table(["while nobody sends", ""], [("from start to bound socket", f"{run['ready_ms']:.1f} ms"),
+    return table(["while no program sends", ""], [("from start to bound socket", f"{run['ready_ms']:.1f} ms"),
                                               ("processor", f"{run['core_part']:.3%} of a core"),
                                               ("memory", f"{run['resident_bytes'] / 2**20:.1f} MiB")])
 

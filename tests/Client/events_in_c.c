@@ -1,6 +1,6 @@
-/* Sends events that it reads from standard input, and answers each with one byte, which is the result. An event
- * is a letter (n for no value, t for a text, j for JSON), the lengths of id and value as two numbers of 32 bits,
- * the id and the value. */
+/* Sends events that it reads from standard input, and answers each with one byte, which is the result. An
+ * event is a letter (n for no value, t for a text, j for JSON), the lengths of id and value as two numbers of
+ * 32 bits, the id and the value. */
 #include <stdint.h>
 #include <stdio.h>
 #include <stdlib.h>

@@ -143,7 +143,7 @@ TEST_F(StoreFault, TheMemoryOfABacklogIsGivenBackOnceItIsStored) {
     other.exec("commit");
     ASSERT_TRUE(WaitUntil([&] { return m_service.RowCount() == rows + REPORTS; }, 30s));
     const auto isGivenBack = [&] { return m_service.ResidentKilobytes() - before < 8'000; };
-    EXPECT_TRUE(WaitUntil(isGivenBack, 30s)) << "though nobody sends";
+    EXPECT_TRUE(WaitUntil(isGivenBack, 30s)) << "though no program sends";
 }
 
 TEST_F(StoreFault, ADeletedStoreCostsWhatWasInItAndWhatComesUntilSetUpMakesAnother) {

@@ -25,7 +25,7 @@ public:
         if (std::getenv("FAKE_LOGGER_REFUSES") != nullptr)
             throw SystemTool::BSException("no log") << SystemTool::BSErrorText("disk full");
         if (std::getenv("FAKE_LOGGER_BREAKS") != nullptr)
-            throw std::runtime_error("of no kind that anybody expects");
+            throw std::runtime_error("of a kind that no caller expects");
         if (State().echoes)
             std::cerr << "InitLog " << logDir << ' ' << fileName << ' ' << appName << ' ' << moduleName << ' '
                       << maxFileBytes << ' ' << maxTotalBytes << ' ' << flushEach << ' ' << console

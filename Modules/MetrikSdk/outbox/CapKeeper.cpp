@@ -41,7 +41,7 @@ void CapKeeper::CountDrops(const OutboxStore::Dropped& dropped, SteadyTime now,
     if (begins)
         news.push_back({report::Cause::Drop, "The outbox is over its bounds: old events are being dropped, " +
                                                  std::to_string(dropped.events) +
-                                                 " of them just now; the total is told when that is over"});
+                                                 " of them just now; the total is logged when that is over"});
 }
 
 void CapKeeper::TellEndOfRun(const std::optional<std::string>& totals, std::vector<report::News>& news) {

@@ -17,8 +17,8 @@ namespace MetrikSdk::process {
 /// The outboxes of this process: one for each database directory, however many modules use it.
 ///
 /// Directories come from outside, in datagrams. An empty directory means the first one that the process was
-/// given. So does a directory that breaks the rule of Sqlite::SafeDirectory, and each new directory when
-/// MAX_OUTBOXES are in use: an outbox takes a file and a thread.
+/// given. The first one is also used in place of a directory that breaks the rule of Sqlite::SafeDirectory,
+/// and of each new directory when MAX_OUTBOXES are in use: an outbox takes a file and a thread.
 ///
 /// Threads: any.
 class OutboxRegistry {

@@ -107,7 +107,7 @@ int Plan(const Collector& collector, const ForwardOptions& options) {
     return missing.empty() ? 0 : 1;
 }
 
-/// What went wrong was told when it did.
+/// Errors are not repeated here: each was printed when it happened.
 void TellResult(const forward::Result& result, const Collector& collector, bool isWithMetrics) {
     fmt::print("{} sent to {}.\n", Rows(result.rows.sent), DestinationOf(collector.logs));
     if (result.rows.refused > 0)

@@ -31,8 +31,8 @@ constexpr auto HELP =
     "  reportctl send --file reports.txt --rate 200\n"
     "  reportctl send --event 'B100|10001' --dry-run | sed s/B100/B200/ | reportctl send -\n"
     "\n"
-    "The service answers nobody. \"sent\" means that somebody listens on its port, and no more: whether it\n"
-    "took the message is in its log and in the store.\n"
+    "The service sends no answer. \"sent\" means that a program listens on its port, and no more: whether\n"
+    "the service took the message is in its log and in the store.\n"
     "\n";
 
 struct SendOptions {
@@ -151,7 +151,7 @@ void AddLines(CLI::App& send, SendOptions& options) {
     send.add_option("input", options.standardInput, "- alone: the same as --file -")->check(isDash);
     send.add_option("--rate", options.delivery.pace.perSecond,
                     "Lines a second, at the most. Datagrams that come faster than the service takes them are "
-                    "lost without a word")
+                    "lost, and no message says so")
         ->capture_default_str()
         ->check(CLI::Range(1, 1'000'000));
 }
@@ -163,7 +163,7 @@ void AddSend(CLI::App& app, int& exitCode) {
     auto* send = app.add_subcommand(
         "send",
         "Send the running service a report or a control message, from flags or line by line. What the "
-        "service would refuse, cut or lose is not sent; the reason is told.");
+        "service would refuse, cut or lose is not sent; the reason is printed.");
     AddReport(*send, *options);
     AddInit(*send, *options);
     AddOpenId(*send, *options);

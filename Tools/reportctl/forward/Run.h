@@ -42,8 +42,8 @@ Plan PlanRun(const Task& task);
 /// each minute. `collector` has what it needs.
 ///
 /// Returns at the end of a run with an end, or after Ctrl-C or SIGTERM, which also ends a request under way.
-/// The calling thread must be the only one. Failure: as State; what goes wrong with the store or the
-/// collector is told, waited for, and in the result.
+/// The calling thread must be the only one. Failure: as State; an error of the store or the collector is
+/// given to `teller`, waited for, and in the result.
 Result Run(const Task& task, const Collector& collector, Teller& teller);
 
 /// For a run with an end: shorter waits, because a timer starts the next one.

@@ -31,8 +31,8 @@ void TellError(const Origin& origin, const std::string& text) {
     fmt::print(stderr, "error: {}{}\n", origin, text);
 }
 
-void TellNobodyListens(const Origin& origin) {
-    TellError(origin, fmt::format("nobody listens on {}; is the service running?", Sender::Address()));
+void TellNoListener(const Origin& origin) {
+    TellError(origin, fmt::format("no program listens on {}; is the service running?", Sender::Address()));
 }
 
 void TellWarning(const Origin& origin, const std::string& text) {
@@ -130,7 +130,7 @@ public:
     void AwaitRefusal() {
         if (m_settings.dryRun || m_sent == 0 || !m_stop.empty() || m_sender.IsHeard())
             return;
-        TellNobodyListens("");
+        TellNoListener("");
         m_stop = "; the last of them were lost";
     }
 
@@ -151,7 +151,7 @@ private:
             m_bytes += line.size();
             return true;
         }
-        TellNobodyListens(fmt::format("line {}: ", number));
+        TellNoListener(fmt::format("line {}: ", number));
         m_stop = fmt::format("; stopped at line {}", number);
         return false;
     }
@@ -194,7 +194,7 @@ int DeliverOne(const std::string& text, const DeliverySettings& settings) {
     }
     Sender sender;
     if (!sender.Send(text) || !sender.IsHeard()) {
-        TellNobodyListens("");
+        TellNoListener("");
         return 1;
     }
     fmt::print("sent {} ({})\n", judgement.what, Count(text.size(), "byte"));

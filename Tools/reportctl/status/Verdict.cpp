@@ -103,8 +103,8 @@ private:
         const auto& look = m_status.ledger;
         if (m_status.service.isRunning && !look.counting)
             Add(Verdict::Degraded,
-                "The service keeps no ledger in its file, so nobody can tell what it refuses or loses. "
-                "docs/Ledger.md tells why that may be; restart the service when it is mended.");
+                "The service keeps no ledger in its file, so what it refuses or loses is not counted. "
+                "docs/Ledger.md tells why that may be; restart the service when the cause is repaired.");
         if (look.sight != ReportLedger::Sight::Sound)
             return;
         for (const Fault& fault : FAULTS)

@@ -14,8 +14,8 @@ std::size_t Columns();
 std::size_t Rows();
 
 /// The line, broken at blanks so that each part has at most so many columns. The parts after the first begin
-/// with `indent` blanks. With 0 columns, or too few for the indent, the line stays as it is. So does a word
-/// that is longer than a line.
+/// with `indent` blanks. With 0 columns, or too few for the indent, the line stays as it is. A
+/// word that is longer than a line stays whole.
 std::string Broken(std::string_view line, std::size_t columns, std::size_t indent = 0);
 
 /// The lines that fit above the last row of the terminal, which stays free for the cursor. A text with more

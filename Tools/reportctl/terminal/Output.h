@@ -5,7 +5,7 @@
 namespace reportctl::terminal {
 
 /// Writes out what standard output has in its buffer. Call it before a line on standard error, so that the
-/// two keep their order when they go to the same place. A failure is told by FinishOutput.
+/// two keep their order when they go to the same place. FinishOutput reports a failure.
 void FlushOutput();
 
 /// Writes out what standard output still has in its buffer. Call it at the program's end. Returns `exitCode`.

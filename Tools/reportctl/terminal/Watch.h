@@ -4,7 +4,7 @@
 
 namespace reportctl::terminal {
 
-/// For a command that runs until it is told to end. While this object lives, Ctrl-C and SIGTERM do not kill
+/// For a command that runs until a signal ends it. While this object lives, Ctrl-C and SIGTERM do not kill
 /// the program: Wait returns false, and the command can end in an orderly way.
 ///
 /// Only one object at a time, on the main thread.

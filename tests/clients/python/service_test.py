@@ -1,6 +1,6 @@
-"""Through the real service: service_test.py PROGRAMS CASES. Whatever the module calls sent is in the store as
-it was given, or in the outbox as the same JSON; whatever it refuses, it refuses for a reason that is
-there."""
+"""Through the real service: service_test.py PROGRAMS CASES. Every event that the module calls sent is in the
+store as it was given, or in the outbox as the same JSON; each event that it refuses has the reason for which
+it is refused."""
 import json
 import random
 import sys

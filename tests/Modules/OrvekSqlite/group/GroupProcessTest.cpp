@@ -180,7 +180,7 @@ TEST_F(AnotherProgram, IsNotLockedOutForLongerThanAGroup) {
             taken.push_back(now - since);
         if (!isFree && wasFree)
             since = now;
-        ASSERT_LT(now - since, 10s) << "nobody else is writing, or nobody else may";
+        ASSERT_LT(now - since, 10s) << "no other program is writing, or none may";
         wasFree = isFree;
     }
     std::sort(taken.begin(), taken.end());
@@ -201,7 +201,7 @@ TEST_F(AnotherProgram, HasItsTurnUnderConstantLoad) {
         ASSERT_NO_THROW(other.exec("insert into BaseInfo values ('other', '')")) << "number " << i;
         waits.push_back(Clock::now() - start);
     }
-    EXPECT_GT(Shared().returned, before) << "nobody else was writing";
+    EXPECT_GT(Shared().returned, before) << "no other program was writing";
     std::sort(waits.begin(), waits.end());
     const auto ms = [](auto wait) { return std::chrono::duration<double, std::milli>(wait).count(); };
     std::printf("waits for the lock: median %.1f ms, longest %.1f ms\n", ms(waits[50]), ms(waits.back()));

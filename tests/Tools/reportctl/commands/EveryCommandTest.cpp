@@ -91,7 +91,7 @@ bool HasControlCharacter(const std::string& text) {
 
 class EveryCommand : public ServiceFilesFixture {
 protected:
-    /// A collector, for the commands that need one. Nobody listens there.
+    /// A collector, for the commands that need one. No program listens there.
     EveryCommand() { ::setenv("OTEL_EXPORTER_OTLP_ENDPOINT", "http://127.0.0.1:1", 1); }
     ~EveryCommand() override { ::unsetenv("OTEL_EXPORTER_OTLP_ENDPOINT"); }
 

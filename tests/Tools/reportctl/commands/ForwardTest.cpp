@@ -83,7 +83,7 @@ TEST_F(ForwardCommand, ChangesNothingInTheStore) {
 TEST_F(ForwardCommand, SaysInADryRunWhatItWouldSendAndSendsAndMakesNothing) {
     InsertMany(10);
     const LoopbackServer collector(Take);
-    Reportctl("stats"); // whatever opening the store for the first time brings
+    Reportctl("stats"); // opening the store for the first time may change it
     const auto before = Everything();
     const auto outcome = Forward("--dry-run --metrics", collector);
     EXPECT_EQ(outcome.exitCode, 0);

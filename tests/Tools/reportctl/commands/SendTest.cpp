@@ -134,7 +134,7 @@ TEST_F(Send, SendsItAnywayWhenAskedTo) {
 TEST_F(Send, SaysWhenNobodyListens) {
     const auto outcome = SendFixture::Send("open-id u1");
     EXPECT_EQ(outcome.exitCode, 1);
-    EXPECT_EQ(outcome.output, std::string("error: ") + NOBODY_LISTENS);
+    EXPECT_EQ(outcome.output, std::string("error: ") + NO_LISTENER);
 }
 
 TEST_F(Send, DoesNothingForACommandLineThatItDoesNotUnderstand) {

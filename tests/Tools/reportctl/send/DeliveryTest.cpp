@@ -111,7 +111,7 @@ TEST_F(SendLines, SendsTheOutputOfADryRun) {
 TEST_F(SendLines, StopsAtTheFirstLineWhenNobodyListens) {
     const auto outcome = Send(FileOf(Line(1) + "\n" + Line(2)));
     EXPECT_EQ(outcome.exitCode, 1);
-    EXPECT_EQ(outcome.output, std::string("error: line 1: ") + NOBODY_LISTENS +
+    EXPECT_EQ(outcome.output, std::string("error: line 1: ") + NO_LISTENER +
                                   "sent 0 messages (0 bytes); stopped at line 1\n");
 }
 
@@ -127,7 +127,7 @@ TEST_F(SendLines, SendsALineAsSoonAsItIsWrittenAndStopsWhenTheListenerGoes) {
     Write(pipe, Line(2));
     EXPECT_TRUE(WaitUntil([&] { return !Said().empty(); }));
     EXPECT_EQ(WEXITSTATUS(::pclose(pipe)), 1);
-    EXPECT_EQ(Said(), std::string("error: line 2: ") + NOBODY_LISTENS +
+    EXPECT_EQ(Said(), std::string("error: line 2: ") + NO_LISTENER +
                           "sent 1 message (40 bytes); stopped at line 2\n");
 }
 

@@ -42,5 +42,5 @@ protected:
         return "--file '" + path + "' ";
     }
 
-    static constexpr auto NOBODY_LISTENS = "nobody listens on 127.0.0.1:9997; is the service running?\n";
+    static constexpr auto NO_LISTENER = "no program listens on 127.0.0.1:9997; is the service running?\n";
 };

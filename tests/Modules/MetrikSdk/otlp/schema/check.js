@@ -3,8 +3,8 @@
 //     node check.js <file with a body>...
 //
 // A body passes when the definition accepts it and when it is unchanged after a conversion to the binary form
-// and back. A member that the definition does not know would be lost in that, and a value of a wrong type would
-// change.
+// and back. A member that the definition does not know would be lost in that, and a value of a wrong type
+// would change.
 // Exit code 0: all pass.
 
 'use strict';
