@@ -1,6 +1,5 @@
 #include "hublink/report.hpp"
 
-#include <array>
 #include <atomic>
 #include <cstddef>
 #include <new>
@@ -8,31 +7,14 @@
 
 #include "EventRules.h"
 #include "Inside.h"
-#include "wire/Buffer.h"
+#include "wire/Datagram.h"
 
 namespace hublink {
-namespace {
-
-/// The memory for one datagram. It is put on the stack, so that each thread has its own without an
-/// allocation.
-// NOLINTNEXTLINE(cppcoreguidelines-pro-type-member-init): the bytes are written before they are read
-class Datagram {
-public:
-    wire::Buffer& Buffer() { return m_buffer; }
-    std::string_view Text() const { return m_buffer.Text(); }
-
-private:
-    std::array<char, wire::MAX_DATAGRAM_BYTES> m_bytes;
-    wire::Buffer m_buffer{m_bytes.data(), m_bytes.size()};
-};
-
-} // namespace
-
 Reporter::Inside::Inside(const Module& module, const Options& options)
     : m_module(module.id), m_channel(options) {
     if (m_module.empty())
         return;
-    Datagram datagram;
+    wire::Datagram datagram;
     const Result isWritten = WriteAnnouncement(datagram.Buffer(), module);
     m_channel.SetModule(std::string(datagram.Text()), isWritten);
 }
@@ -41,7 +23,7 @@ Result Reporter::Inside::Event(const GivenEvent& event) noexcept {
     const auto module = ModuleOf(event.id, m_module);
     if (!module)
         return Result::InvalidEventId;
-    Datagram datagram;
+    wire::Datagram datagram;
     const Result isWritten = WriteEvent(datagram.Buffer(), event);
     return isWritten == Result::Sent
                ? m_channel.Send(datagram.Text(), !module->empty() && *module == m_module)
@@ -49,12 +31,8 @@ Result Reporter::Inside::Event(const GivenEvent& event) noexcept {
 }
 
 Result Reporter::Inside::SetUser(std::string_view openId, std::string_view suiteVersion) noexcept {
-    Datagram datagram;
-    const Result isWritten = WriteUser(datagram.Buffer(), openId, suiteVersion);
-    if (isWritten != Result::Sent)
-        return isWritten;
     try {
-        return m_channel.SetUser(std::string(datagram.Text()));
+        return m_channel.SetUser(openId, suiteVersion);
     } catch (const std::bad_alloc&) {
         return Result::SystemError;
     }

@@ -7,8 +7,9 @@
     reporter.event("B100|10001", "it's open")        # any other id: goes to the local store
 
 Purpose: a text arrives exactly as it was given, or the result says why it was not sent. A reporter doubles
-quotes for the store and escapes JSON. It announces its own module and tells the service who is signed in, and
-it does both again after the service was restarted.
+quotes for the store and escapes JSON. It announces its own module and tells the service who is signed in. It
+does both again after the service was restarted, after Linux dropped datagrams to the service, and every three
+minutes of events in any case.
 
 Threads: every operation may be called from any thread, and in the child of a fork, where the reporter opens a
 socket of its own. This library starts no thread.
@@ -19,14 +20,15 @@ such as KeyboardInterrupt, which are not errors, pass through.
 
 What `Result.SENT` promises: the system took the datagram, and a program listens. Linux drops a datagram
 without an error when the listener's buffer is full. So events of a long burst that come faster than the
-service reads them can be lost. A busy system can report a moment late that no program listens; then only the
-next event gets that result.
+service reads them can be lost. When an announcement is dropped, the module's events of the next second can be
+lost, too.
 
 Uses the standard library only. Needs Python 3.9 or later.
 """
 
 from __future__ import annotations
 
+import contextlib
 import enum
 import errno
 import json
@@ -41,7 +43,7 @@ import weakref
 from dataclasses import dataclass
 from pathlib import Path
 from types import TracebackType
-from typing import Any, Callable, Dict, List, NamedTuple, Optional, Type, Union
+from typing import Any, Callable, Dict, List, NamedTuple, Optional, Tuple, Type, Union
 
 __all__ = ["Json", "Module", "ReportHandler", "Reporter", "Result", "Value"]
 
@@ -50,7 +52,7 @@ _MAX_BYTES = 10240  # the service cuts off what is longer
 _MAX_DEPTH = 127  # levels of a value: the service reads 128, and the report's object around it is one of them
 _SEND_BUFFER_BYTES = 65536  # the default of macOS is 9216, and a report may be longer
 _LOOK_SECONDS = 1.0  # between two looks at the system's table of sockets; a look takes about 50 microseconds
-_REPEAT_SECONDS = 180.0  # between two announcements on a system without such a table
+_TELL_SECONDS = 180.0  # between two announcements in any case: a look may not show that the service lost one
 _DEFAULT_MODULE = "A759"  # the service knows this module from its start
 
 
@@ -61,7 +63,7 @@ class Result(enum.Enum):
     NOBODY_LISTENS = 1  #: no service runs; the event is lost, and the next event tries again
     TOO_LONG = 2  #: the datagram would have more than 10240 bytes
     #: A text has half a surrogate pair, which UTF-8 cannot hold, or a zero character. Or an open id is empty,
-    #: or a part of a user is not a str.
+    #: or a part of a user or of the module is not a str.
     INVALID_TEXT = 3
     #: The value is not JSON, or the time is not an int of 64 bits. Or the value of an event for analytics is
     #: given, but is not an object that the service can read: at most 127 levels, integers of at most 64 bits,
@@ -76,7 +78,9 @@ class Result(enum.Enum):
     #: The service runs for another user and would put the report into that user's store.
     OTHER_USERS_SERVICE = 7
     WOULD_BLOCK = 8  #: the send buffer of the reporter's socket is full
-    SYSTEM_ERROR = 9  #: any other reason
+    #: Any other reason. Without a free descriptor, this library cannot see whose service it is, so it sends
+    #: nothing to a service that it has not seen before.
+    SYSTEM_ERROR = 9
 
 
 class Module(NamedTuple):
@@ -192,7 +196,7 @@ def _is_text(text: str) -> bool:
 
 
 def _checked_text(text: str) -> str:
-    if not _is_text(text):
+    if not isinstance(text, str) or not _is_text(text):
         raise _Refusal(Result.INVALID_TEXT)
     return text
 
@@ -328,47 +332,72 @@ def _user(open_id: str, suite_version: str) -> bytes:
 # --- Looking for the service --------------------------------------------------------------------------------
 
 
+class _Service(enum.Enum):
+    """What the last look found on the service's port."""
+
+    UNKNOWN = 0
+    ABSENT = 1
+    USABLE = 2  #: this user's; or others' are allowed; or this system does not show whose it is
+    OTHERS = 3
+
+
 class _Listener(NamedTuple):
     is_wildcard: bool
     is_own: bool
     inode: str
+    dropped: int  #: the datagrams that the system dropped because the socket's buffer was full
 
 
-def _in_table(address: bytes) -> str:
-    """The address as the kernel's tables write it: words of 32 bits in the machine's byte order."""
-    words = [address[at : at + 4] for at in range(0, len(address), 4)]
-    return "".join(f"{int.from_bytes(word, sys.byteorder):08X}" for word in words)
+def _in_table(address: str) -> str:
+    """The address as the kernel's table writes it: one number in the machine's byte order."""
+    return f"{int.from_bytes(socket.inet_aton(address), sys.byteorder):08X}"
 
 
-_LOCALHOST = socket.inet_aton(_HOST)
-_EXACT_ADDRESSES = {_in_table(_LOCALHOST), _in_table(bytes(10) + b"\xff\xff" + _LOCALHOST)}
-_WILDCARDS = {_in_table(bytes(4)), _in_table(bytes(16))}
-_TABLES = (Path("/proc/net/udp"), Path("/proc/net/udp6"))
+_EXACT_ADDRESS, _WILDCARD = _in_table(_HOST), _in_table("0.0.0.0")
+#: Of the calling thread's network, and where that file does not exist, of the process's. The service binds an
+#: address of IPv4, so the table of IPv6 cannot show it.
+_TABLES = (Path("/proc/thread-self/net/udp"), Path("/proc/net/udp"))
 
 
 def _listeners(table: str, user: int) -> List[_Listener]:
     found = []
     for fields in (line.split() for line in table.splitlines() if f":{_PORT:04X} " in line):
         address, _, port = fields[1].partition(":")
-        is_ours = port == f"{_PORT:04X}" and address in _EXACT_ADDRESSES | _WILDCARDS
+        is_ours = port == f"{_PORT:04X}" and address in (_EXACT_ADDRESS, _WILDCARD)
         if is_ours and fields[2].endswith(":0000"):
-            found.append(_Listener(address in _WILDCARDS, int(fields[7]) == user, fields[9]))
+            is_own = int(fields[7]) == user
+            found.append(_Listener(address == _WILDCARD, is_own, fields[9], int(fields[12])))
     return found
 
 
-def _listener() -> Optional[_Listener]:
-    """The socket that receives a datagram to the service; None when there is none. Raises OSError when the
-    system has no table of its sockets.
+def _table() -> Optional[bytes]:
+    """The system's table of UDP sockets; None when it has none or the program may not read it, which does not
+    change. Raises OSError when the table cannot be read now, for example without a free descriptor."""
+    for path in _TABLES:
+        try:
+            return path.read_bytes()
+        except (FileNotFoundError, PermissionError):
+            pass
+    return None
+
+
+def _listener(table: bytes) -> Optional[_Listener]:
+    """The socket that receives a datagram to the service; None when there is none.
 
     A socket that is bound to 127.0.0.1 itself comes before one that is bound to all addresses. Of several
     such sockets, one of another user is returned.
     """
-    # We read bytes, not text: Python imports a text's codec at its first use. A fork during an import would
-    # leave the child a lock that no thread releases.
-    table = _TABLES[0].read_bytes()
-    if _TABLES[1].exists():  # the file is missing when IPv6 is switched off
-        table += _TABLES[1].read_bytes()
+    # The table is bytes, not text: Python imports a text's codec at its first use. A fork during an import
+    # would leave the child a lock that no thread releases.
     return min(_listeners(table.decode(), os.geteuid()), default=None)
+
+
+def _inode(number: int) -> int:
+    """The inode of an open file or socket; 0 when the number belongs to none. No other open socket has it."""
+    try:
+        return os.fstat(number).st_ino
+    except OSError:
+        return 0
 
 
 #: Errors that an open, connected socket never returns. Then the program has closed our descriptor, and its
@@ -398,6 +427,7 @@ class Reporter:
 
     Without a module of its own, a reporter sends events for the local store and for the default module A759
     only. It sends nothing to a service that runs for another user, unless `allow_other_users_service` is set.
+    Raises TypeError when `module` is not a Module.
     """
 
     def __init__(self, module: Optional[Module] = None, *, allow_other_users_service: bool = False) -> None:
@@ -411,13 +441,15 @@ class Reporter:
         self._lock = threading.RLock()
         self._counts = dict.fromkeys(Result, 0)
         self._socket: Optional[socket.socket] = None
-        self._user: Optional[bytes] = None
-        self._user_is_told = False
+        self._socket_inode = 0
+        self._user: Optional[bytes] = None  # with the last version that was not empty
+        self._due_user: Optional[bytes] = None  # what must be sent before the next event
+        self._suite_version = ""
         self._module_is_told = False
-        self._service: Optional[str] = None  # the inode of the service's socket
-        self._is_others = False
+        self._service = _Service.UNKNOWN
+        self._listener: Optional[_Listener] = None  # that the last look found
         self._next_look = 0.0
-        self._next_repeat = 0.0
+        self._next_tell = 0.0
         _REPORTERS.add(self)
 
     def event(
@@ -431,18 +463,19 @@ class Reporter:
         return self._counted(lambda: self._event(event_id, value, time_ms, day_report))
 
     def set_user(self, open_id: str, suite_version: str = "") -> Result:
-        """Tells the service who is signed in: now, and again whenever the service was restarted. The service
+        """Tells the service who is signed in: now, and again as the module is announced again. The service
         adds the user to every later report, also to those of other programs, because it knows one user only.
-        With an empty `suite_version`, it keeps the version that it knows. When a text cannot be sent
-        (INVALID_TEXT, QUOTE_IN_USER, TOO_LONG), nothing changes. When the system does not take the message
-        now, it is sent before the next event."""
+        So two programs should not set different users. With an empty `suite_version`, it keeps the version
+        that it knows, and after a restart it is told the last version that was not empty. When a text cannot
+        be sent (INVALID_TEXT, QUOTE_IN_USER, TOO_LONG), nothing changes. When the system does not take the
+        message now, it is sent before the next event."""
         return self._counted(lambda: self._set_user(open_id, suite_version))
 
     def count(self, result: Result) -> int:
         """How many calls of event and set_user returned this result. The child of a fork starts with its
-        parent's counts."""
+        parent's counts. For an argument that is not a Result: 0."""
         with self._lock:
-            return self._counts[result]
+            return self._counts[result] if isinstance(result, Result) else 0
 
     def close(self) -> None:
         """Closes the socket. A later event opens another one."""
@@ -483,8 +516,12 @@ class Reporter:
     def _set_user(self, open_id: str, suite_version: str) -> Result:
         message = _user(open_id, suite_version)
         with self._lock:
-            self._user = message
-            self._user_is_told = False
+            everything, version = message, suite_version or self._suite_version
+            with contextlib.suppress(_Refusal):  # id and version fit into a datagram each, but not together
+                everything = _user(open_id, version)
+            is_known = self._user is not None and self._due_user is None
+            self._user, self._suite_version = everything, version
+            self._due_user = message if is_known else everything
             return self._deliver(None, None)
 
     def _announcement_for(self, event_id: str) -> Optional[bytes]:
@@ -524,59 +561,88 @@ class Reporter:
 
     def _try_to_deliver(self, message: Optional[bytes], announcement: Optional[bytes]) -> Result:
         now = time.monotonic()
+        if self._service is not _Service.USABLE or self._socket is None or now >= self._next_look:
+            self._look_for_service(now)
+        if self._service is _Service.OTHERS:
+            return Result.OTHER_USERS_SERVICE
+        if self._service is _Service.UNKNOWN and not self._allow_others:
+            return Result.SYSTEM_ERROR
         if self._socket is None:
             self._socket = _connected()
-            self._next_look = now
-        if now >= self._next_look:
-            self._look_for_service(now)
-        if self._is_others:
-            return Result.OTHER_USERS_SERVICE
-        if self._user is not None and not self._user_is_told:
-            self._user_is_told = self._is_taken(self._socket, self._user)
-            if not self._user_is_told:
-                return Result.NOBODY_LISTENS
+            self._socket_inode = _inode(self._socket.fileno())
+        return Result.SENT if self._are_taken(self._socket, message, announcement) else Result.NOBODY_LISTENS
+
+    def _are_taken(self, to: socket.socket, message: Optional[bytes], announcement: Optional[bytes]) -> bool:
+        """Sends the announcements that are due, then the message."""
+        if self._due_user is not None:
+            if not self._is_taken(to, self._due_user):
+                return False
+            self._due_user = None
         if announcement is not None and not self._module_is_told:
-            self._module_is_told = self._is_taken(self._socket, announcement)
+            self._module_is_told = self._is_taken(to, announcement)
             if not self._module_is_told:
-                return Result.NOBODY_LISTENS
-        is_taken = message is None or self._is_taken(self._socket, message)
-        return Result.SENT if is_taken else Result.NOBODY_LISTENS
+                return False
+        return message is None or self._is_taken(to, message)
 
     def _is_taken(self, to: socket.socket, message: bytes) -> bool:
         to.send(message)
-        if to.getsockopt(socket.SOL_SOCKET, socket.SO_ERROR) == 0:
+        if to.getsockopt(socket.SOL_SOCKET, socket.SO_ERROR) == 0 and not self._is_nobody_there():
             return True
         self._forget_service()
         return False
 
+    def _is_nobody_there(self) -> bool:
+        """The system may not report a refusal: a flood of datagrams can fill the buffer for such messages. So
+        when the last look found no listener, we look again after the datagram was sent."""
+        if self._service is _Service.ABSENT:
+            self._look_for_service(time.monotonic())
+        return self._service is _Service.ABSENT
+
     def _look_for_service(self, now: float) -> None:
-        self._is_others = False
+        self._give_up_a_reused_number()
+        self._next_look = now + _LOOK_SECONDS
+        if now >= self._next_tell:
+            self._announce_again()
+            self._next_tell = now + _TELL_SECONDS
         try:
-            listener = _listener()
-        except (OSError, ValueError, IndexError):  # this system has no such table, or one that we cannot read
-            if now >= self._next_repeat:
-                self._forget_service()
-                self._next_repeat = now + _REPEAT_SECONDS
-            self._next_look = now + _LOOK_SECONDS
+            table = _table()
+        except OSError:  # what was known about a usable service holds on
+            if self._service is _Service.ABSENT:  # another user's service may have come
+                self._service = _Service.UNKNOWN
             return
-        if listener is None or listener.inode != self._service:
-            self._forget_service()
+        listener, self._service = self._found_in(table)
+        # A listener of which the system has dropped datagrams may have lost our announcements. After a
+        # restart, the listener is another one.
+        if listener != self._listener:
+            self._announce_again()
+        self._listener = listener
+
+    def _found_in(self, table: Optional[bytes]) -> Tuple[Optional[_Listener], _Service]:
+        try:
+            listener = None if table is None else _listener(table)
+        except (ValueError, IndexError):  # another table than the one that we know
+            table = listener = None
+        if table is None:
+            return None, _Service.USABLE
         if listener is None:
-            return
-        self._service = listener.inode
-        self._is_others = not listener.is_own and not self._allow_others
-        # While another user's service has the port, we look before each event: this user's service may take
-        # its place at any time.
-        self._next_look = now if self._is_others else now + _LOOK_SECONDS
+            return None, _Service.ABSENT
+        return listener, _Service.USABLE if listener.is_own or self._allow_others else _Service.OTHERS
+
+    def _give_up_a_reused_number(self) -> None:
+        """Looks whether the program closed our descriptor and opened something else that got its number."""
+        if self._socket is not None and _inode(self._socket.fileno()) != self._socket_inode:
+            self._socket.detach()  # we do not close it: it is the program's
+            self._socket = None
 
     def _forget_service(self) -> None:
+        self._service = _Service.UNKNOWN
+        self._announce_again()
+
+    def _announce_again(self) -> None:
         """Makes the announcements due again: a service that was restarted knows neither the module nor the
         user."""
-        self._service = None
-        self._user_is_told = False
+        self._due_user = self._user
         self._module_is_told = False
-        self._next_look = 0.0
-        self._next_repeat = 0.0
 
     def _result_of(self, error: OSError) -> Result:
         if error.errno in (errno.EAGAIN, errno.EWOULDBLOCK, errno.ENOBUFS):

@@ -14,6 +14,7 @@
 #include <unistd.h>
 
 #include "tests/Client/CountedMemory.h"
+#include "tests/Client/ScriptedClock.h"
 #include "tests/Client/ServicePort.h"
 #include "tests/support/TemporaryDirectory.h"
 
@@ -155,6 +156,19 @@ TEST_F(ClientInItsProcess, ADescriptorThatTheProgramUsesForAFileIsLeftAlone) {
     EXPECT_EQ(::lseek(reporters, 0, SEEK_END), 0) << "still open, and nothing was written to it";
     ::close(reporters);
     ::close(file);
+}
+
+TEST_F(ClientInItsProcess, ANumberThatAnotherSocketOfTheProgramGotIsGivenUpWithinASecond) {
+    Poco::Net::DatagramSocket others(Poco::Net::SocketAddress("127.0.0.1", 9998));
+    Poco::Net::DatagramSocket connected;
+    connected.connect(others.address());
+    const int number = DescriptorOfTheReporter();
+    ASSERT_EQ(::dup2(connected.impl()->sockfd(), number), number);
+    AdvanceSteadyClock(std::chrono::seconds(1));
+    EXPECT_EQ(m_reporter.Event("B2"), Result::Sent);
+    EXPECT_THAT(m_port.Take(), SizeIs(2));
+    EXPECT_EQ(others.available(), 0);
+    EXPECT_EQ(::close(number), 0) << "it was left open";
 }
 
 TEST_F(ClientInItsProcess, EightThreadsShareAReporter) {

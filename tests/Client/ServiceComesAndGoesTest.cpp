@@ -5,8 +5,10 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <hublink/report.hpp>
+#include <sys/resource.h>
 #include <unistd.h>
 
+#include "tests/Client/ScriptedClock.h"
 #include "tests/Client/ScriptedSend.h"
 #include "tests/Client/ServicePort.h"
 #include "tests/support/WaitUntil.h"
@@ -49,6 +51,22 @@ public:
 private:
     const bool m_isOther;
     std::optional<ServicePort> m_port;
+};
+
+/// The program can open no file while this object exists.
+class NoFreeDescriptor {
+public:
+    NoFreeDescriptor() {
+        EXPECT_EQ(::getrlimit(RLIMIT_NOFILE, &m_before), 0);
+        const rlimit none{0, m_before.rlim_max};
+        EXPECT_EQ(::setrlimit(RLIMIT_NOFILE, &none), 0);
+    }
+    ~NoFreeDescriptor() { EXPECT_EQ(::setrlimit(RLIMIT_NOFILE, &m_before), 0); }
+    NoFreeDescriptor(const NoFreeDescriptor&) = delete;
+    NoFreeDescriptor& operator=(const NoFreeDescriptor&) = delete;
+
+private:
+    rlimit m_before{};
 };
 
 } // namespace
@@ -132,6 +150,35 @@ TEST_F(ServiceComesAndGoes, TheOwnServiceBehindAnotherUsersGetsTheNextEvent) {
     m_port.emplace();
     EXPECT_EQ(m_reporter.Event("B1"), Result::Sent);
     EXPECT_THAT(m_port->Take(), ElementsAre(USER, EventWithId("B1")));
+}
+
+TEST_F(ServiceComesAndGoes, AnotherUsersServiceGetsNothingFromAProgramWithoutAFreeDescriptor) {
+    EXPECT_EQ(m_reporter.Event("B1"), Result::NobodyListens);
+    OtherUser other;
+    if (!other.IsOther())
+        GTEST_SKIP() << "only root may become another user";
+    {
+        const NoFreeDescriptor none;
+        EXPECT_EQ(m_reporter.Event("B2"), Result::SystemError);
+        EXPECT_EQ(m_reporter.SetUser("u1"), Result::SystemError);
+    }
+    EXPECT_EQ(m_reporter.Event("B3"), Result::OtherUsersService);
+    {
+        const NoFreeDescriptor none;
+        EXPECT_EQ(m_reporter.Event("B4"), Result::OtherUsersService);
+    }
+    EXPECT_THAT(other.Port().Take(), IsEmpty());
+}
+
+TEST_F(ServiceComesAndGoes, TheOwnServiceGetsTheEventsOfAProgramWithoutAFreeDescriptor) {
+    m_port.emplace();
+    EXPECT_EQ(m_reporter.Event("A100|1"), Result::Sent);
+    {
+        const NoFreeDescriptor none;
+        AdvanceSteadyClock(std::chrono::seconds(1));
+        EXPECT_EQ(m_reporter.Event("A100|2"), Result::Sent);
+    }
+    EXPECT_THAT(m_port->Take(), ElementsAre(INIT, EventWithId("A100|1"), EventWithId("A100|2")));
 }
 
 TEST_F(ServiceComesAndGoes, ARefusalThatComesLateCostsNoEventAndTellsEverythingAgain) {

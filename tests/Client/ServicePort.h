@@ -27,6 +27,16 @@ public:
         return texts;
     }
 
+    /// Fills the socket's buffer. The system then drops all datagrams until the next Take.
+    void Fill() {
+        for (const int bytes :
+             {60'000, 1}) { // the small ones take the room that is too small for a large one
+            const std::string text(static_cast<std::size_t>(bytes), 'x');
+            for (int i = 0; i < 500; ++i) // the system makes the buffer at most 16 MiB
+                m_sender.sendTo(text.data(), bytes, m_socket.address());
+        }
+    }
+
     /// The one datagram that has arrived. When there is none or more than one, a text that no datagram has.
     std::string TakeOne() {
         const auto texts = Take();
@@ -35,4 +45,5 @@ public:
 
 private:
     Poco::Net::DatagramSocket m_socket;
+    Poco::Net::DatagramSocket m_sender{Poco::Net::SocketAddress::IPv4};
 };

@@ -67,7 +67,7 @@ HUBLINK_C_EXPORT hublink_result hublink_reporter_event_json(hublink_reporter* re
                                                             const char* json);
 
 /* Tells the service who is signed in. When suite_version is NULL or empty, the service keeps the version that
- * it knows. */
+ * it knows; a service that was restarted is told the last version that was given here and not empty. */
 HUBLINK_C_EXPORT hublink_result hublink_reporter_set_user(hublink_reporter* reporter, const char* open_id,
                                                           const char* suite_version);
 

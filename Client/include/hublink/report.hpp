@@ -29,7 +29,8 @@ namespace hublink {
 enum class Result {
     /// The system took the datagram, and a program listens on the service's port. The library knows no more,
     /// because the service does not answer. Linux drops a datagram without an error when the listener's
-    /// receive buffer is full: after some thousand reports that come faster than the service reads them.
+    /// receive buffer is full: after some thousand reports that come faster than the service reads them. When
+    /// an announcement is dropped, the module's events of the next second can be lost, too; see Reporter.
     Sent,
     /// No service runs. The event is lost: the library keeps nothing for later. The next event tries again.
     NobodyListens,
@@ -53,7 +54,8 @@ enum class Result {
     OtherUsersService,
     /// The system's send buffer is full.
     WouldBlock,
-    /// Any other reason, such as no memory, no free descriptor or a firewall.
+    /// Any other reason, such as no memory, no free descriptor or a firewall. Without a free descriptor, the
+    /// library cannot see whose service it is, so it sends nothing to a service that it has not seen before.
     SystemError,
 };
 
@@ -118,14 +120,19 @@ private:
 /// that was set. After the service was gone or was restarted, it announces both again before the next event.
 /// When no event was sent between the service's end and its new start, the reporter finds the restart by the
 /// service's socket in /proc/net/udp. It looks there once a second while events are sent; events of that
-/// second can get lost. On a system without that file, it announces everything again every three minutes.
+/// second can get lost. There it also sees that Linux dropped datagrams to the service. An announcement may
+/// be among them, so the reporter announces everything again. In any case, and on every system, it announces
+/// everything again every three minutes while events are sent. A second announcement does no harm. But two
+/// programs should not set different users, because each repeats its own.
 ///
 /// Threads: any thread may call at any time. Threads wait for each other only while one of them hands a
 /// datagram to the system or looks for the service's socket. The library starts no thread.
 ///
 /// Fork: a reporter may be used in the child, where it opens a socket of its own. Some programs close all
 /// descriptors that they do not know, and so the reporter's socket, too. The reporter opens another socket
-/// when a call shows that its own was closed.
+/// when a call shows that its own was closed. When the program has opened a socket that got the closed one's
+/// number, the reporter notices it once a second; before that, its datagrams go into the program's socket. It
+/// never closes what the program opened.
 ///
 /// Failure: no call throws, blocks or writes to the terminal. When there was no memory to make the reporter,
 /// Event and SetUser return SystemError.
@@ -158,7 +165,8 @@ public:
 
     /// Tells the service who is signed in, and the version of the suite. The service adds both to every later
     /// report, also to those of other programs, because it knows one user only. With an empty version, the
-    /// service keeps the version that it knows. The message is sent at once. When a text in it cannot be sent
+    /// service keeps the version that it knows; a service that was restarted is told the last version that
+    /// was given here and not empty. The message is sent at once. When a text in it cannot be sent
     /// (InvalidText, QuoteInUser, TooLong), nothing changes. When the system does not take the message now,
     /// it is sent before the next event.
     HUBLINK_EXPORT Result SetUser(std::string_view openId, std::string_view suiteVersion = {}) noexcept;

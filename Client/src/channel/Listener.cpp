@@ -71,8 +71,10 @@ public:
         const auto socket = NumberOf<std::uint64_t>(TakeWord(line));
         if (isExact && m_isExact && owner == ::geteuid()) // of several exact sockets, another user's counts
             return;
+        for (int other = 0; other < 2; ++other) // references, address of the socket in the kernel
+            TakeWord(line);
         m_isExact = isExact;
-        m_listener = {true, owner, socket};
+        m_listener = {true, owner, socket, NumberOf<std::uint64_t>(TakeWord(line))};
     }
 
     Listener Found() const { return m_listener; }
@@ -87,12 +89,12 @@ private:
 /// A file that is open for reading. The destructor closes it.
 class File {
 public:
-    /// Opens the first of the paths that can be opened.
+    /// Opens the first of the paths that the system has and that this program may read.
     template <typename Paths>
     explicit File(const Paths& paths) {
         for (const char* path : paths)
-            if (!IsOpen())
-                m_descriptor = ::open(path, O_RDONLY | O_CLOEXEC);
+            if (!IsOpen() && IsMissing())
+                Open(path);
     }
     ~File() {
         if (IsOpen())
@@ -102,6 +104,10 @@ public:
     File& operator=(const File&) = delete;
 
     bool IsOpen() const { return m_descriptor >= 0; }
+
+    /// Whether no path could be opened, and another try would find the same. EMFILE, for example, goes away.
+    bool IsMissing() const { return m_error == ENOENT || m_error == EACCES || m_error == EPERM; }
+
     ssize_t Read(char* to, std::size_t bytes) const {
         ssize_t count = 0;
         do
@@ -111,7 +117,13 @@ public:
     }
 
 private:
+    void Open(const char* path) {
+        m_descriptor = ::open(path, O_RDONLY | O_CLOEXEC);
+        m_error = IsOpen() ? 0 : errno;
+    }
+
     int m_descriptor = -1;
+    int m_error = ENOENT;
 };
 
 /// Hands the complete lines in the first `bytes` of the buffer to `search`, and moves the incomplete rest to
@@ -128,22 +140,22 @@ std::size_t TakeLines(char* buffer, std::size_t bytes, Search& search) {
 
 } // namespace
 
-std::optional<Listener> FindListener() noexcept {
+Look FindListener() noexcept {
     const File table(TABLES);
     if (!table.IsOpen())
-        return std::nullopt;
+        return {table.IsMissing() ? Look::Outcome::NoTable : Look::Outcome::Failed, {}};
     std::array<char, 32 * LINE_BYTES> buffer; // NOLINT(*-member-init): written before it is read
     std::size_t kept = 0;
     Search search;
     for (;;) {
         const ssize_t count = table.Read(buffer.data() + kept, buffer.size() - kept);
         if (count < 0)
-            return std::nullopt;
+            return {Look::Outcome::Failed, {}};
         if (count == 0)
-            return search.Found();
+            return {Look::Outcome::Done, search.Found()};
         kept = TakeLines(buffer.data(), kept + static_cast<std::size_t>(count), search);
-        if (kept == buffer.size()) // no line of this table has 4 KiB
-            return std::nullopt;
+        if (kept == buffer.size()) // no line of this table has 4 KiB: it is another table
+            return {Look::Outcome::NoTable, {}};
     }
 }
 

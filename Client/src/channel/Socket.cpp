@@ -6,6 +6,7 @@
 #include <fcntl.h>
 #include <netinet/in.h>
 #include <sys/socket.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include "channel/Listener.h"
@@ -36,6 +37,12 @@ int NewSocket() {
 #endif
 }
 
+/// The inode of an open file or socket; 0 when the number belongs to none.
+ino_t InodeOf(int descriptor) {
+    struct stat status {};
+    return ::fstat(descriptor, &status) == 0 ? status.st_ino : 0;
+}
+
 bool Connect(int descriptor) {
     sockaddr_in service{};
     service.sin_family = AF_INET;
@@ -58,6 +65,7 @@ bool Socket::Open() noexcept {
     m_descriptor = NewSocket();
     if (m_descriptor < 0)
         return false;
+    m_inode = InodeOf(m_descriptor);
     EnlargeSendBuffer();
     if (Connect(m_descriptor))
         return true;
@@ -73,6 +81,11 @@ void Socket::EnlargeSendBuffer() const noexcept {
         return;
     bytes = LEAST_SEND_BUFFER_BYTES;
     ::setsockopt(m_descriptor, SOL_SOCKET, SO_SNDBUF, &bytes, sizeof bytes);
+}
+
+void Socket::GiveUpAReusedNumber() noexcept {
+    if (m_descriptor >= 0 && InodeOf(m_descriptor) != m_inode)
+        m_descriptor = -1; // we do not close it: it is the program's
 }
 
 void Socket::Close() noexcept {

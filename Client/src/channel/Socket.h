@@ -2,6 +2,8 @@
 
 #include <string_view>
 
+#include <sys/types.h>
+
 namespace hublink {
 
 /// A socket that is connected to the service's port. It is connected because the system would not report to
@@ -27,6 +29,10 @@ public:
     /// Sends one datagram. Opens the socket first when it is not open. Never blocks.
     Outcome Send(std::string_view datagram) noexcept;
 
+    /// Looks whether our descriptor's number belongs to another file or socket of the program now: the
+    /// program closed our descriptor and opened something else. The next Send then opens another socket.
+    void GiveUpAReusedNumber() noexcept;
+
     void Close() noexcept;
 
 private:
@@ -37,6 +43,7 @@ private:
     static Outcome OutcomeOf(int error) noexcept;
 
     int m_descriptor = -1;
+    ino_t m_inode = 0; ///< Of our socket, which no other open socket of the machine has.
 };
 
 } // namespace hublink

@@ -201,6 +201,10 @@ class AModule(Sending):
     def test_that_cannot_be_announced_has_events_that_cannot_be_sent(self):
         for module, result in ((Module("A1", "\0"), Result.INVALID_TEXT),
                                (Module("A1", "", "\ud800"), Result.INVALID_TEXT),
+                               (Module("A1", 2.1), Result.INVALID_TEXT),
+                               (Module("A1", "", None), Result.INVALID_TEXT),
+                               (Module("A1", b"2.1"), Result.INVALID_TEXT),
+                               (Module(1), Result.INVALID_EVENT_ID),
                                (Module("A1", "x" * 10240), Result.TOO_LONG)):
             reporter = Reporter(module)
             self.assertIs(reporter.event("A1|1"), result)
@@ -235,6 +239,7 @@ class Counters(Sending):
         self.reporter.set_user("it's")
         self.reporter.set_user("me")
         counts = {result: self.reporter.count(result) for result in Result if self.reporter.count(result)}
+        self.assertEqual([self.reporter.count(other) for other in ("SENT", 0, None, [])], [0] * 4)
         self.assertEqual(counts, {Result.SENT: 2, Result.INVALID_TEXT: 1, Result.QUOTE_IN_USER: 1})
 
 

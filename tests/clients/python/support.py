@@ -55,6 +55,13 @@ class Listener:
                 found.append(self.socket.recv(65536).decode())
         return found
 
+    def fill(self):
+        """Fills the buffer. The system then drops all datagrams until they are taken."""
+        with socket.socket(socket.AF_INET, socket.SOCK_DGRAM) as sender:
+            for size in (60_000, 1):  # the small ones take the room that is too small for a large one
+                for _ in range(500):
+                    sender.sendto(b"x" * size, self.socket.getsockname())
+
     def messages(self):
         return [json.loads(text) for text in self.datagrams()]
 
