@@ -36,8 +36,8 @@ restart_user_services() {
     for ssr_process in $(ssr_processes); do
         case $(readlink "/proc/$ssr_process/exe" 2>/dev/null || true) in
         *' (deleted)' | *.dpkg-*)
-            echo "Process $ssr_process of $(stat -c %U "/proc/$ssr_process") still runs the version before. It takes the" \
-                "new one when it is started again."
+            echo "Process $ssr_process of $(stat -c %U "/proc/$ssr_process") still runs the version before." \
+                "It takes the new one when it is started again."
             ;;
         esac
     done

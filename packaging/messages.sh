@@ -41,7 +41,8 @@ whole_log() {
 # texts are passed in the environment, because awk interprets escapes in -v.
 line_after() {
     whole_log | message="Recv] $1" text=$2 awk \
-        'seen && !found && index($0, ENVIRON["text"]) { print; found = 1 } index($0, ENVIRON["message"]) { seen = 1 }'
+        'seen && !found && index($0, ENVIRON["text"]) { print; found = 1 }
+        index($0, ENVIRON["message"]) { seen = 1 }'
 }
 
 query() {
@@ -99,7 +100,8 @@ send_and_show() {
     show "A report for analytics" "$message"
     send "$message"
     found "event" query "$outbox" "select 'number ' || last_sequence || ' of module A759, ' || coalesce(
-            (select 'waiting as ' || uuid || ': ' || payload from event where event_id='A759|$id'), 'uploaded already')
+            (select 'waiting as ' || uuid || ': ' || payload from event where event_id='A759|$id'),
+            'uploaded already')
         from module where module_id='A759' and last_sequence > ${before:-0}"
 
     message='{"msgType":"init","exdata":{"moduleID":"DEMO'$id'","moduleVersion":"1","moduleName":"demo"}}'
@@ -112,12 +114,14 @@ send_and_show() {
     user=$(query "$store" "select extData4 from OperLog where eventID='DEMO|$id'")
     version=$(query "$store" "select extData3 from OperLog where eventID='DEMO|$id'")
     if [ -n "$user" ] && can_be_sent_back "$user$version"; then
-        message='{"msgType":"updateOpenID","exdata":{"openID":"'$user'","hublinkVersion":"'$version'","demo":"'$id'"}}'
+        message='{"msgType":"updateOpenID","exdata":{"openID":"'$user'",'
+        message+='"hublinkVersion":"'$version'","demo":"'$id'"}}'
         show "The signed-in user" "$message"
         send "$message"
         found "$site" line_after "$message" "[App/ReportServer:111 SetBaseInfo] SetBaseInfo $user-$version"
     else
-        printf '\n%s\n' "The signed-in user: left out; there is no row above, or its user and version cannot be sent."
+        printf '\n%s %s\n' "The signed-in user: left out; there is no row above," \
+            "or its user and version cannot be sent."
     fi
 
     message='{"eventID":"DEMO|'$id'", this is no JSON'

@@ -1,5 +1,5 @@
-// Fills the page of `reportctl page` from the data that the program has put into it. Every text of the data was written by
-// another program: it goes into the page as text (textContent), never as markup.
+// Fills the page of `reportctl page` from the data that the program has put into it. Every text of the data
+// was written by another program: it goes into the page as text (textContent), never as markup.
 "use strict";
 
 const data = JSON.parse(document.getElementById("data").textContent);
@@ -39,7 +39,8 @@ function table(caption, headings, rows) {
     const made = element("table");
     made.append(element("caption", caption));
     const head = element("tr");
-    const isNumber = headings.map((_, column) => rows.length > 0 && rows.every((row) => typeof row[column] === "number"));
+    const isNumber = headings.map((_, column) =>
+        rows.length > 0 && rows.every((row) => typeof row[column] === "number"));
     headings.forEach((heading, column) => {
         const cell = element("th", heading, isNumber[column] ? "number" : "");
         cell.scope = "col";
@@ -162,7 +163,8 @@ function showFlow() {
         meter.max = most;
         meter.value = count;
         meter.setAttribute("aria-label", `${text}: ${count}`);
-        item.append(element("span", index === 0 ? text : `→ ${text}`), meter, element("span", number.format(count), "number"));
+        item.append(element("span", index === 0 ? text : `→ ${text}`), meter,
+            element("span", number.format(count), "number"));
         list.append(item);
     });
     byId("flow").append(list);
@@ -171,8 +173,8 @@ function showFlow() {
     numbers("flow", "The ledger since it was begun", ["what", "reports"], steps);
 }
 
-/** Sums the counts of quarter-hours by whole hours or days of the viewer's time zone. From the first one until now, no
- *  hour or day is left out, so that a time without reports can be seen. */
+/** Sums the counts of quarter-hours by whole hours or days of the viewer's time zone. From the first one
+ *  until now, no hour or day is left out, so that a time without reports can be seen. */
 function collect(quarterHours, keyOf) {
     const key = (quarterHour) => keyOf(new Date(quarterHour * QUARTER_HOUR_MS));
     const sums = new Map();
@@ -189,28 +191,37 @@ function showTimes() {
     const hour = (date) => `${date.toLocaleDateString()} ${String(date.getHours()).padStart(2, "0")}:00`;
     const days = collect(data.quarterHours, day);
     const since = data.generatedAt - 48 * 3600 * 1000;
-    const hours = collect(data.quarterHours.filter(([quarterHour]) => quarterHour * QUARTER_HOUR_MS >= since), hour);
+    const recent = data.quarterHours.filter(([quarterHour]) => quarterHour * QUARTER_HOUR_MS >= since);
+    const hours = collect(recent, hour);
     const scales = { scales: { y: WHOLE_NUMBERS }, plugins: { legend: { display: false } } };
-    chart("hours", "bar", hours.map((entry) => entry[0]), [bars("reports", hours.map((entry) => entry[1]))], scales);
+    chart("hours", "bar", hours.map((entry) => entry[0]),
+        [bars("reports", hours.map((entry) => entry[1]))], scales);
     numbers("hours", `Reports by hour, ${zone}`, ["hour", "reports"], hours);
-    chart("days", "bar", days.map((entry) => entry[0]), [bars("reports", days.map((entry) => entry[1]))], scales);
+    chart("days", "bar", days.map((entry) => entry[0]),
+        [bars("reports", days.map((entry) => entry[1]))], scales);
     numbers("days", `Reports by day, ${zone}`, ["day", "reports"], days);
     let sum = data.rowsBefore;
     const growth = days.map(([key, count]) => [key, (sum += count)]);
     chart("growth", "line", growth.map((entry) => entry[0]), [{
         label: "rows", data: growth.map((entry) => entry[1]), borderColor: colour("--accent"), pointRadius: 2,
     }], { scales: { y: { ticks: { precision: 0 } } }, plugins: { legend: { display: false } } });
-    numbers("growth", "Rows of the store at the end of each day, by the time of the report", ["day", "rows"], growth);
+    numbers("growth", "Rows of the store at the end of each day, by the time of the report", ["day", "rows"],
+        growth);
 }
 
 function showTop(section, counts, noKey) {
     const rows = counts.map(({ key, count }) => [key === null ? noKey : key, count]);
-    const horizontal = { indexAxis: "y", scales: { x: WHOLE_NUMBERS }, plugins: { legend: { display: false } } };
-    chart(section, "bar", rows.map((row) => short(row[0])), [bars("reports", rows.map((row) => row[1]))], horizontal);
+    const horizontal = {
+        indexAxis: "y", scales: { x: WHOLE_NUMBERS }, plugins: { legend: { display: false } },
+    };
+    chart(section, "bar", rows.map((row) => short(row[0])),
+        [bars("reports", rows.map((row) => row[1]))], horizontal);
     numbers(section, "The most frequent first", ["which", "reports"], rows);
 }
 
-const REASON_COLOURS = ["#d55e00", "#0072b2", "#009e73", "#cc79a7", "#e69f00", "#56b4e9", "#999999", "#6a3d9a"];
+const REASON_COLOURS = [
+    "#d55e00", "#0072b2", "#009e73", "#cc79a7", "#e69f00", "#56b4e9", "#999999", "#6a3d9a",
+];
 
 function showRefused() {
     const labels = data.refused.map((mark) => new Date(mark.at).toLocaleTimeString());
@@ -222,19 +233,21 @@ function showRefused() {
         stack: "refused",
     })), { scales: { x: { stacked: true }, y: Object.assign({ stacked: true }, WHOLE_NUMBERS) } });
     numbers("refused", `Refused in the ten seconds before each time, ${zone}`, ["time", ...reasons],
-        data.refused.map((mark) => [new Date(mark.at).toLocaleTimeString(), ...reasons.map((reason) => mark[reason])]));
+        data.refused.map((mark, index) => [labels[index], ...reasons.map((reason) => mark[reason])]));
 }
 
 function showOutbox() {
     const outbox = status.outbox;
     const modules = outbox.present ? outbox.modules : [];
-    chart("outbox", "bar", modules.map((module) => short(module.id)), [bars("waiting", modules.map((module) => module.waiting))],
+    chart("outbox", "bar", modules.map((module) => short(module.id)),
+        [bars("waiting", modules.map((module) => module.waiting))],
         { indexAxis: "y", scales: { x: WHOLE_NUMBERS }, plugins: { legend: { display: false } } });
     byId("outbox").append(table("The outbox as a whole", ["", ""], [
         ["collector", outbox.endpoint === null ? "none configured: events stay here" : outbox.endpoint],
         ["waiting", outbox.waiting], ["waiting, size", outbox.present ? size(outbox.waitingBytes) : "–"],
         ["delivered", outbox.delivered], ["refused by the collector", outbox.refused],
-        ["dead letters", outbox.deadLetters], ["dropped", outbox.dropped], ["last failure", outbox.lastFailure],
+        ["dead letters", outbox.deadLetters], ["dropped", outbox.dropped],
+        ["last failure", outbox.lastFailure],
     ].map(([what, value]) => [what, typeof value === "number" ? number.format(value) : orDash(value)])));
     numbers("outbox", "By module", ["module", "waiting", "last sequence"],
         modules.map((module) => [module.id, module.waiting, module.lastSequence]));
@@ -250,7 +263,8 @@ function showLog() {
     for (const line of [...status.log.last].reverse()) {
         const item = element("li");
         const head = element("p");
-        head.append(element("strong", line.level), element("span", ` ${time(line.time)}, ${line.site}`, "quiet"));
+        head.append(element("strong", line.level),
+            element("span", ` ${time(line.time)}, ${line.site}`, "quiet"));
         item.append(head, element("p", line.text));
         list.append(item);
     }
