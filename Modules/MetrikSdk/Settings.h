@@ -75,8 +75,9 @@ struct AsideSettings {
     /// How many strikes an event may have. A strike is a failed try between requests of others that were
     /// taken. Ten of them take some four hours. An event that fails for so long fails for ever.
     int strikes = 10;
-    /// How many failed tries an event may have with others taken before each, whatever happens to the request
-    /// after it. They take some two days. A collector that has too much to do takes the event before.
+    /// How many failed tries an event may have with others taken before each. What happens to the request
+    /// after it does not count. So many tries take some two days. A collector that has too much to do takes
+    /// the event before.
     int tries = 48;
     /// How many events may be aside at once. Each of them takes memory, and a look at each batch. A further
     /// event that would go aside is sent again and again until there is room.

@@ -17,7 +17,7 @@ struct DirectoryFailure {
 inline constexpr mode_t PRIVATE_DIRECTORY = 0700;
 
 /// Makes the directory at `path` and its missing parents. After success, each directory that it made has the
-/// given mode, whatever the umask is, on a file system that has modes. A directory that existed keeps its
+/// given mode, with any umask, on a file system that has modes. A directory that existed keeps its
 /// mode, because it may hold other things.
 ///
 /// A new directory is private until it gets its mode. A symbolic link to a directory counts as a directory.

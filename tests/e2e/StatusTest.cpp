@@ -266,7 +266,7 @@ TEST_F(Status, AsMetricsPassesPromtoolAndIsWrittenWholeOrNotAtAll) {
     const std::string file = m_service.DataDirectory() + "/report.prom";
     int code = -1;
     EXPECT_EQ(Run({"metrics", "--output", file}, code), "");
-    EXPECT_EQ(code, 0) << "whatever the figures say";
+    EXPECT_EQ(code, 0) << "also when the figures show a fault";
     EXPECT_EQ(ModeOf(file), 0644U) << "for the user of a collector";
     const auto text = ContentOf(file);
     for (const auto* sample :

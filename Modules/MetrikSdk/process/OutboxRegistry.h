@@ -51,7 +51,7 @@ public:
 
     /// The text to report for a module that got no outbox; nothing when it was reported too recently. The
     /// limit on reports holds for the whole process. It begins anew when the last outbox in use was released,
-    /// because the users of that outbox have heard of everything.
+    /// because every failure was reported to the users of that outbox.
     std::optional<std::string> ReportNoDirectory();
     std::optional<std::string> RecordFailure(report::Cause cause, const std::string& text);
 

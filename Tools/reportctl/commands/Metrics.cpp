@@ -21,9 +21,10 @@ constexpr auto HELP = "Examples:\n"
 } // namespace
 
 void AddMetrics(CLI::App& app, int& exitCode) {
-    auto* metrics = app.add_subcommand("metrics", "Write what status shows as figures for a monitoring "
-                                                  "system, in Prometheus's text format. The exit code "
-                                                  "is 0 when they were written, whatever they say.");
+    auto* metrics =
+        app.add_subcommand("metrics", "Write what status shows as figures for a monitoring "
+                                      "system, in Prometheus's text format. The exit code "
+                                      "is 0 when they were written, also when they show a fault.");
     auto file = std::make_shared<std::string>();
     metrics
         ->add_option(

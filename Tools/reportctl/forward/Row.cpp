@@ -23,7 +23,7 @@ void WriteText(JsonWriter& writer, const char* key, const Row::Text& text) {
     writer.String(utf8.data(), static_cast<rapidjson::SizeType>(utf8.size()));
 }
 
-/// The open id is the row's, as in an event for analytics, whatever the program put into the value.
+/// The open id is the row's, as in an event for analytics, also when the program put one into the value.
 void WriteMembers(JsonWriter& writer, const JsonTree& value) {
     for (const auto& member : value.GetObject()) {
         const std::string_view name(member.name.GetString(), member.name.GetStringLength());
