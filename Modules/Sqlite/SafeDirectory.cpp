@@ -141,13 +141,20 @@ private:
             throw UnsafePath(Child() + " does not exist, and is only made below the user's data directory");
         if (m_missing == Missing::Leave)
             return false;
-        // The umask can only take rights away from this mode, so the directory never gets more rights than
-        // this.
-        if (::mkdirat(m_directory.Number(), name, SystemTool::IO::PRIVATE_DIRECTORY) != 0 && errno != EEXIST)
+        if (::mkdirat(m_directory.Number(), name, SystemTool::IO::PRIVATE_DIRECTORY) == 0)
+            GiveBackWhatTheUmaskTook(name);
+        else if (errno != EEXIST)
             Fail("Cannot make the directory " + Child());
         if (::fstatat(m_directory.Number(), name, &status, AT_SYMLINK_NOFOLLOW) != 0)
             Fail("Cannot look at " + Child());
         return true;
+    }
+
+    /// The umask of a host may take rights of the owner away from a new directory. A file system without modes
+    /// refuses the change, but the directory can be used all the same.
+    void GiveBackWhatTheUmaskTook(const char* name) const {
+        [[maybe_unused]] const int ignored =
+            ::fchmodat(m_directory.Number(), name, SystemTool::IO::PRIVATE_DIRECTORY, AT_SYMLINK_NOFOLLOW);
     }
 
     std::string Target(const struct stat& link) const {

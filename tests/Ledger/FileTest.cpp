@@ -82,13 +82,16 @@ protected:
 } // namespace
 
 TEST_F(LedgerFile, IsMadeWithItsDirectoriesForItsUserAloneWhateverTheUmask) {
-    const mode_t before = ::umask(0);
-    Writer writer;
-    EXPECT_TRUE(Open(writer));
-    ::umask(before);
-    EXPECT_EQ(ModeOf(m_data.Path() + "/hublink"), 0700U);
-    EXPECT_EQ(ModeOf(Directory()), 0700U);
-    EXPECT_EQ(ModeOf(Path()), 0600U);
+    for (const mode_t mask : {0, 0277, 0777}) {
+        const mode_t before = ::umask(mask);
+        Writer writer;
+        EXPECT_TRUE(Open(writer));
+        ::umask(before);
+        EXPECT_EQ(ModeOf(m_data.Path() + "/hublink"), 0700U) << mask;
+        EXPECT_EQ(ModeOf(Directory()), 0700U) << mask;
+        EXPECT_EQ(ModeOf(Path()), 0600U) << mask;
+        std::filesystem::remove_all(m_data.Path() + "/hublink");
+    }
 }
 
 TEST_F(LedgerFile, HasAllItsBlocksFromTheStart) {

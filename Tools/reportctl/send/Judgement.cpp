@@ -9,6 +9,7 @@
 #include "Common/Wire.h"
 #include "SystemTool/IO/JsonDocument.h"
 #include "Tools/reportctl/message/Message.h"
+#include "Tools/reportctl/store/SqlText.h"
 #include "Tools/reportctl/terminal/Printable.h"
 
 namespace reportctl::send {
@@ -22,18 +23,6 @@ constexpr std::size_t DIGITS_OF_MILLISECONDS = 13;
 
 bool Contains(const std::string& text, const std::string& part) {
     return text.find(part) != std::string::npos;
-}
-
-/// Whether the text has a quote that ends an SQL literal. In a literal, two quotes mean one quote, so a quote
-/// without a second one ends it.
-bool HasLoneQuote(const std::string& text) {
-    for (auto quote = text.find('\''); quote != std::string::npos; quote = text.find('\'', quote)) {
-        const auto end = std::min(text.find_first_not_of('\'', quote), text.size());
-        if ((end - quote) % 2 != 0)
-            return true;
-        quote = end;
-    }
-    return false;
 }
 
 /// The words about a text that goes into the store's SQL: what happens when a character in it ends the SQL,
@@ -51,16 +40,16 @@ constexpr InTheStore OF_THE_USER{"the database would reject every report while i
 
 /// Judges a text that the service puts unchanged into its SQL.
 void JudgeForStore(Judgement& judgement, const std::string& name, const std::string& text,
-                   const InTheStore& store) {
-    if (HasLoneQuote(text))
+                   const InTheStore& words) {
+    if (store::HasLoneQuote(text))
         judgement.errors.push_back(fmt::format("its {} holds a single quote. The service puts the text into "
                                                "its SQL as it is, and {}. {}",
-                                               name, store.loss, store.advice));
+                                               name, words.loss, words.advice));
     if (text.find('\0') != std::string::npos)
         judgement.errors.push_back(
             fmt::format("its {} holds a zero character (\\u0000). The service puts the "
                         "text into its SQL as it is, and {}",
-                        name, store.loss));
+                        name, words.loss));
 }
 
 bool IsNumber(const std::string& text) {
@@ -157,7 +146,7 @@ void JudgeReport(Judgement& judgement, const JsonDocument& report) {
 
 void JudgeUserText(Judgement& judgement, const std::string& name, const std::string& text) {
     JudgeForStore(judgement, name, text, OF_THE_USER);
-    if (Contains(text, "''") && !HasLoneQuote(text))
+    if (store::HasDoubledQuotes(text))
         judgement.warnings.push_back(fmt::format("its {} holds a single quote written twice: it is stored as "
                                                  "one quote, and goes to analytics as two",
                                                  name));

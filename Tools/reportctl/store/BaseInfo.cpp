@@ -7,15 +7,22 @@
 #include <SQLiteCpp/Transaction.h>
 #include <fmt/format.h>
 
+#include "Tools/reportctl/store/SqlText.h"
 #include "Tools/reportctl/store/Store.h"
 
 namespace reportctl::store {
 namespace {
 
-/// Warns of a single quote: the service puts these texts into its statements without escaping them, so the
-/// database would refuse every report. It is a warning and no error, because the suite chooses its ids.
+/// Warns of single quotes: the service puts these texts into its statements without escaping them. With a lone
+/// one, the database would refuse every report. It is a warning and no error, because the suite chooses its
+/// ids.
 void WarnOfQuotes(const terminal::Worklog& log, const std::string& text) {
-    if (text.find('\'') != std::string::npos)
+    if (HasDoubledQuotes(text))
+        log.Warn(
+            fmt::format("\"{}\" holds a single quote written twice: it is stored as one quote, and goes to "
+                        "analytics as two",
+                        text));
+    if (HasLoneQuote(text))
         log.Warn(fmt::format("\"{}\" holds a single quote: the service will not be able to store any report "
                              "while it is set",
                              text));

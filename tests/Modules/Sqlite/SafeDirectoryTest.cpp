@@ -58,11 +58,14 @@ protected:
 } // namespace
 
 TEST_F(TheSafeDirectory, MakesWhatIsMissingBelowTheDataDirectoryForItsUserAlone) {
-    const auto umask = ::umask(0);
-    EXPECT_EQ(Open(Home() + "/a/b"), Home() + "/a/b");
-    ::umask(umask);
-    EXPECT_EQ(ModeOf(Home() + "/a"), 0700U);
-    EXPECT_EQ(ModeOf(Home() + "/a/b"), 0700U);
+    for (const mode_t mask : {0, 0277, 0777}) {
+        const auto umask = ::umask(mask);
+        EXPECT_EQ(Open(Home() + "/a/b"), Home() + "/a/b");
+        ::umask(umask);
+        EXPECT_EQ(ModeOf(Home() + "/a"), 0700U) << mask;
+        EXPECT_EQ(ModeOf(Home() + "/a/b"), 0700U) << mask;
+        fs::remove_all(Home() + "/a");
+    }
 }
 
 TEST_F(TheSafeDirectory, MakesTheDataDirectoryToo) {

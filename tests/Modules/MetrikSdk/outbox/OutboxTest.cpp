@@ -60,18 +60,22 @@ protected:
 };
 
 TEST_F(TheOutbox, MakesTheDirectoryAndPrivateFilesWhateverTheUmask) {
-    const auto before = ::umask(0);
-    Open();
-    Append();
-    ::umask(before);
     const auto mode = [](const std::string& path) {
         struct stat status {};
         return ::stat(path.c_str(), &status) == 0 ? status.st_mode & 07777 : 0U;
     };
-    EXPECT_EQ(mode(m_directory.Path() + "/deep"), 0700U);
-    EXPECT_EQ(mode(m_path), 0700U);
-    for (const std::string suffix : {"", "-wal", "-shm"})
-        EXPECT_EQ(mode(File() + suffix), 0600U) << suffix;
+    for (const mode_t mask : {0, 0277, 0777}) {
+        const auto before = ::umask(mask);
+        Open();
+        Append();
+        ::umask(before);
+        EXPECT_EQ(mode(m_directory.Path() + "/deep"), 0700U) << mask;
+        EXPECT_EQ(mode(m_path), 0700U) << mask;
+        for (const std::string suffix : {"", "-wal", "-shm"})
+            EXPECT_EQ(mode(File() + suffix), 0600U) << suffix << " " << mask;
+        m_outbox.reset();
+        std::filesystem::remove_all(m_directory.Path() + "/deep");
+    }
 }
 
 TEST_F(TheOutbox, NarrowsAFileThatOthersCouldRead) {

@@ -107,9 +107,23 @@ TEST_F(Setup, ReplacesEveryRowOfAKeyThatOthersStoredTwice) {
 TEST_F(Setup, StoresATextThatLooksLikeSqlAsItIsAndWarnsOfTheQuote) {
     const auto outcome = RunSetup("--open-id \"x'); drop table OperLog; --\"");
     EXPECT_EQ(outcome.exitCode, 0) << outcome.output;
-    EXPECT_TRUE(outcome.Says("warning: ")) << outcome.output;
+    EXPECT_TRUE(
+        outcome.Says("warning: \"x'); drop table OperLog; --\" holds a single quote: the service will not "
+                     "be able to store any report while it is set"))
+        << outcome.output;
     EXPECT_EQ(Ask("select value from BaseInfo"), "x'); drop table OperLog; --");
     EXPECT_EQ(ColumnsOf("OperLog"), OPER_LOG_COLUMNS);
+}
+
+TEST_F(Setup, WarnsOfAQuoteThatIsWrittenTwiceInOtherWords) {
+    const auto outcome = RunSetup("--open-id \"x''y\"");
+    EXPECT_EQ(outcome.exitCode, 0) << outcome.output;
+    EXPECT_TRUE(
+        outcome.Says("warning: \"x''y\" holds a single quote written twice: it is stored as one quote, and "
+                     "goes to analytics as two"))
+        << outcome.output;
+    EXPECT_FALSE(outcome.Says("not be able to store")) << outcome.output;
+    EXPECT_EQ(Ask("select value from BaseInfo"), "x''y");
 }
 
 TEST_F(Setup, RefusesAnEmptyOpenId) {
