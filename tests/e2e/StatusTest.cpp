@@ -199,6 +199,17 @@ TEST_F(Status, IsDownWhenAnotherProgramHasThePort) {
     EXPECT_THAT(m_text, HasSubstr("e2e_tests of user"));
 }
 
+TEST_F(Status, NamesTheProgramThatHasThePortThroughIPv6) {
+    Poco::Net::DatagramSocket other{Poco::Net::SocketAddress::IPv6};
+    other.impl()->setOption(IPPROTO_IPV6, IPV6_V6ONLY, 0);
+    other.bind(Poco::Net::SocketAddress("::", 9997), false, false);
+    ::fcntl(other.impl()->sockfd(), F_SETFD, FD_CLOEXEC);
+    m_service.Launch();
+    ASSERT_TRUE(WaitUntil([&] { return m_service.Output().find("in use") != std::string::npos; }));
+    ASSERT_TRUE(WaitUntil([&] { return m_service.Books().counting; }));
+    EXPECT_EQ(At(Json(2), "service.portHolder.pid"), std::to_string(::getpid()));
+}
+
 TEST_F(Status, IsDownForAUserWhenAnotherUsersServiceRuns) {
     if (::geteuid() != 0 ||
         std::system("setpriv --reuid 65534 --regid 65534 --clear-groups true 2>/dev/null") != 0)
@@ -232,6 +243,39 @@ TEST_F(Status, ChangesNoFileOfAServiceThatWasKilled) {
     EXPECT_EQ(At(json, "outbox.waiting"), "1");
     EXPECT_EQ(At(json, "ledger.sinceStart"), "null");
     EXPECT_EQ(Files(), before);
+}
+
+TEST_F(Status, ReadsAStoreWhoseLogEndsBehindItsHeader) { // a kill in the first commit leaves that
+    m_service.Start();
+    m_service.AwaitQuiet();
+    m_service.Kill();
+    std::filesystem::resize_file(m_service.DatabaseFile() + "-wal", 32);
+    const auto before = Files();
+    const auto begun = std::chrono::steady_clock::now();
+    const auto json = Json(2);
+    EXPECT_LT(std::chrono::steady_clock::now() - begun, std::chrono::seconds(5)) << "SQLite searches for ten";
+    EXPECT_EQ(At(json, "store.rows"), "0");
+    EXPECT_EQ(Files(), before);
+}
+
+TEST_F(Status, ReadsDatabasesWithoutTheirIndexes) { // a backup may have left them out
+    m_service.Start();
+    Service::Send(R"({"eventID":"B1"})");
+    Service::Send(R"({"eventID":"A759|1"})");
+    ASSERT_TRUE(WaitUntil([&] { return m_service.RowCount() == 1; }));
+    ASSERT_TRUE(WaitUntil(
+        [&] { return m_service.Count(m_service.OutboxFile(), "select count(*) from event") == 1; }));
+    m_service.Kill();
+    std::map<std::string, std::string> before;
+    for (const auto& file : {m_service.DatabaseFile(), m_service.OutboxFile()}) {
+        std::filesystem::remove(file + "-shm");
+        before[file + "-wal"] = ContentOf(file + "-wal");
+    }
+    const auto json = Json(2);
+    EXPECT_EQ(At(json, "store.rows"), "1");
+    EXPECT_EQ(At(json, "outbox.waiting"), "1");
+    for (const auto& [file, content] : before)
+        EXPECT_TRUE(ContentOf(file) == content) << file;
 }
 
 TEST_F(Status, ChangesNoFileOfAStoreThatNobodyHasOpen) {

@@ -8,7 +8,7 @@
 #include "Tools/reportctl/status/Names.h"
 #include "Tools/reportctl/status/Status.h"
 #include "Tools/reportctl/store/Paths.h"
-#include "Tools/reportctl/store/Unchanged.h"
+#include "Tools/reportctl/store/Store.h"
 
 namespace reportctl::page {
 namespace {
@@ -31,7 +31,7 @@ RefusedAt RefusedBetween(const ReportLedger::MarkAt& before, const ReportLedger:
 template <typename Count>
 void CountIn(const std::string& path, const Count& count) {
     try {
-        auto database = store::OpenUnchanged(path);
+        auto database = store::OpenToGlance(path);
         count(database);
     } catch (const std::exception&) { // the page shows the other data
     }

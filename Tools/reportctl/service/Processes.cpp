@@ -23,8 +23,12 @@ namespace {
 
 namespace fs = std::filesystem;
 
-constexpr auto LOOPBACK = "0100007F"; // 127.0.0.1, as the kernel's table writes addresses
+// 127.0.0.1 and 0.0.0.0, as the kernel's tables write addresses; then the same as addresses of IPv6. A socket
+// at the last one receives what is sent to IPv4 addresses, too, unless it was told not to.
+constexpr auto LOOPBACK = "0100007F";
 constexpr auto ANY_ADDRESS = "00000000";
+constexpr auto LOOPBACK_IN_IPV6 = "0000000000000000FFFF00000100007F";
+constexpr auto ANY_IPV6_ADDRESS = "00000000000000000000000000000000";
 
 std::string Folder(pid_t process) {
     return fmt::format("/proc/{}", process);
@@ -38,6 +42,25 @@ std::string ContentOf(const std::string& path) {
 std::string TargetOf(const fs::path& link) {
     std::error_code error;
     return fs::read_symlink(link, error).string();
+}
+
+/// The sockets that are bound to one of these addresses: one of IPv4, one of IPv6.
+std::vector<BoundSocket> SocketsAt(const std::array<std::string, 2>& addresses) {
+    constexpr std::array TABLES = {"/proc/net/udp", "/proc/net/udp6"};
+    std::vector<BoundSocket> sockets;
+    for (std::size_t i = 0; i < TABLES.size(); ++i) {
+        std::ifstream table(TABLES[i]);
+        for (std::string line; std::getline(table, line);) {
+            std::istringstream fields(line);
+            const std::vector<std::string> words{std::istream_iterator<std::string>(fields), {}};
+            if (words.size() < 10 || words[1] != addresses[i])
+                continue;
+            BoundSocket& socket = sockets.emplace_back();
+            std::from_chars(words[7].data(), words[7].data() + words[7].size(), socket.owner);
+            std::from_chars(words[9].data(), words[9].data() + words[9].size(), socket.inode);
+        }
+    }
+    return sockets;
 }
 
 } // namespace
@@ -108,24 +131,10 @@ std::optional<pid_t> ProcessOfSocket(std::uint64_t inode) {
 
 std::vector<BoundSocket> SocketsAtTheServicesPort() {
     const auto port = fmt::format(":{:04X}", Wire::PORT);
-    std::vector<BoundSocket> exact;
-    std::vector<BoundSocket> any;
-    std::ifstream table("/proc/net/udp");
-    for (std::string line; std::getline(table, line);) {
-        std::istringstream fields(line);
-        const std::vector<std::string> words{std::istream_iterator<std::string>(fields), {}};
-        if (words.size() < 10)
-            continue;
-        BoundSocket socket;
-        std::from_chars(words[7].data(), words[7].data() + words[7].size(), socket.owner);
-        std::from_chars(words[9].data(), words[9].data() + words[9].size(), socket.inode);
-        if (words[1] == LOOPBACK + port)
-            exact.push_back(socket);
-        else if (words[1] == ANY_ADDRESS + port)
-            any.push_back(socket);
-    }
-    exact.insert(exact.end(), any.begin(), any.end());
-    return exact;
+    auto sockets = SocketsAt({LOOPBACK + port, LOOPBACK_IN_IPV6 + port});
+    const auto any = SocketsAt({ANY_ADDRESS + port, ANY_IPV6_ADDRESS + port});
+    sockets.insert(sockets.end(), any.begin(), any.end());
+    return sockets;
 }
 
 std::optional<pid_t> LockHolder() {

@@ -1,13 +1,13 @@
 #include <algorithm>
 #include <charconv>
-#include <filesystem>
+#include <map>
 
 #include <fmt/format.h>
 
 #include "Modules/MetrikSdk/otlp/EndpointConfig.h"
 #include "Tools/reportctl/service/Processes.h"
 #include "Tools/reportctl/status/Parts.h"
-#include "Tools/reportctl/store/Unchanged.h"
+#include "Tools/reportctl/store/Store.h"
 
 namespace reportctl::status {
 namespace {
@@ -57,22 +57,26 @@ void ReadTotals(SQLite::Database& database, Outbox& outbox) {
     outbox.begunAtMs = TimeOf(*outbox.id);
 }
 
+/// How many events of each module wait, by the module's key.
+std::map<std::int64_t, std::int64_t> WaitingByModule(SQLite::Database& database) {
+    std::map<std::int64_t, std::int64_t> waiting;
+    SQLite::Statement counts(database, "select module, count(*) from event group by module");
+    while (counts.executeStep())
+        waiting[counts.getColumn(0).getInt64()] = counts.getColumn(1).getInt64();
+    return waiting;
+}
+
 void ReadModules(SQLite::Database& database, Outbox& outbox) {
-    SQLite::Statement modules(database, "select module_id, last_sequence from module order by id");
+    const bool areToldApart = outbox.waiting.value_or(0) <= MOST_TOLD_APART;
+    auto waiting = areToldApart ? WaitingByModule(database) : std::map<std::int64_t, std::int64_t>();
+    SQLite::Statement modules(database, "select id, module_id, last_sequence from module order by id");
     while (modules.executeStep())
         outbox.modules.push_back(
-            {modules.getColumn(0).getString(), std::nullopt, modules.getColumn(1).getInt64()});
+            {modules.getColumn(1).getString(),
+             areToldApart ? std::optional(waiting[modules.getColumn(0).getInt64()]) : std::nullopt,
+             modules.getColumn(2).getInt64()});
     if (outbox.modules.size() == 1)
         outbox.modules.front().waiting = outbox.waiting;
-    if (outbox.modules.size() < 2 || outbox.waiting.value_or(0) > MOST_TOLD_APART)
-        return;
-    SQLite::Statement waiting(database, "select (select count(*) from event where event.module = module.id) "
-                                        "from module order by id");
-    if (outbox.modules.size() > 50) // counting would read the table once for each module
-        return;
-    for (auto& module : outbox.modules)
-        if (waiting.executeStep())
-            module.waiting = waiting.getColumn(0).getInt64();
 }
 
 /// The collector's address, read from the service's environment as the service's SDK read it at the start.
@@ -110,7 +114,7 @@ Outbox LookAtOutbox(const std::string& path, const Service& service, const Log& 
     if (!outbox.isPresent)
         return outbox;
     try {
-        auto database = store::OpenUnchanged(path);
+        auto database = store::OpenToGlance(path);
         ReadTotals(database, outbox);
         ReadModules(database, outbox);
     } catch (const std::exception& failure) {

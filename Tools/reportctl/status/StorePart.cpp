@@ -1,7 +1,7 @@
 #include <filesystem>
 
 #include "Tools/reportctl/status/Parts.h"
-#include "Tools/reportctl/store/Unchanged.h"
+#include "Tools/reportctl/store/Store.h"
 
 namespace reportctl::status {
 namespace {
@@ -61,7 +61,7 @@ Store LookAtStore(const std::string& path) {
     store.bytes = SizeOf(path);
     store.walBytes = SizeOf(path + "-wal");
     try {
-        auto database = store::OpenUnchanged(path);
+        auto database = store::OpenToGlance(path);
         Read(database, store);
     } catch (const std::exception& failure) {
         store.problem = failure.what();

@@ -231,6 +231,10 @@ SQLite::Database OpenStoreToLook(const std::string& path) {
     return database;
 }
 
+SQLite::Database OpenToGlance(const std::string& path) {
+    return LacksIndex(path) && IsOwner(path) ? OpenStoreToLook(path) : OpenUnchanged(path);
+}
+
 SQLite::Database OpenToRead(const std::string& path) {
     RequireStore(path);
     if (!IsOwner(path))

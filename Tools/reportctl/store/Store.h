@@ -50,6 +50,10 @@ SQLite::Database OpenStore(const std::string& path);
 /// into Report.db, and that would be a change.
 SQLite::Database OpenStoreToLook(const std::string& path);
 
+/// Opens the database for commands that look at it for a moment, as OpenUnchanged does. Where that cannot read
+/// because a -shm is missing, the owner makes it anew, and changes nothing else.
+SQLite::Database OpenToGlance(const std::string& path);
+
 /// Opens the database for commands that read much. The owner reads with SQLite's locks, so that a long read
 /// is correct beside any writer. Another user, such as an administrator, reads as OpenUnchanged does, and so
 /// leaves no file that the owner could not use. The owner reads like that, too, when the disk is full or
