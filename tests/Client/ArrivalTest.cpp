@@ -11,6 +11,7 @@
 #include "SystemTool/IO/JsonDocument.h"
 #include "tests/Client/EventsInCProcess.h"
 #include "tests/Client/RandomEvents.h"
+#include "tests/Client/SameJson.h"
 #include "tests/e2e/support/Service.h"
 #include "tests/support/WaitUntil.h"
 
@@ -38,13 +39,6 @@ std::string Compact(const std::string& json) {
             compact += json[at];
     }
     return compact;
-}
-
-/// The JSON as the service reads and prints it; empty when the service cannot read it.
-std::string Printed(const std::string& json) {
-    std::string error;
-    const JsonDocument document = JsonDocument().FromJson(json, error);
-    return error.empty() ? document.ToJson() : std::string();
 }
 
 struct Row {
@@ -125,7 +119,7 @@ private:
     static bool IsStored(const RandomEvent& given, const std::string& value) {
         if (given.kind != RandomEvent::Kind::Json)
             return value == given.value;
-        return value == Compact(given.value) || (!value.empty() && value == Printed(given.value));
+        return value == Compact(given.value) || IsSameJson(given.value, value);
     }
 
     static bool IsInOutbox(const RandomEvent& given, const std::string& payload) {
