@@ -249,6 +249,11 @@ class TheModule(unittest.TestCase):
     def test_is_written_for_python_3_9(self):
         ast.parse(self.FILE.read_text(), feature_version=(3, 9))
 
+    def test_has_itself_as_its_stubs(self):
+        """Without installed stubs, type checkers take each name of an installed module for Any."""
+        self.assertEqual((self.FILE.parent / "hublink_report-stubs/__init__.pyi").read_text(),
+                         self.FILE.read_text())
+
     def test_has_the_version_of_the_library_for_cpp(self):
         library = re.search(r"VERSION ([0-9.]+)",
                             (ROOT / "Client/CMakeLists.txt").read_text().split("project(")[1])[1]

@@ -1,0 +1,1 @@
+../hublink_report.py
