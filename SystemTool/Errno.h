@@ -1,6 +1,6 @@
 #pragma once
 
-#include <stdexcept>
+#include <cerrno>
 #include <string>
 #include <system_error>
 
@@ -11,9 +11,15 @@ inline std::string ErrnoText(int code) {
     return std::generic_category().message(code);
 }
 
-/// Throws std::runtime_error with the system's words.
+/// Throws std::system_error. Its text is the system's words alone, for a caller that says itself what failed.
 [[noreturn]] inline void ThrowErrno(int code) {
-    throw std::runtime_error(ErrnoText(code));
+    throw std::system_error(code, std::generic_category());
+}
+
+/// Throws std::system_error. Its text is `what` and the system's words, as in "cannot open x: Permission
+/// denied".
+[[noreturn]] inline void ThrowErrno(const std::string& what, int code = errno) {
+    throw std::system_error(code, std::generic_category(), what);
 }
 
 } // namespace SystemTool

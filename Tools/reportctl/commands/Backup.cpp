@@ -1,19 +1,13 @@
-#include <cerrno>
-#include <cstdlib>
 #include <filesystem>
 #include <memory>
-#include <stdexcept>
 #include <string>
-#include <system_error>
 
 #include <CLI/CLI.hpp>
-#include <fcntl.h>
 #include <fmt/format.h>
-#include <sys/stat.h>
-#include <unistd.h>
 
 #include "Tools/reportctl/commands/Commands.h"
 #include "Tools/reportctl/store/Copy.h"
+#include "Tools/reportctl/store/NewDirectory.h"
 #include "Tools/reportctl/store/Paths.h"
 #include "Tools/reportctl/store/Store.h"
 #include "Tools/reportctl/terminal/Progress.h"
@@ -33,41 +27,6 @@ constexpr auto HELP = "Example:\n"
                       "what it had sent since; the collector can tell by log.record.uid.\n"
                       "\n";
 
-[[noreturn]] void Throw(const std::string& what) {
-    throw std::system_error(errno, std::generic_category(), what);
-}
-
-/// The directory of the backup. It must not exist before. The destructor removes it with everything in it,
-/// unless Keep was called.
-class NewDirectory {
-public:
-    explicit NewDirectory(std::string path) : m_path(std::move(path)) {
-        if (::mkdir(m_path.c_str(), 0700) != 0)
-            Throw("cannot make the directory " + m_path);
-    }
-    ~NewDirectory() {
-        std::error_code ignored;
-        if (!m_isKept)
-            fs::remove_all(m_path, ignored);
-    }
-    NewDirectory(const NewDirectory&) = delete;
-    NewDirectory& operator=(const NewDirectory&) = delete;
-
-    /// Writes everything in the directory to the disk. From then on, the destructor keeps the directory.
-    void Keep() {
-        const int directory = ::open(m_path.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
-        const bool isSafe = directory >= 0 && ::syncfs(directory) == 0;
-        ::close(directory);
-        if (!isSafe)
-            Throw("cannot write " + m_path);
-        m_isKept = true;
-    }
-
-private:
-    std::string m_path;
-    bool m_isKept = false;
-};
-
 void Copy(const std::string& from, const std::string& to) {
     {
         terminal::Progress progress("copying " + fs::path(from).filename().string());
@@ -80,10 +39,10 @@ void Copy(const std::string& from, const std::string& to) {
 
 void Backup(const std::string& path) {
     store::RequireStore(store::StorePath()); // checked before the directory is made
-    NewDirectory directory(path);
+    store::NewDirectory directory(path);
     Copy(store::StorePath(), path + "/Report.db");
     if (fs::exists(store::OutboxPath()))
-        Copy(store::OutboxPath(), path + "/MetrikOutbox.db");
+        Copy(store::OutboxPath(), path + "/" + store::OUTBOX_FILE);
     else
         fmt::print("No outbox: {} is not there, so it has no events.\n", store::OutboxPath());
     directory.Keep();

@@ -1,7 +1,6 @@
 #include "Tools/reportctl/forward/State.h"
 
 #include <algorithm>
-#include <cerrno>
 #include <filesystem>
 #include <memory>
 #include <stdexcept>
@@ -99,7 +98,7 @@ Place PlaceIn(SQLite::Database& database) {
 State::State(const std::string& path, const std::string& outbox) {
     const auto directory = std::filesystem::path(path).parent_path().string();
     if (const auto failure = SystemTool::IO::MakeDirectories(directory))
-        throw std::system_error(failure.error, std::generic_category(), "cannot make " + failure.path);
+        SystemTool::ThrowErrno("cannot make " + failure.path, failure.error);
     Sqlite::RequireOurFiles(path);
     Lock(path);
     store::Naming(path, [&] { Open(path, outbox); });
@@ -133,7 +132,7 @@ void State::Lock(const std::string& path) {
     m_lock = SystemTool::IO::Descriptor(
         ::open(path.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW, PRIVATE_FILE));
     if (!m_lock.IsOpen())
-        throw std::system_error(errno, std::generic_category(), "cannot open " + path);
+        SystemTool::ThrowErrno("cannot open " + path);
     if (::flock(m_lock.Number(), LOCK_EX | LOCK_NB) != 0)
         throw std::runtime_error("another `reportctl forward` is at work; this one did nothing");
 }

@@ -140,12 +140,17 @@ bool IsPrivate(const std::string& file) {
     return !fs::exists(file) || fs::status(file).permissions() == PRIVATE_FILE;
 }
 
+void EnsurePrivateFile(terminal::Worklog& log, const std::string& file) {
+    if (!IsPrivate(file))
+        log.Run(
+            terminal::CHANGE, fmt::format("mode of {} to 0600", file),
+            [&] { fs::permissions(file, PRIVATE_FILE); }, "The file's owner must do that.");
+}
+
 void EnsurePrivateFiles(terminal::Worklog& log, const std::string& path) {
-    for (const auto* suffix : {"", "-wal", "-shm", "-journal"})
-        if (const auto file = path + suffix; !IsPrivate(file))
-            log.Run(
-                terminal::CHANGE, fmt::format("mode of {} to 0600", file),
-                [&] { fs::permissions(file, PRIVATE_FILE); }, "The file's owner must do that.");
+    EnsurePrivateFile(log, path);
+    for (const auto* suffix : Sqlite::SIDE_FILE_SUFFIXES)
+        EnsurePrivateFile(log, path + suffix);
 }
 
 void EnsureWriteAheadLog(terminal::Worklog& log, const std::string& path) {

@@ -3,20 +3,19 @@
 #include <cerrno>
 #include <csignal>
 #include <cstdlib>
-#include <system_error>
 
 #include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include "SystemTool/Errno.h"
+
 namespace reportctl::terminal {
 namespace {
 
-constexpr std::size_t BUFFER_BYTES = std::size_t{256} * 1024;
+using SystemTool::IO::Descriptor;
 
-[[noreturn]] void Throw(const std::string& what) {
-    throw std::system_error(errno, std::generic_category(), what);
-}
+constexpr std::size_t BUFFER_BYTES = std::size_t{256} * 1024;
 
 bool IsSpecialFile(const std::string& path) {
     struct stat status {};
@@ -38,11 +37,9 @@ std::string DirectoryOf(const std::string& path) {
 
 /// Puts a file's new name on the disk: after a crash, the name is there only when its directory was synced.
 void SyncDirectoryOf(const std::string& path) {
-    const int directory = ::open(DirectoryOf(path).c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
-    if (directory < 0)
-        return; // this user may not read the directory; the file's contents are on the disk
-    ::fsync(directory);
-    ::close(directory);
+    const Descriptor directory(::open(DirectoryOf(path).c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+    if (directory.IsOpen()) // else this user may not read the directory; the file's contents are on the disk
+        ::fsync(directory.Number());
 }
 
 } // namespace
@@ -50,28 +47,24 @@ void SyncDirectoryOf(const std::string& path) {
 Result::Result(const std::string& path, mode_t mode)
     : m_path(path == "-" ? std::string() : path), m_mode(mode) {
     m_buffer.reserve(BUFFER_BYTES);
-    if (IsStandardOutput())
-        m_descriptor = STDOUT_FILENO;
-    else
+    if (!IsStandardOutput())
         OpenFile();
 }
 
 void Result::OpenFile() {
     if (IsSpecialFile(m_path)) {
-        m_descriptor = ::open(m_path.c_str(), O_WRONLY | O_CLOEXEC | O_NOCTTY);
+        m_file = Descriptor(::open(m_path.c_str(), O_WRONLY | O_CLOEXEC | O_NOCTTY));
     } else {
         m_draft = m_path + ".new-XXXXXX";
-        m_descriptor = ::mkostemp(m_draft.data(), O_CLOEXEC); // makes it with mode 0600
+        m_file = Descriptor(::mkostemp(m_draft.data(), O_CLOEXEC)); // makes it with mode 0600
     }
-    if (m_descriptor >= 0)
+    if (m_file.IsOpen())
         return;
     m_draft.clear();
-    Throw("cannot write " + m_path);
+    SystemTool::ThrowErrno("cannot write " + m_path);
 }
 
 Result::~Result() {
-    if (!IsStandardOutput())
-        ::close(m_descriptor);
     if (!m_draft.empty())
         ::unlink(m_draft.c_str());
 }
@@ -83,13 +76,14 @@ void Result::Write(std::string_view text) {
 }
 
 void Result::Flush() {
+    const int output = IsStandardOutput() ? STDOUT_FILENO : m_file.Number();
     std::string_view rest = m_buffer;
     while (!rest.empty()) {
-        const auto written = ::write(m_descriptor, rest.data(), rest.size());
+        const auto written = ::write(output, rest.data(), rest.size());
         if (written < 0 && errno == EPIPE)
             EndByTheClosedPipe();
         if (written < 0 && errno != EINTR)
-            Throw("cannot write " + (IsStandardOutput() ? "to standard output" : m_path));
+            SystemTool::ThrowErrno("cannot write " + (IsStandardOutput() ? "to standard output" : m_path));
         if (written > 0)
             rest.remove_prefix(static_cast<std::size_t>(written));
     }
@@ -100,9 +94,9 @@ void Result::Finish() {
     Flush();
     if (m_draft.empty())
         return;
-    if (::fchmod(m_descriptor, m_mode) != 0 || ::fsync(m_descriptor) != 0 ||
+    if (::fchmod(m_file.Number(), m_mode) != 0 || ::fsync(m_file.Number()) != 0 ||
         ::rename(m_draft.c_str(), m_path.c_str()) != 0)
-        Throw("cannot write " + m_path);
+        SystemTool::ThrowErrno("cannot write " + m_path);
     m_draft.clear();
     SyncDirectoryOf(m_path);
 }

@@ -5,6 +5,8 @@
 
 #include <sys/types.h>
 
+#include "SystemTool/IO/Descriptor.h"
+
 namespace reportctl::terminal {
 
 /// The output of a command: standard output, or a file that appears whole or not at all.
@@ -38,8 +40,8 @@ private:
 
     std::string m_path;
     mode_t m_mode;
-    std::string m_draft; ///< the unfinished file; empty when there is none
-    int m_descriptor = -1;
+    std::string m_draft;               ///< the unfinished file; empty when there is none
+    SystemTool::IO::Descriptor m_file; ///< not open for standard output
     std::string m_buffer;
 };
 
