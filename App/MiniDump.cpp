@@ -11,10 +11,9 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include <Poco/Format.h>
-
 #include "Common/Common.h"
 
+namespace Paths = SyncServiceReport::Paths;
 using SyncServiceReport::LogLevel;
 using SyncServiceReport::WriteLog;
 
@@ -88,7 +87,7 @@ void MiniDump::OnStackCallBack(int signal) {
 
 bool MiniDump::IsAlreadyRun() {
     ::umask(0);
-    const std::string path = Poco::format("/Library/Preferences/hublink/%s.pid", m_strLogName);
+    const std::string path = Paths::PidFile(Paths::SHARED, m_strLogName);
     // We do not truncate the file here: a second instance, which does not get the lock, must not erase the id
     // of the first. We do not follow a link: every user may put one into that directory, and the file that
     // the link names would be emptied.

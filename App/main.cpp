@@ -46,7 +46,7 @@ int main() {
     // The log is opened before the instance check, so that a refused second instance can write its line into
     // the shared log.
     ConfigureLog();
-    MiniDump::EnableAutoStack(APP_LOG_DIR_PATH, "Report");
+    MiniDump::EnableAutoStack(APP_LOG_DIR_PATH, Paths::SERVICE);
     if (MiniDump::IsAlreadyRun()) {
         WriteLog({LogLevel::Info, "main", 14}, "Process is already running");
         return 1;

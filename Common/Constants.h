@@ -2,6 +2,7 @@
 
 #include <string>
 
+#include "Common/Paths.h"
 #include "Common/Wire.h"
 
 // Each source file has its own copy of these constants, built by its own static initialiser. So they can be
@@ -17,5 +18,5 @@ static const std::string DATE_TIME_FORMAT_MS = "%Y-%m-%d %H:%M:%S:%i";
 static const std::string WIN_REG_PATH = "HKEY_LOCAL_MACHINE\\SOFTWARE\\HubLink";
 
 /// The suite's preferences directory, and its machine-wide settings file there.
-static const std::string MAC_REG_PATH = "/Library/Preferences/hublink";
+static const std::string MAC_REG_PATH = SyncServiceReport::Paths::SHARED;
 static const std::string MAC_REG_INI = MAC_REG_PATH + "/local_machine.ini";

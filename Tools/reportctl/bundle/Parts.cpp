@@ -96,7 +96,7 @@ std::string System() {
                        SystemTool::CommonTool::GetOSVersionString(), name.sysname, name.release, name.machine,
                        ::geteuid(), data, error ? 0 : space.available, Settings(),
                        FilesIn(SyncServiceReport::Paths::Databases(data)), FilesIn(log::LogDirectory()),
-                       FilesIn("/Library/Preferences/hublink"));
+                       FilesIn(SyncServiceReport::Paths::SHARED));
 }
 
 /// The rows of a query, one a line, with a bar between the columns.

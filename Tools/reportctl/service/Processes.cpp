@@ -14,7 +14,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include "Common/Constants.h"
+#include "Common/Paths.h"
 #include "Common/Wire.h"
 #include "SystemTool/IO/Descriptor.h"
 
@@ -139,7 +139,7 @@ std::vector<BoundSocket> SocketsAtTheServicesPort() {
 
 std::optional<pid_t> LockHolder() {
     const SystemTool::IO::Descriptor file(
-        ::open((MAC_REG_PATH + "/Report.pid").c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK));
+        ::open(SyncServiceReport::Paths::PidFile().c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK));
     struct flock whole {};
     whole.l_type = F_WRLCK;
     whole.l_whence = SEEK_SET;

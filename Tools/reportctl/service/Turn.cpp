@@ -7,7 +7,7 @@
 #include <fmt/format.h>
 #include <unistd.h>
 
-#include "Common/Constants.h"
+#include "Common/Paths.h"
 #include "Tools/reportctl/service/Program.h"
 
 namespace reportctl::service {
@@ -17,7 +17,7 @@ namespace {
 /// lock, and the service takes it again. When another service takes it first, ours refuses to start, and the
 /// caller tries again.
 void AwaitLock() {
-    const int file = ::open((MAC_REG_PATH + "/Report.pid").c_str(), O_RDWR | O_CLOEXEC | O_NOFOLLOW);
+    const int file = ::open(SyncServiceReport::Paths::PidFile().c_str(), O_RDWR | O_CLOEXEC | O_NOFOLLOW);
     if (file < 0)
         return;
     struct flock whole {};

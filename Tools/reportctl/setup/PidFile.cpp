@@ -7,6 +7,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include "Common/Paths.h"
 #include "SystemTool/Errno.h"
 #include "SystemTool/IO/Descriptor.h"
 #include "Tools/reportctl/terminal/ShellQuoted.h"
@@ -14,9 +15,9 @@
 namespace reportctl::setup {
 namespace {
 
+namespace Paths = SyncServiceReport::Paths;
 using SystemTool::IO::Descriptor;
 
-constexpr auto NAME = "Report.pid";
 constexpr mode_t MODE = 0666;
 
 Descriptor Opened(int number) {
@@ -28,8 +29,10 @@ Descriptor Opened(int number) {
 /// Creates the file with its full mode from the start; the umask takes nothing from it. An existing file is
 /// never replaced.
 int CreateIn(int directory) {
+    const auto name = Paths::PidFileName();
     const mode_t mask = ::umask(0);
-    const int file = ::openat(directory, NAME, O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC | O_NOFOLLOW, MODE);
+    const int file =
+        ::openat(directory, name.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC | O_NOFOLLOW, MODE);
     const int code = errno;
     ::umask(mask);
     errno = code;
@@ -74,11 +77,11 @@ void LookAt(terminal::Worklog& log, const std::string& file, const struct stat& 
 } // namespace
 
 std::string CommandForPidFile(const std::string& directory) {
-    return fmt::format("sudo install -m 0666 /dev/null {}", terminal::ShellQuoted(directory + "/" + NAME));
+    return fmt::format("sudo install -m 0666 /dev/null {}", terminal::ShellQuoted(Paths::PidFile(directory)));
 }
 
 void EnsurePidFile(terminal::Worklog& log, const std::string& directory) {
-    const auto file = directory + "/" + NAME;
+    const auto file = Paths::PidFile(directory);
     struct stat owner {};
     struct stat status {};
     if (::lstat(directory.c_str(), &owner) == 0 && ::lstat(file.c_str(), &status) == 0)

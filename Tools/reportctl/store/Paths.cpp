@@ -21,7 +21,7 @@ std::string LedgerPath() {
 }
 
 std::string ForwardPath() {
-    return Paths::Suite(SystemTool::CommonTool::GetUserDataDir()) + "/forward/Forward.db";
+    return Paths::Forward(SystemTool::CommonTool::GetUserDataDir());
 }
 
 } // namespace reportctl::store
