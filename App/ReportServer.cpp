@@ -119,11 +119,11 @@ bool ReportServer::JsonToStruct(const std::string& json, ST_OptLog& out) {
             return false;
         }
         out.eventID = report.GetKeyValue(Wire::REPORT_MARK).ToString();
-        const JsonDocument value = report.GetKeyValue("value");
+        const JsonDocument value = report.GetKeyValue(Wire::VALUE);
         out.value = value.IsObject() ? value.ToJson() : value.ToString();
-        out.createTime = TimeText(report.GetKeyValue("createTime"));
+        out.createTime = TimeText(report.GetKeyValue(Wire::CREATE_TIME));
         out.pType = std::count(out.eventID.begin(), out.eventID.end(), '|') == 1 ? 0 : 1;
-        out.isDayReport = report.GetKeyValue("isDayReport").ToInt() == 1;
+        out.isDayReport = report.GetKeyValue(Wire::IS_DAY_REPORT).ToInt() == 1;
         return true;
     } catch (...) {
         Ended(Outcome::Exception);

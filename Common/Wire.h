@@ -25,4 +25,25 @@ inline constexpr std::size_t SECONDS_LENGTH = 10;
 inline constexpr auto MESSAGE_KIND = "msgType";
 inline constexpr auto MESSAGE_DATA = "exdata";
 
+/// The members of a report, beside REPORT_MARK.
+inline constexpr auto VALUE = "value";
+inline constexpr auto CREATE_TIME = "createTime"; ///< Also in an event's EVENT_EXTEND.
+inline constexpr auto IS_DAY_REPORT = "isDayReport";
+
+/// The members of a control message's data. Those of the user are in both kinds, the others in "init".
+inline constexpr auto MODULE_ID = "moduleID";
+inline constexpr auto MODULE_VERSION = "moduleVersion";
+inline constexpr auto MODULE_NAME = "moduleName";
+inline constexpr auto LOG_PATH = "logPath";
+inline constexpr auto DB_PATH = "dbPath";
+inline constexpr auto OPEN_ID = "openID";
+inline constexpr auto HUBLINK_VERSION = "hublinkVersion"; ///< Also in an event's EVENT_EXTEND.
+
+/// The members of an event's payload, as it goes to analytics (docs/Outbox.md), and what the service adds to
+/// the members of EVENT_DATA, which are those of the report's value.
+inline constexpr auto EVENT_EXTEND = "extend";
+inline constexpr auto EVENT_DATA = "eventData";
+inline constexpr auto EVENT_OPEN_ID = "openid";
+inline constexpr auto EVENT_SYSTEM = "sys_version";
+
 } // namespace Wire

@@ -15,13 +15,13 @@ using SystemTool::IO::JsonDocument;
 
 ST_InitMsg InitMsgFrom(const JsonDocument& exdata) {
     const auto text = [&exdata](const char* key) { return exdata.GetKeyValue(key).ToString(); };
-    return {.moduleID = text("moduleID"),
-            .moduleVersion = text("moduleVersion"),
-            .moduleName = text("moduleName"),
-            .logPath = text("logPath"),
-            .dbPath = text("dbPath"),
-            .openID = text("openID"),
-            .hublinkVersion = text("hublinkVersion")};
+    return {.moduleID = text(Wire::MODULE_ID),
+            .moduleVersion = text(Wire::MODULE_VERSION),
+            .moduleName = text(Wire::MODULE_NAME),
+            .logPath = text(Wire::LOG_PATH),
+            .dbPath = text(Wire::DB_PATH),
+            .openID = text(Wire::OPEN_ID),
+            .hublinkVersion = text(Wire::HUBLINK_VERSION)};
 }
 
 } // namespace
@@ -71,8 +71,8 @@ bool MetrikMgr::Update(const std::string& json) {
             openID = msg.openID;
             version = msg.hublinkVersion;
         } else if (msgType == ORVEK_REPORT_UPDATEOPENID) {
-            openID = exdata.GetKeyValue("openID").ToString();
-            version = exdata.GetKeyValue("hublinkVersion").ToString();
+            openID = exdata.GetKeyValue(Wire::OPEN_ID).ToString();
+            version = exdata.GetKeyValue(Wire::HUBLINK_VERSION).ToString();
         }
         // A version without an open id is not passed on, deliberately: it belongs to a user.
         if (!openID.empty()) {

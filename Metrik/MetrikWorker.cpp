@@ -72,8 +72,8 @@ bool MetrikWorker::Send(const ST_OptLog& log) {
     try {
         const ST_BaseInfo& info = m_pServer->GetBaseInfo();
         JsonDocument extend;
-        extend.SetKeyValue("hublinkVersion", info.suiteVersion);
-        extend.SetKeyValue("createTime", log.createTime);
+        extend.SetKeyValue(Wire::HUBLINK_VERSION, info.suiteVersion);
+        extend.SetKeyValue(Wire::CREATE_TIME, log.createTime);
 
         JsonDocument eventData;
         if (!log.value.empty()) {
@@ -86,12 +86,12 @@ bool MetrikWorker::Send(const ST_OptLog& log) {
                 return false;
             }
         }
-        eventData.SetKeyValue("openid", info.openID);
-        eventData.SetKeyValue("sys_version", info.osVersion);
+        eventData.SetKeyValue(Wire::EVENT_OPEN_ID, info.openID);
+        eventData.SetKeyValue(Wire::EVENT_SYSTEM, info.osVersion);
 
         JsonDocument root;
-        root.SetKeyValue("extend", extend);
-        root.SetKeyValue("eventData", eventData);
+        root.SetKeyValue(Wire::EVENT_EXTEND, extend);
+        root.SetKeyValue(Wire::EVENT_DATA, eventData);
         return m_pSdk->ReportEvent(log.eventID, root.ToJson());
     } catch (...) {
         Ended(Outcome::Exception);

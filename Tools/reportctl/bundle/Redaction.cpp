@@ -58,12 +58,12 @@ std::string WithoutStatements(const std::string& text) {
 
 std::string RedactedControl(const message::Message& message, const JsonDocument& data) {
     JsonDocument kept;
-    for (const auto* name :
-         {"moduleID", "moduleVersion", "moduleName", "hublinkVersion", "logPath", "dbPath"})
+    for (const auto* name : {Wire::MODULE_ID, Wire::MODULE_VERSION, Wire::MODULE_NAME, Wire::HUBLINK_VERSION,
+                             Wire::LOG_PATH, Wire::DB_PATH})
         if (const auto text = data.GetKeyValue(name).ToString(); !text.empty())
             kept.SetKeyValue(name, text);
-    if (const auto openID = data.GetKeyValue("openID").ToString(); !openID.empty())
-        kept.SetKeyValue("openID", Sizes("open id", openID.size()));
+    if (const auto openID = data.GetKeyValue(Wire::OPEN_ID).ToString(); !openID.empty())
+        kept.SetKeyValue(Wire::OPEN_ID, Sizes("open id", openID.size()));
     JsonDocument redacted;
     redacted.SetKeyValue(Wire::MESSAGE_KIND, message.control);
     redacted.SetKeyValue(Wire::MESSAGE_DATA, kept);
@@ -73,8 +73,8 @@ std::string RedactedControl(const message::Message& message, const JsonDocument&
 std::string RedactedReport(const message::Message& message) {
     JsonDocument redacted;
     redacted.SetKeyValue(Wire::REPORT_MARK, message.eventID);
-    redacted.SetKeyValue("value", Sizes("value", message.value.size()));
-    redacted.SetKeyValue("createTime", message.createTime);
+    redacted.SetKeyValue(Wire::VALUE, Sizes("value", message.value.size()));
+    redacted.SetKeyValue(Wire::CREATE_TIME, message.createTime);
     return redacted.ToJson();
 }
 

@@ -2,6 +2,7 @@
 
 #include <string_view>
 
+#include "Common/Wire.h"
 #include "Modules/MetrikSdk/otlp/InstanceId.h"
 #include "SystemTool/IO/JsonParse.h"
 #include "SystemTool/Text/Utf8.h"
@@ -27,7 +28,7 @@ void WriteText(JsonWriter& writer, const char* key, const Row::Text& text) {
 void WriteMembers(JsonWriter& writer, const JsonTree& value) {
     for (const auto& member : value.GetObject()) {
         const std::string_view name(member.name.GetString(), member.name.GetStringLength());
-        if (name == "openid")
+        if (name == Wire::EVENT_OPEN_ID)
             continue;
         writer.Key(name.data(), static_cast<rapidjson::SizeType>(name.size()));
         member.value.Accept(writer); // calls itself for each level, of which ReadJson lets 128 pass
@@ -40,10 +41,10 @@ void WriteValue(JsonWriter& writer, const Row::Text& value) {
     if (isJson && tree.IsObject()) {
         WriteMembers(writer, tree);
     } else if (isJson && tree.IsArray()) {
-        writer.Key("value");
+        writer.Key(Wire::VALUE);
         tree.Accept(writer);
     } else {
-        WriteText(writer, "value", value);
+        WriteText(writer, Wire::VALUE, value);
     }
 }
 
@@ -51,15 +52,15 @@ std::string PayloadOf(const Row& row) {
     SystemTool::IO::JsonBuffer text;
     JsonWriter writer(text);
     writer.StartObject();
-    writer.Key("extend");
+    writer.Key(Wire::EVENT_EXTEND);
     writer.StartObject();
-    WriteText(writer, "hublinkVersion", row.suiteVersion);
-    WriteText(writer, "createTime", row.createTime);
+    WriteText(writer, Wire::HUBLINK_VERSION, row.suiteVersion);
+    WriteText(writer, Wire::CREATE_TIME, row.createTime);
     writer.EndObject();
-    writer.Key("eventData");
+    writer.Key(Wire::EVENT_DATA);
     writer.StartObject();
     WriteValue(writer, row.value);
-    WriteText(writer, "openid", row.openid);
+    WriteText(writer, Wire::EVENT_OPEN_ID, row.openid);
     writer.EndObject();
     writer.EndObject();
     return {text.GetString(), text.GetSize()};

@@ -16,8 +16,8 @@ std::string TimeText(const JsonDocument& createTime) {
 
 void ReadReport(Message& message, const JsonDocument& report) {
     message.eventID = report.GetKeyValue(Wire::REPORT_MARK).ToString();
-    message.value = ValueText(report.GetKeyValue("value"));
-    message.createTime = TimeText(report.GetKeyValue("createTime"));
+    message.value = ValueText(report.GetKeyValue(Wire::VALUE));
+    message.createTime = TimeText(report.GetKeyValue(Wire::CREATE_TIME));
     message.kind = message.eventID.starts_with(Wire::ANALYTICS_PREFIX) ? Kind::Event : Kind::Report;
     if (const auto bar = message.eventID.find('|'); bar != std::string::npos)
         message.module = message.eventID.substr(0, bar);
@@ -54,9 +54,9 @@ Message Read(const std::string& text) {
     message.kind = Kind::Control;
     message.control = document.GetKeyValue(Wire::MESSAGE_KIND).ToString();
     const auto data = document.GetKeyValue(Wire::MESSAGE_DATA);
-    message.module = data.GetKeyValue("moduleID").ToString();
+    message.module = data.GetKeyValue(Wire::MODULE_ID).ToString();
     if (message.control == SyncServiceReport::ORVEK_REPORT_MODULEINIT)
-        message.directory = data.GetKeyValue("dbPath").ToString();
+        message.directory = data.GetKeyValue(Wire::DB_PATH).ToString();
     return message;
 }
 

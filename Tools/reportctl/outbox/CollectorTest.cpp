@@ -9,6 +9,7 @@
 #include <fmt/format.h>
 #include <netdb.h>
 
+#include "Common/Wire.h"
 #include "Modules/MetrikSdk/otlp/HttpSender.h"
 #include "Modules/MetrikSdk/otlp/OtlpEncoder.h"
 #include "SystemTool/IO/JsonDocument.h"
@@ -34,12 +35,12 @@ bool HasProxy(const service::Environment& environment) {
 std::string TestEvent() {
     const auto now = MetrikSdk::WallNow();
     SystemTool::IO::JsonDocument extend;
-    extend.SetKeyValue("createTime", std::to_string(now.time_since_epoch().count()));
+    extend.SetKeyValue(Wire::CREATE_TIME, std::to_string(now.time_since_epoch().count()));
     SystemTool::IO::JsonDocument data;
     data.SetKeyValue("test", "sent by `reportctl outbox test`; no report");
     SystemTool::IO::JsonDocument payload;
-    payload.SetKeyValue("extend", extend);
-    payload.SetKeyValue("eventData", data);
+    payload.SetKeyValue(Wire::EVENT_EXTEND, extend);
+    payload.SetKeyValue(Wire::EVENT_DATA, data);
     return MetrikSdk::otlp::EncodeOtlp(
         {.outboxId = "reportctl-test",
          .events = {{.row = 1,

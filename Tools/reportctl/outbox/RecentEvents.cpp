@@ -2,6 +2,7 @@
 
 #include <algorithm>
 
+#include "Common/Wire.h"
 #include "SystemTool/IO/JsonDocument.h"
 #include "Tools/reportctl/outbox/Database.h"
 
@@ -20,7 +21,7 @@ JsonDocument Parsed(const std::string& text) {
 
 /// The service adds these two members to a report's value, or replaces them there.
 JsonDocument WithoutTheServicesOwn(JsonDocument data) {
-    for (const auto* added : {"openid", "sys_version"})
+    for (const auto* added : {Wire::EVENT_OPEN_ID, Wire::EVENT_SYSTEM})
         data.SetKeyValue(added, std::string());
     return data;
 }
@@ -32,8 +33,9 @@ std::size_t HashOf(const std::string& eventID, const std::string& createTime, co
 
 std::size_t HashOf(const Event& event) {
     const auto payload = Parsed(event.payload);
-    return HashOf(event.eventID, payload.GetKeyValue("extend").GetKeyValue("createTime").ToString(),
-                  payload.GetKeyValue("eventData"));
+    return HashOf(event.eventID,
+                  payload.GetKeyValue(Wire::EVENT_EXTEND).GetKeyValue(Wire::CREATE_TIME).ToString(),
+                  payload.GetKeyValue(Wire::EVENT_DATA));
 }
 
 /// What the service takes as the data of an event.

@@ -111,8 +111,8 @@ void JudgeNames(Judgement& judgement, const std::string& text) {
         return;
     for (const auto& member : document.GetObject()) {
         const std::string name(member.name.GetString(), member.name.GetStringLength());
-        for (const auto* right : {Wire::REPORT_MARK, "value", "createTime", "isDayReport", Wire::MESSAGE_KIND,
-                                  Wire::MESSAGE_DATA})
+        for (const auto* right : {Wire::REPORT_MARK, Wire::VALUE, Wire::CREATE_TIME, Wire::IS_DAY_REPORT,
+                                  Wire::MESSAGE_KIND, Wire::MESSAGE_DATA})
             if (name != right && Bare(name) == Bare(right) && !document.HasMember(right))
                 judgement.warnings.push_back(fmt::format(
                     "it has a member {}, which the service does not see: the name is \"{}\", to the letter",
@@ -122,8 +122,8 @@ void JudgeNames(Judgement& judgement, const std::string& text) {
 
 void JudgeReport(Judgement& judgement, const JsonDocument& report) {
     const auto eventID = report.GetKeyValue(Wire::REPORT_MARK).ToString();
-    const auto value = message::ValueText(report.GetKeyValue("value"));
-    const auto time = report.GetKeyValue("createTime").ToString();
+    const auto value = message::ValueText(report.GetKeyValue(Wire::VALUE));
+    const auto time = report.GetKeyValue(Wire::CREATE_TIME).ToString();
     const bool isForAnalytics = eventID.starts_with(Wire::ANALYTICS_PREFIX);
     judgement.what = fmt::format("event {}, for {}", report.GetKeyValue(Wire::REPORT_MARK).ToJson(),
                                  isForAnalytics ? "analytics" : "the store");
@@ -153,8 +153,8 @@ void JudgeUserText(Judgement& judgement, const std::string& name, const std::str
 }
 
 void JudgeUser(Judgement& judgement, const JsonDocument& exdata) {
-    const auto openID = exdata.GetKeyValue("openID").ToString();
-    const auto version = exdata.GetKeyValue("hublinkVersion").ToString();
+    const auto openID = exdata.GetKeyValue(Wire::OPEN_ID).ToString();
+    const auto version = exdata.GetKeyValue(Wire::HUBLINK_VERSION).ToString();
     if (openID.empty() && !version.empty())
         judgement.warnings.emplace_back("its hublinkVersion has no effect: the service takes a version over "
                                         "only together with an openID");
@@ -165,7 +165,7 @@ void JudgeUser(Judgement& judgement, const JsonDocument& exdata) {
 }
 
 void JudgeInit(Judgement& judgement, const JsonDocument& exdata) {
-    const auto module = exdata.GetKeyValue("moduleID");
+    const auto module = exdata.GetKeyValue(Wire::MODULE_ID);
     const auto moduleID = module.ToString();
     judgement.what = fmt::format("init of module {}", module.ToJson());
     if (moduleID.empty())
@@ -179,7 +179,7 @@ void JudgeInit(Judgement& judgement, const JsonDocument& exdata) {
 }
 
 void JudgeOpenIdUpdate(Judgement& judgement, const JsonDocument& exdata) {
-    const auto openID = exdata.GetKeyValue("openID");
+    const auto openID = exdata.GetKeyValue(Wire::OPEN_ID);
     judgement.what = fmt::format("updateOpenID to {}", openID.ToJson());
     if (openID.ToString().empty())
         judgement.errors.emplace_back("it has no openID in its exdata: the service would do nothing");
