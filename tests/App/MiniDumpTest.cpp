@@ -16,6 +16,7 @@
 #include <unistd.h>
 
 #include "tests/fakes/FakeLogger.h"
+#include "tests/support/ChildProcess.h"
 #include "tests/support/FileContent.h"
 #include "tests/support/MountedOver.h"
 #include "tests/support/TemporaryDirectory.h"
@@ -63,12 +64,7 @@ LogRecord Record(int level, int line, const std::string& message) {
 /// Runs `body` in a child process and returns the child's exit code, which is the result of `body`.
 template <typename Body>
 int ExitCodeOfChild(Body body) {
-    const pid_t child = ::fork();
-    if (child == 0)
-        ::_exit(body());
-    int status = 0;
-    ::waitpid(child, &status, 0);
-    return WIFEXITED(status) ? WEXITSTATUS(status) : -1;
+    return ChildProcess(body).Wait();
 }
 
 int IsAlreadyRunAsCode() {

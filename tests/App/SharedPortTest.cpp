@@ -15,6 +15,7 @@
 #include <gtest/gtest.h>
 
 #include "tests/support/CapturedOutput.h"
+#include "tests/support/OtherUser.h"
 #include "tests/support/WaitUntil.h"
 
 // Which other programs may bind the report port. The options of a socket decide that, together with those of
@@ -26,7 +27,6 @@ const std::string LOOPBACK = "127.0.0.1";
 constexpr int PORT = 9997;
 const std::string REPORT = "report";
 const std::string LAST_REPORT = "last report";
-constexpr uid_t ANOTHER_USER = 65534;
 
 class Receiver final : public UDPServer {
 public:
@@ -94,7 +94,7 @@ public:
         EXPECT_EQ(::pipe(told), 0);
         m_process = ::fork();
         if (m_process == 0) {
-            const int error = ::setuid(ANOTHER_USER) == 0 ? Try(attempt) : EPERM;
+            const int error = ::setuid(OtherUser::ID) == 0 ? Try(attempt) : EPERM;
             if (::write(told[1], &error, sizeof error) == sizeof error)
                 ::pause();
             ::_exit(0);
@@ -118,15 +118,6 @@ private:
     int m_error = -1;
 };
 
-bool MayBecomeAnotherUser() {
-    const pid_t process = ::fork();
-    if (process == 0)
-        ::_exit(::setuid(ANOTHER_USER) == 0 ? 0 : 1);
-    int status = 0;
-    ::waitpid(process, &status, 0);
-    return status == 0;
-}
-
 class SharedPort : public ::testing::Test {
 protected:
     void Send(const std::string& report) {
@@ -142,7 +133,7 @@ protected:
 } // namespace
 
 TEST_F(SharedPort, IsRefusedToAnotherUserWhateverHeAsksFor) {
-    if (!MayBecomeAnotherUser())
+    if (!OtherUser::Does([] { return true; }))
         GTEST_SKIP() << "needs the rights to become another user";
     ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT));
     for (const Attempt& attempt : ATTEMPTS) {

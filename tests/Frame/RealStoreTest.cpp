@@ -6,7 +6,6 @@
 #include <SQLiteCpp/SQLiteCpp.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <sys/wait.h>
 #include <unistd.h>
 
 #include "App/ReportServer.h"
@@ -14,6 +13,7 @@
 #include "Frame/DBHelper.h"
 #include "Frame/FrameWorker.h"
 #include "tests/fakes/FakeLogger.h"
+#include "tests/support/ChildProcess.h"
 #include "tests/support/StoreTables.h"
 #include "tests/support/TemporaryDirectory.h"
 
@@ -158,14 +158,11 @@ TEST_F(RealStore, AMissingFileFailsEachRecordUntilItAppears) {
 }
 
 TEST_F(RealStore, ARowSurvivesAKillRightAfterSendReturned) {
-    const pid_t child = ::fork();
-    if (child == 0) {
+    ChildProcess child([this] {
         const bool sent = m_worker.Init() && Send("B1", "survives");
-        ::kill(::getpid(), sent ? SIGKILL : SIGTERM);
-    }
-    int status = 0;
-    ::waitpid(child, &status, 0);
-    ASSERT_TRUE(WIFSIGNALED(status) && WTERMSIG(status) == SIGKILL);
+        return ::kill(::getpid(), sent ? SIGKILL : SIGTERM);
+    });
+    ASSERT_EQ(child.Wait(), 128 + SIGKILL);
     EXPECT_THAT(Query("select value from OperLog"), ElementsAre(Row{"survives"}));
 }
 

@@ -8,10 +8,10 @@
 
 #include <gtest/gtest.h>
 #include <sys/stat.h>
-#include <sys/wait.h>
 #include <unistd.h>
 
 #include "tests/Ledger/LedgerFixture.h"
+#include "tests/support/ChildProcess.h"
 #include "tests/support/WaitUntil.h"
 
 using namespace ReportLedger;
@@ -134,19 +134,15 @@ TEST_F(LedgerReader, PutsWhatCannotBePrintedOutOfTheTexts) {
 TEST_F(LedgerReader, SeesATrueLedgerAfterAKillAtAnyMoment) {
     std::uint64_t received = 0;
     for (int kill = 0; kill < 30; ++kill) {
-        const pid_t process = ::fork();
-        if (process == 0) {
+        ChildProcess process([&] {
             Writer writer;
             if (!Open(writer, NOW_MS + kill))
-                ::_exit(1);
+                return 1;
             const BusyService service(writer);
-            ::pause();
-        }
+            return ::pause();
+        });
         EXPECT_TRUE(WaitUntil([&] { return Look().counting && Look().total[RECEIVED] > received; }));
-        ::kill(process, SIGKILL);
-        int status = 0;
-        ::waitpid(process, &status, 0);
-        ASSERT_EQ(WTERMSIG(status), SIGKILL);
+        ASSERT_EQ(process.Kill(), 128 + SIGKILL);
         const auto look = Look();
         ASSERT_EQ(look.sight, Sight::Sound) << "after kill " << kill;
         ASSERT_FALSE(look.counting);

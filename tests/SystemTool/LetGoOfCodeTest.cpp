@@ -1,20 +1,18 @@
-#include <fstream>
+#include <stdexcept>
 #include <string>
 
 #include <gtest/gtest.h>
+#include <unistd.h>
 
 #include "SystemTool/Platform.h"
+#include "tests/support/ProcessStatus.h"
 
 #ifdef __linux__
 namespace {
 
 /// How much of the mapped files is in this process's memory.
 long ResidentFileKb() {
-    std::ifstream status("/proc/self/status");
-    for (std::string line; std::getline(status, line);)
-        if (line.starts_with("RssFile:"))
-            return std::stol(line.substr(8));
-    return 0;
+    return NumberInStatusOf(::getpid(), "RssFile");
 }
 
 } // namespace

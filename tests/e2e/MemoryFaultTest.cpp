@@ -1,5 +1,4 @@
 #include <filesystem>
-#include <fstream>
 #include <optional>
 
 #include <SQLiteCpp/SQLiteCpp.h>
@@ -7,6 +6,7 @@
 #include <sys/resource.h>
 
 #include "tests/e2e/support/Service.h"
+#include "tests/support/ProcessStatus.h"
 #include "tests/support/WaitUntil.h"
 
 // The service when it reaches a limit on its memory: on its addresses (ulimit -v) or its data (ulimit -d).
@@ -14,15 +14,6 @@
 namespace {
 
 constexpr long ROOM_KILOBYTES = 16 * 1024; // what the limit leaves for a backlog
-
-/// A value of the process's status, in kilobytes.
-long Kilobytes(const Service& service, const std::string& name) {
-    std::ifstream status("/proc/" + std::to_string(service.Process()) + "/status");
-    for (std::string line; std::getline(status, line);)
-        if (line.starts_with(name + ":"))
-            return std::stol(line.substr(name.size() + 1));
-    return -1;
-}
 
 struct Limit {
     const char* name;
@@ -43,7 +34,7 @@ protected:
     }
 
     void SetLimit() {
-        m_limitKilobytes = Kilobytes(m_service, GetParam().usage) + ROOM_KILOBYTES;
+        m_limitKilobytes = NumberInStatusOf(m_service.Process(), GetParam().usage) + ROOM_KILOBYTES;
         const auto bytes = static_cast<rlim_t>(m_limitKilobytes) * 1024;
         const rlimit limit{.rlim_cur = bytes, .rlim_max = bytes};
         ASSERT_EQ(::prlimit(m_service.Process(), GetParam().resource, &limit, nullptr), 0);
@@ -111,8 +102,8 @@ TEST_P(MemoryFault, ABacklogThatFillsTheMemoryCostsReportsAndNotTheService) {
 
     constexpr long FREED_KILOBYTES = 1024; // at least this much: the memory that stays in use is scattered
     EXPECT_TRUE(WaitUntil([&] {
-        return Kilobytes(m_service, GetParam().usage) < m_limitKilobytes - FREED_KILOBYTES;
-    })) << Kilobytes(m_service, GetParam().usage)
+        return NumberInStatusOf(m_service.Process(), GetParam().usage) < m_limitKilobytes - FREED_KILOBYTES;
+    })) << NumberInStatusOf(m_service.Process(), GetParam().usage)
         << " of " << m_limitKilobytes << " KB are in use";
     for (const char* suffix : {"", "-wal", "-shm"})
         std::filesystem::remove(m_service.DatabaseFile() + suffix);

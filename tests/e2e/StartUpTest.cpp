@@ -11,6 +11,7 @@
 #include "tests/support/FileContent.h"
 #include "tests/support/ModeOf.h"
 #include "tests/support/MountedOver.h"
+#include "tests/support/ProcessStatus.h"
 #include "tests/support/WaitUntil.h"
 
 using ::testing::ContainsRegex;
@@ -39,11 +40,8 @@ std::string ContentOfPidFile() {
 
 /// One bit for each signal that the process handles; the lowest bit is for signal 1.
 std::uint64_t CaughtSignals(pid_t process) {
-    std::ifstream status("/proc/" + std::to_string(process) + "/status");
-    for (std::string line; std::getline(status, line);)
-        if (line.starts_with("SigCgt:"))
-            return std::stoull(line.substr(7), nullptr, 16);
-    return 0;
+    const auto signals = StatusOf(process, "SigCgt");
+    return signals.empty() ? 0 : std::stoull(signals, nullptr, 16);
 }
 
 class StartUp : public ::testing::Test {
@@ -83,9 +81,7 @@ TEST_F(StartUp, HoldsThePidFileAndAUmaskOfZero) {
     m_service.Start();
     EXPECT_EQ(ContentOfPidFile(), std::to_string(m_service.Process()));
     EXPECT_EQ(ModeOf(Service::PID_FILE), 0666U);
-    std::ifstream status("/proc/" + std::to_string(m_service.Process()) + "/status");
-    const std::string text{std::istreambuf_iterator<char>(status), {}};
-    EXPECT_THAT(text, HasSubstr("Umask:\t0000\n"));
+    EXPECT_EQ(StatusOf(m_service.Process(), "Umask"), "0000");
 }
 
 TEST_F(StartUp, HandlesASegmentationFaultAndNoOtherSignal) {

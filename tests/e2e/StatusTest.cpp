@@ -13,6 +13,7 @@
 #include "SystemTool/IO/JsonDocument.h"
 #include "tests/e2e/support/Disk.h"
 #include "tests/e2e/support/Service.h"
+#include "tests/support/FileContent.h"
 #include "tests/support/ModeOf.h"
 #include "tests/support/WaitUntil.h"
 
@@ -25,11 +26,6 @@ using ::testing::Not;
 namespace {
 
 using SystemTool::IO::JsonDocument;
-
-std::string ContentOf(const std::string& path) {
-    std::ifstream file(path, std::ios::binary);
-    return {std::istreambuf_iterator<char>(file), {}};
-}
 
 class Status : public ::testing::Test {
 protected:

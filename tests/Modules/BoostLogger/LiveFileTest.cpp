@@ -7,7 +7,7 @@
 
 #include "tests/Modules/BoostLogger/LogFiles.h"
 #include "tests/support/ChildProcess.h"
-#include "tests/support/OrdinaryUser.h"
+#include "tests/support/OtherUser.h"
 #include "tests/support/TemporaryDirectory.h"
 
 using BoostLogger::LiveFile;
@@ -93,7 +93,7 @@ TEST_F(TheLiveFile, LeavesTheModeOfADirectoryThatIsThere) {
 TEST_F(TheLiveFile, SaysWhyADirectoryCouldNotBeMade) {
     const std::string parent = m_directory.Path();
     ChildProcess child([&] {
-        return BecomeOrdinaryUser(parent) && chmod(parent.c_str(), 0555) == 0 &&
+        return OtherUser::BecomeOwnerOf(parent) && chmod(parent.c_str(), 0555) == 0 &&
                MakeDirectory(parent + "/log/metrik").Text() == "cannot make the directory: Permission denied";
     });
     EXPECT_EQ(child.Wait(), 0);

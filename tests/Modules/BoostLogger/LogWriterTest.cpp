@@ -11,7 +11,7 @@
 
 #include "tests/Modules/BoostLogger/LogFiles.h"
 #include "tests/support/ChildProcess.h"
-#include "tests/support/OrdinaryUser.h"
+#include "tests/support/OtherUser.h"
 #include "tests/support/TemporaryDirectory.h"
 #include "tests/support/WaitUntil.h"
 
@@ -275,7 +275,7 @@ TEST_F(TheLogWriter, DoesNotGlueALineToTheHalfOfOneThatAFullDiskCutOff) {
 
 TEST_F(TheLogWriter, DropsRecordsRatherThanOutgrowItsFileWhereItMayNotRotate) {
     ChildProcess child([&] {
-        if (!BecomeOrdinaryUser(m_temporary.Path()))
+        if (!OtherUser::BecomeOwnerOf(m_temporary.Path()))
             return false;
         LogWriter writer(Settings());
         if (writer.Start())

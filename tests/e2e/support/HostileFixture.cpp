@@ -6,6 +6,7 @@
 #include <Poco/RegularExpression.h>
 #include <gmock/gmock.h>
 
+#include "tests/support/ProcessStatus.h"
 #include "tests/support/WaitUntil.h"
 
 using ::testing::ElementsAre;
@@ -46,11 +47,7 @@ const Poco::RegularExpression
               Poco::RegularExpression::RE_UTF8);
 
 std::size_t PeakMemoryOf(pid_t process) {
-    std::ifstream status("/proc/" + std::to_string(process) + "/status");
-    for (std::string line; std::getline(status, line);)
-        if (line.starts_with("VmHWM:"))
-            return std::stoul(line.substr(6)) * 1024;
-    return 0;
+    return static_cast<std::size_t>(std::max(NumberInStatusOf(process, "VmHWM"), 0L)) * 1024;
 }
 
 std::vector<std::string> FilesBelow(const std::string& directory) {

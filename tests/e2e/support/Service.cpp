@@ -19,6 +19,7 @@
 #include <unistd.h>
 
 #include "tests/support/FileContent.h"
+#include "tests/support/ProcessStatus.h"
 #include "tests/support/WaitUntil.h"
 
 namespace {
@@ -260,11 +261,7 @@ std::int64_t Service::Count(const std::string& file, const std::string& sql) con
 }
 
 long Service::ResidentKilobytes() const {
-    std::ifstream status("/proc/" + std::to_string(m_process) + "/status");
-    for (std::string line; std::getline(status, line);)
-        if (line.starts_with("VmRSS:"))
-            return std::stol(line.substr(6));
-    return -1;
+    return NumberInStatusOf(m_process, "VmRSS");
 }
 
 bool Service::Bound() {

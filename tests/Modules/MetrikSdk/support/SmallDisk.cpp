@@ -5,10 +5,11 @@
 
 #include <sched.h>
 #include <sys/mount.h>
-#include <sys/wait.h>
 #include <unistd.h>
 
 #include <gtest/gtest.h>
+
+#include "tests/support/ChildProcess.h"
 
 namespace {
 
@@ -42,16 +43,12 @@ int RunChild(const std::string& directory, int bytes, const std::function<void()
 } // namespace
 
 SmallDiskResult RunOnSmallDisk(const std::string& directory, int bytes, const std::function<void()>& test) {
-    const auto child = ::fork();
-    if (child == 0) {
-        const int code = RunChild(directory, bytes, test);
-        std::fflush(nullptr);
-        ::_exit(code);
-    }
-    int status = 0;
-    ::waitpid(child, &status, 0);
-    if (WIFEXITED(status) && WEXITSTATUS(status) == UNAVAILABLE)
+    const int code = ChildProcess([&] {
+                         const int result = RunChild(directory, bytes, test);
+                         std::fflush(nullptr);
+                         return result;
+                     }).Wait();
+    if (code == UNAVAILABLE)
         return SmallDiskResult::Unavailable;
-    return WIFEXITED(status) && WEXITSTATUS(status) == PASSED ? SmallDiskResult::Passed
-                                                              : SmallDiskResult::Failed;
+    return code == PASSED ? SmallDiskResult::Passed : SmallDiskResult::Failed;
 }

@@ -6,7 +6,7 @@
 #include "tests/Modules/OrvekSqlite/SqliteFixture.h"
 #include "tests/support/ChildProcess.h"
 #include "tests/support/FileContent.h"
-#include "tests/support/OrdinaryUser.h"
+#include "tests/support/OtherUser.h"
 
 // Faults of the file, before the service opens it and while the service runs.
 namespace {
@@ -48,7 +48,7 @@ protected:
     }
 
     /// Becomes an ordinary user, who gets the files, because root may write everything.
-    bool BecomeAnOrdinaryUser() const { return BecomeOrdinaryUser(Directory(), {Store()}); }
+    bool BecomeAnOrdinaryUser() const { return OtherUser::BecomeOwnerOf(Directory(), {Store()}); }
 
 private:
     mode_t m_umask = 0;

@@ -2,6 +2,7 @@
 #include <unistd.h>
 
 #include "tests/Tools/reportctl/support/ReportctlFixture.h"
+#include "tests/support/OtherUser.h"
 
 namespace {
 
@@ -234,7 +235,7 @@ TEST_F(Setup, SaysSoWhenItsWordsCannotBeWritten) {
 /// must make these users.
 class SetupInAnothersDirectory : public Setup {
 protected:
-    static constexpr uid_t NOBODY = 65534;
+    static constexpr uid_t NOBODY = OtherUser::ID;
 
     void SetUp() override {
         if (::geteuid() != 0)

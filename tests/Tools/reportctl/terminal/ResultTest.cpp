@@ -6,6 +6,7 @@
 
 #include <gtest/gtest.h>
 
+#include "tests/support/FileContent.h"
 #include "tests/support/ModeOf.h"
 #include "tests/support/TemporaryDirectory.h"
 
@@ -16,11 +17,6 @@ using reportctl::terminal::Result;
 class ResultFile : public testing::Test {
 protected:
     std::string Path() const { return m_directory.Path() + "/file"; }
-
-    static std::string ContentOf(const std::string& path) {
-        std::ifstream file(path, std::ios::binary);
-        return {std::istreambuf_iterator<char>(file), {}};
-    }
 
     std::ptrdiff_t Files() const {
         return std::distance(std::filesystem::directory_iterator(m_directory.Path()), {});
