@@ -150,8 +150,8 @@ private:
         return true;
     }
 
-    /// The umask of a host may take rights of the owner away from a new directory. A file system without modes
-    /// refuses the change, but the directory can be used all the same.
+    /// The umask of a host may take rights of the owner away from a new directory. A file system without
+    /// modes refuses the change, but the directory can be used all the same.
     void GiveBackWhatTheUmaskTook(const char* name) const {
         [[maybe_unused]] const int ignored =
             ::fchmodat(m_directory.Number(), name, SystemTool::IO::PRIVATE_DIRECTORY, AT_SYMLINK_NOFOLLOW);

@@ -5,8 +5,8 @@
 --
 -- The collector's exporter writes Map and DateTime64, so it cannot write into this engine. The program that
 -- loads the rows gives the time as a text, and each map as two lists, of its keys and of its values. No row
--- is deleted by age: drop the oldest partitions yourself (ALTER TABLE hublink.otel_logs DROP PARTITION ...). The queries
--- are the same for both.
+-- is deleted by age: drop the oldest partitions yourself (ALTER TABLE hublink.otel_logs DROP PARTITION ...).
+-- The queries are the same for both.
 
 CREATE DATABASE IF NOT EXISTS hublink;
 

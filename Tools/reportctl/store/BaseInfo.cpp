@@ -13,9 +13,9 @@
 namespace reportctl::store {
 namespace {
 
-/// Warns of single quotes: the service puts these texts into its statements without escaping them. With a lone
-/// one, the database would refuse every report. It is a warning and no error, because the suite chooses its
-/// ids.
+/// Warns of single quotes: the service puts these texts into its statements without escaping them. With a
+/// lone one, the database would refuse every report. It is a warning and no error, because the suite chooses
+/// its ids.
 void WarnOfQuotes(const terminal::Worklog& log, const std::string& text) {
     if (HasDoubledQuotes(text))
         log.Warn(

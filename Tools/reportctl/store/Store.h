@@ -50,8 +50,8 @@ SQLite::Database OpenStore(const std::string& path);
 /// into Report.db, and that would be a change.
 SQLite::Database OpenStoreToLook(const std::string& path);
 
-/// Opens the database for commands that look at it for a moment, as OpenUnchanged does. Where that cannot read
-/// because a -shm is missing, the owner makes it anew, and changes nothing else.
+/// Opens the database for commands that look at it for a moment, as OpenUnchanged does. Where that cannot
+/// read because a -shm is missing, the owner makes it anew, and changes nothing else.
 SQLite::Database OpenToGlance(const std::string& path);
 
 /// Opens the database for commands that read much. The owner reads with SQLite's locks, so that a long read

@@ -9,8 +9,8 @@
 namespace reportctl::store {
 namespace {
 
-/// The header of a write-ahead log. A log that is no longer has no rows. A process that was killed in its first
-/// commit leaves such a one, and SQLite would look for its index for ten seconds.
+/// The header of a write-ahead log. A log that is no longer has no rows. A process that was killed in its
+/// first commit leaves such a one, and SQLite would look for its index for ten seconds.
 constexpr std::uintmax_t LOG_HEADER_BYTES = 32;
 
 constexpr int BUSY_TIMEOUT_MS = 20; // reading must be quick; in WAL mode, a writer makes no reader wait
@@ -49,9 +49,9 @@ bool LacksIndex(const std::string& path) {
 }
 
 SQLite::Database OpenUnchanged(const std::string& path) {
-    // SQLite would make a missing -wal or -shm. When there is no log with rows, the database file alone has all
-    // rows, and "immutable" keeps SQLite from making the files. An empty log beside an index may get rows at
-    // any moment.
+    // SQLite would make a missing -wal or -shm. When there is no log with rows, the database file alone has
+    // all rows, and "immutable" keeps SQLite from making the files. An empty log beside an index may get rows
+    // at any moment.
     const auto logBytes = LogBytesOf(path);
     const bool isWhole = logBytes <= LOG_HEADER_BYTES && (logBytes > 0 || !HasIndex(path));
     SQLite::Database database(UriOf(path, isWhole ? "immutable=1" : "mode=ro&readonly_shm=1"),

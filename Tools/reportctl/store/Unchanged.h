@@ -16,8 +16,8 @@ namespace reportctl::store {
 /// or when there is a -wal with rows and no -shm.
 SQLite::Database OpenUnchanged(const std::string& path);
 
-/// Whether OpenUnchanged cannot read the database because there is a -wal with rows and no -shm. A backup that
-/// left the -shm out is restored like that.
+/// Whether OpenUnchanged cannot read the database because there is a -wal with rows and no -shm. A backup
+/// that left the -shm out is restored like that.
 bool LacksIndex(const std::string& path);
 
 } // namespace reportctl::store
