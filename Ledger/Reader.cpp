@@ -59,9 +59,28 @@ std::vector<MarkAt> MarksOf(std::span<const Mark> marks, std::int64_t nowMs) {
     return found;
 }
 
+/// When the process was last seen at work: when it counted last, or wrote a mark. It writes marks while no
+/// report comes, too.
+/// A time of the future is from before the clock was set back.
+std::uint64_t LastSignOfWork(const Look& look) {
+    std::uint64_t last = 0;
+    for (const auto ms : look.lastMs)
+        if (ms <= static_cast<std::uint64_t>(look.atMs))
+            last = std::max(last, ms);
+    for (const auto* marks : {&look.marks, &look.recent})
+        if (!marks->empty())
+            last = std::max(last, static_cast<std::uint64_t>(marks->back().atMs));
+    return last;
+}
+
 /// Counts as lost what an ended process had received and not ended, in the same way as the next start will.
-void CountAsLost(Counts& total) {
-    total[LOST_AT_ENDS] = total[RECEIVED] - EndedIn(total);
+/// The process ended at an unknown time after it was last at work.
+void CountAsLost(Look& look) {
+    Counts& total = look.total;
+    const std::uint64_t lost = total[RECEIVED] - EndedIn(total);
+    if (lost != total[LOST_AT_ENDS])
+        look.lastMs[LOST_AT_ENDS] = LastSignOfWork(look);
+    total[LOST_AT_ENDS] = lost;
     total[HANDLED] = total[QUEUED];
     total[RECEIVING] = 0;
 }
@@ -168,12 +187,13 @@ Look LookAt(const File& content, bool counting, std::int64_t nowMs) {
         TakeBalancedLook(content, look);
     } else {
         look.total = CopyOf(content.total);
-        CountAsLost(look.total);
         look.balanced = true;
     }
     look.lastMs = CopyOf(content.lastMs);
     look.marks = MarksOf(content.marks, nowMs);
     look.recent = MarksOf(content.recent, nowMs);
+    if (!counting)
+        CountAsLost(look);
     return look;
 }
 

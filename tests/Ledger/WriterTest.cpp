@@ -158,6 +158,7 @@ TEST_F(LedgerWriter, WhatAProcessDidNotEndIsLostWhenItIsGoneAndCountedByTheNextO
     for (const auto* when : {"while nothing runs", "and again"}) {
         EXPECT_FALSE(Look().counting) << when;
         EXPECT_EQ(Look().total[LOST_AT_ENDS], 4U) << when;
+        EXPECT_EQ(Look().lastMs[LOST_AT_ENDS], static_cast<std::uint64_t>(NOW_MS)) << when;
         EXPECT_EQ(WaitingIn(Look().total), 0U) << when;
     }
     for (int start = 0; start < 2; ++start) {
