@@ -153,6 +153,10 @@ void Outbox::RemoveDelivered(const Batch& batch, std::size_t refused) {
     });
 }
 
+void Outbox::NoteUploadFailure(const std::string& text) {
+    WithStore(Caller::Uploader, [&](OutboxStore& store, Call&) { store.NoteUploadFailure(text, WallNow()); });
+}
+
 void Outbox::MoveToDeadLetters(const StoredEvent& event, const Refusal& refusal) {
     WithStore(Caller::Uploader, [&](OutboxStore& store, Call& call) {
         const auto module = store.MoveToDeadLetters(event, refusal, WallNow());

@@ -44,6 +44,7 @@ public:
     void Release();
 
     void RemoveDelivered(const Batch& batch, std::size_t refused);
+    void NoteUploadFailure(const std::string& text);
     void MoveToDeadLetters(const StoredEvent& event, const Refusal& refusal);
 
     /// Reports the totals of what is being lost, because a callback is about to be removed. Does nothing when

@@ -60,6 +60,15 @@ CREATE TABLE totals(
     last_delivered_ms    INTEGER);
 )sql";
 
+/// The failure with which uploads began to fail last. It lasts as long as at_ms is later than last_delivered_ms
+/// of the totals. The table is made with the first failure, because files of this version can be without it.
+constexpr const char* UPLOAD_FAILURE = R"sql(
+CREATE TABLE IF NOT EXISTS upload_failure(
+    id    INTEGER PRIMARY KEY CHECK (id = 1),
+    at_ms INTEGER NOT NULL,
+    text  TEXT    NOT NULL);
+)sql";
+
 /// Changes version 1 into this version. Version 1 kept its modules for ever. It does not say which modules
 /// have an event waiting. So every module counts as having one, until the newest event that waits now has
 /// left.

@@ -298,6 +298,19 @@ void OutboxStore::RemoveDelivered(const Batch& batch, std::size_t refused) {
     });
 }
 
+void OutboxStore::NoteUploadFailure(const std::string& text, WallTime now) {
+    Guarded("Cannot note that the upload fails", [&] {
+        WriteTransaction transaction(m_database);
+        m_database.exec(UPLOAD_FAILURE);
+        SQLite::Statement note(m_database,
+                               "INSERT OR REPLACE INTO upload_failure(id, at_ms, text) VALUES(1, ?1, ?2)");
+        note.bind(1, static_cast<std::int64_t>(now.time_since_epoch().count()));
+        note.bindNoCopy(2, text);
+        note.exec();
+        transaction.Commit();
+    });
+}
+
 std::string OutboxStore::MoveToDeadLetters(const StoredEvent& event, const Refusal& refusal, WallTime now) {
     return Guarded("Cannot move an event to the dead letters", [&] {
         WriteTransaction transaction(m_database);

@@ -101,6 +101,9 @@ public:
     /// when the event is not there.
     std::string MoveToDeadLetters(const StoredEvent& event, const Refusal& refusal, WallTime now);
 
+    /// Keeps the failure, in the place of an earlier one, for a reader of the file.
+    void NoteUploadFailure(const std::string& text, WallTime now);
+
     /// Deletes the oldest dead letters until both limits hold. Returns how many it deleted.
     std::size_t TrimDeadLetters(std::size_t maxRows, std::size_t maxBytes);
 

@@ -107,8 +107,23 @@ void UploadCycle::Act(Exchange exchange, const UploadRules::Decision& decision) 
 }
 
 void UploadCycle::TellNotNow(const Exchange& exchange) {
-    m_notifier.TellFailure({report::Cause::Upload, m_sender.Destination() + ": " + Describe(exchange.result) +
-                                                       "; the events stay in the outbox"});
+    const auto text =
+        m_sender.Destination() + ": " + Describe(exchange.result) + "; the events stay in the outbox";
+    m_notifier.TellFailure({report::Cause::Upload, text});
+    Note(text);
+}
+
+/// The log forgets: under load it goes round within seconds, and the next failure may be told minutes later.
+/// So the first failure since a delivery is kept in the file, too, where a reader looks whether uploads work.
+void UploadCycle::Note(const std::string& failure) {
+    if (m_isFailureNoted)
+        return;
+    try {
+        m_outbox.NoteUploadFailure(failure);
+        m_isFailureNoted = true;
+    } catch (
+        const outbox::StoreError&) { // the next failure tries again, and the next event tells of the file
+    }
 }
 
 std::string UploadCycle::Describe(const otlp::HttpResult& result) const {
@@ -124,6 +139,7 @@ void UploadCycle::TellFirstStrike(const Exchange& exchange, const AsideList::Str
 }
 
 void UploadCycle::Delivered(Exchange exchange) {
+    m_isFailureNoted = false;
     const auto count = exchange.batch.events.size();
     const auto partial = RetryPolicy::ReadPartialSuccess(exchange.result, count);
     m_removal = Removal{std::move(exchange.batch), partial.rejected};

@@ -65,6 +65,7 @@ private:
     void TellDelivery(std::size_t count, const PartialSuccess& partial);
     void TellPartialSuccess(std::size_t count, const PartialSuccess& partial);
     void TellNotNow(const Exchange& exchange);
+    void Note(const std::string& failure);
     void TellFirstStrike(const Exchange& exchange, const AsideList::Strikes& strikes);
     void MoveToDeadLetters(const Exchange& exchange, const std::string& reason);
     void Settle();
@@ -76,6 +77,7 @@ private:
     std::function<double()> m_random; ///< Uniform in [0, 1).
     UploadRules m_rules;
     std::optional<Removal> m_removal; ///< Delivered, and not deleted yet.
+    bool m_isFailureNoted = false;    ///< That of the failures since the last delivery.
 };
 
 } // namespace MetrikSdk::upload

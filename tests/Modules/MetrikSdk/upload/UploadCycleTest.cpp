@@ -5,6 +5,7 @@
 #include <functional>
 #include <set>
 
+#include <SQLiteCpp/SQLiteCpp.h>
 #include <gtest/gtest.h>
 
 #include "tests/Modules/MetrikSdk/support/ReceivedEvents.h"
@@ -159,6 +160,30 @@ TEST_F(TheUploadCycle, KeepsTheBatchAndWaitsLongerEachTime) {
     Append(1);
     AnswerAlways(Status(503));
     EXPECT_EQ(RunUntilPause().duration, 500ms) << "a success begins anew";
+}
+
+TEST_F(TheUploadCycle, NotesTheFirstFailureSinceADeliveryInTheFile) {
+    const auto noted = [this] {
+        return SQLite::Database(m_directory.Path() + "/MetrikOutbox.db")
+            .execAndGet("SELECT (SELECT count(*) FROM upload_failure) || ' ' || text || ' ' || "
+                        "(at_ms > coalesce(last_delivered_ms, 0)) FROM upload_failure, totals")
+            .getString();
+    };
+    Append(1);
+    AnswerAlways(Status(503));
+    RunUntilPause();
+    const std::string first = "1 http://collector: HTTP status 503; the events stay in the outbox ";
+    EXPECT_EQ(noted(), first + "1");
+    AnswerAlways(Status(502));
+    RunUntilPause();
+    EXPECT_EQ(noted(), first + "1") << "one write for all failures of an outage";
+    AnswerAlways(Status(200));
+    RunUntilPause();
+    EXPECT_EQ(noted(), first + "0") << "the delivery is later";
+    Append(1);
+    AnswerAlways(Status(502));
+    RunUntilPause();
+    EXPECT_EQ(noted().find("1 http://collector: HTTP status 502; the events stay in the outbox "), 0U);
 }
 
 TEST_F(TheUploadCycle, SendsTheSameEventsWithTheSameIdsAgain) {
