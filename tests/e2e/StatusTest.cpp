@@ -10,9 +10,8 @@
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 
-#include "SystemTool/IO/JsonDocument.h"
 #include "tests/e2e/support/Disk.h"
-#include "tests/e2e/support/Service.h"
+#include "tests/e2e/support/StatusFixture.h"
 #include "tests/support/FileContent.h"
 #include "tests/support/ModeOf.h"
 #include "tests/support/WaitUntil.h"
@@ -25,46 +24,8 @@ using ::testing::Not;
 
 namespace {
 
-using SystemTool::IO::JsonDocument;
-
-class Status : public ::testing::Test {
+class Status : public StatusFixture {
 protected:
-    Status() { m_service.Install(); }
-
-    /// Runs reportctl. Returns what it printed, and sets `code` to its exit code.
-    std::string Run(const std::vector<std::string>& arguments, int& code) const {
-        const auto before = m_service.Output().size();
-        code = m_service.Reportctl(arguments);
-        return m_service.Output().substr(before);
-    }
-
-    JsonDocument Json(int expectedCode) const {
-        int code = -1;
-        std::string error;
-        JsonDocument json;
-        m_text = Run({"status", "--json"}, code);
-        json.FromJson(m_text, error);
-        EXPECT_EQ(error, "") << m_text;
-        EXPECT_EQ(code, expectedCode) << m_text;
-        EXPECT_EQ(json.GetKeyValue("verdict").ToString(), expectedCode == 0   ? "healthy"
-                                                          : expectedCode == 1 ? "degraded"
-                                                                              : "down");
-        return json;
-    }
-
-    /// The value at a path such as "ledger.total.received", as text.
-    static std::string At(JsonDocument json, std::string path) {
-        for (std::size_t dot = 0; (dot = path.find('.')) != std::string::npos; path.erase(0, dot + 1))
-            json = json.GetKeyValue(path.substr(0, dot));
-        return json.GetKeyValue(path).ToJson();
-    }
-
-    /// Expects this exit code, and a reason with these words.
-    void Expect(int code, const std::string& words) const {
-        Json(code);
-        EXPECT_THAT(m_text, HasSubstr(words));
-    }
-
     /// Names, sizes, contents and times of all files in the data directory.
     std::map<std::string, std::string> Files() const {
         std::map<std::string, std::string> files;
@@ -74,9 +35,6 @@ protected:
                                       std::to_string(entry.last_write_time().time_since_epoch().count());
         return files;
     }
-
-    Service m_service;
-    mutable std::string m_text; ///< The output of the last call.
 };
 
 } // namespace

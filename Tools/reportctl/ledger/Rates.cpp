@@ -1,6 +1,7 @@
 #include "Tools/reportctl/ledger/Rates.h"
 
 #include <algorithm>
+#include <iterator>
 #include <numeric>
 
 namespace reportctl::ledger {
@@ -23,6 +24,17 @@ const MarkAt* MarkWithin(const std::vector<MarkAt>& marks, std::int64_t nowMs,
     const auto found = std::ranges::find_if(
         marks, [&](const MarkAt& mark) { return mark.atMs < nowMs && nowMs - mark.atMs <= time.count(); });
     return found == marks.end() ? nullptr : &*found;
+}
+
+/// The newest mark that is at least as old as `time`, or else the oldest mark; null when there is none. The
+/// service may not have run when the time began: then the newest mark before it has the counts of that time.
+const MarkAt* MarkBefore(const std::vector<MarkAt>& marks, std::int64_t nowMs,
+                         std::chrono::milliseconds time) {
+    const auto after =
+        std::ranges::find_if(marks, [&](const MarkAt& mark) { return nowMs - mark.atMs < time.count(); });
+    if (after != marks.begin())
+        return &*std::prev(after);
+    return marks.empty() ? nullptr : &marks.front();
 }
 
 Rates Since(const MarkAt* mark, const Look& look) {
@@ -59,7 +71,7 @@ Rates OfTheLastSecond(const Look& look) {
 }
 
 std::uint64_t GrownIn(const Look& look, unsigned place, std::chrono::milliseconds time) {
-    const MarkAt* const mark = MarkWithin(look.marks, look.atMs, time + 11s);
+    const MarkAt* const mark = MarkBefore(look.marks, look.atMs, time);
     return mark == nullptr ? 0 : look.total[place] - std::min(mark->counts[place], look.total[place]);
 }
 

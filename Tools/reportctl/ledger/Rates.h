@@ -24,7 +24,8 @@ Rates RatesBetween(const ReportLedger::Counts& before, const ReportLedger::Count
 Rates OfTheLastMinute(const ReportLedger::Look& look);
 Rates OfTheLastSecond(const ReportLedger::Look& look);
 
-/// How much a counter grew in about the last `time`, or since the oldest mark when that is younger.
+/// How much a counter grew in about the last `time`, or since the oldest mark when that is younger. 0 when no
+/// mark tells it.
 std::uint64_t GrownIn(const ReportLedger::Look& look, unsigned place, std::chrono::milliseconds time);
 
 } // namespace reportctl::ledger

@@ -7,6 +7,7 @@
 #include <fstream>
 #include <iterator>
 #include <sstream>
+#include <string_view>
 
 #include <fcntl.h>
 #include <fmt/format.h>
@@ -44,6 +45,23 @@ std::string TargetOf(const fs::path& link) {
     return fs::read_symlink(link, error).string();
 }
 
+template <typename Number>
+void ReadNumber(std::string_view text, Number& number, int base = 10) {
+    std::from_chars(text.data(), text.data() + text.size(), number, base);
+}
+
+/// The socket in a line of the kernel's table, without its address. The fifth word is what waits to be sent
+/// and to be read, in hexadecimal digits with a colon between.
+BoundSocket SocketIn(const std::vector<std::string>& words) {
+    BoundSocket socket;
+    ReadNumber(words[7], socket.owner);
+    ReadNumber(words[9], socket.inode);
+    ReadNumber(std::string_view(words[4]).substr(words[4].find(':') + 1), socket.unreadBytes, 16);
+    if (words.size() > 12)
+        ReadNumber(words[12], socket.dropped);
+    return socket;
+}
+
 /// The sockets that are bound to one of these addresses: one of IPv4, one of IPv6.
 std::vector<BoundSocket> SocketsAt(const std::array<std::string, 2>& addresses) {
     constexpr std::array TABLES = {"/proc/net/udp", "/proc/net/udp6"};
@@ -53,11 +71,8 @@ std::vector<BoundSocket> SocketsAt(const std::array<std::string, 2>& addresses) 
         for (std::string line; std::getline(table, line);) {
             std::istringstream fields(line);
             const std::vector<std::string> words{std::istream_iterator<std::string>(fields), {}};
-            if (words.size() < 10 || words[1] != addresses[i])
-                continue;
-            BoundSocket& socket = sockets.emplace_back();
-            std::from_chars(words[7].data(), words[7].data() + words[7].size(), socket.owner);
-            std::from_chars(words[9].data(), words[9].data() + words[9].size(), socket.inode);
+            if (words.size() >= 10 && words[1] == addresses[i])
+                sockets.push_back(SocketIn(words));
         }
     }
     return sockets;
@@ -132,6 +147,8 @@ std::optional<pid_t> ProcessOfSocket(std::uint64_t inode) {
 std::vector<BoundSocket> SocketsAtTheServicesPort() {
     const auto port = fmt::format(":{:04X}", Wire::PORT);
     auto sockets = SocketsAt({LOOPBACK + port, LOOPBACK_IN_IPV6 + port});
+    for (auto& socket : sockets)
+        socket.isAtTheServicesAddress = true;
     const auto any = SocketsAt({ANY_ADDRESS + port, ANY_IPV6_ADDRESS + port});
     sockets.insert(sockets.end(), any.begin(), any.end());
     return sockets;

@@ -35,6 +35,9 @@ std::optional<pid_t> ProcessOfSocket(std::uint64_t inode);
 struct BoundSocket {
     uid_t owner = 0;
     std::uint64_t inode = 0;
+    bool isAtTheServicesAddress = false; ///< False: it is bound to all addresses of the machine.
+    std::uint64_t unreadBytes = 0;       ///< What the kernel keeps until the program reads it.
+    std::uint32_t dropped = 0;           ///< Datagrams that the kernel has dropped at this socket.
 };
 
 /// The sockets that are bound to the service's port. Those at the service's own address come first, then

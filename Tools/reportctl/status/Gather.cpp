@@ -8,6 +8,7 @@
 #include "Common/Paths.h"
 #include "SystemTool/CommonTool.h"
 #include "SystemTool/Platform.h"
+#include "Tools/reportctl/status/OutboxFailure.h"
 #include "Tools/reportctl/status/Parts.h"
 #include "Tools/reportctl/status/Status.h"
 #include "Tools/reportctl/store/Paths.h"
@@ -36,6 +37,19 @@ uid_t OwnerOfData(const std::string& data) {
     return ::stat(Paths::Suite(data).c_str(), &status) == 0 ? status.st_uid : ::geteuid();
 }
 
+/// The process that runs; when none does, the one that ran last.
+LogWriter WriterOf(const Service& service, const ReportLedger::Look& ledger) {
+    if (ledger.counting || (!service.isRunning && ledger.sight == ReportLedger::Sight::Sound))
+        return {std::to_string(ledger.process), ledger.startedAtMs};
+    return {service.process ? std::to_string(*service.process) : "", 0};
+}
+
+OutboxWorked WhatWorked(const Status& status) {
+    constexpr auto TO_ANALYTICS = static_cast<unsigned>(ReportLedger::Outcome::ToAnalytics);
+    return {status.outbox.lastDeliveredAtMs.value_or(0),
+            static_cast<std::int64_t>(status.ledger.lastMs[TO_ANALYTICS])};
+}
+
 } // namespace
 
 Status Gather() {
@@ -47,8 +61,11 @@ Status Gather() {
     status.lastSecond = ledger::OfTheLastSecond(status.ledger);
     status.service = LookAtService(status.ledger, OwnerOfData(data));
     status.store = LookAtStore(store::StorePath());
-    status.log = LookAtLog(Paths::ServiceLogs(data), status.atMs);
-    status.outbox = LookAtOutbox(store::OutboxPath(), status.service, status.log);
+    const auto writer = WriterOf(status.service, status.ledger);
+    status.log = LookAtLog(Paths::ServiceLogs(data), writer, status.atMs);
+    status.outbox = LookAtOutbox(store::OutboxPath(), status.service);
+    AddNotedFailure(status.log.fromOutbox, status.outbox, writer);
+    status.outbox.lastFailure = LastingFailure(status.log.fromOutbox, WhatWorked(status), status.atMs);
     status.disk = LookAtDisk(data);
     return status;
 }

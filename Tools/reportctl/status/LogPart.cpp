@@ -1,12 +1,14 @@
 #include <algorithm>
 #include <filesystem>
 #include <fstream>
+#include <unordered_map>
 
 #include <fmt/format.h>
 
 #include "Tools/reportctl/log/Files.h"
 #include "Tools/reportctl/log/Line.h"
 #include "Tools/reportctl/status/Parts.h"
+#include "Tools/reportctl/status/Recent.h"
 
 namespace reportctl::status {
 namespace {
@@ -16,23 +18,22 @@ namespace fs = std::filesystem;
 /// How much of the log's end is read: some thousand lines, in a few milliseconds.
 constexpr std::uintmax_t MOST_READ = std::uintmax_t{1024} * 1024;
 constexpr std::size_t MOST_SHOWN = 5;
-constexpr std::int64_t RECENT_MS = 600'000;
 
 /// The place in the service that logs when the outbox has a failure, and when the failure is over.
 constexpr std::string_view OUTBOX_SITE = "Metrik/MetrikWorker:21 FailCallBackFun";
 
 /// Returns nothing when the line's level is lower than a warning, or when the line is not a record. It looks
 /// at the level first: most lines have a lower one, and reading a line takes longer.
-std::optional<Log::Line> WarningOrErrorIn(std::string_view text) {
+std::optional<log::Line> WarningOrErrorIn(std::string_view text) {
     const auto level = log::LevelIn(text);
     if (level != log::WARN && level != log::ERROR && level != log::FATAL)
         return std::nullopt;
-    auto line = log::ReadLine(text);
-    if (!line)
-        return std::nullopt;
-    return Log::Line{line->time.time_since_epoch().count(), log::WordFor(line->level),
-                     fmt::format("{}:{} {}", line->site, line->number, line->function),
-                     std::move(line->message)};
+    return log::ReadLine(text);
+}
+
+Log::Line Shown(log::Line line) {
+    return {line.time.time_since_epoch().count(), log::WordFor(line.level),
+            fmt::format("{}:{} {}", line.site, line.number, line.function), std::move(line.message)};
 }
 
 /// The last `bytes` of a file, from the first beginning of a line in them.
@@ -59,20 +60,50 @@ std::string NewestPart(const std::string& directory) {
     return newest;
 }
 
-void Take(Log& log, Log::Line line, std::int64_t nowMs) {
-    if (line.site == OUTBOX_SITE)
-        log.lastFromOutbox = line;
-    if (nowMs - line.atMs <= RECENT_MS)
-        ++(line.level == "WARN" ? log.warnings : log.errors);
-    log.last.push_back(std::move(line));
-    if (log.last.size() > MOST_SHOWN)
-        log.last.erase(log.last.begin());
+template <typename Item>
+void AddToTheLast(std::vector<Item>& last, Item item) {
+    last.push_back(std::move(item));
+    if (last.size() > MOST_SHOWN)
+        last.erase(last.begin());
 }
+
+/// Reads the warnings and errors of a log, from the oldest to the newest.
+class Reading {
+public:
+    Reading(Log& log, const LogWriter& writer, std::int64_t nowMs)
+        : m_log(log), m_writer(writer), m_nowMs(nowMs) {}
+
+    void Take(log::Line read) {
+        const bool isWriters = read.process == m_writer.process;
+        auto line = Shown(std::move(read));
+        if (isWriters && line.site == OUTBOX_SITE && line.atMs >= m_writer.startedAtMs)
+            TakeOutboxLine(m_log.fromOutbox, line);
+        if (IsRecent(line.atMs, m_nowMs))
+            ++(line.level == "WARN" ? m_log.warnings : m_log.errors);
+        CountText(line);
+        AddToTheLast(m_log.last, std::move(line));
+    }
+
+private:
+    void CountText(const Log::Line& line) {
+        const auto key = line.level + line.site + line.text;
+        std::erase_if(m_log.lastTexts, [&](const Log::Repeated& earlier) {
+            return earlier.line.level + earlier.line.site + earlier.line.text == key;
+        });
+        AddToTheLast(m_log.lastTexts, Log::Repeated{line, ++m_times[key]});
+    }
+
+    Log& m_log;
+    const LogWriter& m_writer;
+    std::int64_t m_nowMs;
+    std::unordered_map<std::string, int> m_times;
+};
 
 } // namespace
 
-Log LookAtLog(const std::string& directory, std::int64_t nowMs) {
+Log LookAtLog(const std::string& directory, const LogWriter& writer, std::int64_t nowMs) {
     Log log;
+    Reading reading(log, writer, nowMs);
     log.directory = directory;
     std::error_code error;
     for (const auto& entry : fs::directory_iterator(directory, error)) {
@@ -84,7 +115,7 @@ Log LookAtLog(const std::string& directory, std::int64_t nowMs) {
     std::string_view rest = text;
     for (auto end = rest.find('\n'); end != std::string_view::npos; end = rest.find('\n')) {
         if (auto line = WarningOrErrorIn(rest.substr(0, end)))
-            Take(log, std::move(*line), nowMs);
+            reading.Take(std::move(*line));
         rest.remove_prefix(end + 1);
     }
     return log;

@@ -16,10 +16,6 @@ namespace {
 /// module, because an index would make storing an event slower.
 constexpr std::int64_t MOST_TOLD_APART = 20'000;
 
-/// The words with which the outbox logs that a failure is over.
-constexpr auto TAKEN_AGAIN = "events are taken again";
-constexpr auto STORED_AGAIN = "Events are stored again";
-
 /// A UUID of version 7 begins with the time at which it was made.
 std::optional<std::int64_t> TimeOf(const std::string& uuid) {
     constexpr std::size_t VERSION_AT = 14;
@@ -66,6 +62,17 @@ std::map<std::int64_t, std::int64_t> WaitingByModule(SQLite::Database& database)
     return waiting;
 }
 
+/// An outbox of which no upload ever failed has no such table.
+void ReadUploadFailure(SQLite::Database& database, Outbox& outbox) {
+    if (!database.tableExists("upload_failure"))
+        return;
+    SQLite::Statement failure(database, "select at_ms, text from upload_failure");
+    if (!failure.executeStep())
+        return;
+    outbox.uploadFailedAtMs = failure.getColumn(0).getInt64();
+    outbox.uploadFailure = failure.getColumn(1).getString();
+}
+
 void ReadModules(SQLite::Database& database, Outbox& outbox) {
     const bool areToldApart = outbox.waiting.value_or(0) <= MOST_TOLD_APART;
     auto waiting = areToldApart ? WaitingByModule(database) : std::map<std::int64_t, std::int64_t>();
@@ -94,28 +101,19 @@ std::optional<std::string> EndpointOf(const Service& service) {
     return config ? std::optional(MetrikSdk::otlp::WithoutSecrets(config->url)) : std::nullopt;
 }
 
-/// The outbox's last line in the log, unless it says that the failure is over.
-std::optional<std::string> LastFailureIn(const Log& log) {
-    const auto& line = log.lastFromOutbox;
-    if (!line || line->text.find(TAKEN_AGAIN) != std::string::npos ||
-        line->text.find(STORED_AGAIN) != std::string::npos)
-        return std::nullopt;
-    return line->text;
-}
-
 } // namespace
 
-Outbox LookAtOutbox(const std::string& path, const Service& service, const Log& log) {
+Outbox LookAtOutbox(const std::string& path, const Service& service) {
     Outbox outbox;
     outbox.path = path;
     outbox.endpoint = EndpointOf(service);
-    outbox.lastFailure = LastFailureIn(log);
     outbox.isPresent = IsFile(path, outbox.problem);
     if (!outbox.isPresent)
         return outbox;
     try {
         auto database = store::OpenToGlance(path);
         ReadTotals(database, outbox);
+        ReadUploadFailure(database, outbox);
         ReadModules(database, outbox);
     } catch (const std::exception& failure) {
         outbox.problem = failure.what();

@@ -2,6 +2,7 @@
 
 #include <string>
 
+#include "Tools/reportctl/status/OutboxFailure.h"
 #include "Tools/reportctl/status/Status.h"
 
 /// The parts of the status; each function gathers one part. Nothing throws when something is missing, is
@@ -17,9 +18,10 @@ bool IsFile(const std::string& path, std::string& problem);
 
 Store LookAtStore(const std::string& path);
 
-/// `service` gives the process whose settings name the collector, `log` the outbox's last failure.
-Outbox LookAtOutbox(const std::string& path, const Service& service, const Log& log);
+/// `service` gives the process whose settings name the collector.
+Outbox LookAtOutbox(const std::string& path, const Service& service);
 
-Log LookAtLog(const std::string& directory, std::int64_t nowMs);
+/// `writer` is the process whose lines about its outbox count.
+Log LookAtLog(const std::string& directory, const LogWriter& writer, std::int64_t nowMs);
 
 } // namespace reportctl::status

@@ -1,6 +1,3 @@
-#include <map>
-#include <utility>
-
 #include <fmt/format.h>
 
 #include "SystemTool/Text/Utf8.h"
@@ -182,24 +179,18 @@ private:
                         ", last failure " + (outbox.lastFailure ? Shown(*outbox.lastFailure) : "-"));
     }
 
-    /// Shows the last warnings and errors. Equal lines are shown once, with their number.
+    /// Shows the last of the different warnings and errors, each with how often it came.
     void ShowLog() {
         const Log& log = m_status.log;
         Row("log", fmt::format("{}; in the last ten minutes {}, {}", Bytes(log.bytes),
                                Counted(static_cast<std::uint64_t>(log.errors), "error"),
                                Counted(static_cast<std::uint64_t>(log.warnings), "warning")));
-        std::map<std::string, int> times;
-        for (const auto& line : log.last)
-            ++times[line.level + line.site + line.text];
-        for (auto line = log.last.rbegin(); line != log.last.rend(); ++line) {
-            const int count = std::exchange(times[line->level + line->site + line->text], 0);
-            if (count != 0)
-                Row("",
-                    fmt::format("{} {}{:<5} [{}] {}", TimeOfDay(line->atMs),
-                                count > 1 ? fmt::format("{}x ", count) : "", line->level, Shown(line->site),
-                                Shown(line->text)),
-                    2);
-        }
+        for (auto text = log.lastTexts.rbegin(); text != log.lastTexts.rend(); ++text)
+            Row("",
+                fmt::format("{} {}{:<5} [{}] {}", TimeOfDay(text->line.atMs),
+                            text->times > 1 ? fmt::format("{}x ", text->times) : "", text->line.level,
+                            Shown(text->line.site), Shown(text->line.text)),
+                2);
     }
 
     const Status& m_status;

@@ -59,18 +59,32 @@ bool IsOf(const service::BoundSocket& socket, const Service& service, uid_t owne
            service::HasSocket(*service.process, socket.inode).value_or(socket.owner == owner);
 }
 
+PortHolder Holder(std::optional<pid_t> process, uid_t owner) {
+    return {process, process ? service::ProgramNameOf(*process) : std::nullopt, service::NameOf(owner)};
+}
+
+/// A program that allows it shares the address with others of its user, and the kernel gives each sender's
+/// datagrams to one of them. A socket that is bound to all addresses gets nothing beside the service's.
+void FindPortSharer(Service& service, const service::BoundSocket& other) {
+    if (other.isAtTheServicesAddress && !service.portSharer)
+        service.portSharer = Holder(service::ProcessOfSocket(other.inode), other.owner);
+}
+
 void FindPortHolder(Service& service, uid_t owner) {
     const auto sockets = service::SocketsAtTheServicesPort();
     for (const auto& socket : sockets)
-        service.isListening |= IsOf(socket, service, owner);
-    if (sockets.empty())
-        return;
-    PortHolder holder;
-    holder.process = service.isListening ? service.process : service::ProcessOfSocket(sockets.front().inode);
-    if (holder.process)
-        holder.name = service::ProgramNameOf(*holder.process);
-    holder.user = service::NameOf(service.isListening ? owner : sockets.front().owner);
-    service.portHolder = holder;
+        if (IsOf(socket, service, owner)) {
+            service.isListening = true;
+            service.intake = Intake{socket.unreadBytes, socket.dropped};
+        }
+    if (service.isListening) {
+        service.portHolder = Holder(service.process, owner);
+        for (const auto& socket : sockets)
+            if (!IsOf(socket, service, owner))
+                FindPortSharer(service, socket);
+    } else if (!sockets.empty()) {
+        service.portHolder = Holder(service::ProcessOfSocket(sockets.front().inode), sockets.front().owner);
+    }
 }
 
 bool HasPlugin(const Service& service, const std::string& library) {

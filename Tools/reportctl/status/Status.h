@@ -21,6 +21,12 @@ struct PortHolder {
     std::string user; ///< The user's name, or number when it has no name.
 };
 
+/// What the kernel knows of the service's own socket.
+struct Intake {
+    std::uint64_t unreadBytes = 0;
+    std::uint32_t dropped = 0; ///< Since the socket was bound; it wraps around.
+};
+
 struct Service {
     bool isRunning = false;
     bool isListening = false;
@@ -29,6 +35,8 @@ struct Service {
     std::optional<std::string> version;
     std::optional<std::string> buildId;
     std::optional<PortHolder> portHolder;
+    std::optional<PortHolder> portSharer; ///< Another program at the same address and port.
+    std::optional<Intake> intake;
     std::optional<std::string> otherUser; ///< The user whose service holds the machine's lock instead.
     /// Whether the process has loaded the plug-ins. When that is not known, for example because nothing runs:
     /// whether their files are beside the program.
@@ -67,9 +75,11 @@ struct Outbox {
     std::optional<std::int64_t> deadLetters;
     std::optional<std::int64_t> dropped;
     std::optional<std::int64_t> lastDeliveredAtMs;
+    std::optional<std::int64_t> uploadFailedAtMs; ///< When uploads began to fail last.
+    std::string uploadFailure;                    ///< And why.
     std::vector<Module> modules;
     std::optional<std::string> endpoint;    ///< The collector's address, without secrets.
-    std::optional<std::string> lastFailure; ///< The outbox's last line in the log, if the failure lasts.
+    std::optional<std::string> lastFailure; ///< What the outbox told, if the failure lasts.
     std::string problem;
 };
 
@@ -80,12 +90,20 @@ struct Log {
         std::string site; ///< Such as "App/ReportServer:42 Recv".
         std::string text;
     };
+    struct Repeated {
+        Line line; ///< When it came last.
+        int times = 0;
+    };
     std::string directory;
     std::uint64_t bytes = 0;
     int errors = 0; ///< Of the last ten minutes, in the part of the log that was read.
     int warnings = 0;
-    std::vector<Line> last;             ///< The last warnings and errors, the oldest first.
-    std::optional<Line> lastFromOutbox; ///< The outbox's last warning or error, also when it is old.
+    std::vector<Line> last; ///< The last warnings and errors, the oldest first.
+    /// The last of the different warnings and errors, each with how often the part that was read has it; the
+    /// one that came last is the last. A storm of one error leaves the others in it.
+    std::vector<Repeated> lastTexts;
+    /// The last line of each cause that the process told about its outbox, the oldest first.
+    std::vector<Line> fromOutbox;
 };
 
 struct Disk {

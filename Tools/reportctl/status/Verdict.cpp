@@ -3,16 +3,17 @@
 
 #include <fmt/format.h>
 
+#include "Tools/reportctl/status/Recent.h"
 #include "Tools/reportctl/status/Status.h"
 #include "Tools/reportctl/terminal/Quantity.h"
 
 namespace reportctl::status {
 namespace {
 
-using namespace std::chrono_literals;
 using ReportLedger::Outcome;
 
-constexpr std::chrono::milliseconds RECENT = 10min;
+/// Datagrams that wait for less than this are a burst, or a disk that is slow for a moment.
+constexpr std::chrono::milliseconds LONGEST_UNREAD = std::chrono::seconds(5);
 constexpr std::uint64_t LEAST_FREE = 500'000'000;
 constexpr std::uint64_t SMALL_DISK = 10'000'000'000; // below this size, the least is a part of the disk
 constexpr std::uint64_t PART_OF_A_SMALL_DISK = 20;   // 5 %
@@ -60,8 +61,7 @@ private:
         m_judgement.reasons.push_back(std::move(reason));
     }
 
-    std::string Holder() const {
-        const auto& holder = *m_status.service.portHolder;
+    static std::string Words(const PortHolder& holder) {
         return fmt::format("{} of user {}{}", holder.name.value_or("a program"), holder.user,
                            holder.process ? fmt::format(" (process {})", *holder.process) : "");
     }
@@ -81,22 +81,60 @@ private:
             Add(Verdict::Down,
                 fmt::format("Port 9997 is held by {}: reports go there. End that program, then restart "
                             "the service.",
-                            Holder()));
+                            Words(*service.portHolder)));
         else if (service.isRunning && !service.isListening)
             Add(Verdict::Down, "The service runs and does not listen on port 9997. Restart it.");
+        if (service.portSharer)
+            Add(Verdict::Degraded,
+                fmt::format("Port 9997 is shared with {}: a part of the reports goes there and is not "
+                            "handled. End that program.",
+                            Words(*service.portSharer)));
+        JudgeIntake();
     }
 
-    /// The sentence about a fault. `count` can be 0 although the last such report is recent, for example
-    /// after a restart, when the ledger's marks are younger than it. The sentence then says "a report".
+    void JudgeIntake() {
+        const auto& look = m_status.ledger;
+        if (!m_status.service.intake || !look.counting)
+            return;
+        const Intake& intake = *m_status.service.intake;
+        const auto unreadFor = look.atMs - LastReadMs(look);
+        if (intake.unreadBytes > 0 && unreadFor >= LONGEST_UNREAD.count())
+            Add(Verdict::Degraded,
+                fmt::format("The service has not read its socket for {} seconds, although reports wait "
+                            "there. Find out what stops it, or restart it.",
+                            unreadFor / 1000));
+    }
+
+    /// What the kernel dropped and the ledger does not have yet: the service asks about once a second, and not
+    /// while it hangs. Both counts wrap around in 32 bits here.
+    std::uint64_t DroppedSinceCounted() const {
+        const auto& look = m_status.ledger;
+        if (!m_status.service.intake || !look.counting)
+            return 0;
+        const auto counted = ReportLedger::SinceStart(look)[ReportLedger::DROPPED_BY_KERNEL];
+        const auto more =
+            static_cast<std::int32_t>(m_status.service.intake->dropped - static_cast<std::uint32_t>(counted));
+        return more > 0 ? static_cast<std::uint64_t>(more) : 0;
+    }
+
+    /// When the receiving thread was last seen at work. It writes a mark each second, also while nothing comes.
+    static std::int64_t LastReadMs(const ReportLedger::Look& look) {
+        const auto received = static_cast<std::int64_t>(look.lastMs[ReportLedger::RECEIVED]);
+        return look.recent.empty() ? received : std::max(received, look.recent.back().atMs);
+    }
+
+    /// The sentence about a fault. `count` is 0 when the number is not known: the ledger's marks are younger
+    /// than the reports, for example because the clock was set back.
     static std::string Told(const Fault& fault, std::uint64_t count) {
-        return fmt::format("In the last ten minutes, {} {}. {}",
-                           count > 1 ? fmt::format("{} reports were", count) : "a report was", fault.what,
-                           fault.advice);
+        const auto reports = count > 1    ? fmt::format("{} reports were", count)
+                             : count == 1 ? "a report was"
+                                          : "reports were";
+        return fmt::format("In the last ten minutes, {} {}. {}", reports, fault.what, fault.advice);
     }
 
     bool IsRecent(unsigned place) const {
         const auto lastMs = static_cast<std::int64_t>(m_status.ledger.lastMs[place]);
-        return lastMs != 0 && m_status.atMs - lastMs <= RECENT.count();
+        return lastMs != 0 && status::IsRecent(lastMs, m_status.atMs);
     }
 
     void JudgeLedger() {
@@ -107,9 +145,12 @@ private:
                 "docs/Ledger.md tells why that may be; restart the service when the cause is repaired.");
         if (look.sight != ReportLedger::Sight::Sound)
             return;
-        for (const Fault& fault : FAULTS)
-            if (look.total[fault.place] != 0 && IsRecent(fault.place))
-                Add(Verdict::Degraded, Told(fault, ledger::GrownIn(look, fault.place, RECENT)));
+        for (const Fault& fault : FAULTS) {
+            const bool isDrop = fault.place == ReportLedger::DROPPED_BY_KERNEL;
+            const auto uncounted = isDrop ? DroppedSinceCounted() : 0;
+            if (uncounted != 0 || (look.total[fault.place] != 0 && IsRecent(fault.place)))
+                Add(Verdict::Degraded, Told(fault, ledger::GrownIn(look, fault.place, RECENT) + uncounted));
+        }
         if (!look.balanced)
             Add(Verdict::Degraded, fmt::format("The ledger does not balance: {} reports are unaccounted for. "
                                                "Please report this with the "

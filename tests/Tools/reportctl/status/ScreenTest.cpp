@@ -29,8 +29,9 @@ protected:
         m_status.store.newestCreateTime = "1763733966789";
         m_status.log.errors = 1;
         m_status.log.warnings = 2;
-        m_status.log.last.push_back({m_status.atMs, "ERROR", "Frame/DBHelper:34 ExecSql",
-                                     "near \"s\": syntax error-insert into OperLog (eventID,value)"});
+        m_status.log.lastTexts.push_back({{m_status.atMs, "ERROR", "Frame/DBHelper:34 ExecSql",
+                                           "near \"s\": syntax error-insert into OperLog (eventID,value)"},
+                                          1});
     }
     ~StatusScreen() override {
         ::unsetenv("TZ");

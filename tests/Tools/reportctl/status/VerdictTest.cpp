@@ -86,6 +86,58 @@ TEST_F(StatusVerdict, TellsHowManyByTheMarks) {
     ExpectDegraded("17 reports were dropped by the kernel");
 }
 
+TEST_F(StatusVerdict, TellsHowManyWhenTheServiceDidNotRunForLongerThanTenMinutes) {
+    Count(ReportLedger::LOST_AT_ENDS, NOW_MS);
+    m_status.ledger.total[ReportLedger::LOST_AT_ENDS] = 956;
+    ReportLedger::MarkAt afterTheStart{NOW_MS - 1, {}};
+    afterTheStart.counts[ReportLedger::LOST_AT_ENDS] = 956;
+    m_status.ledger.marks = {{NOW_MS - 2 * TEN_MINUTES_MS, {}}, afterTheStart};
+    ExpectDegraded("956 reports were received and not handled");
+}
+
+TEST_F(StatusVerdict, SaysReportsWhenNoMarkTellsHowMany) {
+    Count(ReportLedger::LOST_AT_ENDS, NOW_MS);
+    ExpectDegraded("In the last ten minutes, reports were received and not handled");
+    ReportLedger::MarkAt mark{NOW_MS - 1, {}};
+    mark.counts[ReportLedger::LOST_AT_ENDS] = 2;
+    m_status.ledger.marks = {mark};
+    ExpectDegraded("In the last ten minutes, a report was received and not handled");
+}
+
+TEST_F(StatusVerdict, ForgetsAFaultOfTheTimeBeforeTheClockWasSetBack) {
+    Count(Outcome::Store, NOW_MS + 3'600'000);
+    ExpectHealthy();
+    Count(Outcome::Store, NOW_MS + 100); // a fault that came while the status was gathered
+    ExpectDegraded("refused by the store");
+}
+
+TEST_F(StatusVerdict, IsDegradedByDropsThatAHangingServiceDoesNotCount) {
+    m_status.ledger.total[ReportLedger::DROPPED_BY_KERNEL] = 7;
+    m_status.ledger.atStart[ReportLedger::DROPPED_BY_KERNEL] = 4;
+    m_status.service.intake = Intake{0, 3};
+    ExpectHealthy();
+    m_status.service.intake->dropped = 19'496;
+    ExpectDegraded("19493 reports were dropped by the kernel");
+    m_status.ledger.counting = false; // another process's ledger says nothing about this socket
+    EXPECT_THAT(Judge(m_status).reasons, ElementsAre(HasSubstr("keeps no ledger")));
+}
+
+TEST_F(StatusVerdict, IsDegradedWhenReportsWaitInTheSocketForSeconds) {
+    m_status.service.intake = Intake{200'000, 0};
+    m_status.ledger.lastMs[ReportLedger::RECEIVED] = NOW_MS - 60'000;
+    m_status.ledger.recent = {{NOW_MS - 4999, {}}}; // no report came for a minute, and then a burst
+    ExpectHealthy();
+    m_status.ledger.recent = {{NOW_MS - 5000, {}}};
+    ExpectDegraded("has not read its socket for 5 seconds");
+    m_status.service.intake->unreadBytes = 0;
+    ExpectHealthy();
+}
+
+TEST_F(StatusVerdict, IsDegradedByAProgramThatSharesThePort) {
+    m_status.service.portSharer = PortHolder{17, "other", "u2"};
+    ExpectDegraded("shared with other of user u2 (process 17)");
+}
+
 TEST_F(StatusVerdict, IsDegradedByALedgerThatDoesNotBalance) {
     m_status.ledger.balanced = false;
     m_status.ledger.total[ReportLedger::RECEIVED] = 2;
