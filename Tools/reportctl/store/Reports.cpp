@@ -13,6 +13,8 @@ std::string TimeOf(const std::string& createTime) {
 }
 
 const std::string& ReportsSelect() {
+    // json_valid reads a value up to its first zero byte only. So a value with such a byte does not count as
+    // JSON, and neither does a blob: a report's text may put a blob into its row.
     static const std::string SELECT = fmt::format(R"sql(select id,
     strftime('%Y-%m-%dT%H:%M:%fZ', time / 1000.0, 'unixepoch') as at,
     strftime('%Y-%m-%dT%H:%M:%f', time / 1000.0, 'unixepoch', 'localtime') as at_local,
@@ -20,8 +22,8 @@ const std::string& ReportsSelect() {
     case when instr(eventID, '|') then substr(eventID, 1, instr(eventID, '|') - 1) end as module,
     case when instr(eventID, '|') then substr(eventID, instr(eventID, '|') + 1) end as action,
     value,
-    case when substr(ltrim(value, char(9, 10, 13, 32)), 1, 1) in ('{{', '[') and json_valid(value)
-         then value end as value_json,
+    case when substr(ltrim(value, char(9, 10, 13, 32)), 1, 1) in ('{{', '[') and typeof(value) = 'text'
+              and instr(value, char(0)) = 0 and json_valid(value) then value end as value_json,
     extData4 as openid,
     extData3 as suite_version,
     createTime as create_time,

@@ -31,6 +31,15 @@ TEST_F(Export, WritesJsonLines) {
               "\"create_time\":\"1700000000123\"}\n");
 }
 
+TEST_F(Export, WritesAValueWithAZeroByteAsAText) {
+    Insert("'J|1'", "x'5b5d002c226964223a39392c22782224'", "'0'"); // []<NUL>,"id":99,"x"$
+    Insert("'J|2'", "'[1]' || char(0) || 'garbage'", "'0'");
+    const auto lines = OutputOf("export --format jsonl");
+    EXPECT_NE(lines.find(R"("value":"[]\u0000,\"id\":99,\"x\"$",)"), std::string::npos) << lines;
+    EXPECT_NE(lines.find(R"("value":"[1]\u0000garbage",)"), std::string::npos) << lines;
+    EXPECT_EQ(lines.find('\0'), std::string::npos);
+}
+
 TEST_F(Export, TakesRowsFromTheFirstBoundOnAndBeforeTheSecond) {
     InsertMany(10);
     EXPECT_EQ(OutputOf("export --since 2023-11-14T22:13:22Z --until 2023-11-14T22:13:24Z | cut -d, -f1"),

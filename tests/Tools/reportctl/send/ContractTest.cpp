@@ -92,6 +92,13 @@ TEST_F(SendContract, WhatIsRefusedWouldNotArrive) {
     EXPECT_EQ(Events(), 0u);
 }
 
+TEST_F(SendContract, WhatAReportForgesIsExportedAsAText) {
+    SendAnyway(R"({"eventID":"J|1', x'5b5d002c226964223a39392c22782224', '1700000000000', 0, '1','o') -- "})"
+               "\n");
+    const auto exported = Reportctl("export --format jsonl --event 'J|'");
+    EXPECT_TRUE(exported.Says(R"("value":"[]\u0000,\"id\":99,\"x\"$","openid":"o",)")) << exported.output;
+}
+
 TEST_F(SendContract, AUserWhoIsRefusedWouldSpoilEveryReport) {
     SendAnyway("{\"msgType\":\"updateOpenID\",\"exdata\":{\"openID\":\"u1\",\"hublinkVersion\":\"5''1\"}}\n" +
                std::string(GOOD_FOR_THE_STORE));

@@ -72,6 +72,12 @@ TEST_F(ReportsView, TakesObjectsAndArraysAloneForJson) {
         EXPECT_EQ(JsonOf(none), "NULL") << none;
 }
 
+TEST_F(ReportsView, TakesNothingWithAZeroByteForJson) {
+    for (const auto* none :
+         {"x'5b5d002c226964223a3939'", "cast(x'5b5d00' as text)", "'[1]' || char(0) || 'garbage'", "x'5b5d'"})
+        EXPECT_EQ(JsonOf(none), "NULL") << none;
+}
+
 TEST_F(ReportsView, IsMadeInAStoreOfVersionOneThatKeepsItsRows) {
     SQLite::Database(Store(), SQLite::OPEN_READWRITE).exec("drop view reports; pragma user_version = 1");
     Insert("('B100|1', 'v', '1', 0, '', '')");
