@@ -1,3 +1,4 @@
+#include <filesystem>
 #include <memory>
 #include <string>
 #include <vector>
@@ -76,9 +77,24 @@ std::string TextOf(const Event& event) {
     return text;
 }
 
+/// Whether the service has not made its outbox yet. A file that --file names must exist, and so must the
+/// directory of the databases: without it, set-up has not run, or the data directory is another one.
+bool IsNotMadeYet(const std::string& path) {
+    std::error_code error;
+    return path == store::OutboxPath() && !std::filesystem::exists(path, error) && !error &&
+           std::filesystem::is_directory(std::filesystem::path(path).parent_path(), error);
+}
+
 void List(const OutboxOptions& options) {
-    auto database = outbox::OpenToLook(options.path);
     terminal::Result output("");
+    if (IsNotMadeYet(options.path)) {
+        output.Write(options.isJson
+                         ? "[]\n"
+                         : "nothing waits, and there are no dead letters: there is no outbox yet\n");
+        output.Finish();
+        return;
+    }
+    auto database = outbox::OpenToLook(options.path);
     std::int64_t count = 0;
     const auto print = [&](const Event& event) {
         if (options.isJson)

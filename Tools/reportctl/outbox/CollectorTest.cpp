@@ -12,6 +12,7 @@
 #include "Common/Wire.h"
 #include "Modules/MetrikSdk/otlp/HttpSender.h"
 #include "Modules/MetrikSdk/otlp/OtlpEncoder.h"
+#include "Modules/MetrikSdk/upload/RetryPolicy.h"
 #include "SystemTool/IO/JsonDocument.h"
 #include "SystemTool/Text/Utf8.h"
 #include "SystemTool/Version.h"
@@ -22,6 +23,7 @@ namespace {
 
 using MetrikSdk::otlp::EndpointConfig;
 using MetrikSdk::otlp::HttpResult;
+namespace RetryPolicy = MetrikSdk::upload::RetryPolicy;
 
 constexpr std::size_t BODY_BYTES = 500;
 
@@ -83,20 +85,45 @@ std::string Beginning(const std::string& body) {
     return terminal::Printable(text) + (text.size() < body.size() ? "..." : "");
 }
 
-const char* Verdict(const HttpResult& result) {
-    if (result.status >= 200 && result.status < 300)
-        return result.contentType.starts_with("text/html")
-                   ? "a page, such as the log-in page of a network: events would wait in the outbox"
-                   : "taken";
-    if (result.status == 401 || result.status == 403)
-        return "refused: the collector does not accept the credentials (OTEL_EXPORTER_OTLP_HEADERS)";
-    if (result.status == 404)
-        return "refused: the collector does not know this path";
-    if (result.status == 429 || (result.status >= 502 && result.status <= 504))
-        return "not now: events would wait in the outbox";
-    if (result.status >= 300 && result.status < 400)
-        return "sent elsewhere, which is not followed: events would wait in the outbox";
-    return "refused: events would become dead letters";
+/// What becomes of the event, and what to say about it.
+struct Told {
+    bool isTaken = false;
+    std::string words;
+};
+
+/// An answer of 200 may say in its body that the event was rejected.
+Told TellSuccess(const HttpResult& result) {
+    const auto partial = RetryPolicy::ReadPartialSuccess(result, 1);
+    const auto message = terminal::Printable(partial.message);
+    if (partial.rejected > 0)
+        return {false, "refused for good, though the request was taken: events would be lost" +
+                           (message.empty() ? "" : ": " + message)};
+    if (!partial.impossible.empty())
+        return {true, "taken, but the number of rejected events in the answer is none: " +
+                          terminal::Printable(partial.impossible)};
+    return {true, message.empty() ? "taken" : "taken, with a warning: " + message};
+}
+
+/// Judges by the uploader's own rules, because the test is to say what would become of the user's events.
+Told Tell(const HttpResult& result, const std::vector<std::string>& headers) {
+    using MetrikSdk::upload::Verdict;
+    switch (RetryPolicy::Judge(result)) {
+    case Verdict::Delete:
+        return TellSuccess(result);
+    case Verdict::Halve:
+    case Verdict::HalveForSize:
+        return {false, "refused: events would become dead letters"};
+    default:
+        const auto advice = RetryPolicy::LookAt(result, headers);
+        return {false, "not taken: events would wait in the outbox" + (advice.empty() ? "" : "; " + advice)};
+    }
+}
+
+std::vector<std::string> HeaderNames(const EndpointConfig& config) {
+    std::vector<std::string> names;
+    for (const auto& [name, value] : config.headers)
+        names.push_back(name);
+    return names;
 }
 
 bool TellAnswer(const EndpointConfig& config, const HttpResult& result) {
@@ -109,10 +136,11 @@ bool TellAnswer(const EndpointConfig& config, const HttpResult& result) {
     }
     fmt::print("TLS: {}\n",
                isTls ? "the collector's certificate is trusted" : "none, the address begins with http:");
-    fmt::print("status: {}, {}\n", result.status, Verdict(result));
+    const auto told = Tell(result, HeaderNames(config));
+    fmt::print("status: {}, {}\n", result.status, told.words);
     if (!result.body.empty())
         fmt::print("body: {}\n", Beginning(result.body));
-    return std::string(Verdict(result)) == "taken";
+    return told.isTaken;
 }
 
 } // namespace

@@ -57,6 +57,18 @@ TEST_F(OutboxCommand, ListsAsJson) {
     EXPECT_EQ(Reportctl("outbox list --dead --json").output, "[]\n");
 }
 
+TEST_F(OutboxCommand, ListsNothingWhileTheServiceHasMadeNoOutbox) {
+    std::filesystem::remove_all(Database());
+    std::filesystem::create_directories(Database());
+    const auto json = Reportctl("outbox list --json");
+    EXPECT_EQ(json.exitCode, 0);
+    EXPECT_EQ(json.output, "[]\n");
+    const auto text = Reportctl("outbox list");
+    EXPECT_EQ(text.exitCode, 0);
+    EXPECT_EQ(text.output, "nothing waits, and there are no dead letters: there is no outbox yet\n");
+    EXPECT_EQ(Reportctl("outbox retry --all").exitCode, 1);
+}
+
 TEST_F(OutboxCommand, PutsDeadLettersBackUnderTheirIdsAndNewSequenceNumbers) {
     const auto outcome = Reportctl("outbox retry --all");
     EXPECT_EQ(outcome.exitCode, 0);
@@ -120,12 +132,63 @@ TEST_F(OutboxCommand, SendsATestEventAndTellsTheAnswer) {
     EXPECT_EQ(Status(), "3 1 100 2 2 200") << "it does not go through the outbox";
 }
 
+TEST_F(OutboxCommand, JudgesTheAnswerAsTheUploaderDoes) {
+    Reply reply;
+    LoopbackServer collector([&](const Request&) { return reply; });
+    const auto said = [&](int status, const std::string& body = {}, const std::string& headers = {}) {
+        reply = {.status = status, .body = body, .headers = headers};
+        const auto outcome =
+            Reportctl("outbox test",
+                      "OTEL_EXPORTER_OTLP_HEADERS=key=secret OTEL_EXPORTER_OTLP_ENDPOINT=" + collector.Url());
+        const auto begin = outcome.output.find("status: ");
+        return std::to_string(outcome.exitCode) + " " +
+               outcome.output.substr(begin, outcome.output.find('\n', begin) - begin);
+    };
+    const std::string waits = ", not taken: events would wait in the outbox";
+    const std::string page =
+        "; this is a page: the network may want a log-in, or the address be no collector's";
+    const std::string address = "; look at the address: OTEL_EXPORTER_OTLP_ENDPOINT";
+    EXPECT_EQ(said(200, "<p>", "Content-Type: TEXT/HTML\r\n"), "1 status: 200" + waits + page);
+    EXPECT_EQ(said(405), "1 status: 405" + waits + address);
+    EXPECT_EQ(said(302), "1 status: 302" + waits + address);
+    EXPECT_EQ(said(415), "1 status: 415" + waits +
+                             "; look at OTEL_EXPORTER_OTLP_COMPRESSION: the collector "
+                             "may not unpack, or take no JSON");
+    EXPECT_EQ(said(403),
+              "1 status: 403" + waits + "; look at the credentials: OTEL_EXPORTER_OTLP_HEADERS sets key");
+    EXPECT_EQ(said(503), "1 status: 503" + waits);
+    EXPECT_EQ(said(400), "1 status: 400, refused: events would become dead letters");
+    EXPECT_EQ(said(413), "1 status: 413, refused: events would become dead letters");
+}
+
+TEST_F(OutboxCommand, TellsWhatAnAnswerOfPartialSuccessMeans) {
+    std::string partial;
+    LoopbackServer collector([&](const Request&) {
+        return Reply{.status = 200, .body = R"({"partialSuccess":{)" + partial + "}}", .headers = {}};
+    });
+    const auto said = [&](const std::string& members) {
+        partial = members;
+        const auto outcome = Reportctl("outbox test", "OTEL_EXPORTER_OTLP_ENDPOINT=" + collector.Url());
+        const auto begin = outcome.output.find("status: 200, ") + 13;
+        return std::to_string(outcome.exitCode) + " " +
+               outcome.output.substr(begin, outcome.output.find("\nbody: ") - begin);
+    };
+    EXPECT_EQ(said(R"("rejectedLogRecords":"1","errorMessage":"too\u001bodd")"),
+              "1 refused for good, though the request was taken: events would be lost: too odd");
+    EXPECT_EQ(said(R"("rejectedLogRecords":3)"),
+              "1 refused for good, though the request was taken: events would be lost");
+    EXPECT_EQ(said(R"("errorMessage":"old names")"), "0 taken, with a warning: old names");
+    EXPECT_EQ(said(R"("rejectedLogRecords":"0")"), "0 taken");
+}
+
 TEST_F(OutboxCommand, TellsWhyTheTestEventWasNotTaken) {
     LoopbackServer collector(
         [](const Request&) { return Reply{.status = 401, .body = "who are you?", .headers = {}}; });
     const auto refused = Reportctl("outbox test", "OTEL_EXPORTER_OTLP_ENDPOINT=" + collector.Url());
     EXPECT_EQ(refused.exitCode, 1);
-    EXPECT_TRUE(refused.Says("status: 401, refused: the collector does not accept the credentials"))
+    EXPECT_TRUE(
+        refused.Says("status: 401, not taken: events would wait in the outbox; look at the credentials: "
+                     "OTEL_EXPORTER_OTLP_HEADERS names no header"))
         << refused.output;
     EXPECT_TRUE(refused.Says("body: who are you?")) << refused.output;
 
