@@ -79,6 +79,11 @@ TEST_F(Look, FindTellsOfEveryPlace) {
     EXPECT_THAT(text, HasSubstr("  -> toAnalytics\n"));
     EXPECT_THAT(text, ContainsRegex("Store .since 2023-11-1[45] ..:13:20.000.: 1 found\n"));
     EXPECT_THAT(text, HasSubstr("Outbox: 1 found\n"));
+    Service::Send(R"({"eventID":"B1|2","value":{"a" : "needle"},"createTime":1700000000})");
+    Service::Send(R"({"eventID":"A759|2","value":{"a" : "it''s \/ needle"},"createTime":1700000000})");
+    m_service.AwaitQuiet();
+    EXPECT_THAT(Reportctl({"find", R"({"a" : "needle"})"}), ContainsRegex("Store .*: 1 found\n  row 2 "));
+    EXPECT_THAT(Reportctl({"find", R"(it''s \/ needle)"}), HasSubstr("Outbox: 1 found\n"));
     EXPECT_THAT(Reportctl({"find", "haystack"}, 1), HasSubstr("Outbox: 0 found\n"));
 }
 

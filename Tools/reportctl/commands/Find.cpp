@@ -13,6 +13,7 @@
 #include "Tools/reportctl/commands/Commands.h"
 #include "Tools/reportctl/commands/FilterOptions.h"
 #include "Tools/reportctl/log/Files.h"
+#include "Tools/reportctl/log/FoundReports.h"
 #include "Tools/reportctl/log/Show.h"
 #include "Tools/reportctl/log/Stream.h"
 #include "Tools/reportctl/outbox/Database.h"
@@ -36,9 +37,10 @@ constexpr auto HELP =
     "  reportctl find 1700000000123 --json\n"
     "\n"
     "The text is searched as it is, upper and lower case apart: in the log for datagrams, in the store for "
-    "rows, "
-    "in the\n"
-    "outbox for events that wait or are dead letters. An event that was delivered is in the log alone.\n"
+    "rows, in the\n"
+    "outbox for events that wait or are dead letters. The rows and events of the datagrams are shown too, "
+    "where the\n"
+    "text is spelt differently there. An event that was delivered is in the log alone.\n"
     "Exit code 1: it was found nowhere, or something could not be read.\n"
     "\n";
 
@@ -115,8 +117,10 @@ private:
         const auto take = [&](const log::Entry& entry) {
             if (m_log.since.empty())
                 m_log.since = (m_options.isJson ? terminal::ZonedTime : terminal::LocalTime)(entry.line.time);
-            if (left > 0 && IsHit(entry))
+            if (left > 0 && IsHit(entry)) {
                 Add(m_log, m_options.isJson ? log::JsonOf(entry) : log::TextOf(entry, m_columns));
+                m_reports.Add(entry);
+            }
             left -= left > 0 ? 1 : 0;
         };
         for (bool isFirst = true; left > 0 && !stream.IsAtEnd(); isFirst = false) {
@@ -132,12 +136,14 @@ private:
         if (const auto oldest = store::OldestRow(database))
             m_store.since = m_options.isJson ? oldest->at : TimeOf(*oldest);
         std::deque<store::FoundRow> last; // a line is made of those alone that are shown
-        store::Search(database, m_options.text, [&](const store::FoundRow& row) {
+        const store::IsWanted isWanted = [this](const auto& row) { return m_reports.HaveRow(row); };
+        const auto take = [&](const store::FoundRow& row) {
             ++m_store.found;
             last.push_back(row);
             if (last.size() > m_options.limit)
                 last.pop_front();
-        });
+        };
+        store::Search(database, m_options.text, m_reports.HaveRows() ? isWanted : nullptr, take);
         for (const auto& row : last)
             m_store.lines.push_back(m_options.isJson ? JsonOf(row) : TextOf(row));
     }
@@ -154,7 +160,8 @@ private:
     void SearchOutbox(const std::string& file) {
         auto database = outbox::OpenToLook(file);
         const auto take = [this](const outbox::Event& event) {
-            if (Holds(event.eventID) || Holds(event.payload) || Holds(event.uuid))
+            if (Holds(event.eventID) || Holds(event.payload) || Holds(event.uuid) ||
+                m_reports.HaveEvent(event))
                 Add(m_outbox, m_options.isJson ? JsonOf(event) : TextOf(event));
         };
         outbox::ForEach(database, outbox::Where::Waiting, 0, take);
@@ -190,6 +197,7 @@ private:
         json.Add("openid", row.openid);
         json.Add("createTime", row.createTime);
         json.Add("outcome", "stored");
+        json.AddNull("reason"); // the store has no row of a report that it refused
         return json.Take();
     }
 
@@ -200,6 +208,8 @@ private:
         json.Add("sequence", event.sequence);
         json.Add("eventID", event.eventID);
         json.Add("state", event.isDead ? "dead" : "waiting");
+        json.Add("outcome", "toAnalytics");
+        event.isDead ? json.Add("status", event.status) : json.AddNull("status");
         json.AddOrNull("reason", event.reason);
         json.Add("payload", event.payload);
         return json.Take();
@@ -248,6 +258,7 @@ private:
     Place m_log;
     Place m_store;
     Place m_outbox;
+    log::FoundReports m_reports;      ///< those of m_log, to find their rows and events
     std::set<std::string> m_outboxes; ///< files
 };
 

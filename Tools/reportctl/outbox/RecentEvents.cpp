@@ -31,13 +31,6 @@ std::size_t HashOf(const std::string& eventID, const std::string& createTime, co
                                     WithoutTheServicesOwn(data).ToJson());
 }
 
-std::size_t HashOf(const Event& event) {
-    const auto payload = Parsed(event.payload);
-    return HashOf(event.eventID,
-                  payload.GetKeyValue(Wire::EVENT_EXTEND).GetKeyValue(Wire::CREATE_TIME).ToString(),
-                  payload.GetKeyValue(Wire::EVENT_DATA));
-}
-
 /// What the service takes as the data of an event.
 bool IsData(const std::string& value, const JsonDocument& parsed) {
     return value.empty() || parsed.IsObject() || parsed.ToJson() == "null";
@@ -49,6 +42,20 @@ std::int64_t In(const std::map<std::string, std::int64_t>& counts, const std::st
 }
 
 } // namespace
+
+std::optional<std::size_t> HashOf(const EventContent& report) {
+    const auto data = Parsed(report.value);
+    if (!IsData(report.value, data))
+        return std::nullopt;
+    return HashOf(report.eventID, report.createTime, data);
+}
+
+std::size_t HashOf(const Event& event) {
+    const auto payload = Parsed(event.payload);
+    return HashOf(event.eventID,
+                  payload.GetKeyValue(Wire::EVENT_EXTEND).GetKeyValue(Wire::CREATE_TIME).ToString(),
+                  payload.GetKeyValue(Wire::EVENT_DATA));
+}
 
 void RecentEvents::ReadNew(std::int64_t before) {
     auto database = OpenToLook(m_path);
@@ -95,10 +102,10 @@ void RecentEvents::Trim() {
 }
 
 bool RecentEvents::Take(const EventContent& report, const std::string& module) {
-    const auto data = Parsed(report.value);
-    if (!IsData(report.value, data))
+    const auto hash = HashOf(report);
+    if (!hash)
         return false;
-    const auto [begin, end] = m_events.equal_range(HashOf(report.eventID, report.createTime, data));
+    const auto [begin, end] = m_events.equal_range(*hash);
     const auto first = std::min_element(
         begin, end, [](const auto& a, const auto& b) { return a.second.sequence < b.second.sequence; });
     if (first == end)

@@ -3,6 +3,7 @@
 #include <cstdint>
 #include <deque>
 #include <map>
+#include <optional>
 #include <string>
 #include <unordered_map>
 #include <unordered_set>
@@ -20,6 +21,13 @@ struct EventContent {
     std::string value; ///< empty, or JSON
     std::string createTime;
 };
+
+/// The hash of the event that the service makes of a report; nullopt when it makes none, because the value is
+/// no data of an event.
+std::optional<std::size_t> HashOf(const EventContent& report);
+
+/// The hash of an event: the same as that of the report that it was made of.
+std::size_t HashOf(const Event& event);
 
 /// Finds the newest events of the outbox, waiting or dead, by their content. Each event is found once only,
 /// so two equal reports need two events. It also knows how many events each module has stored: a delivered

@@ -12,8 +12,7 @@ namespace {
 /// Rows that never match a line of the log must not fill the memory of a command that runs for days.
 constexpr std::size_t MAX_ROWS_KEPT = 1'000'000;
 
-/// The service puts texts into its SQL as they are, where two quotes stand for one.
-std::string AsStored(const std::string& text) {
+std::string WithSingleQuotes(const std::string& text) {
     std::string stored;
     for (std::size_t at = 0; at < text.size(); ++at) {
         stored += text[at];
@@ -28,6 +27,15 @@ std::int64_t LastId(SQLite::Database& database) {
 }
 
 } // namespace
+
+RowContent AsStored(const RowContent& report) {
+    return {WithSingleQuotes(report.eventID), WithSingleQuotes(report.value),
+            WithSingleQuotes(report.createTime)};
+}
+
+std::size_t HashOf(const RowContent& content) {
+    return std::hash<std::string>()(content.eventID + '\0' + content.value + '\0' + content.createTime);
+}
 
 void RecentRows::ReadNew(std::int64_t before) {
     auto database = OpenToRead(m_path);
@@ -48,10 +56,6 @@ void RecentRows::ReadNew(std::int64_t before) {
     }
 }
 
-RecentRows::Hash RecentRows::HashOf(const RowContent& content) {
-    return std::hash<std::string>()(content.eventID + '\0' + content.value + '\0' + content.createTime);
-}
-
 void RecentRows::Add(Hash row) {
     ++m_rows[row];
     m_order.push_back(row);
@@ -69,7 +73,7 @@ bool RecentRows::Remove(Hash row) {
 }
 
 bool RecentRows::Take(const RowContent& report) {
-    return Remove(HashOf({AsStored(report.eventID), AsStored(report.value), AsStored(report.createTime)}));
+    return Remove(HashOf(AsStored(report)));
 }
 
 } // namespace reportctl::store

@@ -15,6 +15,13 @@ struct RowContent {
     std::string createTime;
 };
 
+/// The content that the row of a report gets. The service puts texts into its SQL as they are, where two
+/// quotes stand for one.
+RowContent AsStored(const RowContent& report);
+
+/// Two equal contents have the same hash.
+std::size_t HashOf(const RowContent& content);
+
 /// Finds the newest rows of the store by their content. Each row is found once only, so two equal reports
 /// need two rows.
 ///
@@ -36,7 +43,6 @@ public:
 private:
     using Hash = std::size_t;
 
-    static Hash HashOf(const RowContent& content);
     void Add(Hash row);
     bool Remove(Hash row);
 

@@ -2,6 +2,7 @@
 
 #include <SQLiteCpp/Statement.h>
 #include <fmt/format.h>
+#include <sqlite3.h>
 
 #include "Tools/reportctl/store/Reports.h"
 #include "Tools/reportctl/store/Rows.h"
@@ -24,16 +25,35 @@ FoundRow RowOf(SQLite::Statement& rows) {
             .openid = rows.getColumn(6).getString()};
 }
 
+std::string TextOf(sqlite3_value* value) {
+    const auto* text = reinterpret_cast<const char*>(sqlite3_value_text(value)); // NULL is an empty text
+    return text == nullptr ? std::string()
+                           : std::string(text, static_cast<std::size_t>(sqlite3_value_bytes(value)));
+}
+
+/// SQLite calls this for rows that do not have the text. A row is read once only in this way.
+void CallIsWanted(sqlite3_context* context, int, sqlite3_value** values) {
+    const auto& isWanted = *static_cast<const IsWanted*>(sqlite3_user_data(context));
+    sqlite3_result_int(context, isWanted({TextOf(values[0]), TextOf(values[1]), TextOf(values[2])}) ? 1 : 0);
+}
+
+/// `isWanted` must live as long as the statements that use the function.
+void AddFunction(SQLite::Database& database, const IsWanted& isWanted) {
+    database.createFunction("is_wanted", 3, false, const_cast<IsWanted*>(&isWanted), CallIsWanted);
+}
+
 } // namespace
 
-void Search(SQLite::Database& database, const std::string& text,
+void Search(SQLite::Database& database, const std::string& text, const IsWanted& isWanted,
             const std::function<void(const FoundRow&)>& visit) {
+    if (isWanted)
+        AddFunction(database, isWanted);
     SQLite::Statement rows(
         database,
         fmt::format("select {} from ({}) where (instr(event, :text) or instr(value, :text) or "
-                    "instr(create_time, :text) or instr(openid, :text)) and id >= :first and id < :end "
+                    "instr(create_time, :text) or instr(openid, :text){}) and id >= :first and id < :end "
                     "order by id",
-                    COLUMNS, ReportsSelect()));
+                    COLUMNS, ReportsSelect(), isWanted ? " or is_wanted(event, value, create_time)" : ""));
     rows.bind(":text", text);
     InPieces(AllIds(database), IDS_AT_ONCE, [&](IdRange piece) {
         rows.reset();

@@ -7,6 +7,8 @@
 
 #include <SQLiteCpp/Database.h>
 
+#include "Tools/reportctl/store/RecentRows.h"
+
 namespace reportctl::store {
 
 /// A row that was found.
@@ -20,9 +22,12 @@ struct FoundRow {
     std::string openid;
 };
 
-/// Calls `visit` with each row that has the text in its event id, value, createTime or open id. The oldest
-/// row comes first.
-void Search(SQLite::Database& database, const std::string& text,
+/// Says of a row whether it is to be found, though it does not have the text.
+using IsWanted = std::function<bool(const RowContent&)>;
+
+/// Calls `visit` with each row that has the text in its event id, value, createTime or open id, and with each
+/// row that `isWanted` names. `isWanted` may be empty. The oldest row comes first.
+void Search(SQLite::Database& database, const std::string& text, const IsWanted& isWanted,
             const std::function<void(const FoundRow&)>& visit);
 
 /// The row with the lowest id. Nothing when the store has no row.
