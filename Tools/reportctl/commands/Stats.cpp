@@ -35,7 +35,8 @@ constexpr auto HELP =
     "Examples:\n"
     "  reportctl stats                                   # events, the most frequent first\n"
     "  reportctl stats --by hour --since 2026-11-21\n"
-    "  reportctl stats --by event --event 'B100|' --top 10 --csv\n"
+    "  reportctl stats --by event --top 10 --since \"$(date +%F)\"     # today\n"
+    "  reportctl stats --by event --event 'B100|' --csv\n"
     "  reportctl stats --by outcome                      # where reports ended, as the service counted them\n"
     "\n"
     "Counted are the rows of the store, and the events that the outbox has: those that wait and the dead "
@@ -43,6 +44,10 @@ constexpr auto HELP =
     "that a collector took have left the outbox; `--by outcome` counts them too, as toAnalytics. Outcomes "
     "come from the\n"
     "service's ledger, which counts since it was begun and knows no event ids.\n"
+    "\n"
+    "Times are createTime. A row or event whose createTime is no number is within no bound; `--by hour` and "
+    "`--by day`\n"
+    "count it as (no time), in JSON under null.\n"
     "\n";
 
 const std::map<std::string, Grouping> GROUPINGS{{"hour", Grouping::Hour},
@@ -116,7 +121,7 @@ Stats CountOutcomes(const StatsOptions& options) {
     store::Tally tally;
     const auto add = [&](const std::string& key, unsigned place) {
         if (look.total[place] > 0)
-            tally[key] = static_cast<std::int64_t>(look.total[place]);
+            tally[{0, key}] = static_cast<std::int64_t>(look.total[place]);
     };
     for (const auto place :
          {status::Place(ReportLedger::Outcome::Stored), status::Place(ReportLedger::Outcome::ToAnalytics),

@@ -24,11 +24,10 @@ constexpr std::int64_t IDS_AT_ONCE_TO_COUNT = 4 * IDS_AT_ONCE;
 std::string EventsSelect() {
     return fmt::format(R"sql(select event_id as event,
     case when instr(event_id, '|') then substr(event_id, 1, instr(event_id, '|') - 1) end as module,
-    coalesce({}, stored_ms) as time
-from (select event_id, stored_ms,
+    {} as time
+from (select event_id,
              case when json_valid(payload) then json_extract(payload, '$.extend.createTime') end as created
-      from (select event_id, stored_ms, payload from event
-            union all select event_id, stored_ms, payload from dead_letter)))sql",
+      from (select event_id, payload from event union all select event_id, payload from dead_letter)))sql",
                        TimeOf("created"));
 }
 
@@ -54,21 +53,23 @@ std::tm WallClock(std::time_t time, Zone zone) {
 }
 
 /// The key of an hour, such as 2026-11-21T14:00+01:00, or of a day, such as 2026-11-21.
-std::string TimeKey(std::int64_t quarterHour, Grouping grouping, Zone zone) {
-    const auto wall = WallClock(quarterHour * QUARTER_HOUR_S, zone);
+Key TimeKey(std::int64_t quarterHour, Grouping grouping, Zone zone) {
+    const auto time = quarterHour * QUARTER_HOUR_S;
+    const auto wall = WallClock(time, zone);
     if (grouping == Grouping::Day)
-        return fmt::format("{:%Y-%m-%d}", wall);
+        return {0, fmt::format("{:%Y-%m-%d}", wall)};
     const auto offset = wall.tm_gmtoff / 60;
-    return fmt::format("{:%Y-%m-%dT%H}:00{}{:02}:{:02}", wall, offset < 0 ? '-' : '+', std::abs(offset) / 60,
-                       std::abs(offset) % 60);
+    return {time - wall.tm_min * 60 - wall.tm_sec,
+            fmt::format("{:%Y-%m-%dT%H}:00{}{:02}:{:02}", wall, offset < 0 ? '-' : '+', std::abs(offset) / 60,
+                        std::abs(offset) % 60)};
 }
 
-std::optional<std::string> KeyOf(const SQLite::Column& column, Grouping grouping, Zone zone) {
+Key KeyOf(const SQLite::Column& column, Grouping grouping, Zone zone) {
     if (column.isNull())
-        return std::nullopt;
+        return {};
     if (IsByTime(grouping))
         return TimeKey(column.getInt64(), grouping, zone);
-    return column.getString();
+    return {0, column.getString()};
 }
 
 void Add(SQLite::Statement& counts, Grouping grouping, Zone zone, Tally& tally) {
@@ -107,17 +108,19 @@ void CountEvents(SQLite::Database& database, Grouping grouping, const ReportFilt
 }
 
 std::vector<Count> Ranked(const Tally& tally, Grouping grouping, std::size_t top) {
-    std::vector<Count> counts;
-    for (const auto& [key, count] : tally)
-        counts.push_back({key, count});
-    const auto isMore = [](const Count& a, const Count& b) { return a.count > b.count; };
-    std::stable_sort(counts.begin(), counts.end(), isMore);
-    if (top != 0 && counts.size() > top)
-        counts.resize(top);
+    std::vector<std::pair<Key, std::int64_t>> ranked(tally.begin(), tally.end());
+    std::stable_sort(ranked.begin(), ranked.end(),
+                     [](const auto& a, const auto& b) { return a.second > b.second; });
+    if (top != 0 && ranked.size() > top)
+        ranked.resize(top);
     if (IsByTime(grouping))
-        std::sort(counts.begin(), counts.end(), [](const Count& a, const Count& b) { return a.key < b.key; });
-    std::stable_partition(counts.begin(), counts.end(),
-                          [](const Count& count) { return count.key.has_value(); });
+        std::sort(ranked.begin(), ranked.end(),
+                  [](const auto& a, const auto& b) { return a.first < b.first; });
+    std::stable_partition(ranked.begin(), ranked.end(),
+                          [](const auto& count) { return count.first.text.has_value(); });
+    std::vector<Count> counts;
+    for (const auto& [key, count] : ranked)
+        counts.push_back({key.text, count});
     return counts;
 }
 

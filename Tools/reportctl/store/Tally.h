@@ -1,5 +1,6 @@
 #pragma once
 
+#include <compare>
 #include <cstdint>
 #include <map>
 #include <optional>
@@ -15,8 +16,18 @@ namespace reportctl::store {
 /// By which key rows and events are counted.
 enum class Grouping { Hour, Day, Event, Module };
 
-/// Counts by key. A row without a key (it has no time, or no bar in its event id) counts under nullopt.
-using Tally = std::map<std::optional<std::string>, std::int64_t>;
+/// What a row counts under. `text` is nullopt for a row without a key: it has no time, or no bar in its event
+/// id. `hour` is the second since 1970 at which an hour begins, and 0 for other groupings. It gives the order
+/// of two hours with one name: when summer time ends, they differ in the offset from UTC only.
+struct Key {
+    std::int64_t hour = 0;
+    std::optional<std::string> text;
+
+    auto operator<=>(const Key&) const = default;
+};
+
+/// Counts by key.
+using Tally = std::map<Key, std::int64_t>;
 
 /// A key and its count.
 struct Count {
@@ -41,7 +52,7 @@ using QuarterHours = std::map<std::int64_t, std::int64_t>;
 QuarterHours CountByQuarterHour(SQLite::Database& database, const ReportFilter& filter);
 
 /// Counts the events of an outbox into `tally`: the waiting events and the dead letters. An event's time is
-/// the one that the sender gave it, else the time when it was stored. A collector gets the same time.
+/// the one that the sender gave it, as with a row. The time when it was stored does not count.
 void CountEvents(SQLite::Database& database, Grouping grouping, const ReportFilter& filter, Zone zone,
                  Tally& tally);
 

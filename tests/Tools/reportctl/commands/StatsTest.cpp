@@ -1,3 +1,4 @@
+#include "tests/Tools/reportctl/support/OutboxFile.h"
 #include "tests/Tools/reportctl/support/RowsFixture.h"
 
 namespace {
@@ -40,6 +41,26 @@ TEST_F(Stats, CountByHourOfLocalTimeOrOfUtc) {
     EXPECT_EQ(Json("--by hour", "UTC3:30"),
               R"([{"key":"2023-11-14T18:00-03:30","count":1},{"key":"2023-11-14T19:00-03:30","count":2}])"
               "\n");
+}
+
+TEST_F(Stats, KeepTheHoursInOrderWhenSummerTimeEnds) {
+    Insert("'e'", "''", "'1761442200000'"); // 01:30 UTC, 02:30 in winter time
+    Insert("'e'", "''", "'1761438600000'"); // 00:30 UTC, 02:30 in summer time
+    EXPECT_EQ(Json("--by hour", "CET-1CEST,M3.5.0,M10.5.0/3"),
+              R"([{"key":"2025-10-26T02:00+02:00","count":1},{"key":"2025-10-26T02:00+01:00","count":1}])"
+              "\n");
+}
+
+TEST_F(Stats, CountAnEventWithoutATimeInNoHourAndWithinNoBound) {
+    MakeOutbox(Database() + "/MetrikOutbox.db"); // no event in it has a time, all were stored at one
+    EXPECT_EQ(Json("--since 1970-01-01"), "[]\n");
+    EXPECT_EQ(Json("--until 2100-01-01"), "[]\n");
+    EXPECT_EQ(Json("--by hour"), R"([{"key":null,"count":3}])"
+                                 "\n");
+    SQLite::Database(Database() + "/MetrikOutbox.db", SQLite::OPEN_READWRITE)
+        .exec(R"(update event set payload = '{"extend":{"createTime":"1700000000123"}}')");
+    EXPECT_EQ(Json("--since 1970-01-01 --by hour --utc"), R"([{"key":"2023-11-14T22:00+00:00","count":1}])"
+                                                          "\n");
 }
 
 TEST_F(Stats, CountByDay) {
