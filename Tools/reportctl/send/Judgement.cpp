@@ -103,21 +103,35 @@ std::string Bare(std::string_view name) {
     return bare;
 }
 
+using Names = std::vector<const char*>;
+
+const Names NAMES{Wire::REPORT_MARK,   Wire::VALUE,        Wire::CREATE_TIME,
+                  Wire::IS_DAY_REPORT, Wire::MESSAGE_KIND, Wire::MESSAGE_DATA};
+const Names NAMES_IN_EXDATA{Wire::MODULE_ID, Wire::MODULE_VERSION, Wire::MODULE_NAME,    Wire::LOG_PATH,
+                            Wire::DB_PATH,   Wire::OPEN_ID,        Wire::HUBLINK_VERSION};
+
 /// Warns of a member whose name is almost one that the service reads: the service does not see it.
+void JudgeMembers(Judgement& judgement, const rapidjson::Value& object, const Names& names,
+                  const char* where) {
+    for (const auto& member : object.GetObject()) {
+        const std::string name(member.name.GetString(), member.name.GetStringLength());
+        for (const auto* right : names)
+            if (name != right && Bare(name) == Bare(right) && !object.HasMember(right))
+                judgement.warnings.push_back(fmt::format(
+                    "it has a member {}{}, which the service does not see: the name is \"{}\", to the letter",
+                    terminal::Printable(name), where, right));
+    }
+}
+
 void JudgeNames(Judgement& judgement, const std::string& text) {
     rapidjson::Document document;
     document.Parse<rapidjson::kParseIterativeFlag>(text.data(), text.size());
     if (!document.IsObject())
         return;
-    for (const auto& member : document.GetObject()) {
-        const std::string name(member.name.GetString(), member.name.GetStringLength());
-        for (const auto* right : {Wire::REPORT_MARK, Wire::VALUE, Wire::CREATE_TIME, Wire::IS_DAY_REPORT,
-                                  Wire::MESSAGE_KIND, Wire::MESSAGE_DATA})
-            if (name != right && Bare(name) == Bare(right) && !document.HasMember(right))
-                judgement.warnings.push_back(fmt::format(
-                    "it has a member {}, which the service does not see: the name is \"{}\", to the letter",
-                    terminal::Printable(name), right));
-    }
+    JudgeMembers(judgement, document, NAMES, "");
+    const auto exdata = document.FindMember(Wire::MESSAGE_DATA);
+    if (exdata != document.MemberEnd() && exdata->value.IsObject() && !Contains(text, Wire::REPORT_MARK))
+        JudgeMembers(judgement, exdata->value, NAMES_IN_EXDATA, " in its exdata");
 }
 
 void JudgeReport(Judgement& judgement, const JsonDocument& report) {

@@ -217,4 +217,19 @@ TEST_F(SendJudgement, WarnsOfANameThatIsAlmostRight) {
     ExpectGood(R"({"eventID":"B1","Createtime":1)" + TIME);
 }
 
+TEST_F(SendJudgement, WarnsOfNamesInExdataThatAreAlmostRight) {
+    const std::string notSeen = " in its exdata, which the service does not see: the name is ";
+    ExpectWarning(Control("init", R"("moduleID":"A1","openid":"u")"),
+                  "it has a member openid" + notSeen + "\"openID\", to the letter");
+    ExpectWarning(Control("init", R"("moduleID":"A1","DBPath":"/x")"),
+                  "it has a member DBPath" + notSeen + "\"dbPath\", to the letter");
+    ExpectWarning(Control("updateOpenID", R"("openID":"u","hublinkversion":"1")"),
+                  "it has a member hublinkversion" + notSeen + "\"hublinkVersion\", to the letter");
+    EXPECT_NE(Said(Control("init", R"("moduleId":"A1")"))
+                  .find("it has a member moduleId" + notSeen + "\"moduleID\", to the letter"),
+              std::string::npos);
+    ExpectGood(Control("init", R"("moduleID":"A1","ModuleID":"A2","page":1)"));
+    ExpectGood(R"({"eventID":"B1","exdata":{"openid":"u"})" + TIME);
+}
+
 } // namespace
