@@ -70,11 +70,17 @@ std::string RedactedControl(const message::Message& message, const JsonDocument&
     return redacted.ToJson();
 }
 
+/// A time is left as it is when it is a number. A sender may put any other text there.
+std::string RedactedTime(const std::string& time) {
+    return time.find_first_not_of("0123456789") == std::string::npos ? time
+                                                                     : Sizes("createTime", time.size());
+}
+
 std::string RedactedReport(const message::Message& message) {
     JsonDocument redacted;
     redacted.SetKeyValue(Wire::REPORT_MARK, message.eventID);
     redacted.SetKeyValue(Wire::VALUE, Sizes("value", message.value.size()));
-    redacted.SetKeyValue(Wire::CREATE_TIME, message.createTime);
+    redacted.SetKeyValue(Wire::CREATE_TIME, RedactedTime(message.createTime));
     return redacted.ToJson();
 }
 

@@ -23,6 +23,13 @@ TEST(BundleRedaction, LeavesOfAReportWhatTellsNothingOfAPerson) {
               R"("createTime":"1700000000000"})");
 }
 
+TEST(BundleRedaction, LeavesATimeThatIsANumberAlone) {
+    EXPECT_EQ(RedactedDatagram(R"({"eventID":"B1|1","value":"","createTime":"born in May"})"),
+              R"({"eventID":"B1|1","value":"[value, 0 bytes]","createTime":"[createTime, 11 bytes]"})");
+    EXPECT_EQ(RedactedDatagram(R"({"eventID":"B1|1","value":""})"),
+              R"({"eventID":"B1|1","value":"[value, 0 bytes]","createTime":""})");
+}
+
 TEST(BundleRedaction, LeavesOfAControlMessageTheModule) {
     EXPECT_EQ(
         RedactedDatagram(
