@@ -1,3 +1,5 @@
+#include <algorithm>
+
 #include <fmt/format.h>
 #include <fmt/ranges.h>
 
@@ -21,6 +23,14 @@ std::string ValueCase(const Command& command, const Option& option) {
     return fmt::format("    {}) words=\"{}\" ;;\n", patterns, fmt::join(option.choices, " "));
 }
 
+/// Whether the command's word is the name of a file. The words of other commands are texts and ids.
+bool TakesFile(const Command& command) {
+    return std::any_of(command.options.begin(), command.options.end(), [](const Option& option) {
+        const auto& name = option.names.front();
+        return option.isPositional && (name == "FILE" || name == "DIRECTORY");
+    });
+}
+
 void Add(Tables& tables, const Command& command) {
     std::vector<std::string> words;
     for (const auto& sub : command.commands) {
@@ -34,7 +44,8 @@ void Add(Tables& tables, const Command& command) {
         if (!option.value.empty())
             tables.values += ValueCase(command, option);
     }
-    tables.words += fmt::format("    \"{}\") words=\"{}\" ;;\n", command.Name(), fmt::join(words, " "));
+    tables.words += fmt::format("    \"{}\") words=\"{}\"{} ;;\n", command.Name(), fmt::join(words, " "),
+                                TakesFile(command) ? " takes_file=yes" : "");
     for (const auto& sub : command.commands)
         Add(tables, sub);
 }
@@ -47,7 +58,7 @@ std::string BashCompletion(const Command& program) {
     return fmt::format(R"(# completion of {0} for bash
 _{0}() {{
     local current=${{COMP_WORDS[COMP_CWORD]}} previous=${{COMP_WORDS[COMP_CWORD - 1]}}
-    local command={0} words="" i
+    local command={0} words="" takes_file="" i
     for ((i = 1; i < COMP_CWORD; i++)); do
         case "$command ${{COMP_WORDS[i]}}" in
         {1}) command+=" ${{COMP_WORDS[i]}}" ;;
@@ -57,6 +68,7 @@ _{0}() {{
 {2}    esac
     case "$command $previous" in
 {3}    esac
+    if [ -n "$takes_file" ] && [[ $current != -* ]]; then compopt -o default; return; fi
     COMPREPLY=($(compgen -W "$words" -- "$current"))
     # Nothing fits: a file's name may.
     [ ${{#COMPREPLY[@]}} -gt 0 ] || compopt -o default

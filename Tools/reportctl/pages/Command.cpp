@@ -71,6 +71,7 @@ Option ReadOption(const CLI::Option& option) {
     read.group = option.get_group();
     read.isPositional = option.get_snames().empty() && option.get_lnames().empty();
     read.isRequired = option.get_required();
+    read.isRepeatable = read.isPositional && option.get_items_expected_max() > 1;
     read.defaultValue = option.get_default_str();
     read.needs = NamesOf(option.get_needs());
     read.excludes = NamesOf(option.get_excludes());

@@ -19,6 +19,7 @@ struct Option {
     std::string group; ///< its heading in --help
     bool isPositional = false;
     bool isRequired = false;
+    bool isRepeatable = false;         ///< a positional that takes several values
     std::string defaultValue;          ///< the default in --help; empty when there is none
     std::vector<std::string> choices;  ///< the allowed values, when --help lists them
     std::vector<std::string> needs;    ///< the options that must be given with it

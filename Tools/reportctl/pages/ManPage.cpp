@@ -34,7 +34,8 @@ std::string Synopsis(const Command& command) {
     for (std::size_t i = 1; i < command.path.size(); ++i)
         text += fmt::format(".Cm {}\n", command.path[i]);
     for (const auto& option : command.options)
-        text += fmt::format("{} {}\n", option.isRequired ? "." : ".Op", Terms(option, " | "));
+        text += fmt::format("{} {}{}\n", option.isRequired ? "." : ".Op", Terms(option, " | "),
+                            option.isRepeatable ? " ..." : "");
     if (!command.commands.empty())
         text += ".Op Ar command Op Ar option ...\n";
     return text;
