@@ -99,6 +99,8 @@ TEST_P(MemoryFault, ABacklogThatFillsTheMemoryCostsReportsAndNotTheService) {
     EXPECT_TRUE(m_service.IsRunning());
     EXPECT_EQ(m_service.Process(), process);
     EXPECT_EQ(m_service.Log().find("OnStackCallBack"), std::string::npos);
+    EXPECT_EQ(m_service.Reportctl({"status"}), 1);
+    EXPECT_NE(m_service.Output().find(" lost to an exception. "), std::string::npos) << m_service.Output();
 
     constexpr long FREED_KILOBYTES = 1024; // at least this much: the memory that stays in use is scattered
     EXPECT_TRUE(WaitUntil([&] {
