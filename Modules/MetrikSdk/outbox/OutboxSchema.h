@@ -60,8 +60,9 @@ CREATE TABLE totals(
     last_delivered_ms    INTEGER);
 )sql";
 
-/// The failure with which uploads began to fail last. It lasts as long as at_ms is later than last_delivered_ms
-/// of the totals. The table is made with the first failure, because files of this version can be without it.
+/// The failure with which uploads began to fail last. It lasts as long as at_ms is later than
+/// last_delivered_ms of the totals. The table is made with the first failure, because files of this version
+/// can be without it.
 constexpr const char* UPLOAD_FAILURE = R"sql(
 CREATE TABLE IF NOT EXISTS upload_failure(
     id    INTEGER PRIMARY KEY CHECK (id = 1),

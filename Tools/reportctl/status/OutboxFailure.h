@@ -24,8 +24,8 @@ struct LogWriter {
 /// the log.
 void TakeOutboxLine(std::vector<Log::Line>& lines, Log::Line line);
 
-/// Adds the failure of the upload that the outbox noted, unless the log has a later line about uploads. The log
-/// may have lost the line: under load, its newest part is of some seconds only.
+/// Adds the failure of the upload that the outbox noted, unless the log has a later line about uploads. The
+/// log may have lost the line: under load, its newest part is of some seconds only.
 void AddNotedFailure(std::vector<Log::Line>& lines, const Outbox& outbox, const LogWriter& writer);
 
 /// Events that end a failure. In milliseconds since 1970; 0 for never.
@@ -34,8 +34,8 @@ struct OutboxWorked {
     std::int64_t storedAtMs = 0;    ///< The outbox took an event.
 };
 
-/// The newest failure that has not ended, as the outbox told it. A loss, which is over when it is told, counts
-/// for ten minutes.
+/// The newest failure that has not ended, as the outbox told it. A loss, which is over when it is told,
+/// counts for ten minutes.
 std::optional<std::string> LastingFailure(const std::vector<Log::Line>& lines, const OutboxWorked& worked,
                                           std::int64_t nowMs);
 

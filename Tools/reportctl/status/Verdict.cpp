@@ -105,8 +105,8 @@ private:
                             unreadFor / 1000));
     }
 
-    /// What the kernel dropped and the ledger does not have yet: the service asks about once a second, and not
-    /// while it hangs. Both counts wrap around in 32 bits here.
+    /// What the kernel dropped and the ledger does not have yet: the service asks about once a second, and
+    /// not while it hangs. Both counts wrap around in 32 bits here.
     std::uint64_t DroppedSinceCounted() const {
         const auto& look = m_status.ledger;
         if (!m_status.service.intake || !look.counting)
@@ -117,7 +117,8 @@ private:
         return more > 0 ? static_cast<std::uint64_t>(more) : 0;
     }
 
-    /// When the receiving thread was last seen at work. It writes a mark each second, also while nothing comes.
+    /// When the receiving thread was last seen at work. It writes a mark each second, also while nothing
+    /// comes.
     static std::int64_t LastReadMs(const ReportLedger::Look& look) {
         const auto received = static_cast<std::int64_t>(look.lastMs[ReportLedger::RECEIVED]);
         return look.recent.empty() ? received : std::max(received, look.recent.back().atMs);
