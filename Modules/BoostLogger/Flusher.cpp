@@ -3,6 +3,7 @@
 #include <exception>
 
 #include "Modules/BoostLogger/InsideLog.h"
+#include "SystemTool/ThreadHeap.h"
 
 namespace BoostLogger {
 
@@ -31,6 +32,7 @@ bool Flusher::Notice() {
 }
 
 void Flusher::Run() {
+    SystemTool::PrepareHeap();
     const InsideLog inside;
     std::unique_lock lock(m_mutex);
     while (!m_stop) {

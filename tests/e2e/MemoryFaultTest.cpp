@@ -33,11 +33,31 @@ protected:
         SendAndAwaitARow(); // now everything is loaded
     }
 
-    void SetLimit() {
-        m_limitKilobytes = NumberInStatusOf(m_service.Process(), GetParam().usage) + ROOM_KILOBYTES;
-        const auto bytes = static_cast<rlim_t>(m_limitKilobytes) * 1024;
-        const rlimit limit{.rlim_cur = bytes, .rlim_max = bytes};
+    void SetLimit(long roomKilobytes = ROOM_KILOBYTES) {
+        m_limitKilobytes = NumberInStatusOf(m_service.Process(), GetParam().usage) + roomKilobytes;
+        SetLimitTo(static_cast<rlim_t>(m_limitKilobytes) * 1024);
+    }
+
+    void SetLimitTo(rlim_t bytes) const {
+        const rlimit limit{.rlim_cur = bytes, .rlim_max = RLIM_INFINITY};
         ASSERT_EQ(::prlimit(m_service.Process(), GetParam().resource, &limit, nullptr), 0);
+    }
+
+    /// Sends what needs memory in each part of the service: for the tree of a value, for a module and its
+    /// outbox, for the log.
+    void SendAMix(int round) const {
+        const std::string module = "AB" + std::to_string(round) + std::string(5000, 'z');
+        SendLargeReports(1);
+        Service::Send(R"({"msgType":"init","exdata":{"moduleID":")" + module +
+                      R"(","moduleVersion":"1","dbPath":")" + m_service.DataDirectory() + "/hublink/m" +
+                      std::to_string(round % 10) + "\"}}");
+        Service::Send(R"({"eventID":")" + module + R"(|1","value":)" + m_arrayOfTwoThousand + "}");
+        std::string directives;
+        for (int i = 0; i < 4000; ++i)
+            directives += "%s";
+        Service::Send(directives);
+        Service::Send(R"({"x":)" + m_arrayOfTwoThousand); // no JSON
+        Service::Send(std::string(10240, 'x'));
     }
 
     void SendLargeReports(int count) const {
@@ -111,6 +131,26 @@ TEST_P(MemoryFault, ABacklogThatFillsTheMemoryCostsReportsAndNotTheService) {
         std::filesystem::remove(m_service.DatabaseFile() + suffix);
     m_service.Install();
     SendAndAwaitARow(); // SQLite must map memory for the new file
+}
+
+TEST_P(MemoryFault, ThatComesWithinTheHandlingOfAnyReportCostsReportsAndNotTheService) {
+#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
+    GTEST_SKIP() << "a sanitizer's own memory takes the addresses, and it ends the program without them";
+#endif
+    SendLargeReports(100); // a burst: now all threads run
+    for (const long room : {512, 1024, 2048, 4096}) {
+        SetLimit(room);
+        for (int round = 0; round < 150; ++round) {
+            SendAMix(round);
+            const auto areTaken = [&] { return !m_service.IsRunning() || Service::TookAllDatagrams(); };
+            ASSERT_TRUE(round % 20 != 0 || WaitUntil(areTaken));
+            ASSERT_TRUE(m_service.IsRunning()) << m_service.Output();
+        }
+        SetLimitTo(RLIM_INFINITY);
+        SendAndAwaitARow();
+        ASSERT_TRUE(m_service.IsRunning()) << room;
+    }
+    EXPECT_EQ(m_service.Log().find("OnStackCallBack"), std::string::npos);
 }
 
 INSTANTIATE_TEST_SUITE_P(AtALimitOf, MemoryFault,

@@ -9,6 +9,7 @@
 
 #include "Modules/MetrikSdk/process/OutboxCore.h"
 #include "Modules/MetrikSdk/upload/UploadCycle.h"
+#include "SystemTool/ThreadHeap.h"
 
 namespace MetrikSdk::upload {
 namespace {
@@ -100,6 +101,7 @@ Uploader::Uploader(std::shared_ptr<process::OutboxCore> core, std::shared_ptr<ot
     const BlockedSignals blocked;
     m_thread =
         std::thread([sharedCore = m_core, sharedSender = m_sender, done = std::move(finished)]() mutable {
+            SystemTool::PrepareHeap();
             RunUntilStopped(*sharedCore, *sharedSender);
             sharedSender.reset();
             sharedCore.reset();

@@ -2,6 +2,8 @@
 
 #include <exception>
 
+#include "SystemTool/ThreadHeap.h"
+
 namespace OrvekSqlite::group {
 
 void Committer::Notice() {
@@ -34,6 +36,7 @@ void Committer::Stop() {
 }
 
 void Committer::Run() {
+    SystemTool::PrepareHeap();
     m_self = std::this_thread::get_id();
     std::unique_lock lock(m_mutex);
     while (!m_stop) {
