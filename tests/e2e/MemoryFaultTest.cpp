@@ -1,3 +1,4 @@
+#include <algorithm>
 #include <filesystem>
 #include <optional>
 
@@ -39,7 +40,9 @@ protected:
     }
 
     void SetLimitTo(rlim_t bytes) const {
-        const rlimit limit{.rlim_cur = bytes, .rlim_max = RLIM_INFINITY};
+        rlimit limit{};
+        ASSERT_EQ(::prlimit(m_service.Process(), GetParam().resource, nullptr, &limit), 0);
+        limit.rlim_cur = std::min(bytes, limit.rlim_max);
         ASSERT_EQ(::prlimit(m_service.Process(), GetParam().resource, &limit, nullptr), 0);
     }
 
