@@ -79,8 +79,8 @@ struct AsideSettings {
     /// after it does not count. So many tries take some two days. A collector that has too much to do takes
     /// the event before.
     int tries = 48;
-    /// How many events may be aside at once. Each of them takes memory, and a look at each batch. A further
-    /// event that would go aside is sent again and again until there is room.
+    /// How many events that are aside are tried in turns. Each try is a request of one event. Other events
+    /// are also sent before further ones, which are tried once there is room.
     std::size_t maxEvents = 512;
 };
 

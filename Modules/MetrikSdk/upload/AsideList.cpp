@@ -7,13 +7,26 @@ namespace MetrikSdk::upload {
 
 void AsideList::Add(const EventKey& event, WallTime now) {
     m_keys[event.row] = event.uuid;
-    m_entries[event.row] = {now + m_settings.firstPause};
+    if (m_entries.size() < m_settings.maxEvents)
+        m_entries[event.row] = {now + m_settings.firstPause};
 }
 
 void AsideList::Remove(std::int64_t row) {
     m_keys.erase(row);
     m_entries.erase(row);
     m_uncertain.erase(row);
+    AdmitThePassed();
+}
+
+/// Lets events in that were passed while the list was full, the oldest first. They can be tried at once.
+void AsideList::AdmitThePassed() {
+    if (m_keys.size() == m_entries.size())
+        return;
+    for (const auto& [row, uuid] : m_keys) {
+        if (m_entries.size() >= m_settings.maxEvents)
+            return;
+        m_entries.try_emplace(row);
+    }
 }
 
 void AsideList::OtherWasTaken() {
@@ -32,8 +45,8 @@ void AsideList::OtherFailed() {
 
 void AsideList::Taken(std::int64_t row) {
     Remove(row);
-    std::erase_if(m_keys, [this](const auto& key) { return m_entries.at(key.first).tries == 0; });
     std::erase_if(m_entries, [](const auto& entry) { return entry.second.tries == 0; });
+    std::erase_if(m_keys, [this](const auto& key) { return !m_entries.contains(key.first); });
     OtherWasTaken();
 }
 

@@ -34,6 +34,10 @@ namespace MetrikSdk::upload {
 /// the first of them is taken, and the rest wait again like all other events. Otherwise each of a million
 /// machines would send many requests of one event to a collector that has just returned.
 ///
+/// At most AsideSettings::maxEvents are tried. Further events are passed: other events are sent before them,
+/// too, and they are tried once there is room. While the list is full, the events that are tried can only
+/// leave it if others are taken. So a further event must not hold up the others.
+///
 /// The list is kept in memory. A process that starts anew has to find these events again, which takes some
 /// requests. To keep the list in the file would take a write at each try, and a column in every event.
 /// Threads: one. Pure: the caller passes the time.
@@ -43,8 +47,6 @@ public:
 
     /// The events in this list; Outbox::Take leaves them out.
     const EventKeys& Keys() const { return m_keys; }
-
-    bool IsFull() const { return m_keys.size() >= m_settings.maxEvents; }
 
     void Add(const EventKey& event, WallTime now);
     void Remove(std::int64_t row);
@@ -82,12 +84,13 @@ private:
         bool othersWereTaken = false; ///< Since the last try of this event.
     };
 
+    void AdmitThePassed();
     bool IsDue(const Entry& entry, WallTime now) const;
     std::chrono::milliseconds PauseAfter(int tries) const;
 
     const AsideSettings m_settings;
     EventKeys m_keys;
-    std::map<std::int64_t, Entry> m_entries; ///< By row.
+    std::map<std::int64_t, Entry> m_entries; ///< By row. An event without an entry is passed.
     std::set<std::int64_t> m_uncertain; ///< Rows with a strike after which no request of others was answered.
 };
 

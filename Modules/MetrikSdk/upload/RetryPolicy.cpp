@@ -24,10 +24,17 @@ bool IsSuccess(long status) {
 
 /// Whether the answer is a web page. The log-in page of a hotel's network answers every plain request with
 /// 200 and a page. A collector answers with JSON, with nothing, or with a word. Pages from a collector's
-/// address come only with errors, from the proxy in front of it.
+/// address come only with errors, from the proxy in front of it. A page may come without its type.
 bool IsWebPage(const otlp::HttpResult& result) {
     static constexpr std::string_view PAGE = "text/html"; // media types may be in upper or lower case
-    return ::strncasecmp(result.contentType.c_str(), PAGE.data(), PAGE.size()) == 0;
+    if (::strncasecmp(result.contentType.c_str(), PAGE.data(), PAGE.size()) == 0)
+        return true;
+    static constexpr std::string_view BYTE_ORDER_MARK = "\xef\xbb\xbf";
+    std::string_view text = result.body;
+    if (text.starts_with(BYTE_ORDER_MARK))
+        text.remove_prefix(BYTE_ORDER_MARK.size());
+    const auto first = text.find_first_not_of(" \t\r\n");
+    return first != std::string_view::npos && text[first] == '<';
 }
 
 bool AsksToWait(long status) {
@@ -74,12 +81,12 @@ std::chrono::milliseconds Part(double part, std::chrono::milliseconds whole) {
 Verdict Judge(const otlp::HttpResult& result) {
     if (!result.fault.empty())
         return result.began ? Verdict::WaitAndHalve : Verdict::Wait;
+    // A page or a redirect is rarely about the events. But a firewall that forbids one event may answer so.
     if (IsSuccess(result.status))
-        return IsWebPage(result) ? Verdict::Wait : Verdict::Delete;
-    // A redirect is the fault of the address and not of the events. We do not follow it: it could carry the
-    // credentials to another host.
+        return IsWebPage(result) ? Verdict::WaitThenHalve : Verdict::Delete;
+    // We do not follow a redirect: it could carry the credentials to another host.
     if (result.status < 400)
-        return Verdict::Wait;
+        return Verdict::WaitThenHalve;
     if (AsksToWait(result.status) || IsConfigurationsFault(result.status))
         return Verdict::WaitThenHalve;
     return result.status == 413 ? Verdict::HalveForSize : Verdict::Halve;
@@ -131,14 +138,14 @@ std::string Describe(const otlp::HttpResult& result) {
 }
 
 std::string LookAt(const otlp::HttpResult& result, const std::vector<std::string>& headers) {
+    if (result.status == 407 || result.proxyStatus == 407)
+        return "look at the proxy and its credentials: https_proxy, http_proxy";
     if (!result.fault.empty())
         return {};
     if (result.status == 511 || (IsSuccess(result.status) && IsWebPage(result)))
         return "this is a page: the network may want a log-in, or the address be no collector's";
     if (result.status == 401 || result.status == 403)
         return Credentials(headers);
-    if (result.status == 407)
-        return "look at the proxy and its credentials: https_proxy, http_proxy";
     if (result.status == 415)
         return "look at OTEL_EXPORTER_OTLP_COMPRESSION: the collector may not unpack, or take no JSON";
     if (result.status == 404 || result.status == 405 || (result.status >= 300 && result.status < 400))

@@ -104,15 +104,14 @@ void UploadRules::NotTaken(const Sent& sent, Verdict verdict, WallTime now, Even
         StepAside(sent.first, now, queue);
 }
 
-/// Lets the others go past an event that failed alone, if there are others.
+/// Lets the others go past an event that failed alone. If there are no others, the events that are aside take
+/// turns with it: one of them may be taken.
 void UploadRules::StepAside(const EventKey& event, WallTime now, EventQueue& queue) {
-    if (m_aside.IsFull())
-        return;
     m_aside.Add(event, now);
     if (queue.HasOthersThan(m_aside.Keys()))
-        m_sizer.SteppedAside();
-    else
-        m_aside.Remove(event.row);
+        return m_sizer.SteppedAside();
+    m_aside.Remove(event.row);
+    m_isAsidesTurn = true;
 }
 
 UploadRules::Decision UploadRules::AsideFailed(const Sent& sent, WallTime now) {

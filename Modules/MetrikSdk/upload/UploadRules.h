@@ -113,7 +113,7 @@ private:
     const OutboxSettings& m_settings;
     BatchSizer m_sizer;
     AsideList m_aside;
-    bool m_isAsidesTurn = false; ///< A batch was taken since one that is aside was tried.
+    bool m_isAsidesTurn = false; ///< One that is aside is tried next, if one is due.
     int m_failures = 0;          ///< Requests in a row that must be repeated.
     int m_refusalsInARow = 0;    ///< Events refused for good since one was last accepted.
 };

@@ -107,4 +107,21 @@ TEST_F(TheAsideList, ForgetsWhatIsRemoved) {
     EXPECT_FALSE(m_list.UntilDue(NOW));
 }
 
+TEST_F(TheAsideList, PassesFurtherEventsAndTriesThemOnceThereIsRoom) {
+    m_settings.maxEvents = 2;
+    upload::AsideList list(m_settings);
+    for (const std::int64_t row : {1, 2, 3, 4})
+        list.Add(Event(row), NOW);
+    EXPECT_EQ(list.Keys().size(), 4U) << "other events are sent before all of them";
+    list.OtherWasTaken();
+    list.Failed(1, NOW);
+    list.Failed(2, NOW);
+    EXPECT_FALSE(list.Due(NOW));
+    list.Remove(1);
+    EXPECT_EQ(list.Due(NOW)->row, 3);
+    EXPECT_FALSE(list.Failed(3, NOW).isNew) << "nothing was taken since it was let in";
+    list.Taken(2);
+    EXPECT_TRUE(list.Keys().empty()) << "neither of them has a failed try that counts";
+}
+
 } // namespace

@@ -55,7 +55,7 @@ TEST(RetryPolicy, HalvesOnEveryOtherError) {
 
 TEST(RetryPolicy, KeepsTheBatchOnARedirect) {
     for (const long status : {301, 302, 307, 308})
-        EXPECT_EQ(Judge(Answer(status)), upload::Verdict::Wait) << status;
+        EXPECT_EQ(Judge(Answer(status)), upload::Verdict::WaitThenHalve) << status;
 }
 
 TEST(RetryPolicy, KeepsTheBatchWhenTheAnswerIsNotComplete) {
@@ -70,8 +70,17 @@ TEST(RetryPolicy, TakesAWebPageForALogInPage) {
     auto page = Answer(200, "<html>Welcome to the hotel</html>");
     for (const auto* type : {"text/html; charset=utf-8", "Text/HTML"}) {
         page.contentType = type;
-        EXPECT_EQ(Judge(page), upload::Verdict::Wait) << type;
+        EXPECT_EQ(Judge(page), upload::Verdict::WaitThenHalve) << type;
     }
+}
+
+TEST(RetryPolicy, KnowsAWebPageByItsTextWhereNoTypeSaysSo) {
+    for (const auto* text : {"<html>Welcome</html>", "\r\n\t <!DOCTYPE html>", "\xef\xbb\xbf<html>"}) {
+        EXPECT_EQ(Judge(Answer(200, text)), upload::Verdict::WaitThenHalve) << text;
+        EXPECT_NE(upload::RetryPolicy::LookAt(Answer(200, text), {}), "") << text;
+    }
+    for (const auto* text : {"", "  ", "1 < 2", "{}"})
+        EXPECT_EQ(Judge(Answer(200, text)), upload::Verdict::Delete) << text;
 }
 
 TEST(RetryPolicy, JudgesAnErrorByItsStatusAlsoWhenItsTextIsAPage) {
@@ -83,8 +92,7 @@ TEST(RetryPolicy, JudgesAnErrorByItsStatusAlsoWhenItsTextIsAPage) {
     for (const long status : {400, 500})
         EXPECT_EQ(judge(status), upload::Verdict::Halve) << status;
     EXPECT_EQ(judge(413), upload::Verdict::HalveForSize);
-    EXPECT_EQ(judge(302), upload::Verdict::Wait);
-    for (const long status : {401, 403, 429, 502, 503, 504})
+    for (const long status : {302, 401, 403, 429, 502, 503, 504})
         EXPECT_EQ(judge(status), upload::Verdict::WaitThenHalve) << status;
 }
 

@@ -1,5 +1,6 @@
 #include "Modules/MetrikSdk/upload/UploadCycle.h"
 
+#include <algorithm>
 #include <deque>
 #include <filesystem>
 #include <functional>
@@ -87,7 +88,7 @@ protected:
         std::chrono::minutes duration, const std::function<void()>& eachMinute = [] {}) {
         const auto end = m_clock + duration;
         for (auto minute = m_clock; m_clock < end;) {
-            m_clock += std::max(m_cycle.Pass(m_clock).duration, std::chrono::milliseconds(1));
+            m_clock += std::max(m_running->Pass(m_clock).duration, std::chrono::milliseconds(1));
             if (m_clock - minute < 1min)
                 continue;
             minute = m_clock;
@@ -110,6 +111,7 @@ protected:
     outbox::Outbox m_outbox{m_directory.Path(), m_settings, m_notifier};
     FakeSender m_sender;
     upload::UploadCycle m_cycle{m_outbox, m_sender, m_notifier, m_settings, [] { return 0.5; }};
+    upload::UploadCycle* m_running = &m_cycle; ///< The cycle of RunFor.
     int m_next = 0;
     WallTime m_clock = WallNow() + 1h; ///< The clock of RunFor.
 };
@@ -355,6 +357,52 @@ TEST_F(TheUploadCycle, LetsOthersGoPastAnEventThatAFirewallForbids) {
     AnswerLaterTo({13}, Status(403));
     RunFor(1h);
     EXPECT_EQ(m_outbox.Status().delivered, 99);
+}
+
+TEST_F(TheUploadCycle, LetsOthersGoPastAnEventThatIsAnsweredWithAPageOrARedirect) {
+    auto page = Status(200);
+    page.contentType = "text/html";
+    for (const auto& answer : {page, Status(302)}) {
+        AnswerLaterTo({m_next + 13}, answer);
+        Append(100);
+        RunFor(1h);
+        EXPECT_EQ(m_outbox.Status().delivered, m_next - 1) << answer.status;
+        EXPECT_EQ(m_outbox.Status().waiting, 1) << "kept, for the address may be wrong";
+    }
+}
+
+TEST_F(TheUploadCycle, LetsOthersGoPastMoreBadEventsThanAreTriedInTurns) {
+    constexpr int BAD = 600;
+    m_settings.batch.maxEvents = 4; // finds a bad event in a few requests
+    upload::UploadCycle cycle{m_outbox, m_sender, m_notifier, m_settings, [] { return 0.5; }};
+    m_running = &cycle;
+    m_sender.answer = [&](const std::vector<ReceivedEvent>& events) {
+        m_sender.bodies.clear();
+        const bool isBad = std::any_of(events.begin(), events.end(), [](const auto& event) {
+            return event.number < 2 * BAD && event.number % 2 == 1;
+        });
+        return Status(isBad ? 503 : 200);
+    };
+    Append(2 * BAD);
+    RunFor(24h);
+    Append(50);
+    RunFor(1h);
+    EXPECT_EQ(m_outbox.Status().delivered, BAD + 50);
+    AnswerAlways(Status(200));
+    Append(1);
+    RunFor(72h);
+    EXPECT_EQ(m_outbox.Status().waiting, 0);
+}
+
+TEST_F(TheUploadCycle, TriesWhatStandsAsideAlsoWhileNothingButABadEventIsLeft) {
+    Append(20);
+    AnswerLaterTo({13, 19}, Status(503));
+    RunFor(30min);
+    EXPECT_EQ(m_outbox.Status().delivered, 18);
+    AnswerLaterTo({19}, Status(503));
+    RunFor(2h);
+    EXPECT_EQ(m_outbox.Status().delivered, 19);
+    EXPECT_EQ(m_outbox.Status().waiting, 1);
 }
 
 TEST_F(TheUploadCycle, HeedsARetryAfterInEveryAnswer) {
