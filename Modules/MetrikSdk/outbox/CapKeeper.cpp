@@ -47,7 +47,7 @@ void CapKeeper::CountDrops(const OutboxStore::Dropped& dropped, SteadyTime now,
 void CapKeeper::TellEndOfRun(const std::optional<std::string>& totals, std::vector<report::News>& news) {
     if (totals)
         news.push_back({report::Cause::Drop, "No events are dropped any more; lost: " + *totals,
-                        report::News::Kind::End});
+                        report::News::Kind::Totals});
 }
 
 void CapKeeper::EndRun(std::vector<report::News>& news) {

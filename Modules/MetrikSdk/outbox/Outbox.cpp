@@ -174,7 +174,7 @@ void Outbox::MoveToDeadLetters(const StoredEvent& event, const Refusal& refusal)
 void Outbox::TellDeadLetters(const std::optional<std::string>& totals, std::vector<report::News>& news) {
     if (totals)
         news.push_back(
-            {report::Cause::Refusal, "Moved to the dead letters: " + *totals, report::News::Kind::End});
+            {report::Cause::Refusal, "Moved to the dead letters: " + *totals, report::News::Kind::Totals});
 }
 
 void Outbox::EndRuns() {

@@ -145,6 +145,7 @@ std::size_t OutboxStore::Store(const ModuleIdentity& module, const NewEvent& eve
         // No row was inserted: another program has deleted the module, and perhaps more.
         if (insert->exec() != 1)
             throw StoreError(StoreFault::Reopen, "The outbox has lost a module");
+        ForgetVictimBefore(m_database.getLastInsertRowid());
         return bytes + keys.newBytes;
     });
 }
@@ -249,8 +250,11 @@ bool OutboxStore::Delete(const StoredEvent& event) {
 /// reports every day. The newest module is kept, so that its key is not given out twice: another process may
 /// know the key.
 void OutboxStore::ForgetIdleModules() {
-    if (Number(m_database, "SELECT EXISTS (SELECT 1 FROM event)") == 0) // the next events get low rows again
+    if (Number(m_database, "SELECT EXISTS (SELECT 1 FROM event)") ==
+        0) { // the next events get low rows again
         m_database.exec("UPDATE module SET last_event = 0 WHERE last_event > 0");
+        m_lastVictim = 0;
+    }
     const auto excess = Number(m_database, "SELECT count(*) FROM module") - MAX_IDLE_MODULES;
     if (excess <= 0)
         return;
@@ -413,12 +417,20 @@ std::int64_t OutboxStore::LargestModule(std::int64_t minBytes) {
     return query.getColumn(0).getInt64();
 }
 
+/// An event in this row can be dropped from now on, so the next search must not begin behind it.
+void OutboxStore::ForgetVictimBefore(std::int64_t row) {
+    if (row <= m_lastVictimRow)
+        m_lastVictim = 0;
+}
+
 OutboxStore::Dropped OutboxStore::DropOldest(std::int64_t afterRow, WallTime before, std::int64_t excessBytes,
                                              std::size_t maxRows) {
     return Guarded("Cannot drop old events", [&] {
         WriteTransaction transaction(m_database);
         Dropped dropped;
         Removed removed;
+        if (afterRow < std::exchange(m_lastAfterRow, afterRow)) // what was being sent may be dropped now
+            ForgetVictimBefore(afterRow + 1);
         DropWhile(afterRow, 0, maxRows, removed, dropped,
                   [&](WallTime storedAt, std::int64_t) { return storedAt < before; });
         const auto tooMuch = [&](WallTime, std::int64_t bytes) { return bytes < excessBytes; };

@@ -143,6 +143,7 @@ private:
     ReleaseKeys KeysOf(const ModuleIdentity& module);
     ReleaseKeys AddRelease(const ModuleIdentity& module);
     ModuleIdentity IdentityOf(std::int64_t release);
+    void ForgetVictimBefore(std::int64_t row);
     void ForgetIdleModules();
     std::int64_t LargestModule(std::int64_t minBytes);
     template <typename GoesOn>
@@ -158,9 +159,11 @@ private:
     std::unique_ptr<SQLite::Statement> m_oldest;
     std::unique_ptr<SQLite::Statement> m_delete;
     /// The module whose events were dropped last for their bytes, and the row of the last of these events.
-    /// The next search need not begin at the first row again.
+    /// The next search need not begin at the first row again, as long as no event of the module can be before
+    /// that row.
     std::int64_t m_lastVictim = 0;
     std::int64_t m_lastVictimRow = 0;
+    std::int64_t m_lastAfterRow = 0;              ///< Of the last call of DropOldest.
     std::map<ModuleIdentity, ReleaseKeys> m_keys; ///< The keys of modules in use, as the file knows them.
 };
 

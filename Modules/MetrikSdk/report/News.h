@@ -23,9 +23,13 @@ enum class Cause {
 /// The first text that the failure callback gets for this cause.
 const char* NameOf(Cause cause);
 
-/// A failure, or the end of failures, that is to be reported to the callbacks.
+/// A failure, the end of failures, or the totals of a run of losses, to be reported to the callbacks.
 struct News {
-    enum class Kind { Failure, End };
+    enum class Kind {
+        Failure, ///< Reported at most once in an interval.
+        End,     ///< Reported when the failure was.
+        Totals   ///< Always reported. Each outbox has its own, and at most one in ten minutes.
+    };
     Cause cause;
     std::string text;
     Kind kind = Kind::Failure;

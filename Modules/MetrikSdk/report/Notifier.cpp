@@ -57,7 +57,8 @@ void Notifier::TellFailure(Cause cause, const char* text) noexcept {
 std::optional<std::string> Notifier::Words(const News& news) {
     if (news.kind == News::Kind::Failure)
         return m_reporter->RecordFailure(news.cause, news.text, std::chrono::steady_clock::now());
-    return m_reporter->ReportEnd(news.cause) ? std::optional(news.text) : std::nullopt;
+    const bool isDue = m_reporter->ReportEnd(news.cause) || news.kind == News::Kind::Totals;
+    return isDue ? std::optional(news.text) : std::nullopt;
 }
 
 void Notifier::TellFailures(const std::vector<News>& news) noexcept {

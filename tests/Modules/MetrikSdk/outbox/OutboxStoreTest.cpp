@@ -216,6 +216,31 @@ TEST_F(TheOutboxStore, DoesNotDropWhatIsUnderWay) {
     EXPECT_EQ(left.events[2].payload, "3");
 }
 
+TEST_F(TheOutboxStore, DropsTheOldestOfTheLargestModuleAlsoAfterTheOutboxWasEmpty) {
+    for (int i = 0; i < 10; ++i)
+        Store(A759, "first" + std::to_string(i));
+    m_store->DropOldest(0, NEVER_TOO_OLD, 1'000'000, 8); // no module has so much, so all modules' go
+    m_store->DropOldest(0, NEVER_TOO_OLD, 1, 1);
+    m_store->RemoveDelivered(m_store->Oldest(10, ANY_BYTES), 0);
+    Store({"QUIET", "1", "quiet"}, "quiet");
+    for (int i = 0; i < 5; ++i)
+        Store(A759, "again" + std::to_string(i));
+    EXPECT_EQ(m_store->DropOldest(0, NEVER_TOO_OLD, 1, 100).events, 1U);
+    const auto left = m_store->Oldest(10, ANY_BYTES);
+    ASSERT_EQ(left.events.size(), 5U);
+    EXPECT_EQ(left.events[0].payload, "quiet");
+    EXPECT_EQ(left.events[1].payload, "again1");
+}
+
+TEST_F(TheOutboxStore, DropsTheOldestAlsoWhenItWasUnderWayBefore) {
+    for (int i = 0; i < 6; ++i)
+        Store(A759, std::to_string(i));
+    const auto underWay = m_store->Oldest(3, ANY_BYTES).events.back().row;
+    EXPECT_EQ(m_store->DropOldest(underWay, NEVER_TOO_OLD, 1, 100).events, 1U);
+    EXPECT_EQ(m_store->DropOldest(0, NEVER_TOO_OLD, 1, 100).events, 1U);
+    EXPECT_EQ(m_store->Oldest(1, ANY_BYTES).events.at(0).payload, "1");
+}
+
 TEST_F(TheOutboxStore, KeepsTheNewestDeadLettersWithinBothBounds) {
     for (int i = 0; i < 10; ++i) {
         Store(A759, std::string(100, static_cast<char>('0' + i)));

@@ -180,6 +180,34 @@ TEST_F(TheOutbox, TellsTheTotalsOfItsLosses) {
     EXPECT_EQ(Told::Failures().All().size(), told.size()) << "once";
 }
 
+TEST_F(TheOutbox, TellsItsTotalsAlsoWhenAnotherOutboxLostEventsAtTheSameTime) {
+    const auto reporter = std::make_shared<report::FailureReporter>(1min);
+    std::vector<std::string> modules{"A100", "A200"};
+    std::vector<std::unique_ptr<report::Notifier>> notifiers;
+    std::vector<std::unique_ptr<outbox::Outbox>> outboxes;
+    for (const auto& module : modules) {
+        auto& notifier = *notifiers.emplace_back(std::make_unique<report::Notifier>(reporter));
+        notifier.Subscribe(&Told::OnFailure, &Told::OnSuccess);
+        auto& outbox = *outboxes.emplace_back(
+            std::make_unique<outbox::Outbox>(m_directory.Path() + "/" + module, m_settings, notifier));
+        ASSERT_TRUE(outbox.Append({module, "1", ""}, module + "|1", "{}"));
+        outbox.MoveToDeadLetters(outbox.Take(1).events.at(0), {400, "bad"});
+        notifier.TellFailure({report::Cause::Refusal, "An event was refused for good"});
+    }
+    for (const auto& outbox : outboxes)
+        outbox->EndRuns();
+    const auto told = Told::Failures().All();
+    for (const auto& module : modules)
+        EXPECT_EQ(std::count_if(told.begin(), told.end(),
+                                [&](const auto& text) {
+                                    return text.starts_with(
+                                               "events refused: Moved to the dead letters: 1 event from ") &&
+                                           text.ends_with(": " + module + " 1");
+                                }),
+                  1)
+            << module;
+}
+
 TEST_F(TheOutbox, TellsTheTotalsOnceARunOfDropsIsOver) {
     m_settings.caps.maxWaitingBytes = 10'000;
     m_settings.caps.dropRunEnds = 0ms;
