@@ -30,7 +30,8 @@ SignalNames NamesOf(Signal signal) {
 
 /// Variables of the same family that have no effect. Our own rules decide instead; docs/Outbox.md describes
 /// them.
-constexpr std::array NOT_HONOURED{"OTEL_BLRP_SCHEDULE_DELAY",
+constexpr std::array NOT_HONOURED{"OTEL_CONFIG_FILE",
+                                  "OTEL_BLRP_SCHEDULE_DELAY",
                                   "OTEL_BLRP_EXPORT_TIMEOUT",
                                   "OTEL_BLRP_MAX_QUEUE_SIZE",
                                   "OTEL_BLRP_MAX_EXPORT_BATCH_SIZE",
@@ -38,6 +39,9 @@ constexpr std::array NOT_HONOURED{"OTEL_BLRP_SCHEDULE_DELAY",
                                   "OTEL_ATTRIBUTE_COUNT_LIMIT",
                                   "OTEL_LOGRECORD_ATTRIBUTE_VALUE_LENGTH_LIMIT",
                                   "OTEL_LOGRECORD_ATTRIBUTE_COUNT_LIMIT"};
+
+/// The same for metrics: the caller decides when it sends them.
+constexpr std::array NOT_HONOURED_FOR_METRICS{"OTEL_METRIC_EXPORT_INTERVAL", "OTEL_METRIC_EXPORT_TIMEOUT"};
 
 using Url = std::unique_ptr<CURLU, decltype(&::curl_url_cleanup)>;
 
@@ -67,6 +71,15 @@ bool IsToken(const std::string& name) {
 /// A line feed in a value would add another header to the request.
 bool IsHeaderValue(const std::string& value) {
     return std::none_of(value.begin(), value.end(), [](unsigned char c) { return c < 0x20 && c != '\t'; });
+}
+
+/// The name of a header that is no token, as people may see it; empty when it may be a part of a secret. The
+/// '=' may be the end of a secret in base64. A text with a colon may be a whole header, of which only the name
+/// is shown.
+std::string ShownName(const std::string& name, const std::string& value) {
+    if (value.find_first_not_of('=') == std::string::npos)
+        return {};
+    return Trimmed(name.substr(0, name.find(':')));
 }
 
 /// Whether the header describes the body. Only we set those headers.
@@ -143,11 +156,26 @@ private:
 
     /// Complains about variables without effect, because a person who set one of them expects an effect.
     void ReadWhatIsNotHonoured() {
-        if (const auto protocol = Pair("PROTOCOL"); !protocol.value.empty() && protocol.value != "http/json")
+        if (const auto protocol = Pair("PROTOCOL");
+            !protocol.value.empty() && LowerCase(protocol.value) != "http/json")
             m_complaints.push_back(protocol.name + ": only http/json is spoken, and is spoken all the same");
         if (const auto insecure = Pair("INSECURE"); !insecure.value.empty())
             m_complaints.push_back(insecure.name + " has no effect: the address says http or https");
-        for (const char* name : NOT_HONOURED)
+        ComplainOf(NOT_HONOURED);
+        if (m_names.exporter == "OTEL_METRICS_EXPORTER")
+            ReadWhatMetricsDoNotHonour();
+    }
+
+    void ReadWhatMetricsDoNotHonour() {
+        ComplainOf(NOT_HONOURED_FOR_METRICS);
+        const auto temporality = m_names.prefix + "TEMPORALITY_PREFERENCE";
+        if (const auto value = LowerCase(Value(temporality)); !value.empty() && value != "cumulative")
+            m_complaints.push_back(temporality + ": only cumulative is known, and is used");
+    }
+
+    template <typename Names>
+    void ComplainOf(const Names& names) {
+        for (const char* name : names)
             if (!Value(name).empty())
                 m_complaints.push_back(std::string(name) + " has no effect");
     }
@@ -196,15 +224,22 @@ private:
             return {};
         const auto equals = text.find('=');
         const auto name = Trimmed(text.substr(0, equals));
-        if (equals == std::string::npos || !IsToken(name))
-            return "header " + std::to_string(number) + " has no name and '='";
-        const auto value = PercentDecoded(Trimmed(text.substr(equals + 1)));
+        const auto encoded = equals == std::string::npos ? "" : Trimmed(text.substr(equals + 1));
+        if (!IsToken(name) || equals == std::string::npos)
+            return WrongName(number, ShownName(name, encoded));
+        const auto value = PercentDecoded(encoded);
         if (!IsHeaderValue(value))
             return "the value of header " + name + " has control characters";
         if (IsReserved(name))
             return "header " + name + " describes the body,";
         config.headers.emplace_back(name, value);
         return {};
+    }
+
+    static std::string WrongName(int number, const std::string& shown) {
+        const auto header = "header " + std::to_string(number);
+        return header + (shown.empty() ? " has no name and '='"
+                                       : " has the name \"" + shown + "\", which no header can have,");
     }
 
     void ReadTimeout(EndpointConfig& config) {
@@ -230,9 +265,10 @@ private:
 
     void ReadCompression(EndpointConfig& config) {
         OfferPair("COMPRESSION", [&](const Variable& compression) {
-            const bool valid = compression.value == "gzip" || compression.value == "none";
+            const auto word = LowerCase(compression.value);
+            const bool valid = word == "gzip" || word == "none";
             if (valid)
-                config.gzip = compression.value == "gzip";
+                config.gzip = word == "gzip";
             else
                 m_complaints.push_back(compression.name + " is neither gzip nor none and counts as unset");
             return valid;

@@ -51,7 +51,7 @@ void Set(CURL* easy, CURLoption option, Value value) {
 } // namespace
 
 HttpSender::HttpSender(EndpointConfig config)
-    : m_config(std::move(config)), m_headers(nullptr, Curl().slist_free_all),
+    : m_config(std::move(config)), m_secrets(m_config.headers), m_headers(nullptr, Curl().slist_free_all),
       m_multi(nullptr, Curl().multi_cleanup), m_easy(nullptr, Curl().easy_cleanup) {
     InitialiseLibrary();
     m_multi.reset(Curl().multi_init());
@@ -167,9 +167,11 @@ CURLcode HttpSender::Perform() {
 HttpResult HttpSender::Finish(CURLcode code, Answer& answer) {
     auto result = std::move(answer.result);
     Curl().easy_getinfo(m_easy.get(), CURLINFO_RESPONSE_CODE, &result.status);
+    Curl().easy_getinfo(m_easy.get(), CURLINFO_HTTP_CONNECTCODE, &result.proxyStatus);
     const char* type = nullptr;
     if (Curl().easy_getinfo(m_easy.get(), CURLINFO_CONTENT_TYPE, &type) == CURLE_OK && type != nullptr)
         result.contentType = type;
+    result.body = m_secrets.WithoutThem(std::move(result.body));
     if (answer.headersEnded && (code == CURLE_OK || (code == CURLE_WRITE_ERROR && answer.cut)))
         return result;
     result.abandoned = MustEnd();
@@ -179,7 +181,8 @@ HttpResult HttpSender::Finish(CURLcode code, Answer& answer) {
     if (code == CURLE_OK) // the library accepts an answer that ends after its status line
         result.fault = "the answer ended inside its headers";
     else
-        result.fault = m_error[0] != '\0' ? m_error : Curl().easy_strerror(code);
+        result.fault =
+            m_secrets.WithoutThemInFault(m_error[0] != '\0' ? m_error : Curl().easy_strerror(code));
     return result;
 }
 

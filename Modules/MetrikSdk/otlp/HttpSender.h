@@ -8,13 +8,14 @@
 #include <curl/curl.h>
 
 #include "Modules/MetrikSdk/otlp/EndpointConfig.h"
+#include "Modules/MetrikSdk/otlp/Secrets.h"
 #include "Modules/MetrikSdk/otlp/Sender.h"
 
 namespace MetrikSdk::otlp {
 
 /// Posts over HTTP. The connection is kept between requests. TLS certificates are verified. Redirects are not
 /// followed. Only http and https are used. The proxies of the standard variables are used. At most 64 KiB of
-/// an answer's body are read.
+/// an answer's body are read. Results hold no value of a configured header, because people get to see them.
 ///
 /// Threads: any may call Abandon. All other functions: one thread at a time.
 class HttpSender : public Sender {
@@ -50,6 +51,7 @@ private:
     static std::size_t OnHeader(char* bytes, std::size_t size, std::size_t count, void* data);
 
     const EndpointConfig m_config;
+    const Secrets m_secrets;
     std::atomic<bool> m_abandoned = false;
     std::unique_ptr<curl_slist, decltype(&::curl_slist_free_all)> m_headers;
     std::unique_ptr<CURLM, decltype(&::curl_multi_cleanup)> m_multi; ///< Keeps the connection.

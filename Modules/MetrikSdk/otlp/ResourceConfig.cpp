@@ -13,6 +13,15 @@ namespace {
 
 using Attributes = std::vector<std::pair<std::string, std::string>>;
 
+/// Whether each '%' is followed by two hexadecimal digits.
+bool IsPercentEncoded(const std::string& text) {
+    static constexpr auto DIGITS = "0123456789abcdefABCDEF";
+    for (auto at = text.find('%'); at != std::string::npos; at = text.find('%', at + 1))
+        if (at + 2 >= text.size() || text.find_first_not_of(DIGITS, at + 1) < at + 3)
+            return false;
+    return true;
+}
+
 /// Nothing when the list has a wrong form.
 std::optional<Attributes> Parsed(const std::string& list) {
     Attributes attributes;
@@ -22,6 +31,8 @@ std::optional<Attributes> Parsed(const std::string& list) {
         start = end + 1;
         if (text.empty())
             continue;
+        if (!IsPercentEncoded(text))
+            return std::nullopt;
         const auto equals = text.find('=');
         const auto key = PercentDecoded(Trimmed(text.substr(0, equals)));
         if (equals == std::string::npos || key.empty())

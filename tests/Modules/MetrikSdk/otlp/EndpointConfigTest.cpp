@@ -115,6 +115,53 @@ TEST_F(TheEndpointConfig, NamesTheHeaderThatIsIllFormed) {
             "OTEL_EXPORTER_OTLP_HEADERS: header content-type describes the body, and is not sent"}));
 }
 
+TEST_F(TheEndpointConfig, NamesAHeaderWhoseNameIsWrongUnlessThatMayBeASecret) {
+    const auto complaint = [&](const std::string& headers) {
+        Read({{"OTEL_EXPORTER_OTLP_ENDPOINT", "http://c"}, {"OTEL_EXPORTER_OTLP_HEADERS", headers}});
+        return m_complaints.empty() ? "" : m_complaints.at(0);
+    };
+    EXPECT_EQ(
+        complaint("a=1,x y=1"),
+        "OTEL_EXPORTER_OTLP_HEADERS: header 2 has the name \"x y\", which no header can have, and is not "
+        "sent");
+    EXPECT_EQ(
+        complaint("authorization: Bearer s3cr3t=x"),
+        "OTEL_EXPORTER_OTLP_HEADERS: header 1 has the name \"authorization\", which no header can have, "
+        "and is not sent");
+    for (const auto* secret : {"Bearer c2VjcmV0", "Bearer c2VjcmV0=", "Bearer c2VjcmV0==", "=c2VjcmV0"})
+        EXPECT_EQ(complaint(secret),
+                  "OTEL_EXPORTER_OTLP_HEADERS: header 1 has no name and '=' and is not sent");
+}
+
+TEST_F(TheEndpointConfig, ReadsWordsInAnyLetterCase) {
+    const auto config = Read({{"OTEL_EXPORTER_OTLP_ENDPOINT", "http://c"},
+                              {"OTEL_EXPORTER_OTLP_LOGS_COMPRESSION", "NONE"},
+                              {"OTEL_EXPORTER_OTLP_PROTOCOL", "HTTP/JSON"}});
+    EXPECT_FALSE(config->gzip);
+    EXPECT_EQ(m_complaints, std::vector<std::string>());
+}
+
+TEST_F(TheEndpointConfig, TellsWhichVariablesOfMetricsHaveNoEffect) {
+    const Environment environment{{"OTEL_EXPORTER_OTLP_ENDPOINT", "http://c"},
+                                  {"OTEL_CONFIG_FILE", "otel.yaml"},
+                                  {"OTEL_METRIC_EXPORT_INTERVAL", "5000"},
+                                  {"OTEL_METRIC_EXPORT_TIMEOUT", "5000"},
+                                  {"OTEL_EXPORTER_OTLP_METRICS_TEMPORALITY_PREFERENCE", "delta"}};
+    Read(environment);
+    EXPECT_EQ(m_complaints, std::vector<std::string>{"OTEL_CONFIG_FILE has no effect"});
+    Read(environment, otlp::Signal::Metrics);
+    EXPECT_EQ(
+        m_complaints,
+        (std::vector<std::string>{
+            "OTEL_CONFIG_FILE has no effect", "OTEL_METRIC_EXPORT_INTERVAL has no effect",
+            "OTEL_METRIC_EXPORT_TIMEOUT has no effect",
+            "OTEL_EXPORTER_OTLP_METRICS_TEMPORALITY_PREFERENCE: only cumulative is known, and is used"}));
+    Read({{"OTEL_EXPORTER_OTLP_ENDPOINT", "http://c"},
+          {"OTEL_EXPORTER_OTLP_METRICS_TEMPORALITY_PREFERENCE", "Cumulative"}},
+         otlp::Signal::Metrics);
+    EXPECT_EQ(m_complaints, std::vector<std::string>());
+}
+
 TEST_F(TheEndpointConfig, DecodesHeaders) {
     const auto config = Read({{"OTEL_EXPORTER_OTLP_ENDPOINT", "http://c"},
                               {"OTEL_EXPORTER_OTLP_HEADERS", "api-key=a%20b%2Cc , x = y=z,,empty="}});

@@ -49,7 +49,7 @@ TEST_F(TheResourceConfig, PrefersTheServiceNamesOwnVariable) {
 }
 
 TEST_F(TheResourceConfig, DropsAnIllFormedListAsAWhole) {
-    for (const auto* bad : {"a=1,nonsense", "=1", "a=1,=2"}) {
+    for (const auto* bad : {"a=1,nonsense", "=1", "a=1,=2", "a=1,b=%zz", "a=1,b%4=2", "a=%"}) {
         EXPECT_TRUE(Read({{"OTEL_RESOURCE_ATTRIBUTES", bad}}).attributes.empty()) << bad;
         EXPECT_EQ(m_complaints, std::vector<std::string>{
                                     "OTEL_RESOURCE_ATTRIBUTES is no list of key=value and counts as unset"});

@@ -112,7 +112,8 @@ bool LoopbackServer::Read(Poco::Net::StreamSocket& socket, std::string& buffer, 
         if (head == 0 && buffer.find("\r\n\r\n") != std::string::npos) {
             head = buffer.find("\r\n\r\n") + 4;
             ParseHead(buffer.substr(0, head), request);
-            wanted = head + std::stoul(request.headers["content-length"]);
+            const auto length = request.headers.find("content-length"); // a CONNECT has none
+            wanted = head + (length == request.headers.end() ? 0 : std::stoul(length->second));
         }
     }
     request.body = buffer.substr(head, wanted - head);
