@@ -40,20 +40,31 @@ double BusyRate(const Config& config) {
     return config.desktops * config.eventsPerDay * SECOND / USED;
 }
 
+/// A range as --help tells it.
+template <typename Number>
+CLI::Validator From(Number least, Number most) {
+    return CLI::Range(least, most).description(fmt::format("from {} to {}", least, most));
+}
+
+CLI::Validator NotNegative() {
+    auto check = CLI::NonNegativeNumber;
+    return check.description("0 or more");
+}
+
 void AddFleet(CLI::App& app, Config& config, Options& options) {
     app.add_option("--desktops", config.desktops, "Desktops")
-        ->check(CLI::Range(1, 2'000'000))
+        ->check(From(1, 2'000'000))
         ->capture_default_str();
     app.add_option("--days", config.days,
                    "Working days; by default as many as an outage needs to its second midnight")
-        ->check(CLI::Range(1, 40));
+        ->check(From(1, 40));
     app.add_option("--events", config.eventsPerDay, "Events of a desktop and day")
-        ->check(CLI::Range(2, 100'000))
+        ->check(From(2, 100'000))
         ->capture_default_str();
     app.add_option("--seed", config.seed, "The same seed gives the same figures")->capture_default_str();
     app.add_option("--restart", options.restartAt,
                    "All services that run start anew at this hour, such as 10.5");
-    app.add_option("--threads", options.threads, "Threads; they change no figure")->check(CLI::Range(1, 256));
+    app.add_option("--threads", options.threads, "Threads; they change no figure")->check(From(1, 256));
     app.add_flag("--json", options.json, "Write JSON");
     app.add_flag("--hours", options.hours, "A line for each hour, too");
 }
@@ -64,28 +75,27 @@ void AddCollectors(CLI::App& app, Config& config, Options& options) {
     app.add_option("--collectors", config.collectors,
                    "Collectors behind the balancer; by default one for each 50,000 desktops. Without a "
                    "capacity, their number changes no figure")
-        ->check(CLI::Range(1, 1000));
+        ->check(From(1, 1000));
     app.add_option("--capacity", options.capacity,
                    "What they take, as a multiple of the working day's mean rate of events; 0: everything")
-        ->check(CLI::NonNegativeNumber);
-    app.add_option("--outage", options.outageHours, "Hours for which they are away")
-        ->check(CLI::Range(0.0, 900.0));
+        ->check(NotNegative());
+    app.add_option("--outage", options.outageHours, "Hours for which they are away")->check(From(0.0, 900.0));
     app.add_option("--outage-at", options.outageAt, "The hour at which they go")
-        ->check(CLI::Range(0.0, 900.0))
+        ->check(From(0.0, 900.0))
         ->capture_default_str();
     app.add_option("--away", config.away, "What a desktop sees then: refused, 503 or silent")
-        ->transform(CLI::CheckedTransformer(WAYS));
+        ->transform(CLI::CheckedTransformer(WAYS).description(""));
     app.add_flag("--announced", config.isAnnounced,
                  "Their 503 has a Retry-After with the time of their return")
         ->needs("--away");
     app.add_option("--return-capacity", options.returnCapacity, "--capacity after the outage")
-        ->check(CLI::NonNegativeNumber);
+        ->check(NotNegative());
     app.add_option("--queue", options.queueSeconds,
                    "Seconds of work that a collector accepts ahead; then it says 503")
-        ->check(CLI::Range(0.0, 600.0))
+        ->check(From(0.0, 600.0))
         ->capture_default_str();
     app.add_option("--retry-after", config.retryAfter, "Seconds that its 503 asks for")
-        ->check(CLI::Range(0, 86'400));
+        ->check(From(0, 86'400));
 }
 
 /// The settings of the rules, so that one can see what each of them does.
@@ -94,7 +104,7 @@ void AddRules(CLI::App& app, MetrikSdk::OutboxSettings& settings) {
         const auto set = [&value](double seconds) {
             value = std::chrono::milliseconds(std::llround(seconds * 1000));
         };
-        app.add_option_function<double>(name, set, text)->check(CLI::NonNegativeNumber)->group("Rules");
+        app.add_option_function<double>(name, set, text)->check(NotNegative())->group("Rules");
     };
     add("--start-spread", settings.retry.startSpread,
         "Seconds within which the first request after a start goes");
@@ -105,6 +115,13 @@ void AddRules(CLI::App& app, MetrikSdk::OutboxSettings& settings) {
     add("--max-age", settings.caps.maxAge, "The age at which events are dropped, in seconds");
     app.add_option("--max-bytes", settings.caps.maxWaitingBytes, "Bytes at which an outbox is full")
         ->group("Rules");
+}
+
+/// --help names no type of the program's language.
+void NameValues(CLI::App& app) {
+    for (auto* option : app.get_options([](const CLI::Option* each) { return each->get_items_expected_max() > 0; }))
+        option->type_name("NUMBER");
+    app.get_option("--away")->type_name("WORD");
 }
 
 /// Without a capacity, desktops are independent of each other. Fewer of them at once fit the processor's
@@ -164,6 +181,7 @@ int main(int argc, char** argv) {
     AddFleet(app, config, options);
     AddCollectors(app, config, options);
     AddRules(app, config.settings);
+    NameValues(app);
     CLI11_PARSE(app, argc, argv);
     Complete(config, options, app.count("--days") > 0);
 

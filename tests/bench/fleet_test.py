@@ -27,6 +27,13 @@ class Fleet(unittest.TestCase):
             total = sum(hour[rate] for hour in hours) * 3600
             self.assertAlmostEqual(total, counts[count], delta=len(hours) * 2)
 
+    def test_tells_its_options_in_plain_words(self):
+        text = subprocess.run([PROGRAM, "--help"], check=True, capture_output=True, text=True).stdout
+        self.assertIn("--desktops NUMBER:from 1 to 2000000", text)
+        self.assertIn("--away WORD ", text)
+        for word in ("INT", "FLOAT", "ENUM", "->", "--json NUMBER"):
+            self.assertNotIn(word, text)
+
     def test_delivers_each_event_of_a_usual_day_once(self):
         result = run()
         self.assert_adds_up(result)
