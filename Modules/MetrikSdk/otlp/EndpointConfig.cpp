@@ -94,16 +94,19 @@ public:
     Reader(const LookUp& lookUp, std::vector<std::string>& complaints, Signal signal)
         : m_names(NamesOf(signal)), m_lookUp(lookUp), m_complaints(complaints) {}
 
-    bool IsDisabled() {
+    /// The variable that switches sending off, with its value; empty when none does.
+    std::string DisabledBy() {
         const auto disabled = LowerCase(Value("OTEL_SDK_DISABLED"));
         if (!disabled.empty() && disabled != "true" && disabled != "false")
             m_complaints.emplace_back("OTEL_SDK_DISABLED is neither true nor false and counts as unset");
-        return disabled == "true" || IsExporterNone();
+        if (disabled == "true")
+            return "OTEL_SDK_DISABLED=true";
+        return IsExporterNone() ? m_names.exporter + "=none" : "";
     }
 
     std::optional<EndpointConfig> Read() {
         EndpointConfig config;
-        config.url = ReadUrl();
+        ReadUrl(config);
         if (config.url.empty())
             return std::nullopt;
         ReadHeaders(config);
@@ -180,15 +183,14 @@ private:
                 m_complaints.push_back(std::string(name) + " has no effect");
     }
 
-    std::string ReadUrl() {
-        std::string result;
+    void ReadUrl(EndpointConfig& config) {
         OfferPair("ENDPOINT", [&](const Variable& endpoint) {
-            result = UrlOf(endpoint);
-            if (result.empty())
+            config.variables.endpoint = endpoint.name;
+            config.url = UrlOf(endpoint);
+            if (config.url.empty())
                 m_complaints.push_back(endpoint.name + " is no http or https URL and counts as unset");
-            return !result.empty();
+            return !config.url.empty();
         });
-        return result;
     }
 
     /// The URL for the signal; empty when the variable is no http or https URL.
@@ -206,6 +208,7 @@ private:
 
     void ReadHeaders(EndpointConfig& config) {
         const auto headers = Pair("HEADERS");
+        config.variables.headers = headers.name;
         int number = 0;
         for (std::size_t start = 0; start < headers.value.size();) {
             const auto end = std::min(headers.value.find(',', start), headers.value.size());
@@ -267,10 +270,12 @@ private:
         OfferPair("COMPRESSION", [&](const Variable& compression) {
             const auto word = LowerCase(compression.value);
             const bool valid = word == "gzip" || word == "none";
-            if (valid)
+            if (valid) {
                 config.gzip = word == "gzip";
-            else
+                config.variables.compression = compression.name;
+            } else {
                 m_complaints.push_back(compression.name + " is neither gzip nor none and counts as unset");
+            }
             return valid;
         });
     }
@@ -285,7 +290,7 @@ private:
 std::optional<EndpointConfig> ReadEndpoint(const LookUp& lookUp, std::vector<std::string>& complaints,
                                            Signal signal) {
     Reader reader(lookUp, complaints, signal);
-    if (reader.IsDisabled())
+    if (!reader.DisabledBy().empty())
         return std::nullopt;
     try {
         return reader.Read();
@@ -293,6 +298,11 @@ std::optional<EndpointConfig> ReadEndpoint(const LookUp& lookUp, std::vector<std
         complaints.push_back(std::string("No event is sent: ") + error.what());
         return std::nullopt;
     }
+}
+
+std::string DisabledBy(const LookUp& lookUp, Signal signal) {
+    std::vector<std::string> complaints; // ReadEndpoint gives them to the caller
+    return Reader(lookUp, complaints, signal).DisabledBy();
 }
 
 std::string WithoutSecrets(const std::string& url) {

@@ -9,6 +9,14 @@
 
 namespace MetrikSdk::otlp {
 
+/// The variables that decide, so that people can be told which one to look at. Of each pair, it is the one
+/// that is used, or the common one when none is set.
+struct VariableNames {
+    std::string endpoint = "OTEL_EXPORTER_OTLP_ENDPOINT";
+    std::string headers = "OTEL_EXPORTER_OTLP_HEADERS";
+    std::string compression = "OTEL_EXPORTER_OTLP_COMPRESSION";
+};
+
 /// Where and how events are sent, as the OTEL_* variables of the environment say.
 struct EndpointConfig {
     std::string url;
@@ -20,6 +28,7 @@ struct EndpointConfig {
     std::string certificate; ///< PEM file to trust instead of the system's certificates; empty: the system's.
     std::string clientKey;   ///< PEM files to identify ourselves with; empty: not at all.
     std::string clientCertificate;
+    VariableNames variables;
 };
 
 /// What is sent. Each has variables of its own, which win over the common ones, and a path of its own.
@@ -35,6 +44,9 @@ enum class Signal { Logs, Metrics };
 using LookUp = std::function<const char*(const char*)>;
 std::optional<EndpointConfig> ReadEndpoint(const LookUp& lookUp, std::vector<std::string>& complaints,
                                            Signal signal = Signal::Logs);
+
+/// What switches sending off, such as "OTEL_SDK_DISABLED=true"; empty when nothing does.
+std::string DisabledBy(const LookUp& lookUp, Signal signal = Signal::Logs);
 
 /// The URL as people may see it: without user, password, query and fragment, which may be secrets.
 std::string WithoutSecrets(const std::string& url);

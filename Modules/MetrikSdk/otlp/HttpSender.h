@@ -26,6 +26,7 @@ public:
     void Abandon() override { m_abandoned = true; }
     std::string Destination() const override { return WithoutSecrets(m_config.url); }
     std::vector<std::string> HeaderNames() const override;
+    VariableNames Variables() const override { return m_config.variables; }
 
     /// Ends every request of the process, and lets no new one begin. Waits until no request is running, but
     /// at most `patience`. exit() needs this before the TLS library destroys its state, which must not be in

@@ -3,6 +3,7 @@
 #include <string>
 #include <vector>
 
+#include "Modules/MetrikSdk/otlp/EndpointConfig.h"
 #include "Modules/MetrikSdk/otlp/HttpResult.h"
 
 namespace MetrikSdk::otlp {
@@ -24,6 +25,9 @@ public:
 
     /// The names of the configured headers, for people.
     virtual std::vector<std::string> HeaderNames() const = 0;
+
+    /// The variables that configured this sender, for people.
+    virtual VariableNames Variables() const { return {}; }
 };
 
 } // namespace MetrikSdk::otlp

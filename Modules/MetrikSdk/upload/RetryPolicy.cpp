@@ -49,13 +49,13 @@ bool IsConfigurationsFault(long status) {
     return std::find(STATUSES.begin(), STATUSES.end(), status) != STATUSES.end();
 }
 
-std::string Credentials(const std::vector<std::string>& headers) {
+std::string Credentials(const std::vector<std::string>& headers, const std::string& variable) {
     if (headers.empty())
-        return "look at the credentials: OTEL_EXPORTER_OTLP_HEADERS names no header";
+        return "look at the credentials: " + variable + " names no header";
     std::string names;
     for (const auto& name : headers)
         names += (names.empty() ? "" : ", ") + name;
-    return "look at the credentials: OTEL_EXPORTER_OTLP_HEADERS sets " + names;
+    return "look at the credentials: " + variable + " sets " + names;
 }
 
 std::string OneLine(const std::string& text) {
@@ -137,7 +137,8 @@ std::string Describe(const otlp::HttpResult& result) {
     return text.empty() ? status : status + ": " + text;
 }
 
-std::string LookAt(const otlp::HttpResult& result, const std::vector<std::string>& headers) {
+std::string LookAt(const otlp::HttpResult& result, const std::vector<std::string>& headers,
+                   const otlp::VariableNames& variables) {
     if (result.status == 407 || result.proxyStatus == 407)
         return "look at the proxy and its credentials: https_proxy, http_proxy";
     if (!result.fault.empty())
@@ -145,11 +146,11 @@ std::string LookAt(const otlp::HttpResult& result, const std::vector<std::string
     if (result.status == 511 || (IsSuccess(result.status) && IsWebPage(result)))
         return "this is a page: the network may want a log-in, or the address be no collector's";
     if (result.status == 401 || result.status == 403)
-        return Credentials(headers);
+        return Credentials(headers, variables.headers);
     if (result.status == 415)
-        return "look at OTEL_EXPORTER_OTLP_COMPRESSION: the collector may not unpack, or take no JSON";
+        return "look at " + variables.compression + ": the collector may not unpack, or take no JSON";
     if (result.status == 404 || result.status == 405 || (result.status >= 300 && result.status < 400))
-        return "look at the address: OTEL_EXPORTER_OTLP_ENDPOINT";
+        return "look at the address: " + variables.endpoint;
     return {};
 }
 

@@ -6,6 +6,7 @@
 
 #include "Modules/MetrikSdk/Settings.h"
 #include "Modules/MetrikSdk/Time.h"
+#include "Modules/MetrikSdk/otlp/EndpointConfig.h"
 #include "Modules/MetrikSdk/otlp/HttpResult.h"
 
 namespace MetrikSdk::upload {
@@ -54,8 +55,9 @@ std::string Describe(const otlp::HttpResult& result);
 
 /// What a person should look at when the answer points to a wrong configuration rather than to wrong events;
 /// otherwise empty. `headers` are the names of the configured headers, because the credentials are in one of
-/// them.
-std::string LookAt(const otlp::HttpResult& result, const std::vector<std::string>& headers);
+/// them. `variables` are those that configured the sender.
+std::string LookAt(const otlp::HttpResult& result, const std::vector<std::string>& headers,
+                   const otlp::VariableNames& variables = {});
 
 } // namespace RetryPolicy
 } // namespace MetrikSdk::upload

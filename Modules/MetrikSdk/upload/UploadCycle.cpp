@@ -127,7 +127,7 @@ void UploadCycle::Note(const std::string& failure) {
 }
 
 std::string UploadCycle::Describe(const otlp::HttpResult& result) const {
-    const auto lookAt = RetryPolicy::LookAt(result, m_sender.HeaderNames());
+    const auto lookAt = RetryPolicy::LookAt(result, m_sender.HeaderNames(), m_sender.Variables());
     return RetryPolicy::Describe(result) + (lookAt.empty() ? "" : "; " + lookAt);
 }
 

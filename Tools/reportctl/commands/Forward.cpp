@@ -60,6 +60,8 @@ std::string Rows(std::int64_t count) {
 
 /// What is asked for and has nowhere to go; empty when all is well.
 std::string MissingIn(const Collector& collector, const ForwardOptions& options) {
+    if (!collector.disabledBy.empty())
+        return "sending is switched off by " + collector.disabledBy;
     if (!collector.logs)
         return "no collector is configured: set OTEL_EXPORTER_OTLP_ENDPOINT";
     if (options.withMetrics && !collector.metrics)

@@ -35,6 +35,7 @@ Collector CollectorOf(const service::Environment& environment) {
     Collector collector;
     collector.logs = MetrikSdk::otlp::ReadEndpoint(lookUp, collector.complaints, Signal::Logs);
     collector.metrics = MetrikSdk::otlp::ReadEndpoint(lookUp, collector.complaints, Signal::Metrics);
+    collector.disabledBy = MetrikSdk::otlp::DisabledBy(lookUp, Signal::Logs);
     collector.resource = MetrikSdk::otlp::ReadResource(lookUp, collector.complaints);
     RemoveRepetitions(collector.complaints);
     return collector;

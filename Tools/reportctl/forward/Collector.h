@@ -14,6 +14,7 @@ namespace reportctl::forward {
 struct Collector {
     std::optional<MetrikSdk::otlp::EndpointConfig> logs;
     std::optional<MetrikSdk::otlp::EndpointConfig> metrics;
+    std::string disabledBy; ///< What switches the sending of rows off; empty: nothing.
     MetrikSdk::otlp::ResourceConfig resource;
     std::vector<std::string> complaints; ///< About variables that make no sense; each once.
 };

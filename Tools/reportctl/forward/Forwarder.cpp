@@ -153,7 +153,7 @@ void Forwarder::TellWhatTheQueueFound() {
 }
 
 std::string Forwarder::Describe(const HttpResult& result) const {
-    const auto lookAt = upload::RetryPolicy::LookAt(result, m_sender.HeaderNames());
+    const auto lookAt = upload::RetryPolicy::LookAt(result, m_sender.HeaderNames(), m_sender.Variables());
     return upload::RetryPolicy::Describe(result) + (lookAt.empty() ? "" : "; " + lookAt);
 }
 

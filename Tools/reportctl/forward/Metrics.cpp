@@ -63,13 +63,17 @@ std::string MetricsBodyOf(const status::Status& status, const status::Judgement&
         resource);
 }
 
-MetricsOutcome SendMetrics(MetrikSdk::otlp::Sender& sender, const std::string& body) {
+MetricsOutcome SendMetrics(MetrikSdk::otlp::Sender& sender, const std::string& body, double random,
+                           WallTime now) {
     const auto result = sender.Post(body);
+    const auto wished = RetryPolicy::WishedWait(result, random, now, MetrikSdk::RetrySettings());
     if (RetryPolicy::Judge(result) == MetrikSdk::upload::Verdict::Delete)
-        return {true, RemarkIn(result.body)};
-    const auto lookAt = RetryPolicy::LookAt(result, sender.HeaderNames());
-    return {false, sender.Destination() + ": " + RetryPolicy::Describe(result) +
-                       (lookAt.empty() ? "" : "; " + lookAt)};
+        return {true, RemarkIn(result.body), wished};
+    const auto lookAt = RetryPolicy::LookAt(result, sender.HeaderNames(), sender.Variables());
+    return {false,
+            sender.Destination() + ": " + RetryPolicy::Describe(result) +
+                (lookAt.empty() ? "" : "; " + lookAt),
+            wished};
 }
 
 } // namespace reportctl::forward

@@ -1,7 +1,9 @@
 #pragma once
 
+#include <chrono>
 #include <string>
 
+#include "Modules/MetrikSdk/Time.h"
 #include "Modules/MetrikSdk/otlp/ResourceConfig.h"
 #include "Modules/MetrikSdk/otlp/Sender.h"
 #include "Tools/reportctl/status/Status.h"
@@ -17,10 +19,13 @@ std::string MetricsBodyOf(const status::Status& status, const status::Judgement&
 
 struct MetricsOutcome {
     bool isTaken = false;
-    std::string remark; ///< Why not; or what the collector says all the same.
+    std::string remark;                      ///< Why not; or what the collector says all the same.
+    std::chrono::milliseconds wishedWait{0}; ///< The collector wants no figures before.
 };
 
-/// Sends one body. It is not repeated: the next body says everything that this one said.
-MetricsOutcome SendMetrics(MetrikSdk::otlp::Sender& sender, const std::string& body);
+/// Sends one body. It is not repeated: the next body says everything that this one said. `random` is uniform
+/// in [0, 1).
+MetricsOutcome SendMetrics(MetrikSdk::otlp::Sender& sender, const std::string& body, double random,
+                           MetrikSdk::WallTime now);
 
 } // namespace reportctl::forward

@@ -1,12 +1,13 @@
 #include "Tools/reportctl/forward/Run.h"
 
+#include <algorithm>
 #include <memory>
-#include <optional>
 #include <random>
 
 #include "Modules/MetrikSdk/otlp/HttpSender.h"
 #include "Tools/reportctl/forward/EndOfRun.h"
 #include "Tools/reportctl/forward/Metrics.h"
+#include "Tools/reportctl/forward/Schedule.h"
 #include "Tools/reportctl/forward/StopSignals.h"
 #include "Tools/reportctl/status/Status.h"
 #include "Tools/reportctl/store/Store.h"
@@ -28,23 +29,23 @@ std::function<double()> Chance() {
     };
 }
 
-/// Sends the figures from time to time.
+/// Sends the figures.
 class MetricsExport {
 public:
     MetricsExport(HttpSender& sender, const State& state, const Collector& collector, Teller& teller)
         : m_sender(sender), m_state(state), m_collector(collector), m_teller(teller) {}
 
-    void SendWhenDue() {
-        if (m_next && Clock::now() < *m_next)
-            return;
-        m_next = Clock::now() + BETWEEN_METRICS;
+    /// Returns how long to wait before the next ones.
+    std::chrono::milliseconds Send() {
         const auto status = status::Gather();
-        const auto outcome =
-            SendMetrics(m_sender, MetricsBodyOf(status, status::Judge(status), m_state.Where().installation,
-                                                m_collector.resource));
+        const auto outcome = SendMetrics(
+            m_sender,
+            MetricsBodyOf(status, status::Judge(status), m_state.Where().installation, m_collector.resource),
+            m_random(), WallNow());
         m_failure = outcome.isTaken ? "" : outcome.remark;
         if (!outcome.remark.empty())
             m_teller.Note(outcome.isTaken ? outcome.remark : "the figures were not taken: " + outcome.remark);
+        return std::max<std::chrono::milliseconds>(BETWEEN_METRICS, outcome.wishedWait);
     }
 
     /// Why the last ones were not taken; empty when they were.
@@ -55,7 +56,7 @@ private:
     const State& m_state;
     const Collector& m_collector;
     Teller& m_teller;
-    std::optional<Clock::time_point> m_next;
+    std::function<double()> m_random = Chance();
     std::string m_failure;
 };
 
@@ -92,11 +93,6 @@ private:
             m_metricsSender->Abandon();
     }
 
-    void SendMetricsWhenDue() {
-        if (m_metrics)
-            m_metrics->SendWhenDue();
-    }
-
     void GoOnce(StopSignals& stop, Result& result) {
         EndOfRun end(WallNow());
         for (;;) {
@@ -110,7 +106,8 @@ private:
             }
         }
         m_forwarder.EndRun();
-        SendMetricsWhenDue(); // now it is known whether the collector is there
+        if (m_metrics) // now it is known whether the collector is there
+            m_metrics->Send();
         if (end.HasFailed()) {
             result.isComplete = false;
             result.failure = m_forwarder.LastFailure();
@@ -118,9 +115,17 @@ private:
     }
 
     void GoOn(StopSignals& stop) {
-        do
-            SendMetricsWhenDue();
-        while (stop.Wait(m_forwarder.Pass(WallNow()).pause));
+        Schedule schedule(m_metrics != nullptr);
+        do {
+            if (schedule.FiguresAreDue(Clock::now())) {
+                const auto pause = m_metrics->Send();
+                schedule.FiguresWait(Clock::now(), pause);
+            }
+            if (schedule.RowsAreDue(Clock::now())) {
+                const auto pause = m_forwarder.Pass(WallNow()).pause;
+                schedule.RowsWait(Clock::now(), pause);
+            }
+        } while (stop.Wait(schedule.UntilDue(Clock::now())));
     }
 
     const Task& m_task;

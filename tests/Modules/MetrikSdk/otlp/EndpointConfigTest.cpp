@@ -133,6 +133,20 @@ TEST_F(TheEndpointConfig, NamesAHeaderWhoseNameIsWrongUnlessThatMayBeASecret) {
                   "OTEL_EXPORTER_OTLP_HEADERS: header 1 has no name and '=' and is not sent");
 }
 
+TEST_F(TheEndpointConfig, KnowsTheVariablesThatItCameFrom) {
+    const auto config = Read({{"OTEL_EXPORTER_OTLP_ENDPOINT", "http://c"},
+                              {"OTEL_EXPORTER_OTLP_LOGS_ENDPOINT", "nonsense"},
+                              {"OTEL_EXPORTER_OTLP_LOGS_HEADERS", "a=1"},
+                              {"OTEL_EXPORTER_OTLP_LOGS_COMPRESSION", "none"}});
+    EXPECT_EQ(config->variables.endpoint, "OTEL_EXPORTER_OTLP_ENDPOINT");
+    EXPECT_EQ(config->variables.headers, "OTEL_EXPORTER_OTLP_LOGS_HEADERS");
+    EXPECT_EQ(config->variables.compression, "OTEL_EXPORTER_OTLP_LOGS_COMPRESSION");
+    const auto metrics = Read({{"OTEL_EXPORTER_OTLP_METRICS_ENDPOINT", "http://m"}}, otlp::Signal::Metrics);
+    EXPECT_EQ(metrics->variables.endpoint, "OTEL_EXPORTER_OTLP_METRICS_ENDPOINT");
+    EXPECT_EQ(metrics->variables.headers, "OTEL_EXPORTER_OTLP_HEADERS");
+    EXPECT_EQ(metrics->variables.compression, "OTEL_EXPORTER_OTLP_COMPRESSION");
+}
+
 TEST_F(TheEndpointConfig, ReadsWordsInAnyLetterCase) {
     const auto config = Read({{"OTEL_EXPORTER_OTLP_ENDPOINT", "http://c"},
                               {"OTEL_EXPORTER_OTLP_LOGS_COMPRESSION", "NONE"},

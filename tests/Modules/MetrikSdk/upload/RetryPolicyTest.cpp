@@ -44,6 +44,16 @@ TEST(RetryPolicy, BlamesNoEventForAWrongConfigurationAndSaysWhatToLookAt) {
         EXPECT_EQ(lookAt(status), "") << status;
 }
 
+TEST(RetryPolicy, NamesTheVariablesThatAreUsed) {
+    const otlp::VariableNames names{"A_ENDPOINT", "A_HEADERS", "A_COMPRESSION"};
+    const auto lookAt = [&](long status) {
+        return upload::RetryPolicy::LookAt(Answer(status), {"api-key"}, names);
+    };
+    EXPECT_EQ(lookAt(401), "look at the credentials: A_HEADERS sets api-key");
+    EXPECT_EQ(lookAt(404), "look at the address: A_ENDPOINT");
+    EXPECT_EQ(lookAt(415), "look at A_COMPRESSION: the collector may not unpack, or take no JSON");
+}
+
 TEST(RetryPolicy, LearnsALengthFromAnAnswerThatSaysTooLarge) {
     EXPECT_EQ(Judge(Answer(413)), upload::Verdict::HalveForSize);
 }

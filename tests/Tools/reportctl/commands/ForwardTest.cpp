@@ -250,6 +250,17 @@ TEST_F(ForwardCommand, NeedsACollector) {
                               "error: no collector is configured: set OTEL_EXPORTER_OTLP_ENDPOINT\n");
 }
 
+TEST_F(ForwardCommand, SaysWhatSwitchesItOff) {
+    InsertMany(1);
+    const LoopbackServer collector(Take);
+    for (const std::string variable : {"OTEL_SDK_DISABLED=true", "OTEL_LOGS_EXPORTER=none"}) {
+        const auto outcome = Forward("--once", collector, variable);
+        EXPECT_EQ(outcome.exitCode, 1);
+        EXPECT_EQ(outcome.output, "error: sending is switched off by " + variable + "; nothing was sent\n");
+    }
+    EXPECT_EQ(collector.RequestCount(), 0U);
+}
+
 TEST_F(ForwardCommand, SendsTheFiguresToTheirOwnEndpoint) {
     InsertMany(1);
     const LoopbackServer collector(Take);

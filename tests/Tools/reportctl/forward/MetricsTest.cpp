@@ -80,7 +80,7 @@ TEST_F(ForwardMetrics, HaveTheNamesOfThePrometheusFormat) {
 TEST_F(ForwardMetrics, SayWhatTheCollectorSays) {
     const auto answered = [&](const MetrikSdk::otlp::HttpResult& result) {
         m_sender.answer = [result](const auto&) { return result; };
-        return SendMetrics(m_sender, R"({"resourceLogs":[{"scopeLogs":[{"logRecords":[]}]}]})");
+        return SendMetrics(m_sender, R"({"resourceLogs":[{"scopeLogs":[{"logRecords":[]}]}]})", 0.5, m_now);
     };
     EXPECT_TRUE(answered(Status(200)).isTaken);
     EXPECT_EQ(answered(Status(200)).remark, "");
@@ -91,6 +91,12 @@ TEST_F(ForwardMetrics, SayWhatTheCollectorSays) {
               "the collector took the figures and says: slow");
     EXPECT_FALSE(answered(Status(401)).isTaken);
     EXPECT_THAT(answered(Status(401)).remark, HasSubstr("sets api-key"));
+    for (const long status : {200, 429}) {
+        auto answer = Status(status);
+        EXPECT_EQ(answered(answer).wishedWait, std::chrono::seconds(0));
+        answer.retryAfter = "300";
+        EXPECT_EQ(answered(answer).wishedWait, std::chrono::seconds(450)) << "half as long again by chance";
+    }
 }
 
 } // namespace
