@@ -119,7 +119,8 @@ void AddRules(CLI::App& app, MetrikSdk::OutboxSettings& settings) {
 
 /// --help names no type of the program's language.
 void NameValues(CLI::App& app) {
-    for (auto* option : app.get_options([](const CLI::Option* each) { return each->get_items_expected_max() > 0; }))
+    for (auto* option :
+         app.get_options([](const CLI::Option* each) { return each->get_items_expected_max() > 0; }))
         option->type_name("NUMBER");
     app.get_option("--away")->type_name("WORD");
 }

@@ -74,8 +74,8 @@ bool IsHeaderValue(const std::string& value) {
 }
 
 /// The name of a header that is no token, as people may see it; empty when it may be a part of a secret. The
-/// '=' may be the end of a secret in base64. A text with a colon may be a whole header, of which only the name
-/// is shown.
+/// '=' may be the end of a secret in base64. A text with a colon may be a whole header, of which only the
+/// name is shown.
 std::string ShownName(const std::string& name, const std::string& value) {
     if (value.find_first_not_of('=') == std::string::npos)
         return {};

@@ -6,8 +6,8 @@
 
 namespace MetrikSdk::otlp {
 
-/// Keeps secrets out of texts for people. A collector may repeat the credentials that it refuses, and the HTTP
-/// library repeats a proxy's address that it does not understand. Threads: any. Pure.
+/// Keeps secrets out of texts for people. A collector may repeat the credentials that it refuses, and the
+/// HTTP library repeats a proxy's address that it does not understand. Threads: any. Pure.
 class Secrets {
 public:
     /// The values of these headers are secrets, and what follows "Bearer " or "Basic " in them, too.
