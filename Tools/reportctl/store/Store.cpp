@@ -226,12 +226,12 @@ SQLite::Database OpenStore(const std::string& path) {
 
 SQLite::Database OpenStoreToLook(const std::string& path) {
     RequireStore(path);
-    const auto log = path + "-wal";
-    const bool hasRows = fs::exists(log) && fs::file_size(log) > 0;
+    const bool isInUse = fs::exists(path + "-wal");
     auto database = OpenStore(path);
-    // When the log has no rows, SQLite removes the side files at the end. That is right: this opening made
-    // them.
-    if (hasRows)
+    database.exec("pragma query_only = on");
+    // A log that is there is the service's, also when it is still empty. When there is none, this opening
+    // makes the side files, and SQLite removes them at the end.
+    if (isInUse)
         sqlite3_db_config(database.getHandle(), SQLITE_DBCONFIG_NO_CKPT_ON_CLOSE, 1, nullptr);
     return database;
 }

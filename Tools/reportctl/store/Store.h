@@ -45,9 +45,9 @@ auto Naming(const std::string& path, const Work& work) {
 /// SQLite::Exception.
 SQLite::Database OpenStore(const std::string& path);
 
-/// Opens the database as OpenStore does, but for reading: rows that a killed service left in the write-ahead
-/// log stay there when the database is closed. Otherwise the last process that closes the store merges them
-/// into Report.db, and that would be a change.
+/// Opens the database as OpenStore does, but for reading: statements that would change it fail. A write-ahead
+/// log that is there stays as it is when the database is closed, also when the service ends before. Otherwise
+/// the last process that closes the store merges the rows into Report.db, and that would be a change.
 SQLite::Database OpenStoreToLook(const std::string& path);
 
 /// Opens the database for commands that look at it for a moment, as OpenUnchanged does. Where that cannot
