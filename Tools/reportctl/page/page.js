@@ -58,6 +58,30 @@ function table(caption, headings, rows) {
     return made;
 }
 
+/** Makes a table of a few facts: each row has a name, which is its header, and what there is to say. */
+function facts(caption, rows) {
+    const made = element("table");
+    made.append(element("caption", caption), element("tbody"));
+    for (const [name, fact] of rows) {
+        const line = element("tr");
+        const head = element("th", name);
+        head.scope = "row";
+        line.append(head, element("td", orDash(fact)));
+        made.tBodies[0].append(line);
+    }
+    return made;
+}
+
+// The sections whose numbers are open are kept in the address, so that they are open again after a reload. A
+// page from a disk may store nothing.
+const OPEN = "#open=";
+const opened = location.hash.startsWith(OPEN) ? location.hash.slice(OPEN.length).split(",") : [];
+
+function keepOpened() {
+    const ids = [...document.querySelectorAll("details[open]")].map((details) => details.closest("section").id);
+    location.replace(OPEN + ids.join(","));
+}
+
 /** Adds the numbers of a chart as a table, for readers who cannot see the chart or want the exact numbers. */
 function numbers(section, caption, headings, rows) {
     const details = element("details");
@@ -65,6 +89,8 @@ function numbers(section, caption, headings, rows) {
     const scroll = element("div", undefined, "scroll");
     scroll.append(table(caption, headings, rows));
     details.append(scroll);
+    details.open = opened.includes(section);
+    details.addEventListener("toggle", keepOpened);
     byId(section).append(details);
 }
 
@@ -107,7 +133,7 @@ function showVerdict() {
     if (status.reasons.length === 0)
         reasons.append(element("li", "Nothing to do."));
     const service = status.service;
-    byId("service").append(table("What it says of itself", ["", ""], [
+    byId("service").append(facts("What it says of itself", [
         ["running", service.running ? `yes, process ${service.pid}` : "no"],
         ["since", time(service.startedAt)],
         ["version", orDash(service.version)],
@@ -186,13 +212,26 @@ function collect(quarterHours, keyOf) {
     return [...sums.entries()];
 }
 
+/** The name of an hour. When summer time ends, two hours have one name; they are told apart by `offset`. */
+const hourName = (date) => `${date.toLocaleDateString()} ${String(date.getHours()).padStart(2, "0")}:00`;
+const offset = (date) => new Intl.DateTimeFormat("en", { timeZoneName: "shortOffset" })
+    .formatToParts(date).find((part) => part.type === "timeZoneName").value;
+
+/** Gives hours their names in place of the times at which they begin. */
+function named(hours) {
+    const names = hours.map(([at]) => hourName(new Date(at)));
+    const isTwice = (name) => names.indexOf(name) !== names.lastIndexOf(name);
+    return hours.map(([at, count], place) =>
+        [isTwice(names[place]) ? `${names[place]} ${offset(new Date(at))}` : names[place], count]);
+}
+
 function showTimes() {
     const day = (date) => date.toLocaleDateString();
-    const hour = (date) => `${date.toLocaleDateString()} ${String(date.getHours()).padStart(2, "0")}:00`;
+    const hour = (date) => date.getTime() - date.getMinutes() * 60 * 1000;
     const days = collect(data.quarterHours, day);
     const since = data.generatedAt - 48 * 3600 * 1000;
     const recent = data.quarterHours.filter(([quarterHour]) => quarterHour * QUARTER_HOUR_MS >= since);
-    const hours = collect(recent, hour);
+    const hours = named(collect(recent, hour));
     const scales = { scales: { y: WHOLE_NUMBERS }, plugins: { legend: { display: false } } };
     chart("hours", "bar", hours.map((entry) => entry[0]),
         [bars("reports", hours.map((entry) => entry[1]))], scales);
@@ -242,7 +281,7 @@ function showOutbox() {
     chart("outbox", "bar", modules.map((module) => short(module.id)),
         [bars("waiting", modules.map((module) => module.waiting))],
         { indexAxis: "y", scales: { x: WHOLE_NUMBERS }, plugins: { legend: { display: false } } });
-    byId("outbox").append(table("The outbox as a whole", ["", ""], [
+    byId("outbox").append(facts("The outbox as a whole", [
         ["collector", outbox.endpoint === null ? "none configured: events stay here" : outbox.endpoint],
         ["waiting", outbox.waiting], ["waiting, size", outbox.present ? size(outbox.waitingBytes) : "–"],
         ["delivered", outbox.delivered], ["refused by the collector", outbox.refused],

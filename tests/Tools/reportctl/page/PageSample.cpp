@@ -1,4 +1,4 @@
-// page_sample FILE [RELOAD-SECONDS]: writes a page with known numbers and hostile texts. A test opens the
+// page_sample FILE [RELOAD-SECONDS [AT-MS]]: writes a page with known numbers and hostile texts. A test opens the
 // page in a browser.
 
 #include <cstdlib>
@@ -37,9 +37,11 @@ constexpr auto STATUS =
                    "text": "<b>bold</b> & <!-- "}]},
  "disk": {"freeBytes": 104857600}})json";
 
-PageData Sample(int reloadSeconds) {
+constexpr std::int64_t AT_MS = 1'795'270'000'000; // not a full hour
+
+PageData Sample(int reloadSeconds, std::int64_t atMs) {
     PageData data;
-    data.generatedAtMs = 1'795'270'000'000; // not a full hour
+    data.generatedAtMs = atMs;
     data.reloadSeconds = reloadSeconds;
     data.statusJson = STATUS;
     const auto now = data.generatedAtMs / 900'000;
@@ -55,6 +57,7 @@ PageData Sample(int reloadSeconds) {
 
 int main(int argc, char** argv) {
     std::ofstream file(argv[1]);
-    file << ComposePage(Sample(argc > 2 ? std::atoi(argv[2]) : 0), reportctl::page::RandomNonce());
+    const auto sample = Sample(argc > 2 ? std::atoi(argv[2]) : 0, argc > 3 ? std::atoll(argv[3]) : AT_MS);
+    file << ComposePage(sample, reportctl::page::RandomNonce());
     return file.good() ? 0 : 1;
 }

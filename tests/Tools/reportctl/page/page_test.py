@@ -94,6 +94,13 @@ class Page(unittest.TestCase):
         self.assertNotEqual(self.rows("hours")[0][0], berlin)
         self.browser.zone("Europe/Berlin")
 
+    def test_keeps_the_two_hours_apart_that_have_one_name_when_summer_time_ends(self):
+        path = os.path.join(self.directory.name, "autumn.html")
+        subprocess.run([SAMPLE, path, "0", "1792892100000"], check=True)  # 2026-10-25, 02:35 in winter time
+        self.browser.open(path)
+        self.assertEqual(self.rows("hours"), [["10/25/2026 02:00 GMT+2", "20"],
+                                              ["10/25/2026 02:00 GMT+1", "7"]])
+
     def test_draws_each_chart(self):
         page = self.open()
         self.assertEqual(page.value("charts.length"), 7)
@@ -116,6 +123,10 @@ class Page(unittest.TestCase):
         self.assertEqual(page.value("document.documentElement.lang"), "en")
         self.assertTrue(page.value("[...document.querySelectorAll('canvas')]"
                                    ".every(canvas => canvas.getAttribute('aria-label'))"))
+        self.assertEqual(page.value("[...document.querySelectorAll('th')]"
+                                    ".filter(head => !head.textContent || !head.scope).length"), 0)
+        self.assertEqual(page.value("document.querySelector('#service th[scope=row]').textContent"),
+                         "running")
         self.assertTrue(page.value("[...document.querySelectorAll('section')].every(section =>"
                                    " document.getElementById(section.getAttribute('aria-labelledby')))"))
         page.command("Input.dispatchKeyEvent",
@@ -130,9 +141,14 @@ class Page(unittest.TestCase):
         subprocess.run([SAMPLE, path, "1"], check=True)
         self.browser.open(path)
         self.browser.value("window.isOld = true")
+        self.browser.value("document.querySelectorAll('#days summary, #outbox summary')"
+                           ".forEach(summary => summary.click())")
         self.browser.wait("document.documentElement?.dataset.ready === 'yes' && !window.isOld")
         self.browser.value("document.getElementById('pause').click()")
         self.assertEqual(self.text("#pause"), "Go on reloading")
+        self.assertEqual(self.browser.value("[...document.querySelectorAll('details[open]')]"
+                                            ".map(details => details.closest('section').id)"),
+                         ["days", "outbox"])
 
 
 if __name__ == "__main__":
