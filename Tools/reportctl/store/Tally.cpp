@@ -59,7 +59,7 @@ Key TimeKey(std::int64_t quarterHour, Grouping grouping, Zone zone) {
     if (grouping == Grouping::Day)
         return {0, fmt::format("{:%Y-%m-%d}", wall)};
     const auto offset = wall.tm_gmtoff / 60;
-    return {time - wall.tm_min * 60 - wall.tm_sec,
+    return {time - std::int64_t{wall.tm_min} * 60 - wall.tm_sec,
             fmt::format("{:%Y-%m-%dT%H}:00{}{:02}:{:02}", wall, offset < 0 ? '-' : '+', std::abs(offset) / 60,
                         std::abs(offset) % 60)};
 }
@@ -119,6 +119,7 @@ std::vector<Count> Ranked(const Tally& tally, Grouping grouping, std::size_t top
     std::stable_partition(ranked.begin(), ranked.end(),
                           [](const auto& count) { return count.first.text.has_value(); });
     std::vector<Count> counts;
+    counts.reserve(ranked.size());
     for (const auto& [key, count] : ranked)
         counts.push_back({key.text, count});
     return counts;

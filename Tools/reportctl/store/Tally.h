@@ -1,10 +1,10 @@
 #pragma once
 
-#include <compare>
 #include <cstdint>
 #include <map>
 #include <optional>
 #include <string>
+#include <tuple>
 #include <vector>
 
 #include <SQLiteCpp/Database.h>
@@ -23,7 +23,7 @@ struct Key {
     std::int64_t hour = 0;
     std::optional<std::string> text;
 
-    auto operator<=>(const Key&) const = default;
+    bool operator<(const Key& other) const { return std::tie(hour, text) < std::tie(other.hour, other.text); }
 };
 
 /// Counts by key.
