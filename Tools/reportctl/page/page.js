@@ -78,8 +78,8 @@ const OPEN = "#open=";
 const opened = location.hash.startsWith(OPEN) ? location.hash.slice(OPEN.length).split(",") : [];
 
 function keepOpened() {
-    const ids = [...document.querySelectorAll("details[open]")].map((details) => details.closest("section").id);
-    location.replace(OPEN + ids.join(","));
+    const sections = [...document.querySelectorAll("section:has(details[open])")];
+    location.replace(OPEN + sections.map((section) => section.id).join(","));
 }
 
 /** Adds the numbers of a chart as a table, for readers who cannot see the chart or want the exact numbers. */

@@ -1,5 +1,5 @@
-// page_sample FILE [RELOAD-SECONDS [AT-MS]]: writes a page with known numbers and hostile texts. A test opens the
-// page in a browser.
+// page_sample FILE [RELOAD-SECONDS [AT-MS]]: writes a page with known numbers and hostile texts. A test
+// opens the page in a browser.
 
 #include <cstdlib>
 #include <fstream>
