@@ -104,8 +104,15 @@ Told TellSuccess(const HttpResult& result) {
     return {true, message.empty() ? "taken" : "taken, with a warning: " + message};
 }
 
+std::vector<std::string> HeaderNames(const EndpointConfig& config) {
+    std::vector<std::string> names;
+    for (const auto& [name, value] : config.headers)
+        names.push_back(name);
+    return names;
+}
+
 /// Judges by the uploader's own rules, because the test is to say what would become of the user's events.
-Told Tell(const HttpResult& result, const std::vector<std::string>& headers) {
+Told Tell(const HttpResult& result, const EndpointConfig& config) {
     using MetrikSdk::upload::Verdict;
     switch (RetryPolicy::Judge(result)) {
     case Verdict::Delete:
@@ -114,16 +121,9 @@ Told Tell(const HttpResult& result, const std::vector<std::string>& headers) {
     case Verdict::HalveForSize:
         return {false, "refused: events would become dead letters"};
     default:
-        const auto advice = RetryPolicy::LookAt(result, headers);
+        const auto advice = RetryPolicy::LookAt(result, HeaderNames(config), config.variables);
         return {false, "not taken: events would wait in the outbox" + (advice.empty() ? "" : "; " + advice)};
     }
-}
-
-std::vector<std::string> HeaderNames(const EndpointConfig& config) {
-    std::vector<std::string> names;
-    for (const auto& [name, value] : config.headers)
-        names.push_back(name);
-    return names;
 }
 
 bool TellAnswer(const EndpointConfig& config, const HttpResult& result) {
@@ -136,7 +136,7 @@ bool TellAnswer(const EndpointConfig& config, const HttpResult& result) {
     }
     fmt::print("TLS: {}\n",
                isTls ? "the collector's certificate is trusted" : "none, the address begins with http:");
-    const auto told = Tell(result, HeaderNames(config));
+    const auto told = Tell(result, config);
     fmt::print("status: {}, {}\n", result.status, told.words);
     if (!result.body.empty())
         fmt::print("body: {}\n", Beginning(result.body));

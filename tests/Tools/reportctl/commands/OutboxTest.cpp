@@ -137,9 +137,9 @@ TEST_F(OutboxCommand, JudgesTheAnswerAsTheUploaderDoes) {
     LoopbackServer collector([&](const Request&) { return reply; });
     const auto said = [&](int status, const std::string& body = {}, const std::string& headers = {}) {
         reply = {.status = status, .body = body, .headers = headers};
-        const auto outcome =
-            Reportctl("outbox test",
-                      "OTEL_EXPORTER_OTLP_HEADERS=key=secret OTEL_EXPORTER_OTLP_ENDPOINT=" + collector.Url());
+        const auto outcome = Reportctl(
+            "outbox test",
+            "OTEL_EXPORTER_OTLP_LOGS_HEADERS=key=secret OTEL_EXPORTER_OTLP_ENDPOINT=" + collector.Url());
         const auto begin = outcome.output.find("status: ");
         return std::to_string(outcome.exitCode) + " " +
                outcome.output.substr(begin, outcome.output.find('\n', begin) - begin);
@@ -154,8 +154,8 @@ TEST_F(OutboxCommand, JudgesTheAnswerAsTheUploaderDoes) {
     EXPECT_EQ(said(415), "1 status: 415" + waits +
                              "; look at OTEL_EXPORTER_OTLP_COMPRESSION: the collector "
                              "may not unpack, or take no JSON");
-    EXPECT_EQ(said(403),
-              "1 status: 403" + waits + "; look at the credentials: OTEL_EXPORTER_OTLP_HEADERS sets key");
+    EXPECT_EQ(said(403), "1 status: 403" + waits +
+                             "; look at the credentials: OTEL_EXPORTER_OTLP_LOGS_HEADERS sets key");
     EXPECT_EQ(said(503), "1 status: 503" + waits);
     EXPECT_EQ(said(400), "1 status: 400, refused: events would become dead letters");
     EXPECT_EQ(said(413), "1 status: 413, refused: events would become dead letters");
