@@ -53,6 +53,7 @@ TEST_F(Status, OfAServiceThatWorksIsHealthyAndHasItsFigures) {
     EXPECT_EQ(At(json, "service.listening"), "true");
     EXPECT_EQ(At(json, "service.portHolder.pid"), std::to_string(m_service.Process()));
     EXPECT_EQ(At(json, "service.portHolder.name"), R"("SyncServiceReport")");
+    EXPECT_EQ(At(json, "service.lockHolder"), At(json, "service.portHolder"));
     EXPECT_THAT(At(json, "service.startedAt"), ContainsRegex(R"(^"....-..-..T..:..:..\....Z"$)"));
     EXPECT_EQ(At(json, "service.plugins"), R"({"logger":true,"store":true,"sdk":true})");
     EXPECT_EQ(At(json, "ledger.balanced"), "true");
@@ -178,7 +179,8 @@ TEST_F(Status, IsDownForAUserWhenAnotherUsersServiceRuns) {
                         .c_str());
     EXPECT_EQ(WEXITSTATUS(code), 2);
     const auto text = ContentOf(output);
-    EXPECT_THAT(text, HasSubstr("The service of user root runs on this machine"));
+    EXPECT_THAT(text, HasSubstr("The service of user root runs on this machine (process " +
+                                std::to_string(m_service.Process()) + ")"));
     EXPECT_THAT(text, HasSubstr(R"("user": "root")"));
 }
 

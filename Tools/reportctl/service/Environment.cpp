@@ -7,6 +7,7 @@
 
 #include <unistd.h>
 
+#include "Tools/reportctl/service/Lock.h"
 #include "Tools/reportctl/service/Processes.h"
 
 namespace reportctl::service {
@@ -67,7 +68,7 @@ void TakeOverProxies(const Environment& environment) {
 
 Environment OfTheService() {
     auto own = OwnVariables();
-    if (const auto process = LockHolder(); process && OwnerOf(*process) == ::geteuid())
+    if (const auto process = LockedService(); process && OwnerOf(*process) == ::geteuid())
         if (auto variables = Of("/proc/" + std::to_string(*process));
             variables && HasSameData(*variables, own))
             return {*process, std::move(*variables)};

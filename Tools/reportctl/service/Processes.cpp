@@ -9,15 +9,11 @@
 #include <sstream>
 #include <string_view>
 
-#include <fcntl.h>
 #include <fmt/format.h>
 #include <pwd.h>
 #include <sys/stat.h>
-#include <unistd.h>
 
-#include "Common/Paths.h"
 #include "Common/Wire.h"
-#include "SystemTool/IO/Descriptor.h"
 
 namespace reportctl::service {
 namespace {
@@ -152,17 +148,6 @@ std::vector<BoundSocket> SocketsAtTheServicesPort() {
     const auto any = SocketsAt({ANY_ADDRESS + port, ANY_IPV6_ADDRESS + port});
     sockets.insert(sockets.end(), any.begin(), any.end());
     return sockets;
-}
-
-std::optional<pid_t> LockHolder() {
-    const SystemTool::IO::Descriptor file(
-        ::open(SyncServiceReport::Paths::PidFile().c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK));
-    struct flock whole {};
-    whole.l_type = F_WRLCK;
-    whole.l_whence = SEEK_SET;
-    if (!file.IsOpen() || ::fcntl(file.Number(), F_GETLK, &whole) != 0 || whole.l_type == F_UNLCK)
-        return std::nullopt;
-    return whole.l_pid;
 }
 
 } // namespace reportctl::service

@@ -44,8 +44,4 @@ struct BoundSocket {
 /// those at any address.
 std::vector<BoundSocket> SocketsAtTheServicesPort();
 
-/// The process that holds the lock which allows only one service on the machine; nothing when the lock is
-/// free.
-std::optional<pid_t> LockHolder();
-
 } // namespace reportctl::service

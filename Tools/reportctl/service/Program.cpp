@@ -1,11 +1,13 @@
 #include "Tools/reportctl/service/Program.h"
 
 #include <filesystem>
+#include <string_view>
 
 #include <fmt/format.h>
 
 #include "SystemTool/IO/Directory.h"
 #include "SystemTool/Version.h"
+#include "Tools/reportctl/service/Processes.h"
 
 namespace reportctl::service {
 namespace {
@@ -35,6 +37,12 @@ std::string ProgramPath() {
             return std::filesystem::path(folder + NAME).lexically_normal().string();
     }
     return {};
+}
+
+bool IsService(pid_t process) {
+    constexpr std::size_t SHOWN_TO_ALL = 15;
+    const auto name = ProgramNameOf(process);
+    return name == NAME || name == std::string_view(NAME).substr(0, SHOWN_TO_ALL);
 }
 
 std::string VersionText() {

@@ -75,6 +75,16 @@ double Rounded(double value, double to) {
     return std::round(value * to) / to;
 }
 
+void Add(Writer& json, const char* key, const std::optional<PortHolder>& holder) {
+    if (!holder)
+        return json.AddNull(key);
+    json.Begin(key);
+    json.Add("pid", holder->process);
+    json.Add("name", holder->name);
+    holder->user.empty() ? json.AddNull("user") : json.Add("user", holder->user);
+    json.End();
+}
+
 void Add(Writer& json, const Service& service, std::int64_t nowMs) {
     json.Begin("service");
     json.Add("running", service.isRunning);
@@ -88,15 +98,8 @@ void Add(Writer& json, const Service& service, std::int64_t nowMs) {
     json.Add("version", service.version);
     json.Add("buildId", service.buildId);
     json.Add("listening", service.isListening);
-    if (const auto& holder = service.portHolder) {
-        json.Begin("portHolder");
-        json.Add("pid", holder->process);
-        json.Add("name", holder->name);
-        json.Add("user", holder->user);
-        json.End();
-    } else {
-        json.AddNull("portHolder");
-    }
+    Add(json, "portHolder", service.portHolder);
+    Add(json, "lockHolder", service.lockHolder);
     json.Begin("plugins");
     json.Add("logger", service.hasLogger);
     json.Add("store", service.hasStore);

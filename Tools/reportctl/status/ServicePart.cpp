@@ -3,6 +3,7 @@
 #include <sys/stat.h>
 
 #include "SystemTool/Version.h"
+#include "Tools/reportctl/service/Lock.h"
 #include "Tools/reportctl/service/Processes.h"
 #include "Tools/reportctl/service/Program.h"
 #include "Tools/reportctl/status/Parts.h"
@@ -25,15 +26,27 @@ std::optional<std::int64_t> StartOf(pid_t process) {
     return std::int64_t{status.st_mtim.tv_sec} * 1000 + status.st_mtim.tv_nsec / 1'000'000;
 }
 
+PortHolder Described(std::optional<pid_t> process) {
+    const auto user = process ? service::OwnerOf(*process) : std::nullopt;
+    return {process, process ? service::ProgramNameOf(*process) : std::nullopt,
+            user ? service::NameOf(*user) : ""};
+}
+
+void Describe(Service& service, const service::Lock& lock) {
+    service.lockProblem = lock.problem;
+    if (lock.isHeld)
+        service.lockHolder = Described(lock.holder);
+}
+
 /// Finds the service's process: the one that counts in this user's ledger. When none counts there, the
-/// process that holds the machine's lock, if it is this user's.
-void FindProcess(Service& service, const ReportLedger::Look& ledger, uid_t owner) {
-    const auto holder = service::LockHolder();
-    const auto user = holder ? service::OwnerOf(*holder) : std::nullopt;
+/// service that holds the machine's lock, if it is this user's.
+void FindProcess(Service& service, const ReportLedger::Look& ledger, const service::Lock& lock, uid_t owner) {
+    const bool isService = lock.holder && service::IsService(*lock.holder);
+    const auto user = isService ? service::OwnerOf(*lock.holder) : std::nullopt;
     if (ledger.counting)
         service.process = static_cast<pid_t>(ledger.process);
     else if (user == owner)
-        service.process = holder;
+        service.process = lock.holder;
     else if (user)
         service.otherUser = service::NameOf(*user);
     service.isRunning = service.process.has_value();
@@ -99,7 +112,9 @@ bool HasPlugin(const Service& service, const std::string& library) {
 
 Service LookAtService(const ReportLedger::Look& ledger, uid_t owner) {
     Service service;
-    FindProcess(service, ledger, owner);
+    const auto lock = service::LookAtLock();
+    Describe(service, lock);
+    FindProcess(service, ledger, lock, owner);
     DescribeProcess(service, ledger);
     FindPortHolder(service, owner);
     service.hasLogger = HasPlugin(service, "libBoostLogger.dylib");

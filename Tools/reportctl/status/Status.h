@@ -14,11 +14,11 @@
 /// separate functions. An empty optional means that the value is not known or does not exist.
 namespace reportctl::status {
 
-/// The program that has bound the service's port.
+/// A program that holds what only one service on the machine can have: the port, or the pid file's lock.
 struct PortHolder {
     std::optional<pid_t> process; ///< Not known when this user may not see the process.
     std::optional<std::string> name;
-    std::string user; ///< The user's name, or number when it has no name.
+    std::string user; ///< The user's name, or number when it has no name. Empty: not known.
 };
 
 /// What the kernel knows of the service's own socket.
@@ -37,6 +37,8 @@ struct Service {
     std::optional<PortHolder> portHolder;
     std::optional<PortHolder> portSharer; ///< Another program at the same address and port.
     std::optional<Intake> intake;
+    std::optional<PortHolder> lockHolder; ///< Of the pid file's lock.
+    std::string lockProblem;              ///< Why no service can take that lock; empty when one can.
     std::optional<std::string> otherUser; ///< The user whose service holds the machine's lock instead.
     /// Whether the process has loaded the plug-ins. When that is not known, for example because nothing runs:
     /// whether their files are beside the program.

@@ -3,6 +3,7 @@
 
 #include <fmt/format.h>
 
+#include "Common/Paths.h"
 #include "Tools/reportctl/status/Recent.h"
 #include "Tools/reportctl/status/Status.h"
 #include "Tools/reportctl/terminal/Quantity.h"
@@ -62,21 +63,40 @@ private:
     }
 
     static std::string Words(const PortHolder& holder) {
-        return fmt::format("{} of user {}{}", holder.name.value_or("a program"), holder.user,
-                           holder.process ? fmt::format(" (process {})", *holder.process) : "");
+        return fmt::format("{}{}{}", holder.name.value_or("a program"),
+                           holder.user.empty() ? "" : " of user " + holder.user, ProcessOf(holder));
+    }
+
+    static std::string ProcessOf(const PortHolder& holder) {
+        return holder.process ? fmt::format(" (process {})", *holder.process) : "";
+    }
+
+    /// Why no service can start, or what to do so that one starts.
+    std::string WhyNotRunning() const {
+        const Service& service = m_status.service;
+        if (service.lockHolder && service.lockHolder->name)
+            return fmt::format("The lock of {} is held by {}, so no service can start. End that program.",
+                               SyncServiceReport::Paths::PidFile(), Words(*service.lockHolder));
+        if (service.lockHolder)
+            return fmt::format("The lock of {} is held by a program that this user may not see{}. Your "
+                               "service can run when that one has ended: `reportctl run` waits for it.",
+                               SyncServiceReport::Paths::PidFile(), ProcessOf(*service.lockHolder));
+        if (!service.lockProblem.empty())
+            return service.lockProblem;
+        return "The service is not running. Start it: `systemctl --user start sync-service-report`, or sign "
+               "in to the suite again.";
     }
 
     void JudgeService() {
         const Service& service = m_status.service;
         if (!service.isRunning && service.otherUser)
             return Add(Verdict::Down,
-                       fmt::format("The service of user {} runs on this machine, and only one can. Yours "
+                       fmt::format("The service of user {} runs on this machine{}, and only one can. Yours "
                                    "can run when that one has ended: `reportctl run` waits for it.",
-                                   *service.otherUser));
+                                   *service.otherUser,
+                                   service.lockHolder ? ProcessOf(*service.lockHolder) : ""));
         if (!service.isRunning)
-            Add(Verdict::Down,
-                "The service is not running. Start it: `systemctl --user start sync-service-report`, or "
-                "sign in to the suite again.");
+            Add(Verdict::Down, WhyNotRunning());
         if (!service.isListening && service.portHolder)
             Add(Verdict::Down,
                 fmt::format("Port 9997 is held by {}: reports go there. End that program, then restart "

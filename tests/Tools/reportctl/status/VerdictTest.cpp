@@ -190,6 +190,11 @@ TEST_F(StatusVerdict, IsDownAndSaysWhyBeforeAllElse) {
     judgement = Judge(m_status);
     EXPECT_EQ(judgement.verdict, Verdict::Down);
     EXPECT_THAT(judgement.reasons.front(), HasSubstr("The service of user u2 runs"));
+
+    m_status.service.lockHolder = PortHolder{17, "SyncServiceRepo", "u2"};
+    judgement = Judge(m_status);
+    EXPECT_THAT(judgement.reasons.front(),
+                HasSubstr("The service of user u2 runs on this machine (process 17), and only one can."));
 }
 
 TEST(Rates, AreThoseOfTheMarkThatIsAMinuteOld) {
