@@ -6,6 +6,7 @@
 #include <fcntl.h>
 #include <sys/stat.h>
 
+#include "Modules/Sqlite/Links.h"
 #include "Modules/Sqlite/SafeDirectory.h"
 #include "Modules/Sqlite/SideFiles.h"
 #include "Modules/Sqlite/Trust.h"
@@ -47,6 +48,7 @@ void RequireOurFiles(int directory, const std::string& name, const std::string& 
 }
 
 void RequireOurFiles(const std::string& path) {
+    RequireOurLinks(path);
     std::error_code error;
     const auto file = std::filesystem::canonical(path, error);
     if (error || std::filesystem::is_directory(file, error))

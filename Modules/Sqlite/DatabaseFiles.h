@@ -29,8 +29,9 @@ std::optional<Identity> IdentityOf(const std::string& path, int directory = AT_F
 void RequireOurFiles(int directory, const std::string& name, const std::string& shown);
 
 /// The same check for the file that `path` leads to, and for that file's directory. It follows links, because
-/// SQLite follows them. Does nothing when there is no file, or when `path` is a directory: SQLite reports
-/// both itself. Throws UnsafePath.
+/// SQLite follows them, and checks that no other user can have put them there or can replace them. Does
+/// nothing when there is no file, or when `path` is a directory: SQLite reports both itself. Throws
+/// UnsafePath.
 void RequireOurFiles(const std::string& path);
 
 /// Tells whether the log and the index of an open database still have their names.

@@ -29,9 +29,11 @@ protected:
     }
 
     /// Why SQLite must not open the database; empty when it may.
-    std::string Refusal() const {
+    std::string Refusal() const { return Refusal(Database()); }
+
+    static std::string Refusal(const std::string& path) {
         try {
-            RequireOurFiles(Database());
+            RequireOurFiles(path);
             return {};
         } catch (const UnsafePath& refusal) {
             return refusal.what();
@@ -106,4 +108,47 @@ TEST_F(TheDatabaseFiles, AreLookedAtWhereALinkToTheDatabaseLeads) {
     Make(Database() + "-wal");
     fs::permissions(Database() + "-wal", fs::perms{0666});
     EXPECT_THROW(RequireOurFiles(link), UnsafePath);
+}
+
+TEST_F(TheDatabaseFiles, MayBeReachedThroughLinksThatNoOtherUserCanReplace) {
+    const auto link = m_directory.Path() + "/link";
+    fs::create_directory(m_directory.Path() + "/shared");
+    fs::permissions(m_directory.Path() + "/shared", fs::perms{01777}); // like /tmp: its links stay
+    fs::create_symlink("../o.db", m_directory.Path() + "/shared/first");
+    fs::create_symlink("shared/first", link);
+    EXPECT_EQ(Refusal(link), "");
+    fs::remove(Database());
+    EXPECT_EQ(Refusal(link), "") << "SQLite says itself that there is nothing";
+    fs::create_symlink(link, Database());
+    EXPECT_EQ(Refusal(link), "") << "SQLite says itself that the links lead in a circle";
+}
+
+TEST_F(TheDatabaseFiles, AreRefusedBehindALinkThatAnotherUserCouldReplace) {
+    const auto shared = m_directory.Path() + "/shared";
+    fs::create_directory(shared);
+    fs::create_symlink(Database(), shared + "/first");
+    fs::create_symlink("shared/first", m_directory.Path() + "/link");
+    fs::create_directory_symlink(m_directory.Path(), shared + "/directory");
+    for (const auto mode : {0777U, 0775U}) {
+        fs::permissions(shared, fs::perms{mode});
+        for (const auto* path : {"/shared/first", "/link", "/shared/directory/o.db"})
+            EXPECT_EQ(Refusal(m_directory.Path() + path), shared + " may be written by other users") << path;
+    }
+    fs::permissions(shared, fs::perms{0755});
+    EXPECT_EQ(Refusal(shared + "/first"), "");
+}
+
+TEST_F(TheDatabaseFiles, AreRefusedBehindALinkOfAnotherUser) {
+    if (!OtherUser::CanBeMade())
+        GTEST_SKIP() << "only root can give files to another user";
+    const auto link = m_directory.Path() + "/link";
+    fs::create_symlink(Database(), link);
+    OtherUser::Give(link);
+    EXPECT_EQ(Refusal(link), "the link " + link + " belongs to another user");
+    fs::create_directory(m_directory.Path() + "/theirs");
+    fs::permissions(m_directory.Path() + "/theirs", fs::perms{01755});
+    fs::create_symlink(Database(), m_directory.Path() + "/theirs/link");
+    OtherUser::Give(m_directory.Path() + "/theirs");
+    EXPECT_EQ(Refusal(m_directory.Path() + "/theirs/link"),
+              m_directory.Path() + "/theirs belongs to another user");
 }
