@@ -153,6 +153,18 @@ TEST_F(SharedPort, IsBoundBesideAProgramThatLetsTheAddressBeReusedAndNoMore) {
     EXPECT_TRUE(m_receiver.Start(LOOPBACK, PORT)) << m_output.Text();
 }
 
+TEST_F(SharedPort, GivesTheServiceEveryReportBesideAnEarlierSocketOfAnotherUserThatLetsTheAddressBeReused) {
+    if (!OtherUser::Does([] { return true; }))
+        GTEST_SKIP() << "needs the rights to become another user";
+    const AnotherUser other({"the address", {SO_REUSEADDR}, "127.0.0.1"});
+    ASSERT_EQ(other.Error(), 0);
+    ASSERT_TRUE(m_receiver.Start(LOOPBACK, PORT)) << m_output.Text();
+    for (int i = 0; i < 20; ++i)
+        Send(REPORT);
+    EXPECT_TRUE(WaitUntil([&] { return m_receiver.Received() == 20; }, std::chrono::seconds(2)))
+        << m_receiver.Received() << " of 20 arrived";
+}
+
 TEST_F(SharedPort, IsBoundAtOnceWhileTheOldProcessIsBeingKilled) {
     for (int i = 0; i < 20; ++i) {
         int bound[2];

@@ -9,6 +9,7 @@
 
 #include "tests/Modules/MetrikSdk/support/LoopbackServer.h"
 #include "tests/e2e/support/Disk.h"
+#include "tests/e2e/support/FileSizeLimit.h"
 #include "tests/e2e/support/Service.h"
 #include "tests/support/WaitUntil.h"
 
@@ -97,6 +98,19 @@ TEST_F(OutboxFault, AFullDiskCostsTheEventsThatComeMeanwhileAndSaysHowMany) {
     EXPECT_EQ(Told().size(), 1U) << "and not a hundred times";
     disk.MakeRoom();
     ExpectToGoOnAndToHaveCounted("outbox file-Cannot store an event: database or disk is full");
+}
+
+TEST_F(OutboxFault, AFileSizeLimitEndsTheServiceWhenItsLogReachesIt) {
+    m_service.Install();
+    {
+        const FileSizeLimit limit(1'000'000); // the service inherits it
+        m_service.Start();
+    }
+    for (int i = 0; i < 300; ++i)
+        Service::Send(R"({"eventID":"A759|1","value":{"a":")" + std::string(9'000, 'x') + "\"}}");
+    EXPECT_EQ(m_service.AwaitEnd(), -SIGXFSZ);
+    EXPECT_LE(std::filesystem::file_size(m_service.OutboxFile() + "-wal"), 1'000'000U);
+    EXPECT_GT(std::filesystem::file_size(m_service.OutboxFile() + "-wal"), 900'000U);
 }
 
 TEST_F(OutboxFault, ALockHeldForMoreThanFiveSecondsCostsTheEventsThatComeAfterThem) {

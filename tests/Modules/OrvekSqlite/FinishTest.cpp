@@ -1,4 +1,5 @@
 #include <chrono>
+#include <filesystem>
 #include <future>
 #include <thread>
 
@@ -52,6 +53,14 @@ TEST_F(FinishedDatabase, FailsEveryOperationOnceItIsClosed) {
     EXPECT_TRUE(m_database.Finish());
     EXPECT_FALSE(m_database.ExecSql(Insert("later")));
     EXPECT_EQ(m_database.GetLastErrorMsg(), "the database object is destroyed");
+    EXPECT_EQ(Rows(Store()), "1");
+}
+
+TEST_F(FinishedDatabase, HasTheRowsOfALogThatWasDeletedWithoutALaterStatement) {
+    EXPECT_TRUE(m_database.ExecSql(Insert("before")));
+    for (const auto* suffix : {"-wal", "-shm"})
+        ASSERT_TRUE(std::filesystem::remove(Store() + suffix));
+    EXPECT_TRUE(m_database.Finish());
     EXPECT_EQ(Rows(Store()), "1");
 }
 

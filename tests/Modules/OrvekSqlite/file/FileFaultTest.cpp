@@ -212,6 +212,21 @@ TEST_F(DatabaseFile, HoldsEveryRowThoughItsSideFilesWereDeletedAndTheProcessKill
     EXPECT_EQ(Ask(Store(), "pragma integrity_check"), "ok");
 }
 
+/// Only a later statement, or an orderly end, notices that the log is gone.
+TEST_F(DatabaseFile, LosesTheRowsOfItsDeletedLogWhenTheProcessIsKilledBeforeTheNextStatement) {
+    MakeStore(Store());
+    ChildProcess writer([&](const auto&) {
+        if (!Plugin()->Open(Store()) || !Exec(Insert("lost")) || Rows(Store()) != "1")
+            return 1;
+        fs::remove(Store() + "-wal");
+        fs::remove(Store() + "-shm");
+        return ::raise(SIGKILL);
+    });
+    EXPECT_EQ(writer.Wait(), 128 + SIGKILL);
+    EXPECT_EQ(Rows(Store()), "0");
+    EXPECT_EQ(Ask(Store(), "pragma integrity_check"), "ok");
+}
+
 TEST_F(DatabaseFile, HasEachRowOnceWhenASideFileIsDeletedInABurst) {
     OpenStore();
     for (int i = 0; i < 5000; ++i) {
