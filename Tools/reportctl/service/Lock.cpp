@@ -17,8 +17,7 @@ std::string ProblemOf(const std::string& path) {
     if (::lstat(path.c_str(), &status) != 0)
         return {}; // the service makes it
     if (!S_ISREG(status.st_mode))
-        return fmt::format("{} is no regular file, so no service can start. Remove it, and run `reportctl "
-                           "setup`.",
+        return fmt::format("{} is no regular file. Remove it, run `reportctl setup`, and start the service.",
                            path);
     if (::access(path.c_str(), R_OK | W_OK) != 0)
         return fmt::format("{} may not be written by this user, so its service cannot start. Run `reportctl "

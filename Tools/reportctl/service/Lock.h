@@ -12,7 +12,7 @@ namespace reportctl::service {
 struct Lock {
     bool isHeld = false;
     std::optional<pid_t> holder; ///< Not known for some kinds of locks, and across containers.
-    /// Why no service of this user can take the lock, also when it is free; empty when one can.
+    /// What is wrong with the file, so that a service of this user cannot lock it; empty when nothing is.
     std::string problem;
 };
 

@@ -38,7 +38,7 @@ struct Service {
     std::optional<PortHolder> portSharer; ///< Another program at the same address and port.
     std::optional<Intake> intake;
     std::optional<PortHolder> lockHolder; ///< Of the pid file's lock.
-    std::string lockProblem;              ///< Why no service can take that lock; empty when one can.
+    std::string lockProblem;              ///< What is wrong with the pid file; empty when nothing is.
     std::optional<std::string> otherUser; ///< The user whose service holds the machine's lock instead.
     /// Whether the process has loaded the plug-ins. When that is not known, for example because nothing runs:
     /// whether their files are beside the program.

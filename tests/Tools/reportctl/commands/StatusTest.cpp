@@ -97,9 +97,8 @@ TEST_F(StatusCommand, SaysSoWhenTheHolderOfTheLockCannotBeKnown) {
 }
 
 TEST_F(StatusCommand, SaysSoWhenThereIsNoRegularFileToLock) {
-    const auto expected =
-        std::string(PID_FILE) +
-        " is no regular file, so no service can start. Remove it, and run `reportctl setup`.";
+    const auto expected = std::string(PID_FILE) +
+                          " is no regular file. Remove it, run `reportctl setup`, and start the service.";
     fs::create_directory(PID_FILE);
     EXPECT_THAT(Status(), HasSubstr(expected));
     fs::remove(PID_FILE);
