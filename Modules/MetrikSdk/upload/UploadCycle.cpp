@@ -121,8 +121,8 @@ void UploadCycle::Note(const std::string& failure) {
     try {
         m_outbox.NoteUploadFailure(failure);
         m_isFailureNoted = true;
-    } catch (
-        const outbox::StoreError&) { // the next failure tries again, and the next event tells of the file
+    } catch (const outbox::StoreError&) {
+        // The next failure tries again, and the next event tells of the file.
     }
 }
 
