@@ -133,10 +133,9 @@ TEST_F(OutboxCommand, SendsATestEventAndTellsTheAnswer) {
 }
 
 TEST_F(OutboxCommand, JudgesTheAnswerAsTheUploaderDoes) {
-    Reply reply;
-    LoopbackServer collector([&](const Request&) { return reply; });
     const auto said = [&](int status, const std::string& body = {}, const std::string& headers = {}) {
-        reply = {.status = status, .body = body, .headers = headers};
+        const LoopbackServer collector(
+            [&](const Request&) { return Reply{.status = status, .body = body, .headers = headers}; });
         const auto outcome = Reportctl(
             "outbox test",
             "OTEL_EXPORTER_OTLP_LOGS_HEADERS=key=secret OTEL_EXPORTER_OTLP_ENDPOINT=" + collector.Url());
@@ -162,12 +161,10 @@ TEST_F(OutboxCommand, JudgesTheAnswerAsTheUploaderDoes) {
 }
 
 TEST_F(OutboxCommand, TellsWhatAnAnswerOfPartialSuccessMeans) {
-    std::string partial;
-    LoopbackServer collector([&](const Request&) {
-        return Reply{.status = 200, .body = R"({"partialSuccess":{)" + partial + "}}", .headers = {}};
-    });
     const auto said = [&](const std::string& members) {
-        partial = members;
+        const LoopbackServer collector([&](const Request&) {
+            return Reply{.status = 200, .body = R"({"partialSuccess":{)" + members + "}}", .headers = {}};
+        });
         const auto outcome = Reportctl("outbox test", "OTEL_EXPORTER_OTLP_ENDPOINT=" + collector.Url());
         const auto begin = outcome.output.find("status: 200, ") + 13;
         return std::to_string(outcome.exitCode) + " " +
