@@ -35,6 +35,16 @@ protected:
                                       std::to_string(entry.last_write_time().time_since_epoch().count());
         return files;
     }
+
+    void KillAServiceWithARowAndAnEvent() {
+        m_service.Start();
+        Service::Send(R"({"eventID":"B1"})");
+        Service::Send(R"({"eventID":"A759|1"})");
+        ASSERT_TRUE(WaitUntil([&] { return m_service.RowCount() == 1; }));
+        ASSERT_TRUE(WaitUntil(
+            [&] { return m_service.Count(m_service.OutboxFile(), "select count(*) from event") == 1; }));
+        m_service.Kill();
+    }
 };
 
 } // namespace
@@ -185,13 +195,7 @@ TEST_F(Status, IsDownForAUserWhenAnotherUsersServiceRuns) {
 }
 
 TEST_F(Status, ChangesNoFileOfAServiceThatWasKilled) {
-    m_service.Start();
-    Service::Send(R"({"eventID":"B1"})");
-    Service::Send(R"({"eventID":"A759|1"})");
-    ASSERT_TRUE(WaitUntil([&] { return m_service.RowCount() == 1; }));
-    ASSERT_TRUE(WaitUntil(
-        [&] { return m_service.Count(m_service.OutboxFile(), "select count(*) from event") == 1; }));
-    m_service.Kill();
+    ASSERT_NO_FATAL_FAILURE(KillAServiceWithARowAndAnEvent());
     ASSERT_GT(std::filesystem::file_size(m_service.DatabaseFile() + "-wal"), 0U);
     const auto before = Files();
     const auto json = Json(2);
@@ -215,13 +219,7 @@ TEST_F(Status, ReadsAStoreWhoseLogEndsBehindItsHeader) { // a kill in the first 
 }
 
 TEST_F(Status, ReadsDatabasesWithoutTheirIndexes) { // a backup may have left them out
-    m_service.Start();
-    Service::Send(R"({"eventID":"B1"})");
-    Service::Send(R"({"eventID":"A759|1"})");
-    ASSERT_TRUE(WaitUntil([&] { return m_service.RowCount() == 1; }));
-    ASSERT_TRUE(WaitUntil(
-        [&] { return m_service.Count(m_service.OutboxFile(), "select count(*) from event") == 1; }));
-    m_service.Kill();
+    ASSERT_NO_FATAL_FAILURE(KillAServiceWithARowAndAnEvent());
     std::map<std::string, std::string> before;
     for (const auto& file : {m_service.DatabaseFile(), m_service.OutboxFile()}) {
         std::filesystem::remove(file + "-shm");

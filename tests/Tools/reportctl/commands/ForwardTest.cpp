@@ -52,6 +52,13 @@ protected:
         return rows;
     }
 
+    static void ExpectArrived(const LoopbackServer& collector, std::size_t rows) {
+        const auto arrived = ArrivedAt(collector);
+        EXPECT_EQ(arrived.size(), rows);
+        for (const auto& [row, uids] : arrived)
+            EXPECT_EQ(uids.size(), 1U) << "a repetition has its old uid: row " << row;
+    }
+
     static Reply Take(const Request&) { return {}; }
 };
 
@@ -136,10 +143,7 @@ TEST_F(ForwardCommand, LosesNoRowWhenItIsKilledWhileTheCollectorHasARequest) {
     EXPECT_EQ(ForwardAs("--once", collector).exitCode, -1);
     EXPECT_LT(ArrivedAt(collector).size(), 2000U);
     EXPECT_EQ(ForwardAs("--once", collector).exitCode, 0);
-    const auto arrived = ArrivedAt(collector);
-    EXPECT_EQ(arrived.size(), 2000U);
-    for (const auto& [row, uids] : arrived)
-        EXPECT_EQ(uids.size(), 1U) << "a repetition has its old uid: row " << row;
+    ExpectArrived(collector, 2000U);
 }
 
 TEST_F(ForwardCommand, GoesOnUntilItIsToldToEndAndEndsARequestUnderWay) {
@@ -204,10 +208,7 @@ TEST_F(ForwardCommand, LosesNothingWhileTheDiskIsFullForItsOwnFile) {
         GTEST_SKIP() << "this machine does not allow mounting";
     EXPECT_EQ(result, SmallDiskResult::Passed);
     EXPECT_EQ(collector.RequestCount(), 4U) << "700 rows are two; the new one was sent twice";
-    const auto arrived = ArrivedAt(collector);
-    EXPECT_EQ(arrived.size(), 701U);
-    for (const auto& [row, uids] : arrived)
-        EXPECT_EQ(uids.size(), 1U) << "a repetition has its old uid: row " << row;
+    ExpectArrived(collector, 701U);
 }
 
 TEST_F(ForwardCommand, NotesWhatWasTakenThoughNobodyReadsItsResult) {
